@@ -1,0 +1,29 @@
+# What every target of the project shares hangs on these INTERFACE targets; nobody edits global flags.
+
+add_library(clipfile_warnings INTERFACE)
+target_compile_options(clipfile_warnings INTERFACE
+    -Wall -Wextra -Wpedantic -Wconversion -Wshadow -Werror
+    # The locks are annotated; clang checks what the annotations say.
+    $<$<CXX_COMPILER_ID:Clang>:-Wthread-safety>)
+
+add_library(clipfile_sanitizers INTERFACE)
+if(CLIPFILE_SANITIZE STREQUAL "address")
+    set(_flags -fsanitize=address,undefined -fno-sanitize-recover=all -fno-omit-frame-pointer)
+elseif(CLIPFILE_SANITIZE STREQUAL "thread")
+    set(_flags -fsanitize=thread -fno-omit-frame-pointer)
+elseif(CLIPFILE_SANITIZE STREQUAL "")
+    set(_flags)
+else()
+    message(FATAL_ERROR "CLIPFILE_SANITIZE: '${CLIPFILE_SANITIZE}' is none of address, thread or empty.")
+endif()
+target_compile_options(clipfile_sanitizers INTERFACE ${_flags})
+target_link_options(clipfile_sanitizers INTERFACE ${_flags})
+
+# Log lines carry source paths; they are relative to the tree whatever folder it was built in.
+add_library(clipfile_paths INTERFACE)
+target_compile_options(clipfile_paths INTERFACE "-fmacro-prefix-map=${PROJECT_SOURCE_DIR}/=")
+
+# Everything that a target of ours takes over: warnings, sanitizers, source paths, threads.
+add_library(clipfile_common INTERFACE)
+target_link_libraries(clipfile_common INTERFACE
+    clipfile_warnings clipfile_sanitizers clipfile_paths Threads::Threads)

@@ -1,0 +1,63 @@
+# Test programs: one for each folder of tests, one ctest entry for each test case.
+
+find_package(GTest REQUIRED)
+include(GoogleTest)
+
+if(CLIPFILE_TEST_PCH)
+    add_library(clipfile_test_pch OBJECT "${CMAKE_CURRENT_LIST_DIR}/test_pch.cc")
+    target_link_libraries(clipfile_test_pch PRIVATE clipfile_common GTest::gmock)
+    target_precompile_headers(clipfile_test_pch PRIVATE
+        <gmock/gmock.h> <gtest/gtest.h>
+        <algorithm> <array> <atomic> <condition_variable> <cstdint> <cstdio> <cstring> <deque>
+        <functional> <map> <memory> <mutex> <string> <string_view> <thread> <vector>)
+endif()
+
+# clipfile_add_test(NAME SOURCES x_test.cc ... [LIBRARIES ...] [TIMEOUT seconds] [ENVIRONMENT A=b ...] [SERIAL])
+#
+# Registers the sources, builds the program NAME from them and enters each of its cases with ctest. A *_test.cc
+# that no call names fails the configure step (clipfile_check_tests_registered). SERIAL is for measurements of a
+# whole process (memory, open files); everything else runs in parallel.
+function(clipfile_add_test name)
+    cmake_parse_arguments(ARG "SERIAL" "TIMEOUT" "SOURCES;LIBRARIES;ENVIRONMENT" ${ARGN})
+    if(ARG_UNPARSED_ARGUMENTS OR NOT ARG_SOURCES)
+        message(FATAL_ERROR "clipfile_add_test(${name}): SOURCES are missing or '${ARG_UNPARSED_ARGUMENTS}' is not understood.")
+    endif()
+    if(NOT ARG_TIMEOUT)
+        set(ARG_TIMEOUT 60)
+    endif()
+    if(CLIPFILE_SANITIZE)
+        math(EXPR ARG_TIMEOUT "${ARG_TIMEOUT} * 4")
+    endif()
+
+    add_executable(${name} ${ARG_SOURCES})
+    target_link_libraries(${name} PRIVATE clipfile_common ${ARG_LIBRARIES} GTest::gmock_main)
+    if(CLIPFILE_TEST_PCH)
+        target_precompile_headers(${name} REUSE_FROM clipfile_test_pch)
+    endif()
+    set(properties TIMEOUT ${ARG_TIMEOUT})
+    if(ARG_SERIAL)
+        list(APPEND properties RUN_SERIAL ON)
+    endif()
+    if(ARG_ENVIRONMENT)
+        list(APPEND properties ENVIRONMENT "${ARG_ENVIRONMENT}")
+    endif()
+    gtest_discover_tests(${name} TEST_PREFIX "${name}." DISCOVERY_TIMEOUT 120 PROPERTIES ${properties})
+
+    list(TRANSFORM ARG_SOURCES PREPEND "${CMAKE_CURRENT_SOURCE_DIR}/")
+    set_property(GLOBAL APPEND PROPERTY CLIPFILE_REGISTERED_TESTS ${ARG_SOURCES})
+endfunction()
+
+function(clipfile_check_tests_registered)
+    set(roots libs modules host bench fuzz)
+    list(TRANSFORM roots PREPEND "${PROJECT_SOURCE_DIR}/")
+    list(TRANSFORM roots APPEND "/*_test.cc" OUTPUT_VARIABLE patterns)
+    file(GLOB_RECURSE found CONFIGURE_DEPENDS ${patterns})
+    get_property(registered GLOBAL PROPERTY CLIPFILE_REGISTERED_TESTS)
+    if(registered)
+        list(REMOVE_ITEM found ${registered})
+    endif()
+    if(found)
+        list(JOIN found "\n  " lines)
+        message(FATAL_ERROR "These tests are not registered with clipfile_add_test:\n  ${lines}")
+    endif()
+endfunction()

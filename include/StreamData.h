@@ -1,0 +1,33 @@
+#pragma once
+
+#include <cstdint>
+#include <memory>
+
+/// One unit of the live stream as the host hands it over: a video access unit, an audio frame or a timed metadata
+/// packet, undecoded, with its timestamps.
+///
+/// The record belongs to the host system and is compiled into hosts: the order and the width of its fields are an
+/// ABI. It is always held by `std::shared_ptr<StreamData>`; the payload is shared, never copied, on its way through
+/// the module, and is not changed by anyone once the unit was pushed.
+struct StreamData {
+    virtual ~StreamData() = default;
+
+    /// Media clock of the unit: 90000 ticks a second for video and metadata, 48000 for audio.
+    std::uint64_t rtp_timestamp = 0;
+    /// The same instant in milliseconds, on one clock for all three media.
+    std::uint64_t timestamp = 0;
+    std::uint64_t reserved0 = 0;
+    std::uint64_t reserved1 = 0;
+    std::uint64_t reserved2 = 0;
+    std::uint64_t reserved3 = 0;
+    /// Owner of the payload.
+    std::shared_ptr<unsigned char> data;
+    /// Length of the payload in bytes.
+    std::uint64_t size = 0;
+    std::uint64_t reserved4 = 0;
+    bool reservedFlag = true;
+    /// Second owner slot of the host.
+    std::shared_ptr<unsigned char> buffer;
+    /// The payload itself; null in a unit that carries none.
+    const unsigned char* payload = nullptr;
+};
