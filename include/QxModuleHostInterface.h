@@ -3,8 +3,9 @@
 #include <map>
 #include <string>
 
-/// What the host implements for the module. The order of the operations is an ABI. The module keeps the pointer
-/// from `QxModuleInterface::Initialize` to `Uninitialize`, never owns it, and calls it from several threads at once.
+/// What the host implements for the module. The order of the operations is an ABI. The module keeps the
+/// pointer from `QxModuleInterface::Initialize` to `Uninitialize`, never owns it, and calls it from several
+/// threads at once.
 class QxModuleHostInterface {
  public:
     /// Records status and cause of the module. Status 7 means that the module has failed for good.

@@ -6,9 +6,9 @@
 
 /// The module as a host sees it. The order of the operations is an ABI.
 ///
-/// Order of calls: `GetQxModuleInterface`; `Initialize`; the two getters and `Execute` in any order; pushes and
-/// notifications; `Uninitialize` once, after the last push. `Initialize` may run again after that. When `Initialize`
-/// has returned false the host calls nothing further.
+/// Order of calls: `GetQxModuleInterface`; `Initialize`; the two getters and `Execute` in any order; pushes
+/// and notifications; `Uninitialize` once, after the last push. `Initialize` may run again after that. When
+/// `Initialize` has returned false the host calls nothing further.
 class QxModuleInterface {
  public:
     /// Reads settings and start parameters and starts the threads of the module. False when no output path is

@@ -22,8 +22,8 @@ struct QxInputOutputDisconnectionRequest {
     std::uint32_t connectionKind = 0;
 };
 
-/// The host's control notifications. The order of the operations is an ABI. The host delivers them one at a time,
-/// from any of its threads; each runs on the calling thread. A result of 0 means success.
+/// The host's control notifications. The order of the operations is an ABI. The host delivers them one at a
+/// time, from any of its threads; each runs on the calling thread. A result of 0 means success.
 class QxModuleNotifyInterface {
  public:
     virtual std::uint32_t NotifyInputOutputConnectRequest(const QxInputOutputConnectRequest* request) = 0;

@@ -3,12 +3,12 @@
 #include <cstdint>
 #include <memory>
 
-/// One unit of the live stream as the host hands it over: a video access unit, an audio frame or a timed metadata
-/// packet, undecoded, with its timestamps.
+/// One unit of the live stream as the host hands it over: a video access unit, an audio frame or a timed
+/// metadata packet, undecoded, with its timestamps.
 ///
-/// The record belongs to the host system and is compiled into hosts: the order and the width of its fields are an
-/// ABI. It is always held by `std::shared_ptr<StreamData>`; the payload is shared, never copied, on its way through
-/// the module, and is not changed by anyone once the unit was pushed.
+/// The record belongs to the host system and is compiled into hosts: the order and the width of its fields
+/// are an ABI. It is always held by `std::shared_ptr<StreamData>`; the payload is shared, never copied, on
+/// its way through the module, and is not changed by anyone once the unit was pushed.
 struct StreamData {
     virtual ~StreamData() = default;
 

@@ -14,8 +14,9 @@ enum _LogPriority {
 /// The host system's log.
 class Logger {
  public:
-    /// Writes one line, formatted as by printf, when `priority` is not above the threshold. `file` and `function`
-    /// may be null and `line` 0 for lines that name no place. Callable from any thread; never waits for a disk.
-    [[gnu::format(printf, 5, 6)]] static void Put(_LogPriority priority, const char* file, const char* function,
-                                                  int line, const char* format, ...);
+    /// Writes one line, formatted as by printf, when `priority` is not above the threshold. `file` and
+    /// `function` may be null and `line` 0 for lines that name no place. Callable from any thread; never
+    /// waits for a disk.
+    [[gnu::format(printf, 5, 6)]] static void Put(_LogPriority priority, const char* file,
+                                                  const char* function, int line, const char* format, ...);
 };

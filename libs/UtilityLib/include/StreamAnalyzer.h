@@ -19,7 +19,8 @@ struct NalUnit {
 /// A converted sample: the bytes that go into the file, with its timestamps, its duration and its sync flag.
 class SampleData {
  public:
-    SampleData(std::vector<unsigned char> bytes, std::uint64_t rtpTimestamp, std::uint64_t timestamp, bool sync);
+    SampleData(std::vector<unsigned char> bytes, std::uint64_t rtpTimestamp, std::uint64_t timestamp,
+               bool sync);
 
     /// The bytes, owned by the sample.
     unsigned char* GetData();
@@ -46,7 +47,8 @@ class StreamAnalyzer {
     StreamAnalyzer();
     virtual ~StreamAnalyzer();
 
-    /// True when the unit starts an access unit of an IDR picture; fills the parameter sets found in the unit.
+    /// True when the unit starts an access unit of an IDR picture; fills the parameter sets found in the
+    /// unit.
     bool IsAccessUnitStart(const std::shared_ptr<StreamData>& unit, NalUnit& sps, NalUnit& pps);
     /// Each appends one sample a unit, in order.
     void ConvertVideo(std::vector<std::shared_ptr<StreamData>>& units,

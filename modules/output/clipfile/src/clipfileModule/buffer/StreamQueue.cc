@@ -1,0 +1,35 @@
+#include "buffer/StreamQueue.h"
+
+#include <utility>
+
+namespace clipfileModule {
+
+StreamQueue::StreamQueue(std::uint64_t capacity, bool dropWhenFull) : queue(capacity, dropWhenFull) {}
+
+StreamQueue::~StreamQueue() = default;
+
+void StreamQueue::Start(std::function<void(std::shared_ptr<StreamData>&)> unitHandler) {
+    handler = std::move(unitHandler);
+    running = true;
+    thread = std::make_unique<std::thread>(&StreamQueue::run, this);
+}
+
+void StreamQueue::Stop() {
+    running = false;
+    // Closing takes the place of a stop unit: that one would have to wait for room in a full queue whose
+    // worker may have gone.
+    queue.Close();
+    thread->join();
+}
+
+void StreamQueue::run() {
+    while (running) {
+        std::shared_ptr<StreamData> unit = queue.Pop();
+        // A null unit says that the queue was closed.
+        if (unit != nullptr && unit->size != 0) {
+            handler(unit);
+        }
+    }
+}
+
+}  // namespace clipfileModule

@@ -1,0 +1,39 @@
+#pragma once
+
+#include <cstdint>
+#include <string>
+
+#include "StreamAnalyzer.h"
+
+namespace clipfileModule {
+
+/// Everything that a recording needs to know. `Controller` holds the master copy; each recording works on its
+/// own.
+struct OutputSettings {
+    std::string filePrefix;
+    /// Where the dated directories are made; separated by backslashes.
+    std::string outputPath;
+    /// Credentials for a network share.
+    std::string userName;
+    std::string password;
+    /// "normal" or "fragment".
+    std::string fileType;
+    /// "direct" lets a connected input set bit rate and picture size as well as frame rate.
+    std::string naluType;
+    /// Where record commands come from: "on" or "sync".
+    std::string outputMode;
+    std::uint64_t streamStart = 0;
+    std::uint32_t bitrate = 0;
+    /// Frames per 1000 seconds.
+    std::uint32_t framerate = 0;
+    /// Picture size in pixels.
+    std::uint32_t width = 0;
+    std::uint32_t height = 0;
+    /// Length of a file in minutes.
+    std::uint64_t maxFileSize = 0;
+    /// Parameter sets of the recording's first IDR frame; empty until then.
+    nal_access::NalUnit sps;
+    nal_access::NalUnit pps;
+};
+
+}  // namespace clipfileModule
