@@ -17,7 +17,7 @@ struct NalUnit {
 };
 
 /// A converted sample: the bytes that go into the file, with its timestamps, its duration and its sync flag.
-class SampleData {
+class [[gnu::visibility("default")]] SampleData {
  public:
     SampleData(std::vector<unsigned char> bytes, std::uint64_t rtpTimestamp, std::uint64_t timestamp,
                bool sync);
@@ -42,7 +42,7 @@ class SampleData {
 };
 
 /// Reads and converts stream units. An object serves one thread at a time.
-class StreamAnalyzer {
+class [[gnu::visibility("default")]] StreamAnalyzer {
  public:
     StreamAnalyzer();
     virtual ~StreamAnalyzer();
@@ -51,12 +51,12 @@ class StreamAnalyzer {
     /// unit.
     bool IsAccessUnitStart(const std::shared_ptr<StreamData>& unit, NalUnit& sps, NalUnit& pps);
     /// Each appends one sample a unit, in order.
-    void ConvertVideo(std::vector<std::shared_ptr<StreamData>>& units,
-                      std::vector<std::shared_ptr<SampleData>>& samples);
-    void ConvertAudio(std::vector<std::shared_ptr<StreamData>>& units,
-                      std::vector<std::shared_ptr<SampleData>>& samples);
-    void ConvertMeta(std::vector<std::shared_ptr<StreamData>>& units,
-                     std::vector<std::shared_ptr<SampleData>>& samples, std::vector<unsigned char>& block);
+    void ConvertVideo(std::vector<std::shared_ptr<StreamData>> & units,
+                      std::vector<std::shared_ptr<SampleData>> & samples);
+    void ConvertAudio(std::vector<std::shared_ptr<StreamData>> & units,
+                      std::vector<std::shared_ptr<SampleData>> & samples);
+    void ConvertMeta(std::vector<std::shared_ptr<StreamData>> & units,
+                     std::vector<std::shared_ptr<SampleData>> & samples, std::vector<unsigned char> & block);
     /// Reads the timecode of a metadata unit; `sample` stays null when there is none.
     void ConvertTmcd(const std::shared_ptr<StreamData>& unit, std::shared_ptr<SampleData>& sample,
                      bool& dropFrame, unsigned int frames, int offset);
