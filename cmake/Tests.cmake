@@ -6,6 +6,9 @@ include(GoogleTest)
 if(CLIPFILE_TEST_PCH)
     add_library(clipfile_test_pch OBJECT "${CMAKE_CURRENT_LIST_DIR}/test_pch.cc")
     target_link_libraries(clipfile_test_pch PRIVATE clipfile_common GTest::gmock)
+    # As CMake compiles programs: headers precompiled for a library would be refused.
+    set_target_properties(clipfile_test_pch PROPERTIES POSITION_INDEPENDENT_CODE OFF)
+    target_compile_options(clipfile_test_pch PRIVATE -fPIE)
     target_precompile_headers(clipfile_test_pch PRIVATE
         <gmock/gmock.h> <gtest/gtest.h>
         <algorithm> <array> <atomic> <condition_variable> <cstdint> <cstdio> <cstring> <deque>
