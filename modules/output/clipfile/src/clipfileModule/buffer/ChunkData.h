@@ -1,0 +1,31 @@
+#pragma once
+
+#include <cstdint>
+#include <memory>
+#include <vector>
+
+#include "StreamAnalyzer.h"
+#include "StreamData.h"
+
+namespace clipfileModule {
+
+/// The unit of work between `StreamBuffer` and `FileOutput`: the samples of eight video units with just the
+/// audio and metadata that belong to them. Filled by one thread, and read-only once it was queued.
+struct ChunkData {
+    /// Bytes of all samples in the three lists together.
+    std::uint64_t size = 0;
+    /// Always zero.
+    std::uint64_t reserved0 = 0;
+    std::uint64_t reserved1 = 0;
+    std::uint64_t reserved2 = 0;
+    /// True when the audio and video cadences meet at the end of this chunk: a new file may begin behind it.
+    bool sync = false;
+    std::vector<std::shared_ptr<nal_access::SampleData>> video;
+    std::vector<std::shared_ptr<nal_access::SampleData>> audio;
+    std::vector<std::shared_ptr<nal_access::SampleData>> meta;
+    /// First units of the chunk, before conversion. The timecode of a file is read from `firstMeta`.
+    std::shared_ptr<StreamData> firstVideo;
+    std::shared_ptr<StreamData> firstMeta;
+};
+
+}  // namespace clipfileModule

@@ -1,0 +1,305 @@
+// The chunk thread of a recording: three independent streams become one aligned sequence.
+
+#include <algorithm>
+#include <iterator>
+#include <utility>
+
+#include "buffer/StreamBuffer.h"
+#include "buffer/state/EndSyncRecState.h"
+#include "common/Log.h"
+
+namespace clipfileModule {
+
+namespace {
+
+/// Video units that must be cached before a chunk is cut.
+constexpr std::size_t kMinimumVideoUnits = 16;
+/// Units in a cache, and chunks that wait for `FileOutput`; passing one of these ends the recording.
+constexpr std::size_t kVideoLimit = 600;
+constexpr std::size_t kAudioLimit = 900;
+constexpr std::size_t kMetaLimit = 600;
+constexpr std::size_t kFileQueueLimit = 48;
+
+/// Causes of status 6.
+constexpr int kNoError = 0;
+constexpr int kFileTooSlow = 22;
+constexpr int kVideoBufferFull = 23;
+constexpr int kAudioBufferFull = 24;
+constexpr int kMetaBufferFull = 25;
+
+using UnitList = std::vector<std::shared_ptr<StreamData>>;
+using SampleList = std::vector<std::shared_ptr<nal_access::SampleData>>;
+
+/// Index of the first cached unit that starts behind `end` on the time line of unit counts, where a unit
+/// takes `duration` ticks and `before` units came earlier; -1 when the cache does not reach that far.
+int countUntil(std::uint64_t end, std::uint64_t before, std::uint64_t duration, std::size_t cached) {
+    std::uint64_t t = before * duration;
+    for (std::size_t index = 0; index < cached; ++index, t += duration) {
+        if (end < t) {
+            return static_cast<int>(index);
+        }
+    }
+    return -1;
+}
+
+/// Moves the first `count` units of the cache to `units`, and gives the RTP timestamp of the unit that
+/// follows them in `next`, 0 when there is none. False, with nothing done, when the cache is empty or holds
+/// fewer units.
+bool takeUnits(UnitList& cache, std::size_t count, UnitList& units, std::uint64_t& next) {
+    if (cache.empty() || cache.size() < count) {
+        return false;
+    }
+    const auto end = cache.begin() + static_cast<std::ptrdiff_t>(count);
+    units.assign(std::make_move_iterator(cache.begin()), std::make_move_iterator(end));
+    cache.erase(cache.begin(), end);
+    next = cache.empty() ? 0 : cache.front()->rtp_timestamp;
+    return true;
+}
+
+std::uint64_t sumOfSizes(const SampleList& samples) {
+    std::uint64_t sum = 0;
+    for (const auto& sample : samples) {
+        sum += sample->GetDataSize();
+    }
+    return sum;
+}
+
+void dumpCache(const char* name, const UnitList& cache) {
+    const auto rtp = [](const std::shared_ptr<StreamData>& unit) {
+        return static_cast<unsigned long long>(unit->rtp_timestamp);
+    };
+    CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "---------- %s buffer : size = %d. front = %llu, back = %llu", name,
+                 static_cast<int>(cache.size()), cache.empty() ? 0 : rtp(cache.front()),
+                 cache.empty() ? 0 : rtp(cache.back()));
+    for (const auto& unit : cache) {
+        CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "rtp_timestamp = %llu, timestamp = %llu, size = %d.", rtp(unit),
+                     static_cast<unsigned long long>(unit->timestamp), static_cast<int>(unit->size));
+    }
+}
+
+}  // namespace
+
+void StreamBuffer::makeChunk() {
+    bool recordEnded = false;
+    int error = kNoError;
+    {
+        MutexLock lock(bufferMutex);
+        while (stateId != kStopState) {
+            // No predicate: each wake-up makes one pass, whatever woke it.
+            lock.Wait(bufferCondition);
+            if (stateId == kStopState) {
+                break;
+            }
+            error = findPassedLimit();
+            if (error != kNoError) {
+                break;
+            }
+            if (videoBuffer.empty()) {
+                continue;
+            }
+            // In ticks, and unsigned: an open stop of -1 lies above every timestamp.
+            if (static_cast<std::uint64_t>(stopTimestamp.load()) < videoBuffer.front()->rtp_timestamp) {
+                recordEnded = true;
+                break;
+            }
+            if (videoBuffer.size() < kMinimumVideoUnits) {
+                continue;
+            }
+            error = cutChunk();
+            if (error != kNoError) {
+                break;
+            }
+        }
+    }
+    // Both wait for the lock of the state, and whoever holds that one may wait for a worker that adds to a
+    // cache: the lock of the caches had to be given back first.
+    if (recordEnded) {
+        endSync();
+    } else if (error != kNoError) {
+        setError(error);
+    }
+}
+
+void StreamBuffer::endSync() {
+    CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: END SYNC REC. RTPTS = %lld.",
+                       static_cast<long long>(stopTimestamp));
+    CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "start.");
+    MutexLock lock(stateMutex);
+    // A stop that came first has ended the record already.
+    if (stateId == kStartState) {
+        changeState(std::make_shared<EndSyncRecState>(this));
+    }
+    CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "end.");
+}
+
+int StreamBuffer::findPassedLimit() {
+    if (videoBuffer.size() > kVideoLimit) {
+        CLIPFILE_LOG(LOG_PRIORITY_ERROR, "stream is stopped. video buffer is full.");
+        return kVideoBufferFull;
+    }
+    if (audioBuffer.size() > kAudioLimit) {
+        CLIPFILE_LOG(LOG_PRIORITY_ERROR, "stream is stopped. audio buffer is full.");
+        return kAudioBufferFull;
+    }
+    if (metaBuffer.size() > kMetaLimit) {
+        CLIPFILE_LOG(LOG_PRIORITY_ERROR, "stream is stopped. rtmeta buffer is full.");
+        return kMetaBufferFull;
+    }
+    return kNoError;
+}
+
+int StreamBuffer::cutChunk() {
+    // The time line is made of unit counts. An audio frame belongs to the chunk when it starts, by count, not
+    // after the chunk's end less half an audio frame.
+    const std::uint64_t audioFrame = rescale(
+        streamInfo.audio_sample_duration, streamInfo.audio_track_timescale, streamInfo.video_track_timescale);
+    const std::uint64_t videoEnd =
+        (chunkFrames + chunkedVideo) * streamInfo.video_sample_duration - (audioFrame >> 1);
+    const std::uint64_t audioEnd =
+        rescale(videoEnd, streamInfo.video_track_timescale, streamInfo.audio_track_timescale);
+    const int audioCount =
+        countUntil(audioEnd, chunkedAudio, streamInfo.audio_sample_duration, audioBuffer.size());
+    // One metadata unit a video frame.
+    const int metaCount =
+        countUntil(videoEnd, chunkedMeta, streamInfo.video_sample_duration, metaBuffer.size());
+
+    if (audioCount == -1) {
+        CLIPFILE_LOG_PLAIN(LOG_PRIORITY_TRACE, "ST: no audio buffer.");
+        dumpBuffer();
+        return kNoError;
+    }
+    if (static_cast<std::size_t>(audioCount) >= audioBuffer.size()) {
+        CLIPFILE_LOG_PLAIN(LOG_PRIORITY_TRACE, "ST: audio buffer is not complete.");
+        dumpBuffer();
+        return kNoError;
+    }
+    if (metaBuffer.empty()) {
+        CLIPFILE_LOG_PLAIN(LOG_PRIORITY_TRACE, "ST: rtmeta buffer is empty.");
+        return kNoError;
+    }
+    if (metaCount == -1) {
+        CLIPFILE_LOG_PLAIN(LOG_PRIORITY_TRACE, "ST: no rtmeta buffer.");
+        dumpBuffer();
+        return kNoError;
+    }
+    if (static_cast<std::size_t>(metaCount) >= metaBuffer.size()) {
+        CLIPFILE_LOG_PLAIN(LOG_PRIORITY_TRACE, "ST: rtmeta buffer is not complete.");
+        dumpBuffer();
+        return kNoError;
+    }
+
+    auto chunk = std::make_shared<ChunkData>();
+    chunk->firstVideo = videoBuffer.front();
+    chunk->firstMeta = metaBuffer.front();
+    splitVideo(*chunk, chunkFrames);
+    splitAudio(*chunk, static_cast<std::size_t>(audioCount));
+    splitMeta(*chunk, static_cast<std::size_t>(metaCount));
+    dumpChunk(*chunk);
+    chunkedVideo += chunkFrames;
+    chunkedAudio += static_cast<std::uint64_t>(audioCount);
+    chunkedMeta += static_cast<std::uint64_t>(metaCount);
+
+    // The cadence is never 0 here: without a frame rate the time line of the metadata stands still, and no
+    // chunk was complete.
+    if (chunkedVideo != 0 && chunkedAudio != 0 && chunkedVideo % streamInfo.cadence_video_frames == 0 &&
+        chunkedAudio % streamInfo.cadence_audio_frames == 0) {
+        CLIPFILE_LOG_PLAIN(LOG_PRIORITY_TRACE, "ST: a/v sync %llu\t%llu\t%llu",
+                           static_cast<unsigned long long>(chunkedVideo),
+                           static_cast<unsigned long long>(chunkedAudio),
+                           static_cast<unsigned long long>(chunkedMeta));
+        chunk->sync = true;
+    }
+    chunk->size = sumOfSizes(chunk->video) + sumOfSizes(chunk->audio) + sumOfSizes(chunk->meta);
+    if (chunk->video.empty() && chunk->audio.empty() && chunk->meta.empty()) {
+        return kNoError;
+    }
+
+    const std::size_t queued = fileOutput->PushChunk(chunk);
+    chunkProduced = true;
+    CLIPFILE_LOG_PLAIN(LOG_PRIORITY_TRACE, "ST: [C]\t%d\t%d\t%d\t%llu", static_cast<int>(chunkFrames),
+                       audioCount, metaCount, static_cast<unsigned long long>(queued));
+    if (queued > kFileQueueLimit) {
+        CLIPFILE_LOG(LOG_PRIORITY_ERROR, "file access is too slow. buffer is full.");
+        return kFileTooSlow;
+    }
+    dumpBuffer();
+    return kNoError;
+}
+
+std::uint64_t StreamBuffer::rescale(std::uint64_t value, std::uint32_t from, std::uint32_t to) {
+    MutexLock lock(analyzerMutex);
+    return analyzer.ConvertTimestamp(value, from, to);
+}
+
+void StreamBuffer::splitVideo(ChunkData& chunk, std::size_t count) {
+    UnitList units;
+    std::uint64_t next = 0;
+    if (!takeUnits(videoBuffer, count, units, next)) {
+        return;
+    }
+    MutexLock lock(analyzerMutex);
+    analyzer.ConvertVideo(units, chunk.video);
+    setDurations(chunk.video, next, videoRtpRate, streamInfo.video_track_timescale);
+}
+
+void StreamBuffer::splitAudio(ChunkData& chunk, std::size_t count) {
+    UnitList units;
+    std::uint64_t next = 0;
+    if (!takeUnits(audioBuffer, count, units, next)) {
+        return;
+    }
+    MutexLock lock(analyzerMutex);
+    analyzer.ConvertAudio(units, chunk.audio);
+    setDurations(chunk.audio, next, audioRtpRate, streamInfo.audio_track_timescale);
+}
+
+void StreamBuffer::splitMeta(ChunkData& chunk, std::size_t count) {
+    UnitList units;
+    std::uint64_t next = 0;
+    if (!takeUnits(metaBuffer, count, units, next)) {
+        return;
+    }
+    MutexLock lock(analyzerMutex);
+    analyzer.ConvertMeta(units, chunk.meta, metaBlock);
+    setDurations(chunk.meta, next, videoRtpRate, streamInfo.video_track_timescale);
+}
+
+void StreamBuffer::setDurations(SampleList& samples, std::uint64_t next, std::uint32_t clock,
+                                std::uint32_t timescale) {
+    for (std::size_t i = 0; i < samples.size(); ++i) {
+        const std::uint64_t following = i + 1 < samples.size() ? samples[i + 1]->GetRtpTimestamp() : next;
+        samples[i]->SetDuration(
+            analyzer.ConvertTimestamp(following - samples[i]->GetRtpTimestamp(), clock, timescale));
+    }
+}
+
+void StreamBuffer::dumpBuffer() {
+    CLIPFILE_LOG_PLAIN(LOG_PRIORITY_TRACE, "ST: [B]\t%d\t%d\t%d", static_cast<int>(videoBuffer.size()),
+                       static_cast<int>(audioBuffer.size()), static_cast<int>(metaBuffer.size()));
+    dumpCache(kMediaTypes[kVideo], videoBuffer);
+    dumpCache(kMediaTypes[kAudio], audioBuffer);
+    dumpCache(kMediaTypes[kMeta], metaBuffer);
+}
+
+void StreamBuffer::dumpChunk(const ChunkData& chunk) {
+    CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "---------- video. size = %d.", static_cast<int>(chunk.video.size()));
+    dump(chunk.video);
+    CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "---------- audio. size = %d.", static_cast<int>(chunk.audio.size()));
+    dump(chunk.audio);
+    CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "---------- meta.  size = %d.", static_cast<int>(chunk.meta.size()));
+    dump(chunk.meta);
+}
+
+void StreamBuffer::dump(const SampleList& samples) {
+    for (std::size_t index = 0; index < samples.size(); ++index) {
+        nal_access::SampleData& sample = *samples[index];
+        CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "%d\t%d\t%llu\t%llu\t%llu\t%d\t%llu.", static_cast<int>(index),
+                     sample.GetSync() ? 1 : 0, static_cast<unsigned long long>(index * sample.GetDuration()),
+                     static_cast<unsigned long long>(sample.GetRtpTimestamp()),
+                     static_cast<unsigned long long>(sample.GetTimestamp()),
+                     static_cast<int>(sample.GetDataSize()),
+                     static_cast<unsigned long long>(sample.GetDuration()));
+    }
+}
+
+}  // namespace clipfileModule
