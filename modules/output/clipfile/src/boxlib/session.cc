@@ -1,0 +1,35 @@
+#include "boxlib/session.h"
+
+MbxStatus MbxSessionCreate(MbxContext* context, const MbxSessionConfig* config, MbxSession** session) {
+    if (context == nullptr || config == nullptr || session == nullptr) return MBX_ERR_INVALID_ARG;
+    MBX_TRY(MbxSetQuota(context, 0, config->memory_quota, 0, sizeof(MbxSession)));
+    MbxSession* made = nullptr;
+    MBX_TRY(MbxNew(context, &made));
+    const MbxStatus status = MbxScratchInit(context, MBX_MEMORY_CLASS, MBX_SCRATCH_SIZE, &made->scratch);
+    if (status != MBX_OK) {
+        MbxFree(context, made);
+        return status;
+    }
+    made->context = context;
+    made->config = config->options;
+    *session = made;
+    return MBX_OK;
+}
+
+MbxStatus MbxSessionDestroy(MbxSession* session) {
+    if (session == nullptr) return MBX_OK;
+    MbxContext* context = session->context;
+    MbxScratchRelease(context, &session->scratch);
+    MbxFree(context, session);
+    return MBX_OK;
+}
+
+MbxStatus MbxRequireMovie(const MbxSession* session) {
+    if (session == nullptr) return MBX_ERR_INVALID_ARG;
+    return session->movie != nullptr ? MBX_OK : MBX_ERR_BAD_STATE;
+}
+
+MbxStatus MbxRequireTrack(const MbxSession* session, uint32_t index, MbxTrack** track) {
+    MBX_TRY(MbxRequireMovie(session));
+    return MbxListRequire(session->movie->tracks.first, index, track);
+}
