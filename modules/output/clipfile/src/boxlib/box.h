@@ -15,14 +15,14 @@
 //
 //   MbxStatus MbxBuildXxxx(MbxContext* context, const MbxOptions* options, const Params* params, MbxXxxxBox*
 //   box);
-//     MBX_ERR_INVALID_ARG for a null argument; copy the parameters; MbxMakeChild for each child;
+//     MBX_ERR_INVALID_ARG for a null argument (MbxAnyNull); copy the parameters; MbxMakeChild for each child;
 //     MbxMeasureBox last. `box` comes in zeroed. After a failure MbxFreeXxxx releases it with whatever was
 //     handed over by then.
 //   MbxStatus MbxWriteXxxxPayload(context, options, file, position, const MbxXxxxBox* box, written,
 //   accumulated);
 //     Everything behind the header. A leaf composes one buffer and ends with MbxWriteFixedPayload. A parent
-//     seeks, then calls each child by name, in the order of the file, at position + count with &count as
-//     `accumulated`, and ends with MbxReportBytes(count, written, accumulated).
+//     seeks, then calls each child by name (MbxWriteBoxes for a list), in the order of the file, at position
+//     + count with &count as `accumulated`, and ends with MbxReportBytes(count, written, accumulated).
 //   MbxStatus MbxWriteXxxxBox(context, options, file, position, const MbxXxxxBox* box, written, accumulated);
 //     One line: MbxWriteBox, or MbxWriteOptionalBox where a null record means that the box is absent.
 //   MbxStatus MbxFreeXxxx(MbxContext* context, MbxXxxxBox* box);
@@ -103,6 +103,18 @@ MbxStatus MbxWriteEach(const Record* first, uint64_t position, uint64_t* count, 
     return MBX_OK;
 }
 
+// Writes every box of a list with its own box writer, one behind the other.
+template <typename Box>
+MbxStatus MbxWriteBoxes(MbxContext* context, const MbxOptions* options, MbxFile* file, uint64_t position,
+                        const Box* first,
+                        MbxStatus (*writeBox)(MbxContext*, const MbxOptions*, MbxFile*, uint64_t,
+                                              std::type_identity_t<const Box>*, uint64_t*, uint64_t*),
+                        uint64_t* count) {
+    return MbxWriteEach(first, position, count, [&](const Box* box, uint64_t at, uint64_t* counter) {
+        return writeBox(context, options, file, at, box, nullptr, counter);
+    });
+}
+
 // Allocates a zeroed record, builds it with `build(record)` and hands it over to `*slot`. A record whose
 // build fails is released. MBX_ERR_INTERNAL when the slot holds one already.
 template <typename Record, typename Build, typename Free>
@@ -125,6 +137,30 @@ MbxStatus MbxMakeListItem(MbxContext* context, MbxList<Record>* list, Build&& bu
     Record* record = nullptr;
     MBX_TRY(MbxMakeChild(context, &record, build, release));
     MbxListAppend(list, record);
+    return MBX_OK;
+}
+
+// MbxMakeChild for a box that its own builder makes from a parameter record.
+template <typename Box, typename Params>
+MbxStatus MbxMakeBox(MbxContext* context, const MbxOptions* options, Box** slot, const Params* params,
+                     MbxStatus (*build)(MbxContext*, const MbxOptions*, std::type_identity_t<const Params>*,
+                                        std::type_identity_t<Box>*),
+                     MbxStatus (*release)(MbxContext*, std::type_identity_t<Box>*)) {
+    return MbxMakeChild(
+        context, slot, [&](Box* box) { return build(context, options, params, box); }, release);
+}
+
+// One box for each parameter record from `first` on, in the same order.
+template <typename Box, typename Params>
+MbxStatus MbxMakeBoxes(MbxContext* context, const MbxOptions* options, MbxList<Box>* boxes,
+                       const Params* first,
+                       MbxStatus (*build)(MbxContext*, const MbxOptions*, std::type_identity_t<const Params>*,
+                                          std::type_identity_t<Box>*),
+                       MbxStatus (*release)(MbxContext*, std::type_identity_t<Box>*)) {
+    for (const Params* params = first; params != nullptr; params = params->next) {
+        MBX_TRY(MbxMakeListItem(
+            context, boxes, [&](Box* box) { return build(context, options, params, box); }, release));
+    }
     return MBX_OK;
 }
 

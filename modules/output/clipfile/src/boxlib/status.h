@@ -9,3 +9,9 @@
         const MbxStatus mbx_try_status = (expression);       \
         if (mbx_try_status != MBX_OK) return mbx_try_status; \
     } while (false)
+
+// Whether any of the pointers is null: the check that opens most functions.
+template <typename... Pointers>
+constexpr bool MbxAnyNull(Pointers... pointers) {
+    return (... || (pointers == nullptr));
+}
