@@ -32,8 +32,8 @@ enum _LogPriority {
 ///
 /// Everything queued is written before the library is unloaded and before the process ends by `exit` or by
 /// returning from `main`. A line that comes later still, out of a destructor of another library, is written
-/// at once by its caller. A process that ends by a signal or `_exit` loses what is queued. A child of `fork`
-/// starts with an empty queue and opens the log anew.
+/// at once by its caller. A process that ends by a signal or `_exit` loses what is queued. `fork` waits until
+/// the queue is written; parent and child then both append to the log.
 class [[gnu::visibility("default")]] Logger {
  public:
     /// Writes one line, formatted as by printf, when `priority` is not above the threshold; otherwise the

@@ -29,6 +29,18 @@ spdlog::details::log_msg MakeMessage(std::string_view text) {
     return {spdlog::string_view_t(), spdlog::level::info, spdlog::string_view_t(text.data(), text.size())};
 }
 
+/// Keeps signals from the calling thread, and from threads that it starts, while it lives.
+class SignalBlock {
+ public:
+    explicit SignalBlock(const sigset_t& signals) { pthread_sigmask(SIG_BLOCK, &signals, &before_); }
+    SignalBlock(const SignalBlock&) = delete;
+    SignalBlock& operator=(const SignalBlock&) = delete;
+    ~SignalBlock() { pthread_sigmask(SIG_SETMASK, &before_, nullptr); }
+
+ private:
+    sigset_t before_;
+};
+
 std::string OpenErrorText(const std::string& path, int error) {
     return "5 The log \"" + path + "\" cannot be opened (" + std::strerror(error) +
            "), standard error takes its place.";
@@ -171,17 +183,11 @@ LogWriter::LogWriter(const std::string& path) : sink_(std::make_shared<Sink>(pat
     // The log's thread takes no signal: those of the process belong to the host's threads, and a pipe that
     // its reader left is an error of write and not the end of the process.
     sigset_t all;
-    sigset_t before;
     sigfillset(&all);
-    pthread_sigmask(SIG_SETMASK, &all, &before);
-    try {
-        pool_ = std::make_shared<spdlog::details::thread_pool>(
-            kQueueLines, 1, [] { pthread_setname_np(pthread_self(), "qx-log"); });
-    } catch (...) {
-        pthread_sigmask(SIG_SETMASK, &before, nullptr);
-        throw;
-    }
-    pthread_sigmask(SIG_SETMASK, &before, nullptr);
+    const SignalBlock block(all);
+    pool_ = std::make_shared<spdlog::details::thread_pool>(
+        kQueueLines, 1, [] { pthread_setname_np(pthread_self(), "qx-log"); },
+        [sink = sink_.get()] { sink->Finish(); });
     sink_->SetPool(pool_.get());
     logger_ = std::make_shared<spdlog::async_logger>("", sink_, pool_,
                                                      spdlog::async_overflow_policy::overrun_oldest);
@@ -190,7 +196,6 @@ LogWriter::LogWriter(const std::string& path) : sink_(std::make_shared<Sink>(pat
 LogWriter::~LogWriter() {
     // The pool's destructor queues its end behind all lines and joins the thread.
     pool_.reset();
-    sink_->Finish();
 }
 
 void LogWriter::Write(std::string_view line) {
@@ -205,5 +210,14 @@ void LogWriter::WriteDirectly(const std::string& path, std::string_view line) {
         formatter->format(MakeMessage(OpenErrorText(path, file.Error())), bytes);
     }
     formatter->format(MakeMessage(line), bytes);
-    file.Write({bytes.data(), bytes.size()});
+    sigset_t pipe;
+    sigemptyset(&pipe);
+    sigaddset(&pipe, SIGPIPE);
+    const SignalBlock block(pipe);
+    if (!file.Write({bytes.data(), bytes.size()}) && errno == EPIPE) {
+        // The pipe's reader has left: the signal that this raised is taken back, the caller is not to end by
+        // it.
+        const timespec now{};
+        sigtimedwait(&pipe, nullptr, &now);
+    }
 }

@@ -43,8 +43,6 @@ constinit bool closed = false;
 constinit int logPriority = kDefaultPriority;
 constinit LogWriter* writer = nullptr;
 constinit std::vector<RegisteredSink>* sinks = nullptr;
-/// The parent's writer in a child of fork: its thread does not exist here, so it can only be kept.
-constinit LogWriter* inherited = nullptr;
 constinit bool handlesFork = false;
 
 std::string LogPath() {
@@ -62,15 +60,18 @@ void UpdateThreshold() {
     threshold.store(highest, std::memory_order_relaxed);
 }
 
+/// Ends the log's thread around every fork, of which a child would inherit the locks but not the thread. Both
+/// sides start a new one with their next line.
 void HandleFork() {
     if (std::exchange(handlesFork, true)) {
         return;
     }
-    pthread_atfork([] { mutex.lock(); }, [] { mutex.unlock(); },
-                   [] {
-                       inherited = std::exchange(writer, nullptr);
-                       mutex.unlock();
-                   });
+    pthread_atfork(
+        [] {
+            mutex.lock();
+            delete std::exchange(writer, nullptr);
+        },
+        [] { mutex.unlock(); }, [] { mutex.unlock(); });
 }
 
 void WriteToLog(std::string_view line) {
@@ -205,7 +206,6 @@ void Logger::Put(_LogPriority priority, const char* file, const char* function, 
     if (IsWanted(priority)) {
         std::va_list arguments;
         va_start(arguments, format);
-        errno = savedErrno;  // for %m
         try {
             Deliver({priority, file, function, line, Format(format, arguments)});
         } catch (const std::bad_alloc&) {
