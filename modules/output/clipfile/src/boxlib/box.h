@@ -150,6 +150,17 @@ MbxStatus MbxMakeBox(MbxContext* context, const MbxOptions* options, Box** slot,
         context, slot, [&](Box* box) { return build(context, options, params, box); }, release);
 }
 
+// The same for a box that may be absent: null parameters make none.
+template <typename Box, typename Params>
+MbxStatus MbxMakeOptionalBox(MbxContext* context, const MbxOptions* options, Box** slot, const Params* params,
+                             MbxStatus (*build)(MbxContext*, const MbxOptions*,
+                                                std::type_identity_t<const Params>*,
+                                                std::type_identity_t<Box>*),
+                             MbxStatus (*release)(MbxContext*, std::type_identity_t<Box>*)) {
+    if (params == nullptr) return MBX_OK;
+    return MbxMakeBox(context, options, slot, params, build, release);
+}
+
 // One box for each parameter record from `first` on, in the same order.
 template <typename Box, typename Params>
 MbxStatus MbxMakeBoxes(MbxContext* context, const MbxOptions* options, MbxList<Box>* boxes,

@@ -18,6 +18,10 @@ MbxStatus MbxWriteBytes(MbxContext* context, MbxFile* file, const void* data, ui
     return MbxReportBytes(count, written, accumulated);
 }
 
+MbxStatus MbxWriteBuffer(MbxContext* context, MbxFile* file, const MbxBuffer* buffer, uint64_t* accumulated) {
+    return MbxWriteBytes(context, file, buffer->data, buffer->size, nullptr, accumulated);
+}
+
 MbxStatus MbxWriteComposed(MbxContext* context, MbxFile* file, const MbxBytes* bytes, uint64_t* accumulated) {
     if (bytes->overrun != 0) return MBX_ERR_INTERNAL;
     return MbxWriteBytes(context, file, bytes->data, bytes->length, nullptr, accumulated);

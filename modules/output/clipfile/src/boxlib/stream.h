@@ -5,6 +5,7 @@
 // left alone on failure.
 #pragma once
 
+#include "boxlib/buffer.h"
 #include "boxlib/bytes.h"
 
 // Bytes that MbxWriteZeros writes at once.
@@ -16,6 +17,9 @@ MbxStatus MbxSeek(MbxContext* context, MbxFile* file, uint64_t position);
 // Writes where the stream stands. MBX_ERR_IO when the callback fails or moves fewer bytes than asked.
 MbxStatus MbxWriteBytes(MbxContext* context, MbxFile* file, const void* data, uint64_t length,
                         uint64_t* written, uint64_t* accumulated);
+
+// Writes the bytes of a buffer where the stream stands.
+MbxStatus MbxWriteBuffer(MbxContext* context, MbxFile* file, const MbxBuffer* buffer, uint64_t* accumulated);
 
 // Writes a composed buffer where the stream stands. MBX_ERR_INTERNAL when something did not fit it.
 MbxStatus MbxWriteComposed(MbxContext* context, MbxFile* file, const MbxBytes* bytes, uint64_t* accumulated);
