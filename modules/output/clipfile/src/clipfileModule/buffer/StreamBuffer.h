@@ -70,6 +70,8 @@ class StreamBuffer final : public QxModuleStreamInterface,
     void NotifyEndSync() override;
 
  private:
+    friend class StreamBufferPeer;
+
     using UnitList = std::vector<std::shared_ptr<StreamData>>;
     using SampleList = std::vector<std::shared_ptr<nal_access::SampleData>>;
 
@@ -91,7 +93,7 @@ class StreamBuffer final : public QxModuleStreamInterface,
     // The chunk thread.
     void makeChunk() EXCLUDES(stateMutex, bufferMutex);
     void endSync() EXCLUDES(stateMutex, bufferMutex);
-    int findPassedLimit() REQUIRES(bufferMutex);
+    int findPassedLimit() const REQUIRES(bufferMutex);
     int cutChunk() REQUIRES(bufferMutex);
     std::uint64_t rescale(std::uint64_t value, std::uint32_t from, std::uint32_t to) EXCLUDES(analyzerMutex);
     void splitVideo(ChunkData& chunk, std::size_t count) REQUIRES(bufferMutex);
@@ -101,7 +103,7 @@ class StreamBuffer final : public QxModuleStreamInterface,
         REQUIRES(analyzerMutex);
 
     // Log helpers.
-    void dumpBuffer() REQUIRES(bufferMutex);
+    void dumpBuffer() const REQUIRES(bufferMutex);
     static void dumpChunk(const ChunkData& chunk);
     static void dump(const SampleList& samples);
 

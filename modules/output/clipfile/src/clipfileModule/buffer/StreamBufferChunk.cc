@@ -4,6 +4,7 @@
 #include <iterator>
 #include <utility>
 
+#include "buffer/ChunkTimeline.h"
 #include "buffer/StreamBuffer.h"
 #include "buffer/state/EndSyncRecState.h"
 #include "common/Log.h"
@@ -27,20 +28,21 @@ constexpr int kVideoBufferFull = 23;
 constexpr int kAudioBufferFull = 24;
 constexpr int kMetaBufferFull = 25;
 
+const char* messageOf(int error) {
+    switch (error) {
+        case kFileTooSlow:
+            return "file access is too slow. buffer is full.";
+        case kVideoBufferFull:
+            return "stream is stopped. video buffer is full.";
+        case kAudioBufferFull:
+            return "stream is stopped. audio buffer is full.";
+        default:
+            return "stream is stopped. rtmeta buffer is full.";
+    }
+}
+
 using UnitList = std::vector<std::shared_ptr<StreamData>>;
 using SampleList = std::vector<std::shared_ptr<nal_access::SampleData>>;
-
-/// Index of the first cached unit that starts behind `end` on the time line of unit counts, where a unit
-/// takes `duration` ticks and `before` units came earlier; -1 when the cache does not reach that far.
-int countUntil(std::uint64_t end, std::uint64_t before, std::uint64_t duration, std::size_t cached) {
-    std::uint64_t t = before * duration;
-    for (std::size_t index = 0; index < cached; ++index, t += duration) {
-        if (end < t) {
-            return static_cast<int>(index);
-        }
-    }
-    return -1;
-}
 
 /// Moves the first `count` units of the cache to `units`, and gives the RTP timestamp of the unit that
 /// follows them in `next`, 0 when there is none. False, with nothing done, when the cache is empty or holds
@@ -62,19 +64,6 @@ std::uint64_t sumOfSizes(const SampleList& samples) {
         sum += sample->GetDataSize();
     }
     return sum;
-}
-
-void dumpCache(const char* name, const UnitList& cache) {
-    const auto rtp = [](const std::shared_ptr<StreamData>& unit) {
-        return static_cast<unsigned long long>(unit->rtp_timestamp);
-    };
-    CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "---------- %s buffer : size = %d. front = %llu, back = %llu", name,
-                 static_cast<int>(cache.size()), cache.empty() ? 0 : rtp(cache.front()),
-                 cache.empty() ? 0 : rtp(cache.back()));
-    for (const auto& unit : cache) {
-        CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "rtp_timestamp = %llu, timestamp = %llu, size = %d.", rtp(unit),
-                     static_cast<unsigned long long>(unit->timestamp), static_cast<int>(unit->size));
-    }
 }
 
 }  // namespace
@@ -116,6 +105,7 @@ void StreamBuffer::makeChunk() {
     if (recordEnded) {
         endSync();
     } else if (error != kNoError) {
+        CLIPFILE_LOG(LOG_PRIORITY_ERROR, "%s", messageOf(error));
         setError(error);
     }
 }
@@ -132,20 +122,14 @@ void StreamBuffer::endSync() {
     CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "end.");
 }
 
-int StreamBuffer::findPassedLimit() {
+int StreamBuffer::findPassedLimit() const {
     if (videoBuffer.size() > kVideoLimit) {
-        CLIPFILE_LOG(LOG_PRIORITY_ERROR, "stream is stopped. video buffer is full.");
         return kVideoBufferFull;
     }
     if (audioBuffer.size() > kAudioLimit) {
-        CLIPFILE_LOG(LOG_PRIORITY_ERROR, "stream is stopped. audio buffer is full.");
         return kAudioBufferFull;
     }
-    if (metaBuffer.size() > kMetaLimit) {
-        CLIPFILE_LOG(LOG_PRIORITY_ERROR, "stream is stopped. rtmeta buffer is full.");
-        return kMetaBufferFull;
-    }
-    return kNoError;
+    return metaBuffer.size() > kMetaLimit ? kMetaBufferFull : kNoError;
 }
 
 int StreamBuffer::cutChunk() {
@@ -158,10 +142,10 @@ int StreamBuffer::cutChunk() {
     const std::uint64_t audioEnd =
         rescale(videoEnd, streamInfo.video_track_timescale, streamInfo.audio_track_timescale);
     const int audioCount =
-        countUntil(audioEnd, chunkedAudio, streamInfo.audio_sample_duration, audioBuffer.size());
+        CountUntil(audioEnd, chunkedAudio, streamInfo.audio_sample_duration, audioBuffer.size());
     // One metadata unit a video frame.
     const int metaCount =
-        countUntil(videoEnd, chunkedMeta, streamInfo.video_sample_duration, metaBuffer.size());
+        CountUntil(videoEnd, chunkedMeta, streamInfo.video_sample_duration, metaBuffer.size());
 
     if (audioCount == -1) {
         CLIPFILE_LOG_PLAIN(LOG_PRIORITY_TRACE, "ST: no audio buffer.");
@@ -219,7 +203,6 @@ int StreamBuffer::cutChunk() {
     CLIPFILE_LOG_PLAIN(LOG_PRIORITY_TRACE, "ST: [C]\t%d\t%d\t%d\t%llu", static_cast<int>(chunkFrames),
                        audioCount, metaCount, static_cast<unsigned long long>(queued));
     if (queued > kFileQueueLimit) {
-        CLIPFILE_LOG(LOG_PRIORITY_ERROR, "file access is too slow. buffer is full.");
         return kFileTooSlow;
     }
     dumpBuffer();
@@ -273,9 +256,22 @@ void StreamBuffer::setDurations(SampleList& samples, std::uint64_t next, std::ui
     }
 }
 
-void StreamBuffer::dumpBuffer() {
+void StreamBuffer::dumpBuffer() const {
     CLIPFILE_LOG_PLAIN(LOG_PRIORITY_TRACE, "ST: [B]\t%d\t%d\t%d", static_cast<int>(videoBuffer.size()),
                        static_cast<int>(audioBuffer.size()), static_cast<int>(metaBuffer.size()));
+    // No copies are needed: the lock keeps the caches as they are.
+    const auto rtp = [](const std::shared_ptr<StreamData>& unit) {
+        return static_cast<unsigned long long>(unit->rtp_timestamp);
+    };
+    const auto dumpCache = [&rtp](const char* mediaType, const UnitList& cache) {
+        CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "---------- %s buffer : size = %d. front = %llu, back = %llu",
+                     mediaType, static_cast<int>(cache.size()), cache.empty() ? 0 : rtp(cache.front()),
+                     cache.empty() ? 0 : rtp(cache.back()));
+        for (const auto& unit : cache) {
+            CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "rtp_timestamp = %llu, timestamp = %llu, size = %d.", rtp(unit),
+                         static_cast<unsigned long long>(unit->timestamp), static_cast<int>(unit->size));
+        }
+    };
     dumpCache(kMediaTypes[kVideo], videoBuffer);
     dumpCache(kMediaTypes[kAudio], audioBuffer);
     dumpCache(kMediaTypes[kMeta], metaBuffer);
