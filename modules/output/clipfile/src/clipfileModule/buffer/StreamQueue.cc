@@ -19,7 +19,9 @@ void StreamQueue::Stop() {
     // Closing takes the place of a stop unit: that one would have to wait for room in a full queue whose
     // worker may have gone.
     queue.Close();
-    thread->join();
+    if (thread != nullptr && thread->joinable()) {
+        thread->join();
+    }
 }
 
 void StreamQueue::run() {

@@ -1,0 +1,240 @@
+#include "controller/Controller.h"
+
+#include <algorithm>
+#include <utility>
+
+#include "QxRegistry.h"
+#include "buffer/StreamBuffer.h"
+#include "common/Log.h"
+#include "controller/Status.h"
+
+namespace clipfileModule {
+
+namespace {
+
+// Keys of the settings store.
+const std::string kSettingsSection = std::string("Qx") + "/" + "Other" + "/" + "MP4FileOut";
+const std::string kKeyOutputPath = "MP4OutputPath";
+const std::string kKeyMaxFileSize = "MP4MaxFileSize";
+const std::string kKeyUserName = "MP4AuthUserName";
+const std::string kKeyPassword = "MP4AuthPassword";
+
+// Names of the start parameters.
+const std::string kParameterFilePrefix = "-filePrefix";
+const std::string kParameterOutputPath = "-outputPath";
+const std::string kParameterUserName = "-userName";
+const std::string kParameterPassword = "-password";
+const std::string kParameterFileType = "-fileType";
+const std::string kParameterNaluType = "-naluType";
+const std::string kParameterOutputMode = "-outputMode";
+const std::string kParameterHeight = "-encodedHeight";
+const std::string kParameterWidth = "-encodedWidth";
+const std::string kParameterFramerate = "-encodedFPS";
+const std::string kParameterBitrate = "-encodedBPS";
+
+constexpr const char* kNoOutputPath = "none";
+
+std::string readText(QxModuleHostInterface& host, const std::string& key, const std::string& defaultValue) {
+    std::string value;
+    host.GetParameter(key, value, defaultValue);
+    return value;
+}
+
+std::uint32_t readNumber(QxModuleHostInterface& host, const std::string& key, std::uint32_t defaultValue) {
+    int value = 0;
+    host.GetParameter(key, value, static_cast<int>(defaultValue));
+    return static_cast<std::uint32_t>(value);
+}
+
+}  // namespace
+
+Controller::Controller() = default;
+
+Controller::~Controller() = default;
+
+bool Controller::Initialize(QxModuleHostInterface* moduleHost) {
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    recFlag = -1;
+    host = moduleHost;
+    eventPending = false;
+    terminated = false;
+    if (!getStaticConfig()) {
+        CLIPFILE_LOG(LOG_PRIORITY_ERROR, "end. static config error.");
+        SetStatus(kStatusFailed, kCauseInitialize);
+        return false;
+    }
+    {
+        MutexLock lock(analyzerMutex);
+        analyzer = std::make_shared<nal_access::StreamAnalyzer>();
+    }
+    if (!getStartParameters()) {
+        CLIPFILE_LOG(LOG_PRIORITY_ERROR, "end. file output path is none.");
+        SetStatus(kStatusFailed, kCauseInitialize);
+        return false;
+    }
+    const OutputSettings now = getSettings();
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "file output path = %s.", now.outputPath.c_str());
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "fileType   = %s.", now.fileType.c_str());
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "naluType   = %s.", now.naluType.c_str());
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "outputMode = %s.", now.outputMode.c_str());
+
+    eventHandlers = {
+        {kChangeInStreamInfo, [this](std::shared_ptr<Event> event) { OnChangeInStreamInfo(event); }},
+        {kStartStreaming, [this](std::shared_ptr<Event> event) { OnStartStream(event); }},
+        {kStopStreaming, [this](std::shared_ptr<Event> event) { OnStopStream(event); }},
+        {kRestartStreaming, [this](std::shared_ptr<Event> event) { OnRetartStream(event); }},
+        {kRemoveStreaming, [this](std::shared_ptr<Event> event) { OnRemoveStreaming(event); }},
+        {kTransferStatusNotify, [this](std::shared_ptr<Event> event) { OnTransferStatusNotify(event); }},
+        {kTerminate, [this](std::shared_ptr<Event> event) { OnTerminate(event); }},
+    };
+    eventThread = std::make_shared<std::thread>(&Controller::EventLoop, this);
+
+    queueThreads.resize(kQueueCount);
+    queues.resize(kQueueCount);
+    const UnitConsumer consumers[kQueueCount] = {
+        [this](const std::shared_ptr<StreamData>& unit) { pushToBuffers(&StreamBuffer::PushVideo, unit); },
+        [this](const std::shared_ptr<StreamData>& unit) { pushToBuffers(&StreamBuffer::PushAudio, unit); },
+        [this](const std::shared_ptr<StreamData>& unit) { processMeta(unit); },
+    };
+    for (std::size_t i = 0; i < kQueueCount; ++i) {
+        startQueueThread(i, consumers[i]);
+        CLIPFILE_LOG(LOG_PRIORITY_TRACE, "count = %d.", static_cast<int>(i));
+    }
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
+    return true;
+}
+
+bool Controller::getStaticConfig() {
+    QxRegistry* const registry = QxRegistry::GetInstance();
+    bool result = false;
+    {
+        MutexLock lock(settingsMutex);
+        const std::map<std::string, std::string*> fields = {
+            {kKeyOutputPath, &settings.outputPath},
+            {kKeyUserName, &settings.userName},
+            {kKeyPassword, &settings.password},
+        };
+        for (const auto& [key, field] : fields) {
+            std::string value;
+            if (!registry->getValue(kSettingsSection, key, value)) {
+                value.clear();
+            }
+            *field = value;
+        }
+        unsigned int maxFileSize = 0;
+        if (!registry->getValue(kSettingsSection, kKeyMaxFileSize, maxFileSize)) {
+            maxFileSize = defaultMaxFileSize;
+            CLIPFILE_LOG(LOG_PRIORITY_WARNING, "get max file size failed.");
+        }
+        settings.maxFileSize = maxFileSize;
+        CLIPFILE_LOG(LOG_PRIORITY_TRACE, "max filesize = %lld.",
+                     static_cast<long long>(settings.maxFileSize));
+        result = true;
+    }
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end. result = %d.", result);
+    return result;
+}
+
+bool Controller::getStartParameters() {
+    const OutputSettings stored = getSettings();
+    const std::string filePrefix = readText(*host, kParameterFilePrefix, "Unknown-Model");
+    std::string outputPath = readText(*host, kParameterOutputPath, kNoOutputPath);
+    const std::string userName = readText(*host, kParameterUserName, stored.userName);
+    const std::string password = readText(*host, kParameterPassword, stored.password);
+    const std::string fileType = readText(*host, kParameterFileType, "normal");
+    const std::string naluType = readText(*host, kParameterNaluType, "normal");
+    const std::string outputMode = readText(*host, kParameterOutputMode, "on");
+    const std::uint32_t height = readNumber(*host, kParameterHeight, defaultHeight);
+    const std::uint32_t width = readNumber(*host, kParameterWidth, defaultWidth);
+    const std::uint32_t framerate = readNumber(*host, kParameterFramerate, defaultFramerate);
+    const std::uint32_t bitrate = readNumber(*host, kParameterBitrate, defaultBitrate);
+
+    MutexLock lock(settingsMutex);
+    settings.filePrefix = filePrefix;
+    if (outputPath != kNoOutputPath) {
+        std::replace(outputPath.begin(), outputPath.end(), '/', '\\');
+        settings.outputPath = outputPath;
+    }
+    if (settings.outputPath.empty()) {
+        return false;
+    }
+    settings.userName = userName;
+    settings.password = password;
+    settings.fileType = fileType;
+    settings.naluType = naluType;
+    settings.outputMode = outputMode;
+    settings.streamStart = 0;
+    settings.bitrate = bitrate;
+    settings.framerate = framerate;
+    settings.width = width;
+    settings.height = height;
+    return true;
+}
+
+void Controller::startQueueThread(std::size_t index, const UnitConsumer& consumer) {
+    MutexLock lock(queueStartMutex);
+    queueThreadStarted = false;
+    queues[index] = std::make_shared<StreamDataQueue>(queueCapacity, dropWhenFull);
+    queueThreads[index] = std::make_shared<std::thread>(&Controller::queueing, this, queues[index], consumer);
+    while (!queueThreadStarted) {
+        lock.Wait(queueStartCondition);
+    }
+}
+
+OutputSettings Controller::getSettings() const {
+    MutexLock lock(settingsMutex);
+    return settings;
+}
+
+bool Controller::isOutputMode(const char* mode) const {
+    MutexLock lock(settingsMutex);
+    return settings.outputMode == mode;
+}
+
+void Controller::Uninitialize() {
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    terminated = true;
+    if (eventThread->joinable()) {
+        PostEvent(std::make_shared<TerminateEvent>());
+        CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start join...");
+        eventThread->join();
+        CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end join");
+    }
+    eventThread.reset();
+    stopAndRemoveBuffers();
+    for (std::size_t i = 0; i < queueThreads.size(); ++i) {
+        queues[i]->Clear();
+        // Closing wakes the thread, which then finds `terminated`.
+        queues[i]->Close();
+        if (queueThreads[i]->joinable()) {
+            queueThreads[i]->join();
+        }
+    }
+    // The metadata thread may have been on its way into StartStream with the record flag of its last unit.
+    stopAndRemoveBuffers();
+    queueThreads.clear();
+    queues.clear();
+    eventHandlers.clear();
+    {
+        // What stayed undelivered, the TerminateEvent above all, must not end a later run.
+        MutexLock lock(eventQueueMutex);
+        eventQueue.clear();
+    }
+    host = nullptr;
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
+}
+
+void Controller::Execute() {
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    PostEvent(std::make_shared<TransferStatusNotifyEvent>(
+        std::map<std::string, std::string>{{kFileOutputStatusKey, kFileOutputStatusStandby}}));
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
+}
+
+void Controller::SetStatus(int status, int cause) {
+    if (host->GetStatus() != kStatusFailed) {
+        host->SetStatus(status, cause);
+    }
+}
+
+}  // namespace clipfileModule

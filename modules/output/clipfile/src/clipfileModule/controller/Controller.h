@@ -1,0 +1,156 @@
+#pragma once
+
+#include <atomic>
+#include <condition_variable>
+#include <cstdint>
+#include <deque>
+#include <functional>
+#include <list>
+#include <map>
+#include <memory>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include "QxModuleHostInterface.h"
+#include "QxModuleStreamInterface.h"
+#include "StreamAnalyzer.h"
+#include "buffer/StreamQueue.h"
+#include "common/Mutex.h"
+#include "controller/ControllerInterface.h"
+#include "controller/OutputSettings.h"
+
+namespace clipfileModule {
+
+class StreamBuffer;
+
+/// The centre of the module: reads the configuration, owns the intake of the stream and its threads, turns
+/// record commands into recordings, and runs on a thread of its own, one event at a time, whatever must not
+/// run on a thread of the host or of a recording.
+///
+/// Life: construction starts nothing. `Initialize` starts the event thread and three queue threads; after it
+/// has returned true, `Uninitialize` must run before destruction, and `Initialize` may run again after that.
+class Controller : public ControllerInterface, public QxModuleStreamInterface {
+ public:
+    Controller();
+    ~Controller() override;
+
+    /// Reads the settings store and the start parameters of `moduleHost`, which must live until
+    /// `Uninitialize`, and starts the threads. False when no output path is known: the host then has status
+    /// 7, cause 2, and no thread runs. Throws `std::system_error` when a thread cannot be started.
+    bool Initialize(QxModuleHostInterface* moduleHost);
+    /// Ends the event thread, every recording and every queue thread, in this order. Only after a successful
+    /// `Initialize`, once the host has stopped pushing.
+    void Uninitialize();
+    /// Posts the first status map, "standby".
+    void Execute();
+
+    void PostEvent(std::shared_ptr<Event> event) override;
+    void SendEvent(std::shared_ptr<Event> event) override;
+    void BufferingStart() override;
+    void BufferingStop() override;
+    void SetStatus(int status, int cause) override;
+
+    /// The pushes cost one status query, one reference and one push under the queue's own lock. A unit that
+    /// finds its queue full is lost and logged; with status 7 all units are dropped in silence.
+    void PushReserved(const std::shared_ptr<StreamData>& unit) override;
+    void PushVideo(const std::shared_ptr<StreamData>& unit) override;
+    void PushAudio(const std::shared_ptr<StreamData>& unit) override;
+    void PushMeta(const std::shared_ptr<StreamData>& unit) override;
+
+ private:
+    friend class ControllerPeer;
+
+    using UnitConsumer = std::function<void(const std::shared_ptr<StreamData>&)>;
+    using EventHandler = std::function<void(std::shared_ptr<Event>)>;
+
+    /// Places of the three media in `queues` and `queueThreads`.
+    enum QueueIndex : std::size_t { kVideoQueue, kAudioQueue, kMetaQueue, kQueueCount };
+
+    // Configuration (Controller.cc).
+    bool getStaticConfig();
+    bool getStartParameters();
+    void startQueueThread(std::size_t index, const UnitConsumer& consumer);
+    OutputSettings getSettings() const EXCLUDES(settingsMutex);
+    bool isOutputMode(const char* mode) const EXCLUDES(settingsMutex);
+
+    // Event loop (ControllerEvents.cc).
+    void enqueueEvent(std::shared_ptr<Event> event, bool atHead) EXCLUDES(eventQueueMutex);
+    std::shared_ptr<Event> getEvent() EXCLUDES(eventQueueMutex);
+    void dispatchEvent(const std::shared_ptr<Event>& event);
+    void EventLoop();
+    void waitForEvent(bool firstWait) EXCLUDES(eventQueueMutex);
+    void OnTransferStatusNotify(const std::shared_ptr<Event>& event);
+    void OnTerminate(const std::shared_ptr<Event>& event);
+
+    // Intake and record commands (ControllerStream.cc).
+    bool pushUnit(std::size_t index, const std::shared_ptr<StreamData>& unit);
+    void queueing(const std::shared_ptr<StreamDataQueue>& queue, UnitConsumer consumer);
+    void processMeta(const std::shared_ptr<StreamData>& unit);
+    std::int32_t readRecFlag(const StreamData& unit) EXCLUDES(analyzerMutex);
+    std::shared_ptr<nal_access::SampleData> readTimecode(const std::shared_ptr<StreamData>& unit)
+        EXCLUDES(analyzerMutex);
+    void pushToBuffers(void (StreamBuffer::*push)(const std::shared_ptr<StreamData>&),
+                       const std::shared_ptr<StreamData>& unit) EXCLUDES(streamBuffersMutex);
+    void StartStream(const std::shared_ptr<StreamData>& unit) EXCLUDES(streamBuffersMutex);
+    void StopStream(const std::shared_ptr<StreamData>& unit) EXCLUDES(streamBuffersMutex);
+    void RemoveStream(const std::shared_ptr<StreamBuffer>& buffer) EXCLUDES(streamBuffersMutex);
+    void stopAndRemoveBuffers() EXCLUDES(streamBuffersMutex);
+    void flushQueues();
+    void OnChangeInStreamInfo(const std::shared_ptr<Event>& event);
+    void OnStartStream(const std::shared_ptr<Event>& event);
+    void OnStopStream(const std::shared_ptr<Event>& event);
+    void OnRetartStream(const std::shared_ptr<Event>& event);
+    void OnRemoveStreaming(const std::shared_ptr<Event>& event);
+
+    // Changed by Initialize and Uninitialize only, while none of the module's threads runs.
+    QxModuleHostInterface* host = nullptr;
+    std::vector<std::shared_ptr<std::thread>> queueThreads;
+    std::vector<std::shared_ptr<StreamDataQueue>> queues;
+    std::map<int, EventHandler> eventHandlers;
+    std::shared_ptr<std::thread> eventThread;
+
+    // Constant after construction.
+    const int queueCapacity = 50;
+    const bool dropWhenFull = true;
+    const std::uint32_t defaultMaxFileSize = 120;
+    const std::uint32_t defaultHeight = 720;
+    const std::uint32_t defaultWidth = 1280;
+    const std::uint32_t defaultFramerate = 29970;
+    const std::uint32_t defaultBitrate = 60000;
+
+    /// Held while a unit goes to the recordings and during every command, so that no unit falls into a
+    /// change.
+    Mutex streamBuffersMutex;
+    /// One entry a recording in progress or in completion, oldest first.
+    std::list<std::shared_ptr<StreamBuffer>> streamBuffers GUARDED_BY(streamBuffersMutex);
+
+    /// Innermost lock: a connected input changes the settings while a recording starts from them.
+    mutable Mutex settingsMutex;
+    OutputSettings settings GUARDED_BY(settingsMutex);
+
+    /// An analyser serves one thread at a time; both the metadata thread and the event thread read units with
+    /// it.
+    Mutex analyzerMutex;
+    std::shared_ptr<nal_access::StreamAnalyzer> analyzer GUARDED_BY(analyzerMutex);
+
+    /// Last record flag seen, -1 before the first. Used by the metadata queue thread alone once that runs.
+    std::int32_t recFlag = -1;
+
+    Mutex queueStartMutex;
+    std::condition_variable queueStartCondition;
+    bool queueThreadStarted GUARDED_BY(queueStartMutex) = false;
+
+    /// Once true, every thread of the Controller ends.
+    std::atomic<bool> terminated = false;
+
+    /// Guards the events, and is what the loop waits with: a post takes this lock alone, for the length of
+    /// the append, and its signal cannot fall between the loop's last test and its wait.
+    Mutex eventQueueMutex;
+    std::condition_variable eventCondition;
+    std::deque<std::shared_ptr<Event>> eventQueue GUARDED_BY(eventQueueMutex);
+    /// Set by each post, cleared by the loop before it drains the queue.
+    std::atomic<bool> eventPending = false;
+};
+
+}  // namespace clipfileModule

@@ -1,0 +1,117 @@
+// The event loop of `Controller`: whatever must not run on a thread of the host or of a recording runs here.
+
+#include <utility>
+
+#include "common/Log.h"
+#include "controller/Controller.h"
+#include "controller/Status.h"
+
+namespace clipfileModule {
+
+void Controller::PostEvent(std::shared_ptr<Event> event) {
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start. event_id = %d.", event->id);
+    enqueueEvent(std::move(event), false);
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
+}
+
+void Controller::SendEvent(std::shared_ptr<Event> event) {
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start. event_id = %d.", event->id);
+    enqueueEvent(std::move(event), true);
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
+}
+
+void Controller::enqueueEvent(std::shared_ptr<Event> event, bool atHead) {
+    {
+        MutexLock lock(eventQueueMutex);
+        if (atHead) {
+            eventQueue.push_front(std::move(event));
+        } else {
+            eventQueue.push_back(std::move(event));
+        }
+        eventPending = true;
+    }
+    eventCondition.notify_one();
+}
+
+std::shared_ptr<Event> Controller::getEvent() {
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    std::shared_ptr<Event> event;
+    {
+        MutexLock lock(eventQueueMutex);
+        if (!eventQueue.empty()) {
+            event = std::move(eventQueue.front());
+            eventQueue.pop_front();
+        }
+    }
+    if (event == nullptr) {
+        CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end. no event.");
+        return nullptr;
+    }
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "event id = %d.", event->id);
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
+    return event;
+}
+
+void Controller::dispatchEvent(const std::shared_ptr<Event>& event) {
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    const auto handler = eventHandlers.find(event->id);
+    if (handler != eventHandlers.end()) {
+        handler->second(event);
+    } else {
+        CLIPFILE_LOG(LOG_PRIORITY_WARNING, "invalid event.");
+    }
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
+}
+
+void Controller::EventLoop() {
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    bool firstWait = true;
+    do {
+        waitForEvent(firstWait);
+        firstWait = false;
+        if (terminated) {
+            CLIPFILE_LOG(LOG_PRIORITY_TRACE, "terminate.");
+            break;
+        }
+        if (!eventPending) {
+            CLIPFILE_LOG(LOG_PRIORITY_TRACE, "no event.");
+            continue;
+        }
+        eventPending = false;
+        while (const std::shared_ptr<Event> event = getEvent()) {
+            dispatchEvent(event);
+        }
+    } while (!terminated);
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
+}
+
+void Controller::waitForEvent(bool firstWait) {
+    MutexLock lock(eventQueueMutex);
+    // An event that was posted before the thread first came here waits for a later signal; that is how the
+    // loop has always started. From then on the wait is not entered while there is something to do.
+    if (terminated || (!firstWait && !eventQueue.empty())) {
+        return;
+    }
+    lock.Wait(eventCondition);
+}
+
+void Controller::OnTransferStatusNotify(const std::shared_ptr<Event>& event) {
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    const std::map<std::string, std::string> status =
+        std::static_pointer_cast<TransferStatusNotifyEvent>(event)->status;
+    const int result = host->SendTransmissionStatus(status);
+    if (result != 0) {
+        CLIPFILE_LOG(LOG_PRIORITY_ERROR, "SendTransmissionStatus() failed. result = %d.", result);
+    }
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
+}
+
+void Controller::OnTerminate(const std::shared_ptr<Event>&) {
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    terminated = true;
+    BufferingStop();
+    eventCondition.notify_one();
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
+}
+
+}  // namespace clipfileModule

@@ -1,0 +1,136 @@
+#include "message_handler/QxMessageHandler.h"
+
+#include <boost/thread/lock_types.hpp>
+#include <memory>
+
+#include "common/Log.h"
+#include "controller/Status.h"
+
+namespace clipfileModule {
+
+namespace {
+
+constexpr const char* kPropertyFilePrefix = "filePrefix";
+
+constexpr std::uint32_t kResultSuccess = 0;
+constexpr std::uint32_t kResultNotHandled = 3;
+
+/// The only kind of connection whose end stops file output.
+constexpr std::uint32_t kConnectionKindInput = 1;
+
+/// Frame rate of the file for the rate of an input: these three are halved, all others stay.
+std::uint32_t fileFramerate(std::uint32_t inputRate) {
+    switch (inputRate) {
+        case 50000:
+            return 25000;
+        case 59940:
+            return 29970;
+        case 60000:
+            return 30000;
+        default:
+            return inputRate;
+    }
+}
+
+}  // namespace
+
+QxMessageHandler::QxMessageHandler(ControllerInterface* owner) : controller(owner) {}
+
+QxMessageHandler::~QxMessageHandler() {
+    controller = nullptr;
+}
+
+std::uint32_t QxMessageHandler::NotifyInputOutputConnectRequest(const QxInputOutputConnectRequest* request) {
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "notify input output connect request received.");
+    settings.framerate = fileFramerate(request->framerate);
+    settings.bitrate = request->bitrate;
+    settings.height = request->height;
+    settings.width = request->width;
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "framerate : %d.", static_cast<int>(request->framerate));
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "bitrate   : %d.", static_cast<int>(settings.bitrate));
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "width     : %d.", static_cast<int>(settings.width));
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "height    : %d.", static_cast<int>(settings.height));
+    const auto prefix = request->properties.find(kPropertyFilePrefix);
+    if (prefix != request->properties.end()) {
+        settings.filePrefix = prefix->second;
+    }
+    controller->PostEvent(std::make_shared<ChangeInStreamInfoEvent>(settings));
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end. result = %d.", static_cast<int>(kResultSuccess));
+    return kResultSuccess;
+}
+
+std::uint32_t QxMessageHandler::NotifyModuleConnectionRequestReply(const void*) {
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "notify module connection request reply.");
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end. result = %d.", static_cast<int>(kResultSuccess));
+    return kResultSuccess;
+}
+
+std::uint32_t QxMessageHandler::NotifyInputOutputDisconnectionRequest(
+    const QxInputOutputDisconnectionRequest* request) {
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "notify disconnect received.");
+    std::uint32_t result = kResultNotHandled;
+    if (request->connectionKind == kConnectionKindInput) {
+        if (fileOutputStarted) {
+            stopFileOutput();
+        }
+        result = kResultSuccess;
+    }
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end. result = %d.", static_cast<int>(result));
+    return result;
+}
+
+std::uint32_t QxMessageHandler::NotifySetPropertiesRequest(const void*) {
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end. result = %d.", static_cast<int>(kResultSuccess));
+    return kResultSuccess;
+}
+
+void QxMessageHandler::NotifyOnlineStatus() {
+    bool changed = false;
+    {
+        boost::upgrade_lock<boost::shared_mutex> lock(onlineMutex);
+        if (!online) {
+            boost::upgrade_to_unique_lock<boost::shared_mutex> exclusive(lock);
+            CLIPFILE_LOG(LOG_PRIORITY_TRACE, "notify online.");
+            online = true;
+            changed = true;
+        }
+    }
+    if (changed && !fileOutputStarted) {
+        startFileOutput();
+    }
+}
+
+void QxMessageHandler::NotifyOfflineStatus() {
+    bool changed = false;
+    {
+        boost::upgrade_lock<boost::shared_mutex> lock(onlineMutex);
+        if (online) {
+            boost::upgrade_to_unique_lock<boost::shared_mutex> exclusive(lock);
+            CLIPFILE_LOG(LOG_PRIORITY_TRACE, "notify offline.");
+            online = false;
+            changed = true;
+        }
+    }
+    if (changed && fileOutputStarted) {
+        controller->SetStatus(kStatusStreamFault, kCauseOffline);
+        stopFileOutput();
+    }
+}
+
+void QxMessageHandler::startFileOutput() {
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start file output.");
+    controller->BufferingStart();
+    fileOutputStarted = true;
+}
+
+void QxMessageHandler::stopFileOutput() {
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "stop file output.");
+    controller->BufferingStop();
+    fileOutputStarted = false;
+}
+
+}  // namespace clipfileModule

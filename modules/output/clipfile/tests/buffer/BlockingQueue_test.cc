@@ -1,0 +1,145 @@
+#include "buffer/BlockingQueue.h"
+
+#include <gtest/gtest.h>
+
+#include <atomic>
+#include <deque>
+#include <functional>
+#include <queue>
+#include <thread>
+#include <vector>
+
+#include "support/WaitUntil.h"
+
+namespace clipfileModule {
+namespace {
+
+using IntQueue = BlockingQueue<int, std::queue<int, std::deque<int>>>;
+
+constexpr bool kDrop = true;
+constexpr bool kWait = false;
+
+TEST(BlockingQueue, GivesItemsInOrderOfArrival) {
+    IntQueue queue(3, kDrop);
+    EXPECT_TRUE(queue.Push(1));
+    EXPECT_TRUE(queue.Push(2));
+    EXPECT_TRUE(queue.Push(3));
+    EXPECT_EQ(queue.Pop(), 1);
+    EXPECT_EQ(queue.Pop(), 2);
+    EXPECT_EQ(queue.Pop(), 3);
+}
+
+TEST(BlockingQueue, AtCapacityWithDropWhenFullReturnsFalseAndKeepsItsContents) {
+    IntQueue queue(2, kDrop);
+    EXPECT_TRUE(queue.Push(1));
+    EXPECT_TRUE(queue.Push(2));
+    EXPECT_FALSE(queue.Push(3));
+    EXPECT_EQ(queue.Pop(), 1);
+    EXPECT_TRUE(queue.Push(4));
+    EXPECT_EQ(queue.Pop(), 2);
+    EXPECT_EQ(queue.Pop(), 4);
+    EXPECT_TRUE(queue.Empty());
+}
+
+TEST(BlockingQueue, PopWaitsForAnItem) {
+    IntQueue queue(1, kDrop);
+    int item = 0;
+    std::thread consumer([&] { item = queue.Pop(); });
+    EXPECT_TRUE(queue.Push(7));
+    consumer.join();
+    EXPECT_EQ(item, 7);
+}
+
+TEST(BlockingQueue, APopFreesExactlyOneWaitingPush) {
+    IntQueue queue(2, kWait);
+    ASSERT_TRUE(queue.Push(0));
+    ASSERT_TRUE(queue.Push(0));
+    std::atomic<int> done = 0;
+    std::vector<std::thread> producers;
+    for (int i = 0; i < 3; ++i) {
+        producers.emplace_back([&] {
+            EXPECT_TRUE(queue.Push(1));
+            ++done;
+        });
+    }
+    for (int freed = 1; freed <= 3; ++freed) {
+        queue.Pop();
+        EXPECT_TRUE(waitUntil([&] { return done == freed; }));
+        // The queue is full again, so no other producer can have come in.
+        EXPECT_EQ(done, freed);
+    }
+    for (std::thread& producer : producers) {
+        producer.join();
+    }
+    EXPECT_EQ(queue.Pop(), 1);
+    EXPECT_EQ(queue.Pop(), 1);
+    EXPECT_TRUE(queue.Empty());
+}
+
+TEST(BlockingQueue, ClearWithTheDefaultPredicateEmptiesTheQueueAndFreesEveryWaitingProducer) {
+    IntQueue queue(4, kWait);
+    for (int i = 0; i < 4; ++i) {
+        ASSERT_TRUE(queue.Push(i));
+    }
+    std::atomic<int> done = 0;
+    std::vector<std::thread> producers;
+    for (int i = 0; i < 3; ++i) {
+        producers.emplace_back([&] {
+            EXPECT_TRUE(queue.Push(9));
+            ++done;
+        });
+    }
+    queue.Clear();
+    EXPECT_TRUE(waitUntil([&] { return done == 3; }));
+    for (std::thread& producer : producers) {
+        producer.join();
+    }
+    queue.Clear();
+    EXPECT_TRUE(queue.Empty());
+}
+
+TEST(BlockingQueue, ClearKeepsTheItemsThatThePredicateSparesInTheirOrder) {
+    IntQueue queue(6, kDrop);
+    for (int i = 1; i <= 6; ++i) {
+        ASSERT_TRUE(queue.Push(i));
+    }
+    queue.SetFlushPredicate([](int item) { return item % 2 == 0; });
+    queue.Clear();
+    EXPECT_EQ(queue.Pop(), 1);
+    EXPECT_EQ(queue.Pop(), 3);
+    EXPECT_EQ(queue.Pop(), 5);
+    EXPECT_TRUE(queue.Empty());
+}
+
+TEST(BlockingQueue, ClearWithoutAPredicateThrowsAndLosesNothing) {
+    IntQueue queue(2, kDrop);
+    ASSERT_TRUE(queue.Push(1));
+    ASSERT_TRUE(queue.Push(2));
+    queue.SetFlushPredicate(nullptr);
+    EXPECT_THROW(queue.Clear(), std::bad_function_call);
+    EXPECT_EQ(queue.Pop(), 1);
+    EXPECT_EQ(queue.Pop(), 2);
+}
+
+TEST(BlockingQueue, CloseFreesWaitingProducersAndConsumers) {
+    IntQueue full(1, kWait);
+    ASSERT_TRUE(full.Push(1));
+    std::thread producer([&] { EXPECT_FALSE(full.Push(2)); });
+    IntQueue empty(1, kWait);
+    std::thread consumer([&] { EXPECT_EQ(empty.Pop(), 0); });
+    full.Close();
+    empty.Close();
+    producer.join();
+    consumer.join();
+}
+
+TEST(BlockingQueue, AClosedQueueTakesAndGivesNothing) {
+    IntQueue queue(2, kWait);
+    ASSERT_TRUE(queue.Push(1));
+    queue.Close();
+    EXPECT_FALSE(queue.Push(2));
+    EXPECT_EQ(queue.Pop(), 0);
+}
+
+}  // namespace
+}  // namespace clipfileModule
