@@ -175,6 +175,19 @@ MbxStatus MbxMakeBoxes(MbxContext* context, const MbxOptions* options, MbxList<B
     return MBX_OK;
 }
 
+// One temporary box for one write: builds it with `build(box)`, writes it with `writeBox(box)` when there is
+// a file, and releases it on every path. `size` receives the measured size.
+template <typename Box, typename Build, typename WriteRecord, typename Free>
+MbxStatus MbxWriteTemporary(MbxContext* context, const MbxFile* file, uint64_t* size, Build&& build,
+                            WriteRecord&& writeBox, Free&& release) {
+    Box* box = nullptr;
+    MbxStatus status = MbxMakeChild(context, &box, build, release);
+    if (status == MBX_OK && file != nullptr) status = writeBox(box);
+    if (status == MBX_OK) *size = box->size;
+    const MbxStatus released = release(context, box);
+    return status != MBX_OK ? status : released;
+}
+
 // Releases a record: first what it owns, by `members()`, then the record. MBX_ERR_INVALID_ARG for a null
 // context; a null record is MBX_OK.
 template <typename Record, typename Members>

@@ -1,5 +1,8 @@
 #include "boxlib/session.h"
 
+#include "boxlib/file.h"
+#include "boxlib/profile.h"
+
 MbxStatus MbxSessionCreate(MbxContext* context, const MbxSessionConfig* config, MbxSession** session) {
     if (context == nullptr || config == nullptr || session == nullptr) return MBX_ERR_INVALID_ARG;
     MBX_TRY(MbxSetQuota(context, 0, config->memory_quota, 0, sizeof(MbxSession)));
@@ -19,6 +22,8 @@ MbxStatus MbxSessionCreate(MbxContext* context, const MbxSessionConfig* config, 
 MbxStatus MbxSessionDestroy(MbxSession* session) {
     if (session == nullptr) return MBX_OK;
     MbxContext* context = session->context;
+    MBX_TRY(MbxFreeFileType(context, session->ftyp));
+    MBX_TRY(MbxFreeProfile(context, session->profile));
     MbxScratchRelease(context, &session->scratch);
     MbxFree(context, session);
     return MBX_OK;
