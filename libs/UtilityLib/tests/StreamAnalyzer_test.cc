@@ -403,6 +403,36 @@ TEST(GetRecFlg, ReadsNoFlagAsFalse) {
     EXPECT_FALSE(analyzer.GetRecFlg(nullptr, 100));
 }
 
+// The worked example of docs/metadata-format.md.
+const ByteVector kWorkedExample = {0x01,  // packet
+                                   0x06, 0x0E, 0x2B, 0x34, 0x02, 0x53, 0x01, 0x01, 0x0C,
+                                   0x02, 0x01, 0x01, 0x7F, 0x01, 0x00, 0x00,  // local set
+                                   0x22,                                      // length 34
+                                   0xE0, 0x00, 0x00, 0x10,                    // identifier
+                                   0x9B, 0x1F, 0x5C, 0x2E, 0x4D, 0x60, 0x4A, 0x17, 0xA6,
+                                   0x3B, 0x0E, 0x72, 0xD8, 0x41, 0xC5, 0x93,              //
+                                   0xE1, 0x01, 0x00, 0x01, 0x01,                          // flag: on
+                                   0xE1, 0x02, 0x00, 0x05, 0x0A, 0x14, 0x1E, 0x0C, 0x01,  // timecode
+                                   0x01,                                                  // packet
+                                   0x06, 0x0E, 0x2B, 0x34, 0x02, 0x0B, 0x01, 0x01, 0x0E,
+                                   0x01, 0x03, 0x01, 0x01, 0x00, 0x00, 0x00,  // foreign label
+                                   0x81, 0x05,                                // length 5
+                                   0x41, 0x01, 0x13, 0x00, 0x00};
+
+TEST(MetadataFormat, WorkedExampleReadsAsThePageSays) {
+    ASSERT_EQ(kWorkedExample.size(), 76U);
+    StreamAnalyzer analyzer;
+    EXPECT_TRUE(analyzer.GetRecFlg(kWorkedExample.data(), kWorkedExample.size()));
+    std::shared_ptr<SampleData> sample;
+    bool dropFrame = false;
+    analyzer.ConvertTmcd(MakeUnit(kWorkedExample), sample, dropFrame, 60, 0);
+    ASSERT_TRUE(sample);
+    EXPECT_EQ(BytesOf(*sample), (ByteVector{10, 20, 30, 12}));
+    EXPECT_TRUE(dropFrame);
+    EXPECT_EQ(ConvertOneMeta(kWorkedExample, kBlock), Join({kWorkedExample, kBlock}));
+    EXPECT_EQ(ConvertOneMeta(kWorkedExample, kBlock).size(), 140U);
+}
+
 // ConvertTimestamp
 
 TEST(ConvertTimestamp, RoundsToTheNearestAndHalvesUp) {
