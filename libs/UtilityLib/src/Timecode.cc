@@ -6,7 +6,7 @@ namespace nal_access {
 
 namespace {
 
-constexpr std::int64_t kMinutesOfDay = 24 * 60;
+constexpr std::int64_t kMinutesOfDay = std::int64_t{24} * 60;
 
 /// Frame numbers left out at the start of a minute that is no tenth.
 std::int64_t DroppedNumbers(const Timecode& timecode, unsigned int rate) {
@@ -31,7 +31,7 @@ Timecode AddFrames(const Timecode& timecode, unsigned int rate, std::int64_t off
     const std::int64_t perDay = kMinutesOfDay / 10 * perTenMinutes;
 
     // Address to count.
-    const std::int64_t minute = timecode.hours * 60 + timecode.minutes;
+    const std::int64_t minute = std::int64_t{timecode.hours} * 60 + timecode.minutes;
     std::int64_t number = timecode.seconds * perSecond + timecode.frames;
     if (minute % 10 != 0) {
         number = std::max(number, dropped) - dropped;

@@ -88,8 +88,8 @@ TEST(AddFrames, CountsEveryFrameOfADropFrameDayAt60) {
 }
 
 TEST(AddFrames, CountsEveryFrameOfADayAtTheOtherRates) {
-    EXPECT_EQ(WalkDay(24, false, 0), 24 * 86400);
-    EXPECT_EQ(WalkDay(25, false, 0), 25 * 86400);
+    EXPECT_EQ(WalkDay(24, false, 0), 2073600);
+    EXPECT_EQ(WalkDay(25, false, 0), 2160000);
 }
 
 TEST(AddFrames, LeavesNoNumberOutWithoutTheFlag) {
@@ -121,8 +121,9 @@ TEST(AddFrames, WrapsAt24HoursInBothDirections) {
     EXPECT_EQ(AddFrames({0, 0, 0, 0, false}, 25, -1), (Timecode{23, 59, 59, 24, false}));
     EXPECT_EQ(AddFrames({23, 59, 59, 29, true}, 30, 1), (Timecode{0, 0, 0, 0, true}));
     EXPECT_EQ(AddFrames({0, 0, 0, 0, true}, 60, -1), (Timecode{23, 59, 59, 59, true}));
-    EXPECT_EQ(AddFrames({1, 2, 3, 4, true}, 30, 3 * 2589408), (Timecode{1, 2, 3, 4, true}));
-    EXPECT_EQ(AddFrames({1, 2, 3, 4, true}, 30, -3 * 2589408), (Timecode{1, 2, 3, 4, true}));
+    // Three days.
+    EXPECT_EQ(AddFrames({1, 2, 3, 4, true}, 30, 7768224), (Timecode{1, 2, 3, 4, true}));
+    EXPECT_EQ(AddFrames({1, 2, 3, 4, true}, 30, -7768224), (Timecode{1, 2, 3, 4, true}));
 }
 
 TEST(AddFrames, TakesTheLargestOffsets) {

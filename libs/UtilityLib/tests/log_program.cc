@@ -10,6 +10,7 @@
 #include <csignal>
 #include <cstdio>
 #include <cstdlib>
+#include <filesystem>
 #include <fstream>
 #include <functional>
 #include <map>
@@ -149,22 +150,29 @@ int EnvironmentIsReadOnce() {
     return 0;
 }
 
+/// The signals that a thread of this process blocks, found by its name; waits until there is one.
+unsigned long long BlockedSignals(const std::string& name) {
+    for (;;) {
+        for (const auto& task : std::filesystem::directory_iterator("/proc/self/task")) {
+            std::string found;
+            std::ifstream(task.path() / "comm") >> found;
+            std::ifstream status(task.path() / "status");
+            for (std::string line; found == name && std::getline(status, line);) {
+                if (line.rfind("SigBlk:", 0) == 0) {
+                    return std::strtoull(line.c_str() + 7, nullptr, 16);
+                }
+            }
+        }
+        std::this_thread::yield();
+    }
+}
+
 /// The log's thread must not take signals away from the threads of the host.
 int BlocksSignals() {
     Log(LOG_PRIORITY_ERROR, "line");
-    for (int task = static_cast<int>(getpid()) + 1; task < static_cast<int>(getpid()) + 100; ++task) {
-        std::ifstream status("/proc/self/task/" + std::to_string(task) + "/status");
-        std::string line;
-        while (std::getline(status, line)) {
-            if (line.rfind("SigBlk:", 0) == 0) {
-                const auto blocked = std::strtoull(line.c_str() + 7, nullptr, 16);
-                const auto bit = [](int signal) { return 1ULL << (signal - 1); };
-                const auto wanted = bit(SIGINT) | bit(SIGTERM) | bit(SIGUSR1) | bit(SIGPIPE);
-                return (blocked & wanted) == wanted ? 0 : 1;
-            }
-        }
-    }
-    return 2;
+    const auto bit = [](int signal) { return 1ULL << (signal - 1); };
+    const auto wanted = bit(SIGINT) | bit(SIGTERM) | bit(SIGUSR1) | bit(SIGPIPE);
+    return (BlockedSignals("qx-log") & wanted) == wanted ? 0 : 1;
 }
 
 /// Waits for the reader of the pipe to go away, then logs.
