@@ -12,6 +12,7 @@
 struct MbxAinfParams;
 struct MbxIodsParams;
 struct MbxMetaParams;
+struct MbxLevel;
 struct MbxPsshParams;
 
 // ---- File type and profile
@@ -208,6 +209,8 @@ struct MbxTrack {
     MbxList<MbxDataEntry> dataEntries;
     MbxSampleEntryList sampleEntries;
     MbxList<MbxSampleSegment> segments;  // the first is what `moov` reports
+    MbxSampleSegment* sealedSegment;     // the one before the last; null with fewer than two
+    uint32_t segmentCount;               // records in `segments`
     uint64_t baseDecodeTime;             // decode time of the first segment
     uint32_t auxEnabled;
     uint32_t trickEnabled;
@@ -259,6 +262,7 @@ struct MbxMovie {
     MbxIodsParams* iods;
     MbxUserMetadata userMetadata;
     MbxList<MbxPsshParams> pssh;
-    uint32_t freeBytes;      // reserved behind everything else of `moov`
-    uint32_t fragmentCount;  // 0: not fragmented; otherwise the number of the open fragment
+    MbxList<MbxLevel> levels;  // `leva`; empty: none
+    uint32_t freeBytes;        // reserved behind everything else of `moov`
+    uint32_t fragmentCount;    // 0: not fragmented; otherwise the number of the open fragment
 };

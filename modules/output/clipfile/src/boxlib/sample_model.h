@@ -123,6 +123,7 @@ struct MbxSampleSegment {
     MbxList<MbxSampleGroupParams> sampleGroups;            // `sbgp`
     MbxAvcConfig* avcConfig;                               // `avcn`, owned
     MbxList<MbxGroupDescriptionParams> groupDescriptions;  // `sgpd`
+    uint32_t releasedSamples;                              // held by the tables when they were released
     MbxSampleSegment* next;
 };
 
