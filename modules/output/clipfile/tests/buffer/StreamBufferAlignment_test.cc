@@ -5,11 +5,10 @@
 #include <chrono>
 #include <cstdint>
 #include <cstdlib>
-#include <mutex>
 #include <string>
-#include <vector>
 
 #include "support/BufferHarness.h"
+#include "support/ChunkFollower.h"
 #include "support/StreamUnits.h"
 
 namespace clipfileModule {
@@ -23,53 +22,6 @@ constexpr std::uint64_t kSeconds = 300;
 #else
 constexpr std::uint64_t kSeconds = 3600;
 #endif
-
-/// What one chunk held.
-struct ChunkRecord {
-    std::size_t video = 0;
-    std::size_t audio = 0;
-    std::size_t meta = 0;
-    bool sync = false;
-    /// All numbers followed on those of the chunk before.
-    bool inOrder = false;
-};
-
-/// Follows the samples of a recording through its chunks.
-class ChunkFollower {
- public:
-    void Take(const ChunkData& chunk) {
-        ChunkRecord record;
-        record.video = chunk.video.size();
-        record.audio = chunk.audio.size();
-        record.meta = chunk.meta.size();
-        record.sync = chunk.sync;
-        record.inOrder = follow('V', chunk.video, video_) && follow('A', chunk.audio, audio_) &&
-                         follow('M', chunk.meta, meta_);
-        const std::lock_guard lock(mutex_);
-        records_.push_back(record);
-    }
-    std::vector<ChunkRecord> Records() const {
-        const std::lock_guard lock(mutex_);
-        return records_;
-    }
-
- private:
-    static bool follow(char medium, const std::vector<std::shared_ptr<nal_access::SampleData>>& samples,
-                       std::uint64_t& next) {
-        for (const auto& sample : samples) {
-            if (stream_units::NumberOf(medium, *sample) != next++) {
-                return false;
-            }
-        }
-        return true;
-    }
-
-    std::uint64_t video_ = 0;
-    std::uint64_t audio_ = 0;
-    std::uint64_t meta_ = 0;
-    mutable std::mutex mutex_;
-    std::vector<ChunkRecord> records_;
-};
 
 /// The period of the audio and video cadence, in frames of each.
 struct Cadence {
@@ -114,9 +66,9 @@ TEST_P(StreamBufferAlignment, HoldsOverTheStream) {
     clock.rate = rate;
     BufferHarness harness(clock);
     harness.gop = 1000000000;
-    ChunkFollower follower;
+    ChunkFollower follower(0);
     harness.recorder.SetChunkHook(
-        [&](StreamBufferInterface*, const std::shared_ptr<ChunkData>& chunk) { follower.Take(*chunk); });
+        [&](std::size_t, const std::shared_ptr<ChunkData>& chunk) { follower.Take(*chunk); });
     harness.Start();
     std::size_t seen = 0;
     while (harness.nextVideo < frames) {
@@ -133,13 +85,13 @@ TEST_P(StreamBufferAlignment, HoldsOverTheStream) {
     EXPECT_TRUE(harness.controller.Calls().empty());
 
     const Cadence cadence = cadenceOf(rate);
-    const std::vector<ChunkRecord> records = follower.Records();
+    const auto records = follower.Records();
     ASSERT_GE(records.size(), expectedChunks);
     std::uint64_t audio = 0;
     std::uint64_t lastSync = 0;
     std::uint64_t syncs = 0;
     for (std::uint64_t c = 1; c <= expectedChunks; ++c) {
-        const ChunkRecord& record = records[c - 1];
+        const ChunkFollower::Record& record = records[c - 1];
         const std::string where = "chunk " + std::to_string(c);
         ASSERT_TRUE(record.inOrder) << where;
         ASSERT_EQ(record.video, 8u) << where;

@@ -84,8 +84,7 @@ void FileOutputRecorder::SetQueueSize(std::size_t size) {
     queueSize_ = size;
 }
 
-void FileOutputRecorder::SetChunkHook(
-    std::function<void(StreamBufferInterface*, const std::shared_ptr<ChunkData>&)> hook) {
+void FileOutputRecorder::SetChunkHook(ChunkHook hook) {
     const std::lock_guard lock(mutex_);
     chunkHook_ = std::move(hook);
 }
@@ -189,13 +188,13 @@ void FileOutputRecorder::OnStop(const void* output) {
 }
 
 std::size_t FileOutputRecorder::OnChunk(const void* output, const std::shared_ptr<ChunkData>& chunk) {
-    std::function<void(StreamBufferInterface*, const std::shared_ptr<ChunkData>&)> hook;
-    StreamBufferInterface* buffer = nullptr;
+    ChunkHook hook;
+    std::size_t index = 0;
     {
         const std::lock_guard lock(mutex_);
         Entry& entry = find(output);
         hook = chunkHook_;
-        buffer = entry.record.buffer;
+        index = static_cast<std::size_t>(&entry - entries_.data());
         if (!hook) {
             entry.record.chunks.push_back(chunk);
         }
@@ -204,7 +203,7 @@ std::size_t FileOutputRecorder::OnChunk(const void* output, const std::shared_pt
         }
     }
     if (hook) {
-        hook(buffer, chunk);
+        hook(index, chunk);
     }
     const std::lock_guard lock(mutex_);
     ++find(output).record.chunkCount;

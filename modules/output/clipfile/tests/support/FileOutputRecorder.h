@@ -33,6 +33,9 @@ class FileOutputRecorder {
         std::size_t chunkCount = 0;
     };
 
+    using ChunkHook =
+        std::function<void(std::size_t output, const std::shared_ptr<clipfileModule::ChunkData>& chunk)>;
+
     FileOutputRecorder();
     ~FileOutputRecorder();
     FileOutputRecorder(const FileOutputRecorder&) = delete;
@@ -42,10 +45,9 @@ class FileOutputRecorder {
     void SetInitializeResult(bool result);
     /// What `PushChunk` returns, by default 0: a file output that is never behind.
     void SetQueueSize(std::size_t size);
-    /// Chunks go to `hook` and are not kept. It runs on the chunk thread, under the lock of its caches.
-    void SetChunkHook(std::function<void(clipfileModule::StreamBufferInterface*,
-                                         const std::shared_ptr<clipfileModule::ChunkData>&)>
-                          hook);
+    /// Chunks go to `hook`, with the number of their output, and are not kept. It runs on the chunk thread,
+    /// under the lock of its caches.
+    void SetChunkHook(ChunkHook hook);
     /// Runs inside each `Start`.
     void SetStartHook(std::function<void()> hook);
     /// Each output runs a thread from `Start` to `Stop` that asks its buffer for timecodes as a writer does.
@@ -85,8 +87,6 @@ class FileOutputRecorder {
     bool initializeResult_ = true;
     bool threaded_ = false;
     std::size_t queueSize_ = 0;
-    std::function<void(clipfileModule::StreamBufferInterface*,
-                       const std::shared_ptr<clipfileModule::ChunkData>&)>
-        chunkHook_;
+    ChunkHook chunkHook_;
     std::function<void()> startHook_;
 };

@@ -4,6 +4,8 @@
 #include <condition_variable>
 #include <mutex>
 
+#include "common/SchedulePoint.h"
+
 // Clang's thread safety analysis checks what these say (-Wthread-safety); other compilers read past them.
 #if defined(__clang__)
 #define CLIPFILE_THREAD_ATTRIBUTE(x) __attribute__((x))
@@ -25,7 +27,10 @@ namespace clipfileModule {
 /// A `std::mutex` that the analysis knows.
 class CLIPFILE_THREAD_ATTRIBUTE(capability("mutex")) Mutex {
  public:
-    void lock() ACQUIRE() { mutex_.lock(); }
+    void lock() ACQUIRE() {
+        SchedulePoint();
+        mutex_.lock();
+    }
     void unlock() RELEASE() { mutex_.unlock(); }
 
  private:
@@ -36,17 +41,26 @@ class CLIPFILE_THREAD_ATTRIBUTE(capability("mutex")) Mutex {
 /// Holds a `Mutex` for a scope, and waits on condition variables with it.
 class CLIPFILE_THREAD_ATTRIBUTE(scoped_lockable) MutexLock {
  public:
-    explicit MutexLock(Mutex& mutex) ACQUIRE(mutex) : lock_(mutex.mutex_) {}
+    explicit MutexLock(Mutex& mutex) ACQUIRE(mutex) : lock_(mutex.mutex_, std::defer_lock) {
+        SchedulePoint();
+        lock_.lock();
+    }
     ~MutexLock() RELEASE() {}
     MutexLock(const MutexLock&) = delete;
     MutexLock& operator=(const MutexLock&) = delete;
 
-    void Lock() ACQUIRE() { lock_.lock(); }
+    void Lock() ACQUIRE() {
+        SchedulePoint();
+        lock_.lock();
+    }
     void Unlock() RELEASE() { lock_.unlock(); }
 
     /// Gives the mutex back while waiting and holds it again on return. May return without a signal: callers
     /// test their condition in a loop, unless a spurious pass is harmless to them.
-    void Wait(std::condition_variable& condition) { condition.wait(lock_); }
+    void Wait(std::condition_variable& condition) {
+        SchedulePoint();
+        condition.wait(lock_);
+    }
 
  private:
     std::unique_lock<std::mutex> lock_;

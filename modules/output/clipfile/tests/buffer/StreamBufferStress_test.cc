@@ -1,0 +1,246 @@
+// A recording under a random schedule: three threads push, commands and faults arrive, events restart it.
+// CLIPFILE_STRESS_SEED repeats a schedule.
+
+#include <gtest/gtest.h>
+
+#include <atomic>
+#include <condition_variable>
+#include <cstdlib>
+#include <deque>
+#include <iostream>
+#include <map>
+#include <memory>
+#include <mutex>
+#include <optional>
+#include <random>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include "LogCapture.h"
+#include "support/BufferHarness.h"
+#include "support/ChunkFollower.h"
+#include "support/SeededDelays.h"
+#include "support/StreamUnits.h"
+
+namespace clipfileModule {
+namespace {
+
+using stream_units::StreamClock;
+
+constexpr std::chrono::seconds kDuration{4};
+
+/// Runs the events of recordings as the controller does: one at a time, on a thread of its own.
+class EventRunner {
+ public:
+    explicit EventRunner(const OutputSettings& settings) : settings_(settings), thread_([this] { run(); }) {}
+    ~EventRunner() {
+        {
+            const std::lock_guard lock(mutex_);
+            ended_ = true;
+            changed_.notify_one();
+        }
+        thread_.join();
+    }
+    void Post(std::shared_ptr<Event> event) {
+        const std::lock_guard lock(mutex_);
+        events_.push_back(std::move(event));
+        changed_.notify_one();
+    }
+
+ private:
+    void run() {
+        std::unique_lock lock(mutex_);
+        while (true) {
+            changed_.wait(lock, [this] { return ended_ || !events_.empty(); });
+            if (events_.empty()) {
+                return;
+            }
+            const std::shared_ptr<Event> event = std::move(events_.front());
+            events_.pop_front();
+            lock.unlock();
+            if (const auto restart = std::dynamic_pointer_cast<RestartStreamingEvent>(event)) {
+                restart->buffer->Stop();
+                restart->buffer->Start(settings_);
+            } else if (const auto removal = std::dynamic_pointer_cast<RemoveStreamingEvent>(event)) {
+                removal->buffer->Stop();
+            }
+            lock.lock();
+        }
+    }
+
+    const OutputSettings settings_;
+    std::mutex mutex_;
+    std::condition_variable changed_;
+    std::deque<std::shared_ptr<Event>> events_;
+    bool ended_ = false;
+    std::thread thread_;
+};
+
+/// Pushes the three media from a thread each, in step within a few frames.
+class Pushers {
+ public:
+    Pushers(StreamBuffer& buffer, const StreamClock& clock, std::uint64_t seed)
+        : buffer_(buffer), clock_(clock) {
+        threads_.emplace_back(
+            [this, seed] { run(seed + 1, video_, [this](std::uint64_t n) { pushVideo(n); }); });
+        threads_.emplace_back(
+            [this, seed] { run(seed + 2, audio_, [this](std::uint64_t n) { pushAudio(n); }); });
+        threads_.emplace_back(
+            [this, seed] { run(seed + 3, meta_, [this](std::uint64_t n) { pushMeta(n); }); });
+    }
+    ~Pushers() {
+        done_ = true;
+        for (std::thread& thread : threads_) {
+            thread.join();
+        }
+    }
+    std::uint64_t Frame() const { return video_; }
+
+ private:
+    template <typename Push>
+    void run(std::uint64_t seed, std::atomic<std::uint64_t>& frame, Push push) {
+        std::minstd_rand random(static_cast<std::uint32_t>(seed));
+        while (!done_) {
+            if (frame > std::min({video_.load(), audio_.load(), meta_.load()}) + 6) {
+                std::this_thread::yield();
+                continue;
+            }
+            push(frame);
+            ++frame;
+            if (random() % 16 == 0) {
+                std::this_thread::sleep_for(std::chrono::microseconds(random() % 200));
+            }
+        }
+    }
+    void pushVideo(std::uint64_t n) {
+        buffer_.PushVideo(clock_.Video(n, n % 10 == 0 ? stream_units::kIdr : stream_units::kPicture));
+    }
+    void pushAudio(std::uint64_t n) {
+        for (std::uint64_t k = clock_.AudioBefore(n); k < clock_.AudioBefore(n + 1); ++k) {
+            buffer_.PushAudio(clock_.Audio(k));
+        }
+    }
+    void pushMeta(std::uint64_t n) {
+        const stream_units::Timecode timecode{1, 2, 3, static_cast<unsigned char>(n % 25), false};
+        buffer_.PushMeta(clock_.Meta(n, {std::nullopt, timecode}));
+    }
+
+    StreamBuffer& buffer_;
+    const StreamClock clock_;
+    std::atomic<bool> done_ = false;
+    std::atomic<std::uint64_t> video_ = 0;
+    std::atomic<std::uint64_t> audio_ = 0;
+    std::atomic<std::uint64_t> meta_ = 0;
+    std::vector<std::thread> threads_;
+};
+
+class StreamBufferStress : public ::testing::TestWithParam<bool> {};
+
+TEST_P(StreamBufferStress, EndsWithEveryRecordingInOrderAndComplete) {
+    const char* given = std::getenv("CLIPFILE_STRESS_SEED");
+    const std::uint64_t seed = given != nullptr ? std::stoull(given) : std::random_device()();
+    // Printed at once, so that a run that does not end shows it too.
+    std::cout << "seed " << seed << std::endl;
+    std::mt19937_64 random(seed);
+    std::vector<std::string> schedule;
+    std::optional<SeededDelays> delays;
+    if (GetParam()) {
+        delays.emplace(seed);
+    }
+
+    BufferHarness harness;
+    harness.recorder.SetThreaded();
+    std::mutex mutex;
+    std::map<std::size_t, std::unique_ptr<ChunkFollower>> followers;
+    harness.recorder.SetChunkHook([&](std::size_t output, const std::shared_ptr<ChunkData>& chunk) {
+        ChunkFollower* follower = nullptr;
+        {
+            const std::lock_guard lock(mutex);
+            auto& entry = followers[output];
+            if (entry == nullptr) {
+                entry = std::make_unique<ChunkFollower>();
+            }
+            follower = entry.get();
+        }
+        follower->Take(*chunk);
+    });
+    {
+        EventRunner events(harness.settings);
+        harness.controller.SetEventHook([&](std::shared_ptr<Event> event) { events.Post(std::move(event)); });
+        Pushers pushers(*harness.buffer, harness.clock, seed);
+        const auto end = std::chrono::steady_clock::now() + kDuration;
+        while (std::chrono::steady_clock::now() < end) {
+            // Let the stream go on, now for nothing, now for some chunks.
+            const std::uint64_t until = pushers.Frame() + (random() % 3 == 0 ? 0 : random() % 60);
+            const auto patience = std::chrono::steady_clock::now() + std::chrono::milliseconds(200);
+            while (pushers.Frame() < until && std::chrono::steady_clock::now() < patience) {
+                std::this_thread::yield();
+            }
+            const std::string at = " at frame " + std::to_string(pushers.Frame());
+            switch (random() % 8) {
+                case 0:
+                case 1:
+                case 2:
+                    schedule.push_back("start" + at);
+                    harness.buffer->Start(harness.settings);
+                    break;
+                case 3:
+                    schedule.push_back("stop" + at);
+                    harness.buffer->Stop();
+                    break;
+                case 4: {
+                    schedule.push_back("two stops" + at);
+                    std::thread other([&] { harness.buffer->Stop(); });
+                    harness.buffer->Stop();
+                    other.join();
+                    break;
+                }
+                case 5:
+                    schedule.push_back("end of record" + at);
+                    harness.buffer->SetStopTimestamp(
+                        static_cast<std::int64_t>(harness.clock.VideoRtp(pushers.Frame())));
+                    break;
+                case 6:
+                    schedule.push_back("slow file output" + at);
+                    harness.recorder.SetQueueSize(49);
+                    break;
+                default:
+                    schedule.push_back("fast file output" + at);
+                    harness.recorder.SetQueueSize(0);
+                    break;
+            }
+        }
+        harness.buffer->Stop();
+    }
+    harness.controller.SetEventHook(nullptr);
+    harness.buffer->Stop();
+
+    std::string trace = "seed " + std::to_string(seed) + ":";
+    for (const std::string& step : schedule) {
+        trace += "\n  " + step;
+    }
+    SCOPED_TRACE(trace);
+    std::size_t chunks = 0;
+    for (const auto& [output, follower] : followers) {
+        for (const ChunkFollower::Record& record : follower->Records()) {
+            ++chunks;
+            ASSERT_TRUE(record.inOrder) << "output " << output;
+            ASSERT_EQ(record.video, 8u);
+            ASSERT_EQ(record.audio, 15u);
+            ASSERT_EQ(record.meta, 8u);
+        }
+    }
+    EXPECT_GT(chunks, 0u);
+    for (const auto& output : harness.recorder.Outputs()) {
+        ASSERT_EQ(output.calls.front(), "Initialize");
+        ASSERT_EQ(output.calls.back(), "Uninitialize");
+        ASSERT_EQ(output.calls.at(output.calls.size() - 2), "Stop");
+    }
+}
+
+INSTANTIATE_TEST_SUITE_P(Schedule, StreamBufferStress, ::testing::Values(false, true),
+                         [](const auto& param) { return param.param ? "WithDelays" : "Plain"; });
+
+}  // namespace
+}  // namespace clipfileModule
