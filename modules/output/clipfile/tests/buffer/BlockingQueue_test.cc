@@ -38,7 +38,7 @@ TEST(BlockingQueue, AtCapacityWithDropWhenFullReturnsFalseAndKeepsItsContents) {
     EXPECT_TRUE(queue.Push(4));
     EXPECT_EQ(queue.Pop(), 2);
     EXPECT_EQ(queue.Pop(), 4);
-    EXPECT_TRUE(queue.Empty());
+    EXPECT_EQ(queue.Size(), 0U);
 }
 
 TEST(BlockingQueue, PopWaitsForAnItem) {
@@ -73,7 +73,7 @@ TEST(BlockingQueue, APopFreesExactlyOneWaitingPush) {
     }
     EXPECT_EQ(queue.Pop(), 1);
     EXPECT_EQ(queue.Pop(), 1);
-    EXPECT_TRUE(queue.Empty());
+    EXPECT_EQ(queue.Size(), 0U);
 }
 
 TEST(BlockingQueue, ClearWithTheDefaultPredicateEmptiesTheQueueAndFreesEveryWaitingProducer) {
@@ -95,7 +95,7 @@ TEST(BlockingQueue, ClearWithTheDefaultPredicateEmptiesTheQueueAndFreesEveryWait
         producer.join();
     }
     queue.Clear();
-    EXPECT_TRUE(queue.Empty());
+    EXPECT_EQ(queue.Size(), 0U);
 }
 
 TEST(BlockingQueue, ClearKeepsTheItemsThatThePredicateSparesInTheirOrder) {
@@ -108,7 +108,7 @@ TEST(BlockingQueue, ClearKeepsTheItemsThatThePredicateSparesInTheirOrder) {
     EXPECT_EQ(queue.Pop(), 1);
     EXPECT_EQ(queue.Pop(), 3);
     EXPECT_EQ(queue.Pop(), 5);
-    EXPECT_TRUE(queue.Empty());
+    EXPECT_EQ(queue.Size(), 0U);
 }
 
 TEST(BlockingQueue, ClearWithoutAPredicateThrowsAndLosesNothing) {

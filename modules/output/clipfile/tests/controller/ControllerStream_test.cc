@@ -137,7 +137,7 @@ TEST_F(ControllerStreamTest, PushReservedHasNoEffectOnAnyQueue) {
     controller_.PushReserved(unit);
     EXPECT_EQ(unit.use_count(), 1);
     for (const std::size_t queue : {kVideo, kAudio, kMeta}) {
-        EXPECT_TRUE(peer_.Queue(queue).Empty());
+        EXPECT_EQ(peer_.Queue(queue).Size(), 0U);
     }
 }
 
@@ -164,7 +164,7 @@ TEST_F(ControllerStreamTest, The51stUnitOfAHeldUpQueueIsRefusedAndLoggedAndThe50
             // The queue thread takes the first unit and stands in front of the recordings with it.
             (controller_.*medium.push)(MetaUnit(0, 0, 0));
             expected.push_back(medium.statistics + "0");
-            ASSERT_TRUE(waitUntil([&] { return peer_.Queue(medium.queue).Empty(); }));
+            ASSERT_TRUE(waitUntil([&] { return peer_.Queue(medium.queue).Size() == 0; }));
             for (std::uint64_t i = 1; i <= 50; ++i) {
                 (controller_.*medium.push)(MetaUnit(i, i, 0));
                 expected.push_back(medium.statistics + std::to_string(i));
@@ -309,7 +309,7 @@ TEST_F(ControllerStreamTest, AnyOtherOutputModeRecordsNothingAndNeverReadsTheFla
     for (const char* mode : {"off", "", "ON", "Sync"}) {
         Run(mode);
         controller_.PushMeta(MetaUnit(1, 180000, 2000, recFlag(true)));
-        ASSERT_TRUE(waitUntil([&] { return peer_.Queue(kMeta).Empty(); }));
+        ASSERT_TRUE(waitUntil([&] { return peer_.Queue(kMeta).Size() == 0; }));
         controller_.BufferingStart();
         EXPECT_TRUE(Recordings().empty()) << mode;
         EXPECT_TRUE(RecordLines().empty()) << mode;
@@ -321,7 +321,7 @@ TEST_F(ControllerStreamTest, AnyOtherOutputModeRecordsNothingAndNeverReadsTheFla
 TEST_F(ControllerStreamTest, InOnModeTheFlagIsNotRead) {
     Run("on");
     controller_.PushMeta(MetaUnit(1, 180000, 2000, recFlag(true)));
-    ASSERT_TRUE(waitUntil([&] { return peer_.Queue(kMeta).Empty(); }));
+    ASSERT_TRUE(waitUntil([&] { return peer_.Queue(kMeta).Size() == 0; }));
     EXPECT_TRUE(RecordLines().empty());
 }
 
@@ -404,7 +404,7 @@ TEST_F(ControllerStreamTest, BufferingStopStopsEveryRecordingKeepsTheListAndFlus
         MutexLock held(peer_.StreamBuffersMutex());
         for (const std::size_t queue : {kVideo, kAudio, kMeta}) {
             ASSERT_TRUE(peer_.Queue(queue).Push(MetaUnit(2, 180, 2, recFlag(true))));
-            ASSERT_TRUE(waitUntil([&] { return peer_.Queue(queue).Empty(); }));
+            ASSERT_TRUE(waitUntil([&] { return peer_.Queue(queue).Size() == 0; }));
             ASSERT_TRUE(peer_.Queue(queue).Push(MetaUnit(3, 270, 3, recFlag(true))));
         }
         // The flush happens outside the lock, so this test lets the stop come first: the log line tells.
@@ -418,7 +418,7 @@ TEST_F(ControllerStreamTest, BufferingStopStopsEveryRecordingKeepsTheListAndFlus
     EXPECT_EQ(peer_.StreamBuffers().size(), 1U);
     EXPECT_EQ(log_.Count("OP: CHANGE STATE wait_state -> stop."), 1U);
     for (const std::size_t queue : {kVideo, kAudio, kMeta}) {
-        EXPECT_TRUE(peer_.Queue(queue).Empty());
+        EXPECT_EQ(peer_.Queue(queue).Size(), 0U);
     }
 }
 
@@ -449,7 +449,7 @@ TEST_F(ControllerStreamTest, ARestartFlushesTheQueuesAlsoWhenTheRecordingHasLeft
         MutexLock held(peer_.StreamBuffersMutex());
         for (const std::size_t queue : {kVideo, kAudio}) {
             ASSERT_TRUE(peer_.Queue(queue).Push(MetaUnit(2, 180, 2)));
-            ASSERT_TRUE(waitUntil([&] { return peer_.Queue(queue).Empty(); }));
+            ASSERT_TRUE(waitUntil([&] { return peer_.Queue(queue).Size() == 0; }));
             ASSERT_TRUE(peer_.Queue(queue).Push(MetaUnit(3, 270, 3)));
         }
         gate.Release();
@@ -457,7 +457,7 @@ TEST_F(ControllerStreamTest, ARestartFlushesTheQueuesAlsoWhenTheRecordingHasLeft
     ASSERT_TRUE(waitUntil([&] { return CountLines("OnRetartStream", "end.") == 1; }));
     EXPECT_TRUE(log_.Contains("OP: REC RESTART. RTPTS = 5 -> 6."));
     for (const std::size_t queue : {kVideo, kAudio, kMeta}) {
-        EXPECT_TRUE(peer_.Queue(queue).Empty());
+        EXPECT_EQ(peer_.Queue(queue).Size(), 0U);
     }
     EXPECT_EQ(log_.CountIf([](const CapturedLine& line) { return line.text.rfind("OP: CHANGE", 0) == 0; }),
               0U);

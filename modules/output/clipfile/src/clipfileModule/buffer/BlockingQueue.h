@@ -1,6 +1,7 @@
 #pragma once
 
 #include <condition_variable>
+#include <cstddef>
 #include <cstdint>
 #include <functional>
 #include <utility>
@@ -85,10 +86,10 @@ class BlockingQueue {
         notEmpty.notify_all();
     }
 
-    /// True when nothing waits in the queue.
-    bool Empty() const {
+    /// Number of items that wait.
+    std::size_t Size() const {
         MutexLock lock(mutex);
-        return queue.empty();
+        return queue.size();
     }
 
  private:

@@ -96,7 +96,7 @@ void expectDropsEverything(const char* name, CacheStateId id) {
         EXPECT_EQ(state.Execute(stream_units::VideoUnit(0, 0, 0, stream_units::kIdr), queue, mediaType),
                   nullptr);
     }
-    EXPECT_TRUE(queue->queue.Empty());
+    EXPECT_TRUE(queue->queue.Size() == 0);
     EXPECT_TRUE(state.CanFinish(queue->queue));
     state.OnEnter();
     state.OnExit();

@@ -36,7 +36,7 @@ TEST(EndSyncRecState, DropsEveryUnitSilently) {
         EXPECT_EQ(state.Execute(stream_units::VideoUnit(0, 0, 0, stream_units::kIdr), queue, mediaType),
                   nullptr);
     }
-    EXPECT_TRUE(queue->queue.Empty());
+    EXPECT_TRUE(queue->queue.Size() == 0);
     EXPECT_THAT(log.Lines(), IsEmpty());
 }
 

@@ -58,7 +58,7 @@ TEST_F(StartCacheStateTest, QueuesUnitsOfEveryMediumInOrder) {
     for (const auto& unit : units) {
         EXPECT_EQ(queue->queue.Pop(), unit);
     }
-    EXPECT_TRUE(queue->queue.Empty());
+    EXPECT_TRUE(queue->queue.Size() == 0);
     EXPECT_THAT(log.Lines(), IsEmpty());
 }
 

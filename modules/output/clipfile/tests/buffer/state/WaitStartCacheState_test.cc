@@ -56,7 +56,7 @@ TEST_F(WaitStartCacheStateTest, DropsUnitsOfEveryMediumBeforeTheStart) {
     EXPECT_EQ(execute(video(999), "video"), nullptr);
     EXPECT_EQ(execute(audio(999), "audio"), nullptr);
     EXPECT_EQ(execute(meta(999), "meta"), nullptr);
-    EXPECT_TRUE(queue->queue.Empty());
+    EXPECT_TRUE(queue->queue.Size() == 0);
     EXPECT_THAT(log.Lines(), IsEmpty());
 }
 
@@ -91,14 +91,14 @@ TEST_F(WaitStartCacheStateTest, AUnitOfAnyMediumPastTheStopCancelsTheRecord) {
         EXPECT_EQ(log.Lines()[0].line, 0);
         EXPECT_FALSE(log.Lines()[0].file.has_value());
     }
-    EXPECT_TRUE(queue->queue.Empty());
+    EXPECT_TRUE(queue->queue.Size() == 0);
     EXPECT_THAT(buffer.calls, IsEmpty()) << "the removal is asked for on entry of the next state";
 }
 
 TEST_F(WaitStartCacheStateTest, AUnitAtTheStopIsStillTaken) {
     buffer.stop = 90000;
     EXPECT_EQ(execute(audio(1000), "audio"), nullptr);
-    EXPECT_FALSE(queue->queue.Empty());
+    EXPECT_FALSE(queue->queue.Size() == 0);
     EXPECT_EQ(execute(video(1000), "video")->GetId(), kStartState);
 }
 
@@ -123,7 +123,7 @@ TEST_F(WaitStartCacheStateTest, TimestampsAboveAllThatTicksCanHoldEndEvenAnOpenR
 TEST_F(WaitStartCacheStateTest, ANegativeStartLiesAboveEveryTimestamp) {
     buffer.start = -90;
     EXPECT_EQ(execute(audio(1ULL << 40), "audio"), nullptr);
-    EXPECT_TRUE(queue->queue.Empty());
+    EXPECT_TRUE(queue->queue.Size() == 0);
 }
 
 TEST_F(WaitStartCacheStateTest, AudioAndMetadataAreQueuedWhileVideoWaits) {
@@ -138,18 +138,18 @@ TEST_F(WaitStartCacheStateTest, AudioAndMetadataAreQueuedWhileVideoWaits) {
 
 TEST_F(WaitStartCacheStateTest, VideoThatIsNoIdrFrameIsDropped) {
     EXPECT_EQ(execute(video(1000, stream_units::kPicture), "video"), nullptr);
-    EXPECT_TRUE(queue->queue.Empty());
+    EXPECT_TRUE(queue->queue.Size() == 0);
     EXPECT_THAT(log.Texts(LOG_PRIORITY_TRACE), IsEmpty());
 }
 
 TEST_F(WaitStartCacheStateTest, ParameterSetsWithoutAnIdrSliceStartNothing) {
     EXPECT_EQ(execute(video(1000, {false, true, true}), "video"), nullptr);
-    EXPECT_TRUE(queue->queue.Empty());
+    EXPECT_TRUE(queue->queue.Size() == 0);
 }
 
 TEST_F(WaitStartCacheStateTest, AnIdrFrameWithoutSpsIsLoggedAndDropped) {
     EXPECT_EQ(execute(video(1000, {true, false, true}), "video"), nullptr);
-    EXPECT_TRUE(queue->queue.Empty());
+    EXPECT_TRUE(queue->queue.Size() == 0);
     EXPECT_EQ(log.Count(LOG_PRIORITY_NOTICE, kExecute, "sps nal unit size is 0."), 1u);
     EXPECT_FALSE(log.Contains("pps nal unit size is 0."));
     EXPECT_EQ(log.Find("sps nal unit size is 0.")->file,
@@ -158,7 +158,7 @@ TEST_F(WaitStartCacheStateTest, AnIdrFrameWithoutSpsIsLoggedAndDropped) {
 
 TEST_F(WaitStartCacheStateTest, AnIdrFrameWithoutPpsIsLoggedAndDropped) {
     EXPECT_EQ(execute(video(1000, {true, true, false}), "video"), nullptr);
-    EXPECT_TRUE(queue->queue.Empty());
+    EXPECT_TRUE(queue->queue.Size() == 0);
     EXPECT_EQ(log.Count(LOG_PRIORITY_NOTICE, kExecute, "pps nal unit size is 0."), 1u);
     EXPECT_FALSE(log.Contains("sps nal unit size is 0."));
 }
@@ -180,7 +180,7 @@ TEST_F(WaitStartCacheStateTest, AnIdrFrameWithBothSetsLeadsToTheStartState) {
     const std::shared_ptr<CacheState> next = execute(idr, "video");
     ASSERT_NE(next, nullptr);
     EXPECT_EQ(next->GetId(), kStartState);
-    EXPECT_TRUE(queue->queue.Empty()) << "the frame reaches the cache on entry of the state";
+    EXPECT_TRUE(queue->queue.Size() == 0) << "the frame reaches the cache on entry of the state";
     // The sets as they were sent: Baseline profile, level 3.0, 64 x 48 pixels; picture set 0 of sequence 0.
     EXPECT_THAT(log.Texts(), ElementsAre("IDR received. sps dump., size = 7.", "67 42 c0 1e da 11 e4 ",
                                          "IDR received. pps dump., size = 4.", "68 ce 38 80 ",

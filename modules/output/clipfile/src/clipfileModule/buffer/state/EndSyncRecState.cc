@@ -16,7 +16,7 @@ std::shared_ptr<CacheState> EndSyncRecState::Execute(const std::shared_ptr<Strea
 }
 
 bool EndSyncRecState::CanFinish(const StreamDataQueue& queue) {
-    return queue.Empty();
+    return queue.Size() == 0;
 }
 
 }  // namespace clipfileModule
