@@ -40,7 +40,7 @@ class LoadedModule {
 };
 
 /// The host's side of the contract. Records what the module asks and says.
-class RecordingHost : public QxModuleHostInterface {
+class RecordingHost final : public QxModuleHostInterface {
  public:
     using StatusMap = std::map<std::string, std::string>;
 
