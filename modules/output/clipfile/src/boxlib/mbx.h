@@ -120,9 +120,8 @@ MbxStatus MbxAddDataReference(MbxSession* session, uint32_t track, const char* l
                               uint32_t* index);
 
 // Append a sample entry; `index` receives its 1-based place. MBX_ERR_INVALID_ARG for a kind of video entry
-// other than 1, 2 and 11, or a data reference index outside 1 to 65535; MBX_ERR_NOT_FOUND for one that the
-// track does not have; MBX_ERR_BAD_STATE when the track's handler is not `vide`, `soun`, `tmcd` or `meta`
-// respectively.
+// other than 1, 2 and 11, or a data reference index outside 1 to 65535 or that the track does not have;
+// MBX_ERR_BAD_STATE when the track's handler is not `vide`, `soun`, `tmcd` or `meta` respectively.
 MbxStatus MbxAddVideoEntry(MbxSession* session, uint32_t track, const MbxVisualEntryParams* params,
                            uint32_t* index);
 MbxStatus MbxAddSoundEntry(MbxSession* session, uint32_t track, const MbxAudioEntryParams* params,

@@ -1,6 +1,7 @@
 #include "boxlib/session.h"
 
 #include "boxlib/file.h"
+#include "boxlib/movie.h"
 #include "boxlib/profile.h"
 
 MbxStatus MbxSessionCreate(MbxContext* context, const MbxSessionConfig* config, MbxSession** session) {
@@ -24,6 +25,7 @@ MbxStatus MbxSessionDestroy(MbxSession* session) {
     MbxContext* context = session->context;
     MBX_TRY(MbxFreeFileType(context, session->ftyp));
     MBX_TRY(MbxFreeProfile(context, session->profile));
+    MBX_TRY(MbxFreeMovie(context, session->movie));
     MbxScratchRelease(context, &session->scratch);
     MbxFree(context, session);
     return MBX_OK;

@@ -1,5 +1,6 @@
 #include "fixture.h"
 
+#include <algorithm>
 #include <cctype>
 #include <stdexcept>
 
@@ -57,4 +58,22 @@ std::string Dump(const Bytes& bytes) {
         text += cell;
     }
     return text;
+}
+
+testing::AssertionResult SameBytes(const char* actualText, const char* expectedText, const Bytes& actual,
+                                   const Bytes& expected) {
+    if (actual == expected) return testing::AssertionSuccess();
+    const auto line = [](const Bytes& bytes, size_t begin) {
+        const size_t end = std::min(bytes.size(), begin + 32);
+        if (begin >= end) return std::string(" nothing");
+        return Dump(Bytes(bytes.begin() + static_cast<std::ptrdiff_t>(begin),
+                          bytes.begin() + static_cast<std::ptrdiff_t>(end)));
+    };
+    const auto differing = std::mismatch(actual.begin(), actual.end(), expected.begin(), expected.end());
+    const auto offset = static_cast<size_t>(differing.first - actual.begin());
+    const size_t begin = offset / 16 * 16;
+    return testing::AssertionFailure()
+           << actualText << " has " << actual.size() << " bytes, " << expectedText << " has "
+           << expected.size() << "; they differ at byte " << offset << ".\nFrom byte " << begin
+           << " on, actual:" << line(actual, begin) << "\nexpected:" << line(expected, begin);
 }

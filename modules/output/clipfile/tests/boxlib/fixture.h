@@ -23,11 +23,13 @@ Bytes Words(std::initializer_list<uint32_t> words);
 // One after the other.
 Bytes operator+(Bytes a, const Bytes& b);
 
-// A hexadecimal dump of 16 bytes a line with offsets: a difference reads well in a failure message.
+// A hexadecimal dump of 16 bytes a line with offsets.
 std::string Dump(const Bytes& bytes);
 
-// Compares bytes by their dumps.
-#define EXPECT_BYTES(actual, expected) EXPECT_EQ(Dump(actual), Dump(expected))
+// Compares bytes; a failure shows the first lines of the two dumps that differ.
+testing::AssertionResult SameBytes(const char* actualText, const char* expectedText, const Bytes& actual,
+                                   const Bytes& expected);
+#define EXPECT_BYTES(actual, expected) EXPECT_PRED_FORMAT2(SameBytes, actual, expected)
 
 // A host and a context. What a test leaves allocated fails it.
 class BoxTest : public testing::Test {

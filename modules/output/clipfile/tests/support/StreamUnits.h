@@ -176,7 +176,7 @@ struct MetaFields {
 /// One packet: a byte 01, a universal label, BER length, value (SMPTE ST 336).
 inline Bytes Packet(const std::array<unsigned char, 16>& label, const Bytes& value) {
     Bytes packet = {0x01};
-    Append(packet, Bytes(label.begin(), label.end()));
+    packet.insert(packet.end(), label.begin(), label.end());
     if (value.size() < 0x80) {
         packet.push_back(static_cast<unsigned char>(value.size()));
     } else {
