@@ -15,6 +15,9 @@ MbxStatus MbxBuildMoov(MbxContext* context, const MbxOptions* options, const Mbx
             [&](MbxTrakBox* trak) { return MbxBuildTrak(context, options, &inMovie, trak); }, MbxFreeTrak));
     }
     MBX_TRY(MbxMakeBox(context, options, &box->mvhd, movie, MbxBuildMvhd, MbxFreeMvhd));
+    if (movie->fragmentCount != 0) {
+        MBX_TRY(MbxMakeBox(context, options, &box->mvex, movie, MbxBuildMvex, MbxFreeMvex));
+    }
     if (MbxHasUserMetadata(&movie->userMetadata)) {
         MBX_TRY(MbxMakeBox(context, options, &box->userMetadata, &movie->userMetadata, MbxBuildUserMetadata,
                            MbxFreeUserMetadata));
@@ -30,6 +33,7 @@ MbxStatus MbxWriteMoovPayload(MbxContext* context, const MbxOptions* options, Mb
     MBX_TRY(MbxSeek(context, file, position));
     MBX_TRY(MbxWriteMvhdBox(context, options, file, position + count, box->mvhd, nullptr, &count));
     MBX_TRY(MbxWriteBoxes(context, options, file, position, box->tracks.first, MbxWriteTrakBox, &count));
+    MBX_TRY(MbxWriteMvexBox(context, options, file, position + count, box->mvex, nullptr, &count));
     MBX_TRY(MbxWriteUserMetadataBox(context, options, file, position + count, box->userMetadata, nullptr,
                                     &count));
     return MbxReportBytes(count, written, accumulated);
@@ -45,6 +49,7 @@ MbxStatus MbxFreeMoov(MbxContext* context, MbxMoovBox* box) {
     return MbxFreeBox(context, box, [&] {
         MBX_TRY(MbxFreeMvhd(context, box->mvhd));
         MBX_TRY(MbxFreeList(context, &box->tracks, MbxFreeTrak));
+        MBX_TRY(MbxFreeMvex(context, box->mvex));
         return MbxFreeUserMetadata(context, box->userMetadata);
     });
 }

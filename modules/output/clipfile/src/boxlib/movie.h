@@ -1,6 +1,7 @@
 // `moov` and `mvhd`, and the record of a movie.
 #pragma once
 
+#include "boxlib/movie_extends.h"
 #include "boxlib/track.h"
 
 struct MbxMvhdBox {
@@ -13,7 +14,8 @@ struct MbxMoovBox {
     uint64_t size;
     MbxMvhdBox* mvhd;
     MbxList<MbxTrakBox> tracks;
-    MbxUserMetadataBox* userMetadata;  // null for none
+    MbxMvexBox* mvex;  // null for none, as are the following
+    MbxUserMetadataBox* userMetadata;
 };
 
 MbxStatus MbxBuildMoov(MbxContext* context, const MbxOptions* options, const MbxMovie* movie,

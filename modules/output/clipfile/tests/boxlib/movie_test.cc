@@ -216,6 +216,18 @@ TEST_F(MovieHeaderTest, MovieWithEmptyUserMetadataHasNoUuidBox) {
     EXPECT_EQ(std::search(moov.begin(), moov.end(), code.begin(), code.end()), moov.end());
 }
 
+TEST_F(MovieHeaderTest, FragmentedMovieHasMvexBehindItsTracks) {
+    options.mehd_mode = 0;
+    addTrack(1, 100);
+    last()->defaults = {1, 1000, 0, 0x00010000};
+    const size_t unfragmented = writeMoov().size();
+    movie->fragmentCount = 1;
+    const Bytes moov = writeMoov();
+    ASSERT_EQ(moov.size(), unfragmented + 40);
+    EXPECT_BYTES(Bytes(moov.end() - 40, moov.end()), Hex("00000028 'mvex' 00000020 'trex' 00000000 00000001"
+                                                         "00000001 000003E8 00000000 00010000"));
+}
+
 TEST_F(MovieHeaderTest, TrackDurationOverflowEndsTheBuild) {
     addTrack(1, UINT64_MAX);
     movie->header.timescale = 1001;
