@@ -71,6 +71,6 @@ MbxStatus MbxToMp4Time(MbxContext* context, const MbxDate* date, uint64_t* secon
     uint64_t days = daysBeforeYear(date->year) - daysBeforeYear(1904);
     days += kDaysBeforeMonth[date->month - 1] + (date->month > 2 ? leapDay : 0);
     days += date->day - 1U;
-    *seconds = days * 86400 + date->hour * 3600U + date->minute * 60U + date->second;
+    *seconds = days * 86400 + uint64_t{date->hour} * 3600 + uint64_t{date->minute} * 60 + date->second;
     return MBX_OK;
 }

@@ -10,6 +10,7 @@
 #include <filesystem>
 #include <fstream>
 #include <future>
+#include <memory>
 #include <limits>
 #include <string>
 #include <thread>
@@ -155,16 +156,21 @@ TEST(PosixPlatform, HasNoLogonYet) {
 
 TEST(PosixPlatform, GivesUpAThreadWithoutWaitingForIt) {
     const PosixPlatform platform;
-    std::promise<void> release;
-    std::promise<void> ended;
-    std::thread thread([&] {
-        release.get_future().wait();
-        ended.set_value_at_thread_exit();
+    struct Signals {
+        std::promise<void> release;
+        std::promise<void> ended;
+    };
+    // The thread outlives its owner, and so does what it uses.
+    const auto signals = std::make_shared<Signals>();
+    std::future<void> ended = signals->ended.get_future();
+    std::thread thread([signals] {
+        signals->release.get_future().wait();
+        signals->ended.set_value();
     });
     platform.GiveUp(thread);
     EXPECT_FALSE(thread.joinable());
-    release.set_value();
-    ended.get_future().wait();
+    signals->release.set_value();
+    ended.wait();
 }
 
 TEST(PosixPlatform, IsTheSystemThatTheModuleRunsOn) {
