@@ -10,8 +10,8 @@
 #include <filesystem>
 #include <fstream>
 #include <future>
-#include <memory>
 #include <limits>
+#include <memory>
 #include <string>
 #include <thread>
 
