@@ -3,6 +3,7 @@
 // Units of a live stream as a host pushes them, made by hand: H.264 access units, AAC frames and metadata
 // packets. Each carries a number in its payload ("#V0000000042"), so that a loss can be told.
 
+#include <algorithm>
 #include <array>
 #include <cstddef>
 #include <cstdint>
@@ -175,8 +176,8 @@ struct MetaFields {
 
 /// One packet: a byte 01, a universal label, BER length, value (SMPTE ST 336).
 inline Bytes Packet(const std::array<unsigned char, 16>& label, const Bytes& value) {
-    Bytes packet = {0x01};
-    packet.insert(packet.end(), label.begin(), label.end());
+    Bytes packet(1 + label.size(), 0x01);
+    std::copy(label.begin(), label.end(), packet.begin() + 1);
     if (value.size() < 0x80) {
         packet.push_back(static_cast<unsigned char>(value.size()));
     } else {

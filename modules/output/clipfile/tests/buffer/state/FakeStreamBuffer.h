@@ -12,26 +12,26 @@ class FakeStreamBuffer : public clipfileModule::StreamBufferInterface {
  public:
     void SetVideoSequenceHeader(const nal_access::NalUnit& sps, const nal_access::NalUnit& pps,
                                 const std::shared_ptr<StreamData>& unit) override {
-        calls.push_back("SetVideoSequenceHeader");
+        calls.emplace_back("SetVideoSequenceHeader");
         lastSps = sps;
         lastPps = pps;
         lastUnit = unit;
     }
     bool MakeFileTimecode(const std::shared_ptr<clipfileModule::ChunkData>& /*chunk*/) override {
-        calls.push_back("MakeFileTimecode");
+        calls.emplace_back("MakeFileTimecode");
         return false;
     }
     bool GetFileTimecode(unsigned char* /*timecode*/, bool* /*dropFrame*/) override {
-        calls.push_back("GetFileTimecode");
+        calls.emplace_back("GetFileTimecode");
         return false;
     }
     bool GetFileTimecode(unsigned char* /*timecode*/) override {
-        calls.push_back("GetFileTimecode");
+        calls.emplace_back("GetFileTimecode");
         return false;
     }
     std::int64_t GetStartTimestamp() const override { return start; }
     std::int64_t GetStopTimestamp() const override { return stop; }
-    void NotifyEndSync() override { calls.push_back("NotifyEndSync"); }
+    void NotifyEndSync() override { calls.emplace_back("NotifyEndSync"); }
 
     std::int64_t start = 0;
     std::int64_t stop = -1;
