@@ -16,7 +16,6 @@ namespace {
 using stream_units::kIdr;
 using stream_units::kPicture;
 using stream_units::StreamClock;
-using ::testing::Contains;
 using ::testing::Each;
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;

@@ -16,11 +16,9 @@ namespace clipfileModule {
 namespace {
 
 using stream_units::kIdr;
-using stream_units::StreamClock;
 using ::testing::Contains;
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
-using ::testing::Not;
 
 constexpr char kStart[] = "clipfileModule::StreamBuffer::Start";
 constexpr char kStop[] = "clipfileModule::StreamBuffer::Stop";
