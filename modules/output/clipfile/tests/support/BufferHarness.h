@@ -96,6 +96,16 @@ class BufferHarness {
     [[nodiscard]] bool RunUntilText(const LogCapture& log, const std::string& text) {
         return RunUntil([&](std::chrono::milliseconds wait) { return log.WaitForText(text, 1, wait); });
     }
+    /// Pushes metadata units until the line was logged: each makes a pass.
+    [[nodiscard]] bool NudgeUntilText(const LogCapture& log, const std::string& text) {
+        for (int i = 0; i < 200; ++i) {
+            if (log.WaitForText(text, 1, std::chrono::milliseconds(20))) {
+                return true;
+            }
+            buffer->PushMeta(clock.Meta(nextVideo++));
+        }
+        return false;
+    }
 
     std::vector<std::shared_ptr<clipfileModule::ChunkData>> Chunks(std::size_t output = 0) const {
         return recorder.At(output).chunks;
