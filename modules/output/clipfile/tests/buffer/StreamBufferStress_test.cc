@@ -3,7 +3,6 @@
 
 #include <gtest/gtest.h>
 
-#include <atomic>
 #include <condition_variable>
 #include <cstdlib>
 #include <deque>
@@ -21,12 +20,10 @@
 #include "support/BufferHarness.h"
 #include "support/ChunkFollower.h"
 #include "support/SeededDelays.h"
-#include "support/StreamUnits.h"
+#include "support/StreamPushers.h"
 
 namespace clipfileModule {
 namespace {
-
-using stream_units::StreamClock;
 
 constexpr std::chrono::seconds kDuration{4};
 
@@ -77,64 +74,6 @@ class EventRunner {
     std::thread thread_;
 };
 
-/// Pushes the three media from a thread each, in step within a few frames.
-class Pushers {
- public:
-    Pushers(StreamBuffer& buffer, const StreamClock& clock, std::uint64_t seed)
-        : buffer_(buffer), clock_(clock) {
-        threads_.emplace_back(
-            [this, seed] { run(seed + 1, video_, [this](std::uint64_t n) { pushVideo(n); }); });
-        threads_.emplace_back(
-            [this, seed] { run(seed + 2, audio_, [this](std::uint64_t n) { pushAudio(n); }); });
-        threads_.emplace_back(
-            [this, seed] { run(seed + 3, meta_, [this](std::uint64_t n) { pushMeta(n); }); });
-    }
-    ~Pushers() {
-        done_ = true;
-        for (std::thread& thread : threads_) {
-            thread.join();
-        }
-    }
-    std::uint64_t Frame() const { return video_; }
-
- private:
-    template <typename Push>
-    void run(std::uint64_t seed, std::atomic<std::uint64_t>& frame, Push push) {
-        std::minstd_rand random(static_cast<std::uint32_t>(seed));
-        while (!done_) {
-            if (frame > std::min({video_.load(), audio_.load(), meta_.load()}) + 6) {
-                std::this_thread::yield();
-                continue;
-            }
-            push(frame);
-            ++frame;
-            if (random() % 16 == 0) {
-                std::this_thread::sleep_for(std::chrono::microseconds(random() % 200));
-            }
-        }
-    }
-    void pushVideo(std::uint64_t n) {
-        buffer_.PushVideo(clock_.Video(n, n % 10 == 0 ? stream_units::kIdr : stream_units::kPicture));
-    }
-    void pushAudio(std::uint64_t n) {
-        for (std::uint64_t k = clock_.AudioBefore(n); k < clock_.AudioBefore(n + 1); ++k) {
-            buffer_.PushAudio(clock_.Audio(k));
-        }
-    }
-    void pushMeta(std::uint64_t n) {
-        const stream_units::Timecode timecode{1, 2, 3, static_cast<unsigned char>(n % 25), false};
-        buffer_.PushMeta(clock_.Meta(n, {std::nullopt, timecode}));
-    }
-
-    StreamBuffer& buffer_;
-    const StreamClock clock_;
-    std::atomic<bool> done_ = false;
-    std::atomic<std::uint64_t> video_ = 0;
-    std::atomic<std::uint64_t> audio_ = 0;
-    std::atomic<std::uint64_t> meta_ = 0;
-    std::vector<std::thread> threads_;
-};
-
 class StreamBufferStress : public ::testing::TestWithParam<bool> {};
 
 TEST_P(StreamBufferStress, EndsWithEveryRecordingInOrderAndComplete) {
@@ -168,7 +107,7 @@ TEST_P(StreamBufferStress, EndsWithEveryRecordingInOrderAndComplete) {
     {
         EventRunner events(harness.settings);
         harness.controller.SetEventHook([&](std::shared_ptr<Event> event) { events.Post(std::move(event)); });
-        Pushers pushers(*harness.buffer, harness.clock, seed);
+        StreamPushers pushers(*harness.buffer, harness.clock, seed, [](std::size_t) { return true; });
         const auto end = std::chrono::steady_clock::now() + kDuration;
         while (std::chrono::steady_clock::now() < end) {
             // Let the stream go on, now for nothing, now for some chunks.
