@@ -4,17 +4,10 @@
 
 namespace {
 
-// The number of records of a list, MBX_ERR_OVERFLOW for more than `limit`.
-template <typename Record>
-MbxStatus countUpTo(const MbxList<Record>& list, uint32_t limit, uint32_t* count) {
-    MBX_TRY(MbxListCount<Record>(list.first, count));
-    return *count <= limit ? MBX_OK : MBX_ERR_OVERFLOW;
-}
-
 MbxStatus writeAvcExtension(MbxContext* context, MbxFile* file, const MbxAvcConfig& config,
                             uint64_t* accumulated) {
     uint32_t extensions = 0;
-    MBX_TRY(countUpTo(config.sequenceExtensions, UINT8_MAX, &extensions));
+    MBX_TRY(MbxListCountUpTo(&config.sequenceExtensions, UINT8_MAX, &extensions));
     MbxBytes bytes;
     MbxBeginBytes(context, &bytes);
     MbxPut8(&bytes, config.values.chroma_format | 0xFCU);            // bit(6) reserved, unsigned int(2)
@@ -28,7 +21,7 @@ MbxStatus writeAvcExtension(MbxContext* context, MbxFile* file, const MbxAvcConf
 MbxStatus writeHvcArray(MbxContext* context, MbxFile* file, const MbxHvcCArray& array,
                         uint64_t* accumulated) {
     uint32_t nalUnits = 0;
-    MBX_TRY(countUpTo(array.nalUnits, UINT16_MAX, &nalUnits));
+    MBX_TRY(MbxListCountUpTo(&array.nalUnits, UINT16_MAX, &nalUnits));
     uint64_t head = 0;
     MbxPutBits(&head, 1, array.completeness);  // bit(1) array_completeness
     MbxPutBits(&head, 1, 0);                   // bit(1) reserved = 0
@@ -92,8 +85,8 @@ MbxStatus MbxWriteAvcCPayload(MbxContext* context, MbxFile* file, uint64_t posit
     const MbxAvcConfig& config = *box->config;
     uint32_t sequenceSets = 0;
     uint32_t pictureSets = 0;
-    MBX_TRY(countUpTo(config.sequenceSets, 31, &sequenceSets));
-    MBX_TRY(countUpTo(config.pictureSets, UINT8_MAX, &pictureSets));
+    MBX_TRY(MbxListCountUpTo(&config.sequenceSets, 31, &sequenceSets));
+    MBX_TRY(MbxListCountUpTo(&config.pictureSets, UINT8_MAX, &pictureSets));
 
     MbxBytes head;
     MbxBeginBytes(context, &head);
@@ -139,7 +132,7 @@ MbxStatus MbxWriteHvcCPayload(MbxContext* context, MbxFile* file, uint64_t posit
                               uint64_t* written, uint64_t* accumulated) {
     const MbxHvcCValues& values = box->params->values;
     uint32_t arrays = 0;
-    MBX_TRY(countUpTo(box->params->arrays, UINT8_MAX, &arrays));
+    MBX_TRY(MbxListCountUpTo(&box->params->arrays, UINT8_MAX, &arrays));
 
     uint64_t profile = 0;
     MbxPutBits(&profile, 2, values.general_profile_space);  // unsigned int(2) general_profile_space

@@ -29,6 +29,13 @@ MbxStatus MbxListCount(const Record* first, uint32_t* count) {
     return MBX_OK;
 }
 
+// The number of records of a list for a field that carries up to `limit`: MBX_ERR_OVERFLOW above it.
+template <typename Record>
+MbxStatus MbxListCountUpTo(const MbxList<Record>* list, uint32_t limit, uint32_t* count) {
+    MBX_TRY(MbxListCount<Record>(list->first, count));
+    return *count <= limit ? MBX_OK : MBX_ERR_OVERFLOW;
+}
+
 // The record at a 1-based index, null beyond the end. MBX_ERR_INVALID_ARG for a null result or an index of 0.
 template <typename Record>
 MbxStatus MbxListAt(Record* first, uint32_t index, Record** record) {

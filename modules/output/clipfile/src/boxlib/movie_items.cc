@@ -72,8 +72,8 @@ MbxStatus writeInitialObjectDescriptor(MbxContext* context, MbxFile* file, uint6
         MbxBytes bytes;
         MbxBeginBytes(context, &bytes);
         MbxPut(&bytes, bits, 2);
-        for (const uint8_t level : params.profileLevels)
-            MbxPut8(&bytes, level);  // bit(8) of OD, scene, sound, picture, graphics
+        // bit(8) ODProfileLevelIndication, then those of scene, audio, visual and graphics
+        for (const uint8_t level : params.profileLevels) MbxPut8(&bytes, level);
         uint64_t count = 0;
         MBX_TRY(MbxWriteComposed(context, target, &bytes, &count));
         MBX_TRY(writeEsIdInc(context, target, at + count, params.trackId, &count));

@@ -52,6 +52,14 @@ TEST_F(ListTest, Count) {
     EXPECT_EQ(MbxListCount(list.first, nullptr), MBX_ERR_INVALID_ARG);
 }
 
+TEST_F(ListTest, CountUpToALimitOverflowsAboveIt) {
+    uint32_t count = 7;
+    EXPECT_EQ(MbxListCountUpTo(&list, 4, &count), MBX_OK);
+    EXPECT_EQ(count, 4U);
+    EXPECT_EQ(MbxListCountUpTo(&list, 3, &count), MBX_ERR_OVERFLOW);
+    EXPECT_EQ(MbxListCountUpTo(&list, 4, nullptr), MBX_ERR_INVALID_ARG);
+}
+
 TEST_F(ListTest, AtIsOneBased) {
     Item* item = nullptr;
     EXPECT_EQ(MbxListAt(list.first, 1, &item), MBX_OK);
