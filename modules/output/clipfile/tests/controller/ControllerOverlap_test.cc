@@ -2,6 +2,7 @@
 
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <cstdint>
 #include <memory>
 #include <optional>
@@ -15,6 +16,7 @@
 #include "support/FakeRegistry.h"
 #include "support/FileOutputRecorder.h"
 #include "support/SettleEventLoop.h"
+#include "support/StreamBufferPeer.h"
 #include "support/StreamUnits.h"
 #include "support/WaitUntil.h"
 
@@ -117,10 +119,27 @@ class ControllerOverlapTest : public testing::Test {
               const std::shared_ptr<StreamData>& unit, const std::string& line, std::uint64_t rtp) {
         const std::string text = line + std::to_string(rtp);
         const std::size_t before = log_.Count(text);
-        const bool recorded = !peer_.StreamBuffers().empty();
         (controller_.*push)(unit);
-        ASSERT_TRUE(waitUntil(
-            [&] { return peer_.Queue(queue).Size() == 0 && (!recorded || log_.Count(text) > before); }));
+        // A recording may end at any unit, and with it the lines.
+        ASSERT_TRUE(waitUntil([&] {
+            const auto recordings = peer_.StreamBuffers();
+            return peer_.Queue(queue).Size() == 0 && (recordings.empty() || log_.Count(text) > before);
+        }));
+        ASSERT_TRUE(queue == 0 || waitUntil([&] {
+                        const auto recordings = peer_.StreamBuffers();
+                        return std::all_of(recordings.begin(), recordings.end(), [&](const auto& recording) {
+                            return IsSettled(*recording, unit);
+                        });
+                    }));
+    }
+    /// Until its first picture a recording must have cached what goes before that: what is still on its way
+    /// to the cache then is not trimmed.
+    static bool IsSettled(StreamBuffer& recording, const std::shared_ptr<StreamData>& unit) {
+        const auto start = static_cast<std::uint64_t>(recording.GetStartTimestamp()) / 90;
+        const auto stop = static_cast<std::uint64_t>(recording.GetStopTimestamp()) / 90;
+        const bool isDropped = unit->timestamp < start || unit->timestamp > stop;
+        return isDropped || StreamBufferPeer::Cached(recording)[0] != 0 ||
+               StreamBufferPeer::Holds(recording, unit);
     }
 
     std::uint64_t frame_ = 0;

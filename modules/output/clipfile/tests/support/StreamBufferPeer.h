@@ -1,7 +1,9 @@
 #pragma once
 
+#include <algorithm>
 #include <array>
 #include <cstddef>
+#include <memory>
 
 #include "buffer/StreamBuffer.h"
 
@@ -14,6 +16,14 @@ class StreamBufferPeer {
     static std::array<std::size_t, 3> Cached(StreamBuffer& buffer) {
         MutexLock lock(buffer.bufferMutex);
         return {buffer.videoBuffer.size(), buffer.audioBuffer.size(), buffer.metaBuffer.size()};
+    }
+    /// True when a unit of audio or metadata has reached its cache.
+    static bool Holds(StreamBuffer& buffer, const std::shared_ptr<StreamData>& unit) {
+        MutexLock lock(buffer.bufferMutex);
+        const auto isIn = [&unit](const auto& cache) {
+            return std::find(cache.begin(), cache.end(), unit) != cache.end();
+        };
+        return isIn(buffer.audioBuffer) || isIn(buffer.metaBuffer);
     }
 };
 
