@@ -137,7 +137,8 @@ MbxStatus MbxSetAvcConfig(MbxSession* session, uint32_t track, uint32_t entry,
                           const MbxAvcConfigParams* params);
 
 // Append a copy of one NAL unit, header byte included and start code not, to the entry's sequence or picture
-// parameter sets. Counts and lengths are checked when the box is built.
+// parameter sets. MBX_ERR_BAD_STATE for an entry of another kind, or before MbxSetAvcConfig. Counts and lengths
+// are checked when the box is built.
 MbxStatus MbxAddAvcSps(MbxSession* session, uint32_t track, uint32_t entry, const uint8_t* data,
                        uint64_t size);
 MbxStatus MbxAddAvcPps(MbxSession* session, uint32_t track, uint32_t entry, const uint8_t* data,
@@ -149,12 +150,13 @@ MbxStatus MbxSetHvcConfig(MbxSession* session, uint32_t track, uint32_t entry, c
 
 // Appends a copy of one NAL unit to the `hvcC` array of its type (below 64), which is made when needed;
 // `completeness` (below 2) is that of the array and overwrites. MBX_ERR_BAD_STATE for an entry of another
-// kind.
+// kind, or before MbxSetHvcConfig.
 MbxStatus MbxAddHvcNalUnit(MbxSession* session, uint32_t track, uint32_t entry, uint8_t nalType,
                            uint8_t completeness, const uint8_t* data, uint64_t size);
 
 // Sets or replaces the elementary stream descriptor of an entry of kind 1, 3 or 4. MBX_ERR_BAD_STATE for
-// another kind, MBX_ERR_INVALID_ARG for a value out of its range, MBX_ERR_INTERNAL for an unknown form.
+// another kind, or for one of kind 3 that describes another codec; MBX_ERR_INVALID_ARG for a value out of its
+// range, MBX_ERR_INTERNAL for an unknown form.
 MbxStatus MbxSetEsds(MbxSession* session, uint32_t track, uint32_t entry, const MbxEsdsParams* params);
 
 // Puts an item of user metadata on a track, or with track 0 on the movie. MBX_ERR_INVALID_ARG for a value out
