@@ -4,8 +4,7 @@
 // with a null file it only counts. There is no other size calculation, so sizes cannot drift from what is
 // written.
 //
-// ---- How to write a box
-// --------------------------------------------------------------------------------------------
+// ---- How to write a box ----
 //
 // A box with the code xxxx is a plain record MbxXxxxBox, whose first field is `uint64_t size`: its total size
 // on file, header included, set by its builder. Child boxes hang on pointers (null is absent) or on an

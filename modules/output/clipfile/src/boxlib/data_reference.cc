@@ -1,7 +1,6 @@
 #include "boxlib/data_reference.h"
 
-// ---- dinf
-// ----------------------------------------------------------------------------------------------------------
+// ---- dinf ----
 
 MbxStatus MbxBuildDinf(MbxContext* context, const MbxOptions* options, const MbxList<MbxDataEntry>* entries,
                        MbxDinfBox* box) {
@@ -30,8 +29,7 @@ MbxStatus MbxFreeDinf(MbxContext* context, MbxDinfBox* box) {
     return MbxFreeBox(context, box, [&] { return MbxFreeDref(context, box->dref); });
 }
 
-// ---- dref
-// ----------------------------------------------------------------------------------------------------------
+// ---- dref ----
 
 namespace {
 
@@ -99,8 +97,7 @@ MbxStatus MbxFreeDref(MbxContext* context, MbxDrefBox* box) {
     return MbxFreeBox(context, box, [&] { return MbxFreeList(context, &box->entries, freeEntryBox); });
 }
 
-// ---- url , urn
-// ----------------------------------------------------------------------------------------------------
+// ---- url , urn ----
 
 namespace {
 
@@ -178,8 +175,7 @@ MbxStatus MbxFreeUrn(MbxContext* context, MbxDataEntryBox* box) {
     return freeEntryBox(context, box);
 }
 
-// ---- The records
-// ---------------------------------------------------------------------------------------------------
+// ---- The records ----
 
 MbxStatus MbxAddDataEntry(MbxContext* context, MbxList<MbxDataEntry>* list, const MbxDataEntryParams* params,
                           uint32_t* index) {

@@ -21,8 +21,7 @@
 
 #include "boxlib/mbx_types.h"
 
-// ---- Context and allocator
-// -----------------------------------------------------------------------------------------
+// ---- Context and allocator ----
 
 // Makes a context with a copy of the callbacks. MBX_ERR_INVALID_ARG for a null argument or an entry that is
 // not set, MBX_ERR_NO_MEMORY when `alloc` refuses. The context must outlive its sessions.
@@ -50,8 +49,7 @@ MbxStatus MbxScratchInit(MbxContext* context, uint32_t class_, uint64_t size, Mb
 // Releases the scratch's memory and clears the pointer. Null arguments are allowed; safe to call twice.
 void MbxScratchRelease(MbxContext* context, MbxScratch* scratch);
 
-// ---- Numbers and time
-// ----------------------------------------------------------------------------------------------
+// ---- Numbers and time ----
 
 // Seconds from 1 January 1904, the epoch of ISO/IEC 14496-12. MBX_ERR_INVALID_ARG for a null argument, a year
 // before 1904, or a field outside its range (second 60 is allowed; 29 February in leap years only).
@@ -61,8 +59,7 @@ MbxStatus MbxToMp4Time(MbxContext* context, const MbxDate* date, uint64_t* secon
 // or a null result, MBX_ERR_OVERFLOW for a quotient above 64 bits.
 MbxStatus MbxRescale(uint64_t value, uint64_t divisor, uint64_t multiplier, uint64_t* result);
 
-// ---- Session
-// -------------------------------------------------------------------------------------------------------
+// ---- Session ----
 
 // Makes the session of one output file: sets the context's quota, allocates the session and its scratch, and
 // copies the configuration. MBX_ERR_INVALID_ARG for a null argument or a quota that cannot hold the session.
@@ -71,8 +68,7 @@ MbxStatus MbxSessionCreate(MbxContext* context, const MbxSessionConfig* config, 
 // Releases the whole tree and the session; null is allowed and gives MBX_OK.
 MbxStatus MbxSessionDestroy(MbxSession* session);
 
-// ---- File type and profile
-// -----------------------------------------------------------------------------------------
+// ---- File type and profile ----
 
 // Makes the file type record, or overwrites the two words of the existing one.
 MbxStatus MbxCreateFileType(MbxSession* session, uint32_t majorBrand, uint32_t minorVersion);
@@ -95,8 +91,7 @@ MbxStatus MbxAddVideoProfile(MbxSession* session, const MbxVideoProfile* profile
 // Measures, and with a file writes, the `uuid` box that carries the profile; an empty one without a profile.
 MbxStatus MbxWriteProfile(MbxSession* session, MbxFile* file, uint64_t position, uint64_t* size);
 
-// ---- Movie and tracks
-// ----------------------------------------------------------------------------------------------
+// ---- Movie and tracks ----
 
 // Makes the movie. MBX_ERR_INVALID_ARG for a timescale of 0, MBX_ERR_BAD_STATE when there is one already,
 // which is left untouched.
@@ -183,8 +178,7 @@ MbxStatus MbxSetMovieTimes(MbxSession* session, uint32_t track, uint32_t selecto
 // with a composition offset is added, MBX_ERR_BAD_STATE afterwards.
 MbxStatus MbxSetSignedOffsets(MbxSession* session, uint32_t track, uint32_t signedOffsets);
 
-// ---- Samples and fragments
-// -----------------------------------------------------------------------------------------
+// ---- Samples and fragments ----
 
 // Appends one sample to the track's open chunk, which is opened when needed. `randomAccess` asks for a row in
 // the fragment index, which the samples of `moov` never get. MBX_ERR_BAD_STATE for a track or sample entry
@@ -220,8 +214,7 @@ MbxStatus MbxSealFragment(MbxSession* session);
 // be at least two (MBX_ERR_BAD_STATE). The fragment keeps its times and position.
 MbxStatus MbxReleaseFragment(MbxSession* session, uint32_t fragment);
 
-// ---- Writing
-// -------------------------------------------------------------------------------------------------------
+// ---- Writing ----
 
 // Writes a box header in the session's box_size_mode for a payload of `payloadSize` bytes that the caller
 // writes; `headerSize` receives 8 or 16. MBX_ERR_INVALID_ARG for a payload of 2^64 - 16 bytes or more,

@@ -2,8 +2,7 @@
 
 #include "boxlib/version.h"
 
-// ---- mdia
-// ----------------------------------------------------------------------------------------------------------
+// ---- mdia ----
 
 MbxStatus MbxBuildMdia(MbxContext* context, const MbxOptions* options, const MbxTrack* track,
                        MbxMdiaBox* box) {
@@ -40,8 +39,7 @@ MbxStatus MbxFreeMdia(MbxContext* context, MbxMdiaBox* box) {
     });
 }
 
-// ---- mdhd
-// ----------------------------------------------------------------------------------------------------------
+// ---- mdhd ----
 
 MbxStatus MbxBuildMdhd(MbxContext* context, const MbxOptions* options, const MbxTrack* track,
                        MbxMdhdBox* box) {
@@ -94,8 +92,7 @@ MbxStatus MbxComputeMediaDuration(const MbxTrack* track, uint64_t* duration) {
     return MBX_OK;
 }
 
-// ---- hdlr
-// ----------------------------------------------------------------------------------------------------------
+// ---- hdlr ----
 
 MbxStatus MbxBuildHdlr(MbxContext* context, const MbxOptions* options, const MbxHandler* handler,
                        MbxHdlrBox* box) {
@@ -132,8 +129,7 @@ MbxStatus MbxFreeHdlr(MbxContext* context, MbxHdlrBox* box) {
     return MbxFreeBox(context, box);
 }
 
-// ---- minf
-// ----------------------------------------------------------------------------------------------------------
+// ---- minf ----
 
 MbxStatus MbxBuildMinf(MbxContext* context, const MbxOptions* options, const MbxTrack* track,
                        MbxMinfBox* box) {

@@ -63,8 +63,7 @@ MbxStatus writeEmpty(MbxContext* context, MbxFile* file, uint64_t position, uint
 
 }  // namespace
 
-// ---- vmhd
-// ----------------------------------------------------------------------------------------------------------
+// ---- vmhd ----
 
 MbxStatus MbxBuildVmhd(MbxContext* context, const MbxOptions* options, const MbxMediaInformation* information,
                        MbxMediaInformationBox* box) {
@@ -93,8 +92,7 @@ MbxStatus MbxFreeVmhd(MbxContext* context, MbxMediaInformationBox* box) {
     return MbxFreeMediaInformation(context, box);
 }
 
-// ---- smhd
-// ----------------------------------------------------------------------------------------------------------
+// ---- smhd ----
 
 MbxStatus MbxBuildSmhd(MbxContext* context, const MbxOptions* options, const MbxMediaInformation* information,
                        MbxMediaInformationBox* box) {
@@ -123,8 +121,7 @@ MbxStatus MbxFreeSmhd(MbxContext* context, MbxMediaInformationBox* box) {
     return MbxFreeMediaInformation(context, box);
 }
 
-// ---- sthd
-// ----------------------------------------------------------------------------------------------------------
+// ---- sthd ----
 
 MbxStatus MbxBuildSthd(MbxContext* context, const MbxOptions* options, const MbxMediaInformation* information,
                        MbxMediaInformationBox* box) {
@@ -147,8 +144,7 @@ MbxStatus MbxFreeSthd(MbxContext* context, MbxMediaInformationBox* box) {
     return MbxFreeMediaInformation(context, box);
 }
 
-// ---- nmhd
-// ----------------------------------------------------------------------------------------------------------
+// ---- nmhd ----
 
 MbxStatus MbxBuildNmhd(MbxContext* context, const MbxOptions* options, const MbxMediaInformation* information,
                        MbxMediaInformationBox* box) {

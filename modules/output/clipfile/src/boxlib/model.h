@@ -15,8 +15,7 @@ struct MbxMetaParams;
 struct MbxLevel;
 struct MbxPsshParams;
 
-// ---- File type and profile
-// -----------------------------------------------------------------------------------------
+// ---- File type and profile ----
 
 struct MbxBrand {
     uint32_t brand;
@@ -48,8 +47,7 @@ struct MbxProfile {
     MbxList<MbxProfileExtra> extras;
 };
 
-// ---- User metadata
-// -------------------------------------------------------------------------------------------------
+// ---- User metadata ----
 
 struct MbxMetadataItem {
     uint32_t type;
@@ -94,8 +92,7 @@ struct MbxUserMetadata {
     MbxList<MbxMetadataTrack> tracks;    // `MTSM`
 };
 
-// ---- Track
-// ---------------------------------------------------------------------------------------------------------
+// ---- Track ----
 
 // Bits of MbxTrackHeader::fieldsSet: what the caller gave. The builders compute a field whose bit is clear.
 enum MbxTrackHeaderField : uint32_t {
@@ -224,8 +221,7 @@ struct MbxTrack {
     MbxTrack* next;
 };
 
-// ---- Movie
-// ---------------------------------------------------------------------------------------------------------
+// ---- Movie ----
 
 // Bits of MbxMovieHeader::fieldsSet.
 enum MbxMovieHeaderField : uint32_t {

@@ -2,8 +2,7 @@
 
 #include "boxlib/version.h"
 
-// ---- moov
-// ----------------------------------------------------------------------------------------------------------
+// ---- moov ----
 
 MbxStatus MbxBuildMoov(MbxContext* context, const MbxOptions* options, const MbxMovie* movie,
                        MbxMoovBox* box) {
@@ -15,13 +14,18 @@ MbxStatus MbxBuildMoov(MbxContext* context, const MbxOptions* options, const Mbx
             [&](MbxTrakBox* trak) { return MbxBuildTrak(context, options, &inMovie, trak); }, MbxFreeTrak));
     }
     MBX_TRY(MbxMakeBox(context, options, &box->mvhd, movie, MbxBuildMvhd, MbxFreeMvhd));
+    MBX_TRY(MbxMakeOptionalBox(context, options, &box->ainf, movie->ainf, MbxBuildAinf, MbxFreeAinf));
+    MBX_TRY(MbxMakeOptionalBox(context, options, &box->iods, movie->iods, MbxBuildIods, MbxFreeIods));
+    MBX_TRY(MbxMakeOptionalBox(context, options, &box->meta, movie->meta, MbxBuildMeta, MbxFreeMeta));
     if (movie->fragmentCount != 0) {
         MBX_TRY(MbxMakeBox(context, options, &box->mvex, movie, MbxBuildMvex, MbxFreeMvex));
     }
+    MBX_TRY(MbxMakeBoxes(context, options, &box->pssh, movie->pssh.first, MbxBuildPssh, MbxFreePssh));
     if (MbxHasUserMetadata(&movie->userMetadata)) {
         MBX_TRY(MbxMakeBox(context, options, &box->userMetadata, &movie->userMetadata, MbxBuildUserMetadata,
                            MbxFreeUserMetadata));
     }
+    MBX_TRY(MbxMakeFree(context, options, movie->freeBytes, &box->freeSpace));
     return MbxMeasureBox(context, options, box, MbxWriteMoovPayload);
 }
 
@@ -32,10 +36,15 @@ MbxStatus MbxWriteMoovPayload(MbxContext* context, const MbxOptions* options, Mb
     uint64_t count = 0;
     MBX_TRY(MbxSeek(context, file, position));
     MBX_TRY(MbxWriteMvhdBox(context, options, file, position + count, box->mvhd, nullptr, &count));
+    MBX_TRY(MbxWriteAinfBox(context, options, file, position + count, box->ainf, nullptr, &count));
+    MBX_TRY(MbxWriteIodsBox(context, options, file, position + count, box->iods, nullptr, &count));
+    MBX_TRY(MbxWriteMetaBox(context, options, file, position + count, box->meta, nullptr, &count));
     MBX_TRY(MbxWriteBoxes(context, options, file, position, box->tracks.first, MbxWriteTrakBox, &count));
     MBX_TRY(MbxWriteMvexBox(context, options, file, position + count, box->mvex, nullptr, &count));
     MBX_TRY(MbxWriteUserMetadataBox(context, options, file, position + count, box->userMetadata, nullptr,
                                     &count));
+    MBX_TRY(MbxWriteBoxes(context, options, file, position, box->pssh.first, MbxWritePsshBox, &count));
+    MBX_TRY(MbxWriteFreeBox(context, options, file, position + count, box->freeSpace, nullptr, &count));
     return MbxReportBytes(count, written, accumulated);
 }
 
@@ -48,14 +57,18 @@ MbxStatus MbxWriteMoovBox(MbxContext* context, const MbxOptions* options, MbxFil
 MbxStatus MbxFreeMoov(MbxContext* context, MbxMoovBox* box) {
     return MbxFreeBox(context, box, [&] {
         MBX_TRY(MbxFreeMvhd(context, box->mvhd));
+        MBX_TRY(MbxFreeAinf(context, box->ainf));
+        MBX_TRY(MbxFreeIods(context, box->iods));
+        MBX_TRY(MbxFreeMeta(context, box->meta));
         MBX_TRY(MbxFreeList(context, &box->tracks, MbxFreeTrak));
         MBX_TRY(MbxFreeMvex(context, box->mvex));
-        return MbxFreeUserMetadata(context, box->userMetadata);
+        MBX_TRY(MbxFreeUserMetadata(context, box->userMetadata));
+        MBX_TRY(MbxFreeList(context, &box->pssh, MbxFreePssh));
+        return MbxFreeFree(context, box->freeSpace);
     });
 }
 
-// ---- mvhd
-// ----------------------------------------------------------------------------------------------------------
+// ---- mvhd ----
 
 namespace {
 
@@ -129,8 +142,7 @@ MbxStatus MbxFreeMvhd(MbxContext* context, MbxMvhdBox* box) {
     return MbxFreeBox(context, box);
 }
 
-// ---- The record
-// ----------------------------------------------------------------------------------------------------
+// ---- The record ----
 
 MbxStatus MbxNewMovie(MbxContext* context, uint32_t timescale, MbxMovie** movie) {
     if (MbxAnyNull(context, movie) || timescale == 0) return MBX_ERR_INVALID_ARG;
@@ -176,7 +188,11 @@ MbxStatus MbxSetMovieTimes(MbxContext* context, const MbxOptions* options, MbxMo
 
 MbxStatus MbxFreeMovie(MbxContext* context, MbxMovie* movie) {
     return MbxFreeBox(context, movie, [&] {
+        MBX_TRY(MbxFreeAinfParams(context, movie->ainf));
+        MBX_TRY(MbxFreeMetaParams(context, movie->meta));
         MBX_TRY(MbxFreeList(context, &movie->tracks, MbxFreeTrack));
+        MBX_TRY(MbxFreeIodsParams(context, movie->iods));
+        MBX_TRY(MbxFreeList(context, &movie->pssh, MbxFreePsshParams));
         return MbxReleaseUserMetadata(context, &movie->userMetadata);
     });
 }

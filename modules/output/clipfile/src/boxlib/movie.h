@@ -1,7 +1,10 @@
 // `moov` and `mvhd`, and the record of a movie.
 #pragma once
 
+#include "boxlib/item.h"
 #include "boxlib/movie_extends.h"
+#include "boxlib/movie_items.h"
+#include "boxlib/protection.h"
 #include "boxlib/track.h"
 
 struct MbxMvhdBox {
@@ -13,9 +16,14 @@ struct MbxMvhdBox {
 struct MbxMoovBox {
     uint64_t size;
     MbxMvhdBox* mvhd;
+    MbxAinfBox* ainf;  // null for none, as are all that follow but the lists
+    MbxIodsBox* iods;
+    MbxMetaBox* meta;
     MbxList<MbxTrakBox> tracks;
-    MbxMvexBox* mvex;  // null for none, as are the following
+    MbxMvexBox* mvex;
     MbxUserMetadataBox* userMetadata;
+    MbxList<MbxPsshBox> pssh;
+    MbxFreeSpaceBox* freeSpace;
 };
 
 MbxStatus MbxBuildMoov(MbxContext* context, const MbxOptions* options, const MbxMovie* movie,

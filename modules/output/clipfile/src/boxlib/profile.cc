@@ -2,8 +2,7 @@
 
 #include "boxlib/uuid.h"
 
-// ---- PROF
-// ----------------------------------------------------------------------------------------------------------
+// ---- PROF ----
 
 namespace {
 
@@ -97,8 +96,7 @@ MbxStatus MbxFreeProf(MbxContext* context, MbxProfBox* box) {
     });
 }
 
-// ---- FPRF
-// ----------------------------------------------------------------------------------------------------------
+// ---- FPRF ----
 
 MbxStatus MbxBuildFprf(MbxContext* context, const MbxOptions* options, const MbxProfile* profile,
                        MbxFprfBox* box) {
@@ -127,8 +125,7 @@ MbxStatus MbxFreeFprf(MbxContext* context, MbxFprfBox* box) {
     return MbxFreeBox(context, box);
 }
 
-// ---- APRF, VPRF, BPRF, PPRF
-// ----------------------------------------------------------------------------------------
+// ---- APRF, VPRF, BPRF, PPRF ----
 
 namespace {
 
@@ -235,8 +232,7 @@ MbxStatus MbxFreePprf(MbxContext* context, MbxProfileEntryBox* box) {
     return MbxFreeBox(context, box);
 }
 
-// ---- PREX
-// ----------------------------------------------------------------------------------------------------------
+// ---- PREX ----
 
 MbxStatus MbxBuildPrex(MbxContext* context, const MbxOptions* options, const MbxProfileExtra* extra,
                        MbxPrexBox* box) {
@@ -273,8 +269,7 @@ MbxStatus MbxFreePrex(MbxContext* context, MbxPrexBox* box) {
     return MbxFreeBox(context, box);
 }
 
-// ---- The record
-// ----------------------------------------------------------------------------------------------------
+// ---- The record ----
 
 MbxStatus MbxAddProfileEntry(MbxContext* context, MbxProfile* profile, uint32_t code, const uint32_t* values,
                              uint32_t count) {

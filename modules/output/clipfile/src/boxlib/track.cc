@@ -16,6 +16,11 @@ MbxStatus MbxBuildTrak(MbxContext* context, const MbxOptions* options, const Mbx
         MBX_TRY(MbxMakeBox(context, options, &box->userMetadata, &source->userMetadata, MbxBuildUserMetadata,
                            MbxFreeUserMetadata));
     }
+    const MbxSampleSegment* segment = source->segments.first;
+    if (source->auxEnabled != 0 && segment != nullptr && segment->auxSizes.count != 0) {
+        const MbxSencParams params = {0, &segment->auxSizes};
+        MBX_TRY(MbxMakeBox(context, options, &box->senc, &params, MbxBuildSenc, MbxFreeSenc));
+    }
     return MbxMeasureBox(context, options, box, MbxWriteTrakPayload);
 }
 
@@ -26,6 +31,7 @@ MbxStatus MbxWriteTrakPayload(MbxContext* context, const MbxOptions* options, Mb
     uint64_t count = 0;
     MBX_TRY(MbxSeek(context, file, position));
     MBX_TRY(MbxWriteTkhdBox(context, options, file, position + count, box->tkhd, nullptr, &count));
+    MBX_TRY(MbxWriteSencBox(context, options, file, position + count, box->senc, nullptr, &count));
     MBX_TRY(MbxWriteTrefBox(context, options, file, position + count, box->tref, nullptr, &count));
     MBX_TRY(MbxWriteEdtsBox(context, options, file, position + count, box->edts, nullptr, &count));
     MBX_TRY(MbxWriteMdiaBox(context, options, file, position + count, box->mdia, nullptr, &count));
@@ -43,6 +49,7 @@ MbxStatus MbxWriteTrakBox(MbxContext* context, const MbxOptions* options, MbxFil
 MbxStatus MbxFreeTrak(MbxContext* context, MbxTrakBox* box) {
     return MbxFreeBox(context, box, [&] {
         MBX_TRY(MbxFreeTkhd(context, box->tkhd));
+        MBX_TRY(MbxFreeSenc(context, box->senc));
         MBX_TRY(MbxFreeTref(context, box->tref));
         MBX_TRY(MbxFreeEdts(context, box->edts));
         MBX_TRY(MbxFreeMdia(context, box->mdia));

@@ -1,6 +1,7 @@
 // `trak`, and the records of a track: its making, edits, references and times.
 #pragma once
 
+#include "boxlib/auxiliary_information.h"
 #include "boxlib/media.h"
 #include "boxlib/track_header.h"
 #include "boxlib/user_metadata.h"
@@ -8,7 +9,8 @@
 struct MbxTrakBox {
     uint64_t size;
     MbxTkhdBox* tkhd;
-    MbxTrefBox* tref;  // null for none, as are the next and userMetadata
+    MbxSencBox* senc;  // null for none, as are the next two and userMetadata
+    MbxTrefBox* tref;
     MbxEdtsBox* edts;
     MbxMdiaBox* mdia;
     MbxUserMetadataBox* userMetadata;
@@ -24,8 +26,7 @@ MbxStatus MbxWriteTrakBox(MbxContext* context, const MbxOptions* options, MbxFil
                           const MbxTrakBox* box, uint64_t* written, uint64_t* accumulated);
 MbxStatus MbxFreeTrak(MbxContext* context, MbxTrakBox* box);
 
-// ---- Records
-// -------------------------------------------------------------------------------------------------------
+// ---- Records ----
 
 // A new track of a handler: `vide`, `soun`, `subt`, `meta`, `tmcd`, `odsm`, `BKDT`, `PKDT` or `GRAP`.
 struct MbxHandlerRequest {

@@ -3,8 +3,7 @@
 #include "boxlib/media.h"
 #include "boxlib/version.h"
 
-// ---- tkhd
-// ----------------------------------------------------------------------------------------------------------
+// ---- tkhd ----
 
 MbxStatus MbxBuildTkhd(MbxContext* context, const MbxOptions* options, const MbxTrackInMovie* track,
                        MbxTkhdBox* box) {
@@ -69,8 +68,7 @@ MbxStatus MbxComputeTrackDuration(const MbxTrackInMovie* track, uint64_t* durati
     return MBX_OK;
 }
 
-// ---- edts, elst
-// ----------------------------------------------------------------------------------------------------
+// ---- edts, elst ----
 
 MbxStatus MbxBuildEdts(MbxContext* context, const MbxOptions* options, const MbxEditList* editList,
                        MbxEdtsBox* box) {
@@ -142,8 +140,7 @@ MbxStatus MbxFreeElst(MbxContext* context, MbxElstBox* box) {
     return MbxFreeBox(context, box);
 }
 
-// ---- tref
-// ----------------------------------------------------------------------------------------------------------
+// ---- tref ----
 
 MbxStatus MbxBuildTref(MbxContext* context, const MbxOptions* options,
                        const MbxList<MbxReferenceGroup>* groups, MbxTrefBox* box) {

@@ -2,8 +2,7 @@
 
 #include "boxlib/uuid.h"
 
-// ---- USMT
-// ----------------------------------------------------------------------------------------------------------
+// ---- USMT ----
 
 MbxStatus MbxBuildUserMetadata(MbxContext* context, const MbxOptions* options, const MbxUserMetadata* lists,
                                MbxUserMetadataBox* box) {
@@ -45,8 +44,7 @@ MbxStatus MbxFreeUserMetadata(MbxContext* context, MbxUserMetadataBox* box) {
     });
 }
 
-// ---- MTDT, MTDF
-// ----------------------------------------------------------------------------------------------------
+// ---- MTDT, MTDF ----
 
 namespace {
 
@@ -135,8 +133,7 @@ MbxStatus MbxFreeMtdf(MbxContext* context, MbxMetadataItemsBox* box) {
     return MbxFreeBox(context, box);
 }
 
-// ---- MTSM
-// ----------------------------------------------------------------------------------------------------------
+// ---- MTSM ----
 
 MbxStatus MbxBuildMtsm(MbxContext* context, const MbxOptions* options, const MbxMetadataTrack* track,
                        MbxMtsmBox* box) {
@@ -179,8 +176,7 @@ MbxStatus MbxFreeMtsm(MbxContext* context, MbxMtsmBox* box) {
     });
 }
 
-// ---- MTHD
-// ----------------------------------------------------------------------------------------------------------
+// ---- MTHD ----
 
 MbxStatus MbxBuildMthd(MbxContext* context, const MbxOptions* options, const MbxMetadataTrackHeader* header,
                        MbxMthdBox* box) {
@@ -213,8 +209,7 @@ MbxStatus MbxFreeMthd(MbxContext* context, MbxMthdBox* box) {
     return MbxFreeBox(context, box);
 }
 
-// ---- MDST
-// ----------------------------------------------------------------------------------------------------------
+// ---- MDST ----
 
 MbxStatus MbxBuildMdst(MbxContext* context, const MbxOptions* options,
                        const MbxList<MbxMetadataTrackEntry>* entries, MbxMdstBox* box) {

@@ -1,5 +1,6 @@
 #include "boxlib/movie.h"
 
+#include "boxlib/sample_store.h"
 #include "registry.h"
 #include "track_fixture.h"
 
@@ -233,6 +234,100 @@ TEST_F(MovieHeaderTest, TrackDurationOverflowEndsTheBuild) {
     movie->header.timescale = 1001;
     MbxMvhdBox box = {};
     EXPECT_EQ(MbxBuildMvhd(context, &options, movie, &box), MBX_ERR_OVERFLOW);
+}
+
+// The codes of the boxes that stand one behind the other in a range.
+std::vector<std::string> childCodes(const Bytes& bytes, size_t begin, size_t end) {
+    std::vector<std::string> codes;
+    while (begin + 8 <= end) {
+        codes.emplace_back(bytes.begin() + static_cast<std::ptrdiff_t>(begin) + 4,
+                           bytes.begin() + static_cast<std::ptrdiff_t>(begin) + 8);
+        begin += MbxGet32(bytes.data() + begin);
+    }
+    EXPECT_EQ(begin, end);
+    return codes;
+}
+
+class WholeMovieTest : public MovieTest {
+ protected:
+    // A movie with every part that `moov` knows. Its records are released with it.
+    void SetUp() override {
+        MovieTest::SetUp();
+        MbxTrackParams params = TrackParams(1, 1000);
+        params.auxEnabled = 1;
+        ASSERT_EQ(create(MbxCode("vide"), params), MBX_OK);
+        params.trackId = 2;
+        params.auxEnabled = 0;
+        ASSERT_EQ(create(MbxCode("meta"), params), MBX_OK);
+        const MbxTrackReferenceParams reference = {MbxCode("cdsc"), 2};
+        uint32_t index = 0;
+        ASSERT_EQ(MbxAddTrackReference(context, movie, movie->tracks.first, &reference, &index), MBX_OK);
+        MbxSampleSegment* segment = addSegment(movie->tracks.first, 100);
+        segment->auxSizes.list.capacity = MBX_BLOCK_CAPACITY;
+        ASSERT_EQ(MbxAddAuxSize(context, &segment->auxSizes, 2, kTitlePair), MBX_OK);
+        ASSERT_EQ(MbxNew(context, &movie->ainf), MBX_OK);
+        ASSERT_EQ(MbxNew(context, &movie->iods), MBX_OK);
+        ASSERT_EQ(MbxNew(context, &movie->meta), MBX_OK);
+        ASSERT_EQ(MbxNew(context, &movie->meta->handler), MBX_OK);
+        MbxPsshParams* pssh = nullptr;
+        ASSERT_EQ(MbxNew(context, &pssh), MBX_OK);
+        MbxListAppend(&movie->pssh, pssh);
+        const MbxMetadataItemParams item = {1, 0, 0x15C7, 0, kTitlePair, 2};
+        ASSERT_EQ(MbxPutMetadataItem(context, &movie->userMetadata.items, &item, &index), MBX_OK);
+        movie->fragmentCount = 1;
+        movie->freeBytes = 20;
+    }
+
+    static constexpr uint8_t kTitlePair[2] = {'A', 'B'};
+};
+
+TEST_F(WholeMovieTest, ChildrenOfMoovStandInTheirOrder) {
+    const Bytes moov = writeMoov();
+    EXPECT_EQ(childCodes(moov, 8, moov.size()),
+              std::vector<std::string>(
+                  {"mvhd", "ainf", "iods", "meta", "trak", "trak", "mvex", "uuid", "pssh", "free"}));
+    EXPECT_BYTES(Bytes(moov.end() - 28, moov.end()), Hex("0000001C 'free'") + Repeat(0, 20));
+}
+
+TEST_F(WholeMovieTest, ChildrenOfTrakStandInTheirOrder) {
+    MbxTrakBox* box = nullptr;
+    ASSERT_EQ(MbxNew(context, &box), MBX_OK);
+    const MbxTrackInMovie inMovie = {movie->tracks.first, 1000};
+    ASSERT_EQ(MbxBuildTrak(context, &options, &inMovie, box), MBX_OK);
+    EXPECT_EQ(MbxWriteTrakBox(context, &options, &file, 0, box, nullptr, nullptr), MBX_OK);
+    EXPECT_EQ(MbxFreeTrak(context, box), MBX_OK);
+    EXPECT_EQ(childCodes(file.bytes, 8, file.bytes.size()),
+              std::vector<std::string>({"tkhd", "senc", "tref", "edts", "mdia", "uuid"}));
+    EXPECT_BYTES(Bytes(file.bytes.begin() + 100, file.bytes.begin() + 118),
+                 Hex("00000012 'senc' 00000000 00000001 'AB'"));
+}
+
+TEST_F(WholeMovieTest, TrackWithoutAuxiliarySamplesHasNoSenc) {
+    MbxTrakBox* box = nullptr;
+    ASSERT_EQ(MbxNew(context, &box), MBX_OK);
+    movie->tracks.first->auxEnabled = 0;
+    const MbxTrackInMovie inMovie = {movie->tracks.first, 1000};
+    ASSERT_EQ(MbxBuildTrak(context, &options, &inMovie, box), MBX_OK);
+    EXPECT_EQ(box->senc, nullptr);
+    EXPECT_EQ(MbxFreeTrak(context, box), MBX_OK);
+}
+
+TEST_F(WholeMovieTest, EveryRefusedAllocationIsReportedAndLeaksNothing) {
+    const size_t live = host.live.size();
+    for (uint64_t n = 1;; n++) {
+        ASSERT_LT(n, 1000U);
+        MbxMoovBox* box = nullptr;
+        ASSERT_EQ(MbxNew(context, &box), MBX_OK);
+        host.allocations = 0;
+        host.failAllocation = n;
+        const MbxStatus status = MbxBuildMoov(context, &options, movie, box);
+        const bool isComplete = host.allocations < n;
+        host.failAllocation = 0;
+        EXPECT_EQ(MbxFreeMoov(context, box), MBX_OK);
+        EXPECT_EQ(host.live.size(), live);
+        ASSERT_EQ(status, isComplete ? MBX_OK : MBX_ERR_NO_MEMORY) << n;
+        if (isComplete) break;
+    }
 }
 
 class MovieTimesTest : public MovieTest {
