@@ -12,19 +12,17 @@
 // are either owned (MbxBuffer) or borrowed from the model, which outlives the box. Four functions belong to
 // it, with these arguments, of which `options` stands only where a child or a form needs it:
 //
-//   MbxStatus MbxBuildXxxx(MbxContext* context, const MbxOptions* options, const Params* params, MbxXxxxBox*
-//   box);
+//   MbxStatus MbxBuildXxxx(context, options, const Params* params, MbxXxxxBox* box);
 //     MBX_ERR_INVALID_ARG for a null argument (MbxAnyNull); copy the parameters; MbxMakeChild for each child;
 //     MbxMeasureBox last. `box` comes in zeroed. After a failure MbxFreeXxxx releases it with whatever was
 //     handed over by then.
-//   MbxStatus MbxWriteXxxxPayload(context, options, file, position, const MbxXxxxBox* box, written,
-//   accumulated);
+//   MbxStatus MbxWriteXxxxPayload(context, options, file, position, box, written, accumulated);
 //     Everything behind the header. A leaf composes one buffer and ends with MbxWriteFixedPayload. A parent
 //     seeks, then calls each child by name (MbxWriteBoxes for a list), in the order of the file, at position
 //     + count with &count as `accumulated`, and ends with MbxReportBytes(count, written, accumulated).
-//   MbxStatus MbxWriteXxxxBox(context, options, file, position, const MbxXxxxBox* box, written, accumulated);
+//   MbxStatus MbxWriteXxxxBox(context, options, file, position, box, written, accumulated);
 //     One line: MbxWriteBox, or MbxWriteOptionalBox where a null record means that the box is absent.
-//   MbxStatus MbxFreeXxxx(MbxContext* context, MbxXxxxBox* box);
+//   MbxStatus MbxFreeXxxx(context, box);
 //     One line: MbxFreeBox, with a function that releases what the record owns.
 //
 // The payload writer reads beside the standard: the clause stands above it (`// 8.2.2 Movie Header Box`), the
@@ -34,13 +32,12 @@
 // Rules for all of it:
 // - First failure returns at once (MBX_TRY); what was handed to the parent goes with the parent.
 // - Ownership passes by hanging the record on its parent and clearing the local pointer (MbxMakeChild does
-// both).
+//   both).
 // - All memory comes from MbxNew, MbxNewArray, MbxBufferAssign or MbxAlloc in class MBX_MEMORY_CLASS.
-// Copying,
-//   comparing and clearing go through the context (MbxCopy, MbxClear, callbacks), never through the C
-//   library.
+//   Copying, comparing and clearing go through the context (MbxCopy, MbxClear, callbacks), never through the
+//   C library.
 // - Tables go through MbxWriteTable: one temporary array per block, converted in a loop that vectorises, one
-// write.
+//   write.
 // - A count that its field cannot carry is MBX_ERR_OVERFLOW; a value that the mode cannot carry is
 //   MBX_ERR_BAD_STATE; an unknown kind or code is MBX_ERR_INTERNAL.
 // - Public operations stand in session*.cc and only check and look up; what they do to the tree stands in the

@@ -7,15 +7,14 @@
 // Common to all operations:
 // - The result is a status; values come back through pointers, which are left alone on failure.
 // - A null session or result pointer is MBX_ERR_INVALID_ARG. A call that needs a movie gives
-// MBX_ERR_BAD_STATE
-//   when there is none. Track numbers are 1-based places in the movie's track list, not track identifiers;
-//   zero where one is required is MBX_ERR_INVALID_ARG, one beyond the list MBX_ERR_NOT_FOUND.
+//   MBX_ERR_BAD_STATE when there is none. Track numbers are 1-based places in the movie's track list, not
+//   track identifiers; zero where one is required is MBX_ERR_INVALID_ARG, one beyond the list
+//   MBX_ERR_NOT_FOUND.
 // - MBX_ERR_NO_MEMORY comes from any call that stores something. A call that failed leaves in place what it
-// had
-//   built up to then; the session can still be used and must still be destroyed.
-// - Writing calls seek to the position given and never remember one. With a null file they measure: the size
-// comes
-//   back, and nothing is touched. MBX_ERR_IO when a callback fails or moves fewer bytes than asked.
+//   had built up to then; the session can still be used and must still be destroyed.
+// - Writing calls seek to the position given and never remember one. With a null file they measure: the
+//   size comes back, and nothing is touched. MBX_ERR_IO when a callback fails or moves fewer bytes than
+//   asked.
 // - A context and its sessions belong to one thread at a time. There is no global state and no lock.
 #pragma once
 
