@@ -41,8 +41,7 @@ class SampleStoreTest : public SampleTest {
     MbxTrack* track = nullptr;
 };
 
-// ---- What a sample must satisfy
-// ------------------------------------------------------------------------------------
+// ---- What a sample must satisfy ----
 
 TEST_F(SampleStoreTest, NullArgumentsAreInvalid) {
     const MbxSampleInfo info = sample();
@@ -122,8 +121,7 @@ TEST_F(SampleStoreTest, ANegativeOffsetOfASignedSegmentCannotOverflow) {
     EXPECT_EQ(add(info), MBX_ERR_OVERFLOW);
 }
 
-// ---- Runs
-// ----------------------------------------------------------------------------------------------------------
+// ---- Runs ----
 
 TEST_F(SampleStoreTest, EqualDurationsAreOneRun) {
     for (int i = 0; i < 1001; i++) ASSERT_EQ(add(sample()), MBX_OK);
@@ -154,8 +152,7 @@ TEST_F(SampleStoreTest, CompositionOffsetsRunTheSameWay) {
     EXPECT_EQ(runsOf(segment().compositionOffsets.runs), (Runs{{2, 0}, {1, 20}, {2, 0xFFFFFFFB}}));
 }
 
-// ---- Presentation times
-// --------------------------------------------------------------------------------------------
+// ---- Presentation times ----
 
 TEST_F(SampleStoreTest, EarliestPresentationIsTheSmallestDecodeTimeAndOffset) {
     MbxSampleInfo info = sample();
@@ -201,8 +198,7 @@ TEST_F(SampleStoreTest, SignedOffsetsCanBeSetUntilASampleHasAnOffset) {
     EXPECT_EQ(MbxSetSignedOffsets(context, track, 1), MBX_ERR_BAD_STATE);
 }
 
-// ---- Chunks
-// --------------------------------------------------------------------------------------------------------
+// ---- Chunks ----
 
 TEST_F(SampleStoreTest, ChunksOf2And2And3SamplesAreTwoRuns) {
     addChunk(2, 1000);
@@ -251,8 +247,7 @@ TEST_F(SampleStoreTest, EndChunkWithoutAnOpenChunkIsBadState) {
     EXPECT_EQ(segment().chunks.chunkCount, 1U);
 }
 
-// ---- Sizes
-// ---------------------------------------------------------------------------------------------------------
+// ---- Sizes ----
 
 TEST_F(SampleStoreTest, ASizeThatNeverChangesCostsNothing) {
     addSizes(Numbers(3000, 77));
@@ -293,8 +288,7 @@ TEST_F(SampleStoreTest, ASizeOfZeroAfterOthersSpillsThem) {
     EXPECT_EQ(Entries<uint32_t>(segment().sizes.list), (Numbers{4, 0}));
 }
 
-// ---- Sync samples
-// --------------------------------------------------------------------------------------------------
+// ---- Sync samples ----
 
 TEST_F(SampleStoreTest, SyncFlags1101ListSamples1And2And4) {
     addSyncs({1, 1, 0, 1});
@@ -328,8 +322,7 @@ TEST_F(SampleStoreTest, SyncNumbersCountFromOneInEachSegment) {
     EXPECT_EQ(Entries<uint32_t>(segment().syncSamples.list), (Numbers{2, 4}));
 }
 
-// ---- Dependencies
-// --------------------------------------------------------------------------------------------------
+// ---- Dependencies ----
 
 TEST_F(SampleStoreTest, DependenciesKeepTheFirstAndRunTheSecond) {
     addDependencies({1, 2, 2, 2});
@@ -363,8 +356,7 @@ TEST_F(SampleStoreTest, ARunOfDependenciesIsAddedAtOnce) {
     MbxBlockListRelease(context, &list.list);
 }
 
-// ---- Trick play and auxiliary information
-// --------------------------------------------------------------------------
+// ---- Trick play and auxiliary information ----
 
 TEST_F(SampleStoreTest, TrickBytesHoldPictureTypeAndDependencyLevel) {
     MbxSampleInfo info = sample();
@@ -434,8 +426,7 @@ TEST_F(SampleStoreTest, AuxiliarySizeWithoutBytesIsInvalidBeforeAnythingIsRecord
     EXPECT_EQ(MbxAddAuxSize(context, &list, 3, nullptr), MBX_ERR_INVALID_ARG);
 }
 
-// ---- Fragment index
-// ------------------------------------------------------------------------------------------------
+// ---- Fragment index ----
 
 TEST_F(SampleStoreTest, AnIndexEntryAskedForOnTheFirstSegmentAddsNoRow) {
     EXPECT_EQ(add(sample(), 1, 1), MBX_OK);
@@ -467,8 +458,7 @@ TEST_F(SampleStoreTest, AnIndexEntryWhoseFragmentNumberDisagreesIsInternal) {
     EXPECT_EQ(add(sample(), 1, 1), MBX_ERR_INTERNAL);
 }
 
-// ---- Refused memory
-// ------------------------------------------------------------------------------------------------
+// ---- Refused memory ----
 
 TEST_F(SampleStoreTest, EveryRefusedAllocationIsReportedAndLeaksNothing) {
     for (uint64_t n = 1;; n++) {
