@@ -131,8 +131,8 @@ MbxStatus MbxSetAvcConfig(MbxSession* session, uint32_t track, uint32_t entry,
                           const MbxAvcConfigParams* params);
 
 // Append a copy of one NAL unit, header byte included and start code not, to the entry's sequence or picture
-// parameter sets. MBX_ERR_BAD_STATE for an entry of another kind, or before MbxSetAvcConfig. Counts and lengths
-// are checked when the box is built.
+// parameter sets. MBX_ERR_BAD_STATE for an entry of another kind, or before MbxSetAvcConfig. Counts and
+// lengths are checked when the box is built.
 MbxStatus MbxAddAvcSps(MbxSession* session, uint32_t track, uint32_t entry, const uint8_t* data,
                        uint64_t size);
 MbxStatus MbxAddAvcPps(MbxSession* session, uint32_t track, uint32_t entry, const uint8_t* data,
