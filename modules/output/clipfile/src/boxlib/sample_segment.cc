@@ -1,6 +1,6 @@
 #include "boxlib/sample_segment.h"
 
-#include "boxlib/box.h"
+#include "boxlib/codec_config.h"
 #include "boxlib/sample_group_model.h"
 
 namespace {
@@ -132,6 +132,8 @@ MbxStatus MbxReleaseSegment(MbxContext* context, MbxSampleSegment* segment) {
     MbxBlockListRelease(context, &segment->trickBytes);
     segment->releasedSamples += segment->sizes.count;
     clearTables(segment);
+    MBX_TRY(MbxFreeAvcConfig(context, segment->avcConfig));
+    segment->avcConfig = nullptr;
     return MbxReleaseSampleGroups(context, segment);
 }
 

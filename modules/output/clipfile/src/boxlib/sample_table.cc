@@ -45,9 +45,23 @@ MbxStatus buildTables(MbxContext* context, const MbxOptions* options, const MbxS
     return MBX_OK;
 }
 
+// In `stbl` the rows of these tables and of the groups always have an allocation of their own.
+MbxStatus buildAuxiliary(MbxContext* context, const MbxOptions* options, const MbxSampleSegment& segment,
+                         MbxStblBox* box) {
+    const MbxSaioParams offsets = {{}, 0, &segment.auxOffsets};
+    const auto buildSaio = [&](MbxSaioBox* saio) {
+        return MbxBuildSaio(context, nullptr, options, &offsets, saio);
+    };
+    MBX_TRY(MbxMakeChild(context, &box->saio, buildSaio, MbxFreeSaio));
+    const MbxSaizParams sizes = {{}, &segment.auxSizes};
+    const auto buildSaiz = [&](MbxSaizBox* saiz) {
+        return MbxBuildSaiz(context, nullptr, options, &sizes, saiz);
+    };
+    return MbxMakeChild(context, &box->saiz, buildSaiz, MbxFreeSaiz);
+}
+
 MbxStatus buildGroups(MbxContext* context, const MbxOptions* options, const MbxSampleSegment& segment,
                       MbxStblBox* box) {
-    // In `stbl` the rows of these tables always have an allocation of their own.
     for (const MbxSampleGroupParams* group = segment.sampleGroups.first; group != nullptr;
          group = group->next) {
         const auto build = [&](MbxSbgpBox* made) {
@@ -77,6 +91,9 @@ MbxStatus MbxBuildStbl(MbxContext* context, const MbxOptions* options, const Mbx
     };
     MBX_TRY(MbxMakeChild(context, &box->stsd, buildStsd, MbxFreeStsd));
     MBX_TRY(buildTables(context, options, segment, box));
+    if (track->auxEnabled != 0 && segment.auxSizes.count != 0) {
+        MBX_TRY(buildAuxiliary(context, options, segment, box));
+    }
     MBX_TRY(buildGroups(context, options, segment, box));
     return MbxMeasureBox(context, options, box, MbxWriteStblPayload);
 }
@@ -96,6 +113,8 @@ MbxStatus MbxWriteStblPayload(MbxContext* context, const MbxOptions* options, Mb
     MBX_TRY(MbxWriteCo64Box(context, options, file, position + count, box->co64, nullptr, &count));
     MBX_TRY(MbxWriteStssBox(context, options, file, position + count, box->stss, nullptr, &count));
     MBX_TRY(MbxWriteSdtpBox(context, options, file, position + count, box->sdtp, nullptr, &count));
+    MBX_TRY(MbxWriteSaioBox(context, nullptr, options, file, position + count, box->saio, nullptr, &count));
+    MBX_TRY(MbxWriteSaizBox(context, nullptr, options, file, position + count, box->saiz, nullptr, &count));
     MBX_TRY(MbxWriteEach(box->sampleGroups.first, position, &count,
                          [&](const MbxSbgpBox* group, uint64_t at, uint64_t* counter) {
                              return MbxWriteSbgpBox(context, nullptr, options, file, at, group, nullptr,
@@ -126,6 +145,8 @@ MbxStatus MbxFreeStbl(MbxContext* context, MbxStblBox* box) {
         MBX_TRY(MbxFreeCo64(context, box->co64));
         MBX_TRY(MbxFreeStss(context, box->stss));
         MBX_TRY(MbxFreeSdtp(context, box->sdtp));
+        MBX_TRY(MbxFreeSaio(context, box->saio));
+        MBX_TRY(MbxFreeSaiz(context, box->saiz));
         MBX_TRY(MbxFreeList(context, &box->sampleGroups, MbxFreeSbgp));
         return MbxFreeList(context, &box->groupDescriptions, MbxFreeSgpd);
     });

@@ -1,6 +1,7 @@
 // `stbl`: what `moov` reports about a track's samples.
 #pragma once
 
+#include "boxlib/auxiliary_information.h"
 #include "boxlib/model.h"
 #include "boxlib/sample_description.h"
 #include "boxlib/sample_group.h"
@@ -18,6 +19,8 @@ struct MbxStblBox {
     MbxCo64Box* co64;
     MbxStssBox* stss;
     MbxSdtpBox* sdtp;
+    MbxSaioBox* saio;  // null without auxiliary information, as is saiz
+    MbxSaizBox* saiz;
     MbxList<MbxSbgpBox> sampleGroups;
     MbxList<MbxSgpdBox> groupDescriptions;
 };

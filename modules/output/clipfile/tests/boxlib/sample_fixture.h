@@ -28,8 +28,13 @@ class SampleTest : public BoxTest {
         MbxTrack* track = &tracks.emplace_back();
         track->header.trackId = static_cast<uint32_t>(tracks.size()) * 10;
         track->mediaHeader.timescale = timescale;
-        MbxListAppend(&track->sampleEntries.entries, &sampleEntries.emplace_back());
-        MbxListAppend(&track->sampleEntries.entries, &sampleEntries.emplace_back());
+        for (int i = 0; i < 2; i++) {
+            MbxSampleEntry* entry = &sampleEntries.emplace_back();
+            entry->kind = MBX_ENTRY_RTMD;
+            entry->code = MbxCode("rtmd");
+            entry->dataReferenceIndex = 1;
+            MbxListAppend(&track->sampleEntries.entries, entry);
+        }
         MbxListAppend(&movie.tracks, track);
         return track;
     }

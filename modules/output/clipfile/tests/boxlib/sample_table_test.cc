@@ -237,6 +237,53 @@ TEST_F(SampleTableTest, OffsetOf2To32IsRefusedInMode0AndOneBelowStaysInStco) {
     EXPECT_EQ(MbxWriteMoov(session, nullptr, 0, &size), MBX_ERR_BAD_STATE);
 }
 
+TEST_F(SampleTableTest, AuxiliaryTablesAndGroupsStandBehindTheTables) {
+    MbxTrack* made = session->movie->tracks.first;
+    made->auxEnabled = 1;
+    const uint8_t bytes[] = {1, 2};
+    MbxSampleInfo sample = {};
+    sample.size = 5;
+    sample.duration = 1000;
+    sample.isSync = 1;
+    sample.descriptionIndex = 1;
+    sample.auxOffset = 0x99;
+    sample.auxSize = 2;
+    sample.auxData = bytes;
+    ASSERT_EQ(MbxAddSample(session, 1, &sample, 0), MBX_OK);
+    ASSERT_EQ(MbxEndChunk(session, 1), MBX_OK);
+    MbxSampleSegment* segment = made->segments.first;
+    MbxSampleGroupParams* group = nullptr;
+    ASSERT_EQ(MbxNew(context, &group), MBX_OK);
+    group->groupingType = MbxCode("tele");
+    group->rows.capacity = 1;
+    ASSERT_EQ(MbxBlockListAppend(context, &group->rows, MbxSampleGroupRow{1, 1}, nullptr), MBX_OK);
+    MbxListAppend(&segment->sampleGroups, group);
+    MbxGroupDescriptionParams* descriptions = nullptr;
+    ASSERT_EQ(MbxNew(context, &descriptions), MBX_OK);
+    descriptions->groupingType = MbxCode("roll");
+    MbxListAppend(&segment->groupDescriptions, descriptions);
+    EXPECT_BYTES(tables(), Hex("00000018 'stts' 00000000 00000001 00000001 000003E8"
+                               "0000001C 'stsc' 00000000 00000001 00000001 00000001 00000001"
+                               "00000014 'stsz' 00000000 00000005 00000001"
+                               "00000014 'stco' 00000000 00000001 00000000"
+                               "00000014 'saio' 00000000 00000001 00000099"
+                               "00000011 'saiz' 00000000 02 00000001"
+                               "0000001C 'sbgp' 00000000 'tele' 00000001 00000001 00000001"
+                               "00000018 'sgpd' 01000000 'roll' 00000000 00000000"));
+    made->auxEnabled = 0;
+    const Bytes code = Hex("'saio'");
+    const Bytes without = tables();
+    EXPECT_EQ(std::search(without.begin(), without.end(), code.begin(), code.end()), without.end());
+}
+
+TEST_F(SampleTableTest, Mode2MakesCo64EvenForSmallOffsets) {
+    session->config.chunk_offset_mode = 2;
+    add(5, 1);
+    ASSERT_EQ(MbxEndChunk(session, 1), MBX_OK);
+    const Bytes all = tables();
+    EXPECT_BYTES(Bytes(all.end() - 24, all.end()), Hex("00000018 'co64' 00000000 00000001 0000000000000030"));
+}
+
 TEST_F(SampleTableTest, FragmentsAreNotReported) {
     add(5, 1);
     ASSERT_EQ(MbxEndChunk(session, 1), MBX_OK);

@@ -1,0 +1,85 @@
+#include "fixture.h"
+#include "track_fixture.h"
+
+namespace {
+
+class SessionFragmentTest : public SessionTest {
+ protected:
+    void SetUp() override {
+        SessionTest::SetUp();
+        config.options.mehd_mode = 1;
+        CreateSession();
+    }
+
+    void createTrack() {
+        ASSERT_EQ(MbxCreateMovie(session, 1000), MBX_OK);
+        const MbxTrackParams params = TrackParams(7, 1000);
+        const MbxMetaEntryParams entry = {1};
+        uint32_t number = 0;
+        ASSERT_EQ(MbxAddMetaTrack(session, &params, &number), MBX_OK);
+        ASSERT_EQ(MbxAddDataReference(session, 1, nullptr, 0, &number), MBX_OK);
+        ASSERT_EQ(MbxAddMetaEntry(session, 1, &entry, &number), MBX_OK);
+    }
+
+    void addChunk(uint64_t offset, uint32_t randomAccess) {
+        MbxSampleInfo sample = {};
+        sample.size = 16;
+        sample.offset = offset;
+        sample.duration = 100;
+        sample.isSync = 1;
+        sample.descriptionIndex = 1;
+        ASSERT_EQ(MbxAddSample(session, 1, &sample, randomAccess), MBX_OK);
+        ASSERT_EQ(MbxEndChunk(session, 1), MBX_OK);
+    }
+
+    uint64_t size = 0;
+};
+
+TEST_F(SessionFragmentTest, EveryOperationRefusesANullSession) {
+    EXPECT_EQ(MbxShiftFragmentOffsets(nullptr, 1, 0, 0, 1), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxSetFragmentBase(nullptr, 1, 0), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxSealFirstFragment(nullptr), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxSealFragment(nullptr), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxReleaseFragment(nullptr, 1), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxWriteMoof(nullptr, &file, 1, 0, &size), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxWriteMfra(nullptr, &file, 0, &size), MBX_ERR_INVALID_ARG);
+}
+
+TEST_F(SessionFragmentTest, EveryOperationNeedsAMovieAndAResult) {
+    EXPECT_EQ(MbxShiftFragmentOffsets(session, 1, 0, 0, 1), MBX_ERR_BAD_STATE);
+    EXPECT_EQ(MbxSetFragmentBase(session, 1, 0), MBX_ERR_BAD_STATE);
+    EXPECT_EQ(MbxSealFirstFragment(session), MBX_ERR_BAD_STATE);
+    EXPECT_EQ(MbxSealFragment(session), MBX_ERR_BAD_STATE);
+    EXPECT_EQ(MbxReleaseFragment(session, 1), MBX_ERR_BAD_STATE);
+    EXPECT_EQ(MbxWriteMoof(session, &file, 1, 0, &size), MBX_ERR_BAD_STATE);
+    EXPECT_EQ(MbxWriteMfra(session, &file, 0, &size), MBX_ERR_BAD_STATE);
+    EXPECT_EQ(MbxWriteMoof(session, &file, 1, 0, nullptr), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxWriteMfra(session, &file, 0, nullptr), MBX_ERR_INVALID_ARG);
+}
+
+TEST_F(SessionFragmentTest, AFragmentIsSealedPlacedWrittenReleasedAndIndexed) {
+    createTrack();
+    addChunk(0, 1);
+    ASSERT_EQ(MbxSealFirstFragment(session), MBX_OK);
+    addChunk(0, 1);
+    ASSERT_EQ(MbxSealFragment(session), MBX_OK);
+    ASSERT_EQ(MbxWriteMoof(session, nullptr, 1, 0, &size), MBX_OK);
+    EXPECT_EQ(size, 76U);
+    ASSERT_EQ(MbxShiftFragmentOffsets(session, 1, 0, 0, 0x100 + 76 + 8), MBX_OK);
+    ASSERT_EQ(MbxSetFragmentBase(session, 1, 0x100), MBX_OK);
+    ASSERT_EQ(MbxWriteMoof(session, &file, 1, 0, &size), MBX_OK);
+    EXPECT_BYTES(file.bytes, Hex("0000004C 'moof'"
+                                 "00000010 'mfhd' 00000000 00000001"
+                                 "00000034 'traf'"
+                                 "00000018 'tfhd' 00000001 00000007 0000000000000154"
+                                 "00000014 'trun' 00000001 00000001 00000000"));
+    ASSERT_EQ(MbxReleaseFragment(session, 1), MBX_OK);
+    MemoryFile index;
+    ASSERT_EQ(MbxWriteMfra(session, &index, 0, &size), MBX_OK);
+    EXPECT_BYTES(index.bytes, Hex("00000043 'mfra'"
+                                  "0000002B 'tfra' 01000000 00000007 00000000 00000001"
+                                  "0000000000000064 0000000000000100 01 01 01"
+                                  "00000010 'mfro' 00000000 00000043"));
+}
+
+}  // namespace
