@@ -11,7 +11,8 @@ namespace clipfileModule {
 /// own.
 struct OutputSettings {
     std::string filePrefix;
-    /// Where the dated directories are made; separated by backslashes.
+    /// Where the dated directories are made. Separated by backslashes when it came as start parameter; a path
+    /// of the settings store stands as it was written.
     std::string outputPath;
     /// Credentials for a network share.
     std::string userName;
