@@ -9,6 +9,7 @@
 #include <thread>
 #include <vector>
 
+#include "support/SchedulePoints.h"
 #include "support/WaitUntil.h"
 
 namespace clipfileModule {
@@ -18,6 +19,13 @@ using IntQueue = BlockingQueue<int, std::queue<int, std::deque<int>>>;
 
 constexpr bool kDrop = true;
 constexpr bool kWait = false;
+
+/// Returns once the thread, which came to `queue` first of all, stands in its wait there.
+void waitUntilInside(const SchedulePoints& points, const std::thread& thread, const IntQueue& queue) {
+    // In front of the lock, and in front of the wait with the lock held.
+    ASSERT_TRUE(points.WaitFor(thread.get_id(), 2));
+    static_cast<void>(queue.Size());
+}
 
 TEST(BlockingQueue, GivesItemsInOrderOfArrival) {
     IntQueue queue(3, kDrop);
@@ -42,15 +50,18 @@ TEST(BlockingQueue, AtCapacityWithDropWhenFullReturnsFalseAndKeepsItsContents) {
 }
 
 TEST(BlockingQueue, PopWaitsForAnItem) {
+    const SchedulePoints points;
     IntQueue queue(1, kDrop);
     int item = 0;
     std::thread consumer([&] { item = queue.Pop(); });
+    waitUntilInside(points, consumer, queue);
     EXPECT_TRUE(queue.Push(7));
     consumer.join();
     EXPECT_EQ(item, 7);
 }
 
 TEST(BlockingQueue, APopFreesExactlyOneWaitingPush) {
+    const SchedulePoints points;
     IntQueue queue(2, kWait);
     ASSERT_TRUE(queue.Push(0));
     ASSERT_TRUE(queue.Push(0));
@@ -62,11 +73,14 @@ TEST(BlockingQueue, APopFreesExactlyOneWaitingPush) {
             ++done;
         });
     }
+    for (const std::thread& producer : producers) {
+        waitUntilInside(points, producer, queue);
+    }
+    EXPECT_EQ(done, 0);
     for (int freed = 1; freed <= 3; ++freed) {
+        EXPECT_EQ(queue.Size(), 2U);
         queue.Pop();
         EXPECT_TRUE(waitUntil([&] { return done == freed; }));
-        // The queue is full again, so no other producer can have come in.
-        EXPECT_EQ(done, freed);
     }
     for (std::thread& producer : producers) {
         producer.join();
@@ -77,6 +91,7 @@ TEST(BlockingQueue, APopFreesExactlyOneWaitingPush) {
 }
 
 TEST(BlockingQueue, ClearWithTheDefaultPredicateEmptiesTheQueueAndFreesEveryWaitingProducer) {
+    const SchedulePoints points;
     IntQueue queue(4, kWait);
     for (int i = 0; i < 4; ++i) {
         ASSERT_TRUE(queue.Push(i));
@@ -88,6 +103,9 @@ TEST(BlockingQueue, ClearWithTheDefaultPredicateEmptiesTheQueueAndFreesEveryWait
             EXPECT_TRUE(queue.Push(9));
             ++done;
         });
+    }
+    for (const std::thread& producer : producers) {
+        waitUntilInside(points, producer, queue);
     }
     queue.Clear();
     EXPECT_TRUE(waitUntil([&] { return done == 3; }));
@@ -122,11 +140,14 @@ TEST(BlockingQueue, ClearWithoutAPredicateThrowsAndLosesNothing) {
 }
 
 TEST(BlockingQueue, CloseFreesWaitingProducersAndConsumers) {
+    const SchedulePoints points;
     IntQueue full(1, kWait);
     ASSERT_TRUE(full.Push(1));
     std::thread producer([&] { EXPECT_FALSE(full.Push(2)); });
     IntQueue empty(1, kWait);
     std::thread consumer([&] { EXPECT_EQ(empty.Pop(), 0); });
+    waitUntilInside(points, producer, full);
+    waitUntilInside(points, consumer, empty);
     full.Close();
     empty.Close();
     producer.join();

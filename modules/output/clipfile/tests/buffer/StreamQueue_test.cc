@@ -4,11 +4,14 @@
 
 #include <atomic>
 #include <condition_variable>
+#include <cstdlib>
 #include <memory>
 #include <mutex>
+#include <system_error>
 #include <thread>
 #include <vector>
 
+#include "support/SchedulePoints.h"
 #include "support/WaitUntil.h"
 
 namespace clipfileModule {
@@ -31,11 +34,18 @@ class Handler {
             std::unique_lock lock(mutex_);
             entered_.push_back(unit->rtp_timestamp);
             changed_.notify_all();
-            changed_.wait(lock, [this] { return !held_; });
+            changed_.wait(lock, [this] { return !held_ || passes_ > 0; });
+            passes_ -= held_ ? 1 : 0;
         };
     }
     void Hold() { set(true); }
     void Release() { set(false); }
+    /// Lets one unit out of the handler.
+    void ReleaseOne() {
+        const std::lock_guard lock(mutex_);
+        ++passes_;
+        changed_.notify_all();
+    }
     void WaitForEntries(std::size_t count) {
         std::unique_lock lock(mutex_);
         changed_.wait(lock, [&] { return entered_.size() >= count; });
@@ -56,7 +66,19 @@ class Handler {
     std::condition_variable changed_;
     std::vector<std::uint64_t> entered_;
     bool held_ = false;
+    int passes_ = 0;
 };
+
+/// Holds the worker in the handler with unit 0 and fills the queue behind it with the next units.
+void fillBehindHeldWorker(StreamQueue& queue, Handler& handler) {
+    handler.Hold();
+    queue.Start(handler.Function());
+    ASSERT_TRUE(queue.queue.Push(makeUnit(0)));
+    handler.WaitForEntries(1);
+    for (std::uint64_t i = 1; i <= kCapacity; ++i) {
+        ASSERT_TRUE(queue.queue.Push(makeUnit(i)));
+    }
+}
 
 TEST(StreamQueue, HandsUnitsToTheHandlerInOrder) {
     Handler handler;
@@ -74,26 +96,33 @@ TEST(StreamQueue, HandsUnitsToTheHandlerInOrder) {
     }
 }
 
-TEST(StreamQueue, AtCapacityBlocksItsProducerUntilTheNextPop) {
+TEST(StreamQueue, AtCapacityBlocksItsProducersAndTheNextPopFreesExactlyOne) {
+    const SchedulePoints points;
     Handler handler;
-    handler.Hold();
     StreamQueue queue(kCapacity, false);
-    queue.Start(handler.Function());
-    ASSERT_TRUE(queue.queue.Push(makeUnit(0)));
-    handler.WaitForEntries(1);
-    for (std::uint64_t i = 1; i <= kCapacity; ++i) {
-        ASSERT_TRUE(queue.queue.Push(makeUnit(i)));
-    }
-    std::atomic<bool> pushed = false;
-    std::thread producer([&] {
+    fillBehindHeldWorker(queue, handler);
+    std::atomic<int> pushed = 0;
+    const auto push = [&] {
         EXPECT_TRUE(queue.queue.Push(makeUnit(kCapacity + 1)));
-        pushed = true;
-    });
-    EXPECT_FALSE(pushed);
+        ++pushed;
+    };
+    std::thread one(push);
+    std::thread other(push);
+    // In front of the lock, and in front of the wait: with the lock free both are inside.
+    ASSERT_TRUE(points.WaitFor(one.get_id(), 2));
+    ASSERT_TRUE(points.WaitFor(other.get_id(), 2));
+    EXPECT_EQ(queue.queue.Size(), kCapacity);
+    EXPECT_EQ(pushed, 0);
+    handler.ReleaseOne();
+    handler.WaitForEntries(2);
+    EXPECT_TRUE(waitUntil([&] { return pushed == 1; }));
+    EXPECT_EQ(queue.queue.Size(), kCapacity);
+    EXPECT_EQ(pushed, 1);
     handler.Release();
-    producer.join();
-    EXPECT_TRUE(pushed);
-    handler.WaitForEntries(kCapacity + 2);
+    one.join();
+    other.join();
+    EXPECT_EQ(pushed, 2);
+    handler.WaitForEntries(kCapacity + 3);
     queue.Stop();
 }
 
@@ -125,16 +154,13 @@ TEST(StreamQueue, StopReturnsAlthoughUnitsRemain) {
 }
 
 TEST(StreamQueue, StopReturnsWithAFullQueueAndAProducerBlockedInPush) {
+    const SchedulePoints points;
     Handler handler;
-    handler.Hold();
     StreamQueue queue(kCapacity, false);
-    queue.Start(handler.Function());
-    ASSERT_TRUE(queue.queue.Push(makeUnit(0)));
-    handler.WaitForEntries(1);
-    for (std::uint64_t i = 1; i <= kCapacity; ++i) {
-        ASSERT_TRUE(queue.queue.Push(makeUnit(i)));
-    }
+    fillBehindHeldWorker(queue, handler);
     std::thread producer([&] { EXPECT_FALSE(queue.queue.Push(makeUnit(kCapacity + 1))); });
+    ASSERT_TRUE(points.WaitFor(producer.get_id(), 2));
+    EXPECT_EQ(queue.queue.Size(), kCapacity);
     std::thread stopper([&] { queue.Stop(); });
     producer.join();
     handler.Release();
@@ -148,6 +174,37 @@ TEST(StreamQueue, StopOfAnIdleWorkerEndsIt) {
         queue.Start([](std::shared_ptr<StreamData>&) {});
         queue.Stop();
     }
+}
+
+// In a process of its own, which ends without a second join: the thread sanitizer knows a thread no more once
+// a join of it was tried.
+TEST(StreamQueueDeathTest, StopOnItsOwnWorkerCannotJoinAndThrowsTheSystemError) {
+    GTEST_FLAG_SET(death_test_style, "threadsafe");
+    EXPECT_EXIT(
+        {
+            StreamQueue queue(kCapacity, false);
+            std::atomic<bool> thrown = false;
+            queue.Start([&](std::shared_ptr<StreamData>&) {
+                try {
+                    queue.Stop();
+                } catch (const std::system_error&) {
+                    thrown = true;
+                }
+            });
+            queue.queue.Push(makeUnit(1));
+            std::_Exit(waitUntil([&] { return thrown.load(); }) ? 0 : 1);
+        },
+        testing::ExitedWithCode(0), "");
+}
+
+TEST(StreamQueueDeathTest, DestructionWithoutAStopEndsTheProcess) {
+    GTEST_FLAG_SET(death_test_style, "threadsafe");
+    EXPECT_DEATH(
+        {
+            StreamQueue queue(kCapacity, false);
+            queue.Start([](std::shared_ptr<StreamData>&) {});
+        },
+        "terminate called");
 }
 
 TEST(StreamQueue, StopBeforeAnyStartHasNothingToJoin) {

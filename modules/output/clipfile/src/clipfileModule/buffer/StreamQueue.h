@@ -30,7 +30,8 @@ class StreamQueue {
     /// not 0. Throws `std::system_error` when no thread can be started.
     void Start(std::function<void(std::shared_ptr<StreamData>&)> handler);
     /// Ends and joins the worker. Units that still wait are not handled. Returns also when the queue is full,
-    /// when producers wait in `Push` (their pushes then fail) and when there is no worker.
+    /// when producers wait in `Push` (their pushes then fail) and when there is no worker. Throws
+    /// `std::system_error` when the worker cannot be joined, as by itself.
     void Stop();
 
     /// Producers push here directly.
