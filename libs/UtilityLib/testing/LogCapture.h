@@ -144,9 +144,10 @@ class LogCapture {
         return Count(priority, function, text) > 0;
     }
     /// The first line with this text.
-    std::optional<CapturedLine> Find(std::string_view text) const {
+    std::optional<CapturedLine> Find(std::string_view text) const { return FindIf(HasText(text)); }
+    std::optional<CapturedLine> FindIf(const std::function<bool(const CapturedLine&)>& matches) const {
         const auto lines = Lines();
-        const auto found = std::find_if(lines.begin(), lines.end(), HasText(text));
+        const auto found = std::find_if(lines.begin(), lines.end(), matches);
         return found == lines.end() ? std::nullopt : std::optional(*found);
     }
 

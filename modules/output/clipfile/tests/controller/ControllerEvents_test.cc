@@ -11,6 +11,7 @@
 #include "support/ControllerPeer.h"
 #include "support/FakeHost.h"
 #include "support/FakeRegistry.h"
+#include "support/SchedulePoints.h"
 #include "support/SettleEventLoop.h"
 #include "support/WaitUntil.h"
 
@@ -75,10 +76,10 @@ TEST_F(ControllerEventsTest, APostIsLoggedOnBothSides) {
     }
     std::vector<std::string> loop;
     for (const CapturedLine& line : log_.Lines()) {
+        EXPECT_EQ(line.priority, LOG_PRIORITY_TRACE) << line;
+        EXPECT_EQ(line.file, kFile) << line;
         // The loop itself may pass once more, for a signal of the set-up that came late.
         if (line.function != functionName("PostEvent") && line.function != functionName("EventLoop")) {
-            EXPECT_EQ(line.priority, LOG_PRIORITY_TRACE) << line;
-            EXPECT_EQ(line.file, kFile) << line;
             loop.push_back(line.function->substr(functionName("").size()) + " " + line.text);
         }
     }
@@ -182,6 +183,17 @@ TEST_F(ControllerEventsTest, EachOfManySinglePostsWakesTheLoop) {
     }
 }
 
+TEST_F(ControllerEventsTest, APostBetweenTheLastTestOfTheQueueAndTheWaitIsNotLost) {
+    auto gate = log_.BlockAtText("end. no event.");
+    controller_.PostEvent(makeStatusEvent("drained"));
+    ASSERT_TRUE(gate.WaitReached());
+    // The event thread has seen an empty queue and has not come to its wait.
+    controller_.PostEvent(makeStatusEvent("in between"));
+    gate.Release();
+    ASSERT_TRUE(WaitForValues(2));
+    EXPECT_EQ(Values(), (std::vector<std::string>{"drained", "in between"}));
+}
+
 TEST_F(ControllerEventsTest, ATerminateEventThatRunsStopsBufferingAndEndsTheLoop) {
     controller_.PostEvent(std::make_shared<TerminateEvent>());
     ASSERT_TRUE(host_.WaitForStatus({3, 0}));
@@ -210,6 +222,24 @@ TEST_F(ControllerEventsTest, TheDrainRunsWhatWaitsAlsoAfterTerminate) {
     EXPECT_EQ(Values(), (std::vector<std::string>{"running", "behind the end"}));
 }
 
+/// The test ends the controller itself.
+class ControllerEndTest : public ControllerEventsTest {
+ protected:
+    void TearDown() override {}
+};
+
+TEST_F(ControllerEndTest, UninitializeEndsAThreadThatStandsBetweenItsLastTestAndTheWait) {
+    auto gate = log_.BlockAtText("end. no event.");
+    controller_.PostEvent(makeStatusEvent("drained"));
+    ASSERT_TRUE(gate.WaitReached());
+    std::thread ender([&] { controller_.Uninitialize(); });
+    ASSERT_TRUE(log_.WaitForText("start join..."));
+    gate.Release();
+    ender.join();
+    EXPECT_EQ(host_.Statuses().size(), 0U);
+    EXPECT_EQ(peer_.WaitingEvents(), 0U);
+}
+
 /// The event thread is held before it reaches its first wait.
 class ControllerFirstWaitTest : public testing::Test {
  protected:
@@ -226,23 +256,21 @@ class ControllerFirstWaitTest : public testing::Test {
 };
 
 TEST_F(ControllerFirstWaitTest, TheFirstExecuteBeforeTheWaitIsDeliveredOnlyAtTheNextPost) {
+    const SchedulePoints points;
     ASSERT_TRUE(controller_.Initialize(&host_));
     ASSERT_TRUE(gate_.WaitReached());
+    const auto eventThread =
+        log_.FindIf([](const CapturedLine& line) { return line.function == functionName("EventLoop"); });
     controller_.Execute();
     gate_.Release();
-    // The thread may be anywhere between the gate and its wait; a post that it does not see in the wait
-    // changes nothing, so nothing is delivered before one does.
-    EXPECT_EQ(host_.Transmissions().size(), 0U);
-    std::size_t posts = 1;
-    ASSERT_TRUE(waitUntil([&] {
-        if (host_.Transmissions().empty()) {
-            controller_.PostEvent(makeStatusEvent("next"));
-            ++posts;
-        }
-        return !host_.Transmissions().empty();
-    }));
-    EXPECT_GE(posts, 2U);
-    ASSERT_TRUE(host_.WaitForTransmissions(posts));
+    // In front of the lock, and in front of the wait; that the events can be counted means that the thread
+    // has given the lock back and is inside.
+    ASSERT_TRUE(points.WaitFor(eventThread->thread, 2));
+    EXPECT_EQ(peer_.WaitingEvents(), 1U);
+    EXPECT_EQ(
+        log_.CountIf([](const CapturedLine& line) { return line.function == functionName("getEvent"); }), 0U);
+    controller_.PostEvent(makeStatusEvent("next"));
+    ASSERT_TRUE(host_.WaitForTransmissions(2));
     EXPECT_EQ(host_.Transmissions()[0].at("file_output_status"), "standby");
     EXPECT_EQ(host_.Transmissions()[1].at("file_output_status"), "next");
     controller_.Uninitialize();
