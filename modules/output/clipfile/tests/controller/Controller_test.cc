@@ -16,7 +16,7 @@
 namespace clipfileModule {
 namespace {
 
-const std::string kFile = "modules/output/clipfile/src/clipfileModule/controller/Controller.cc";
+const std::string kFolder = "modules/output/clipfile/src/clipfileModule/controller/";
 
 /// A controller that has not been initialised, its host and its settings store.
 class ControllerTest : public testing::Test {
@@ -38,11 +38,16 @@ class ControllerTest : public testing::Test {
         controller_.Uninitialize();
         running_ = false;
     }
-    /// Texts of the lines that `function` logged, in order.
-    std::vector<std::string> TextsOf(const std::string& function) {
+    /// Texts of the lines that `function` logged, in order, each checked for priority and source.
+    std::vector<std::string> TextsOf(const std::string& function, const std::string& file = "Controller.cc") {
         std::vector<std::string> texts;
         for (const CapturedLine& line : log_.Lines()) {
             if (line.function == "clipfileModule::Controller::" + function) {
+                EXPECT_EQ(line.priority, line.text == "get max file size failed." ? LOG_PRIORITY_WARNING
+                                                                                  : LOG_PRIORITY_TRACE)
+                    << line;
+                EXPECT_EQ(line.file, kFolder + file) << line;
+                EXPECT_GT(line.line, 0) << line;
                 texts.push_back(line.text);
             }
         }
@@ -68,7 +73,7 @@ TEST_F(ControllerTest, WithoutAnyOutputPathInitializeFailsWithStatus7Cause2AndNo
     const auto line = log_.Find("end. file output path is none.");
     ASSERT_TRUE(line);
     EXPECT_EQ(line->priority, LOG_PRIORITY_ERROR);
-    EXPECT_EQ(line->file, kFile);
+    EXPECT_EQ(line->file, kFolder + "Controller.cc");
     EXPECT_EQ(line->function, "clipfileModule::Controller::Initialize");
 }
 
@@ -107,8 +112,6 @@ TEST_F(ControllerTest, WithoutAMaximalFileSizeItIs120AndInitializeGoesOn) {
     EXPECT_EQ(
         TextsOf("getStaticConfig"),
         (std::vector<std::string>{"get max file size failed.", "max filesize = 120.", "end. result = 1."}));
-    EXPECT_TRUE(log_.Contains(LOG_PRIORITY_WARNING, "clipfileModule::Controller::getStaticConfig",
-                              "get max file size failed."));
 }
 
 TEST_F(ControllerTest, TheStoredMaximalFileSizeIsTaken) {
@@ -118,6 +121,17 @@ TEST_F(ControllerTest, TheStoredMaximalFileSizeIsTaken) {
     EXPECT_EQ(peer_.Settings().maxFileSize, 4294967295U);
     EXPECT_EQ(TextsOf("getStaticConfig"),
               (std::vector<std::string>{"max filesize = 4294967295.", "end. result = 1."}));
+}
+
+TEST_F(ControllerTest, TheStoreIsAskedForTextsInKeyOrderAndThenForTheNumber) {
+    registry_.Set("MP4OutputPath", "a");
+    ASSERT_TRUE(Initialize());
+    EXPECT_EQ(registry_.AskedKeys(), (std::vector<std::string>{
+                                         "Qx/Other/MP4FileOut/MP4AuthPassword",
+                                         "Qx/Other/MP4FileOut/MP4AuthUserName",
+                                         "Qx/Other/MP4FileOut/MP4OutputPath",
+                                         "Qx/Other/MP4FileOut/MP4MaxFileSize",
+                                     }));
 }
 
 TEST_F(ControllerTest, StartParametersHaveTheirDefaults) {
@@ -181,13 +195,6 @@ TEST_F(ControllerTest, InitializeLogsItsWay) {
               (std::vector<std::string>{"start.", "file output path = a.", "fileType   = normal.",
                                         "naluType   = normal.", "outputMode = on.", "count = 0.",
                                         "count = 1.", "count = 2.", "end."}));
-    for (const CapturedLine& line : log_.Lines()) {
-        if (line.function == "clipfileModule::Controller::Initialize") {
-            EXPECT_EQ(line.priority, LOG_PRIORITY_TRACE) << line;
-            EXPECT_EQ(line.file, kFile) << line;
-            EXPECT_GT(line.line, 0) << line;
-        }
-    }
 }
 
 TEST_F(ControllerTest, InitializeStartsFourThreadsAndUninitializeEndsThem) {
@@ -221,7 +228,7 @@ TEST_F(ControllerTest, UninitializeLogsItsWay) {
     Uninitialize();
     EXPECT_EQ(TextsOf("Uninitialize"),
               (std::vector<std::string>{"start.", "start join...", "end join", "end."}));
-    EXPECT_EQ(TextsOf("queueing"),
+    EXPECT_EQ(TextsOf("queueing", "ControllerStream.cc"),
               (std::vector<std::string>{"start.", "start.", "start.", "end.", "end.", "end."}));
 }
 

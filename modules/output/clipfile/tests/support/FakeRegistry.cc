@@ -10,6 +10,7 @@ struct Store {
     std::mutex mutex;
     std::map<std::string, std::string> texts;
     std::map<std::string, unsigned int> numbers;
+    std::vector<std::string> asked;
 };
 
 Store& store() {
@@ -20,6 +21,7 @@ Store& store() {
 template <typename Value>
 bool find(const std::map<std::string, Value>& values, const std::string& section, const std::string& key,
           Value& value) {
+    store().asked.push_back(section + "/" + key);
     const auto found = values.find(key);
     if (section != "Qx/Other/MP4FileOut" || found == values.end()) {
         return false;
@@ -44,6 +46,12 @@ void FakeRegistry::Clear() {
     const std::lock_guard lock(store().mutex);
     store().texts.clear();
     store().numbers.clear();
+    store().asked.clear();
+}
+
+std::vector<std::string> FakeRegistry::AskedKeys() const {
+    const std::lock_guard lock(store().mutex);
+    return store().asked;
 }
 
 QxRegistry* QxRegistry::GetInstance() {
