@@ -15,6 +15,7 @@
 #include "support/FakeHost.h"
 #include "support/FakeRegistry.h"
 #include "support/FileOutputRecorder.h"
+#include "support/HeldQueueThreads.h"
 #include "support/SettleEventLoop.h"
 #include "support/StreamUnits.h"
 #include "support/WaitUntil.h"
@@ -67,6 +68,19 @@ class ControllerStreamTest : public testing::Test {
             const auto sent = host_.Transmissions();
             return std::find(sent.begin(), sent.end(), behind) != sent.end();
         }));
+    }
+    /// Puts two units into each queue, whose threads are held.
+    void FillQueues() {
+        for (const std::size_t queue : {kVideo, kAudio, kMeta}) {
+            ASSERT_TRUE(peer_.Queue(queue).Push(MetaUnit(2, 180, 2, recFlag(true))));
+            ASSERT_TRUE(peer_.Queue(queue).Push(MetaUnit(3, 270, 3, recFlag(true))));
+            ASSERT_EQ(peer_.Queue(queue).Size(), 2U);
+        }
+    }
+    void ExpectEmptyQueues() {
+        for (const std::size_t queue : {kVideo, kAudio, kMeta}) {
+            EXPECT_EQ(peer_.Queue(queue).Size(), 0U);
+        }
     }
     /// Pushes metadata units and waits until the last of them was handed to the recordings.
     void PushMeta(const std::shared_ptr<StreamData>& unit) {
@@ -136,9 +150,7 @@ TEST_F(ControllerStreamTest, PushReservedHasNoEffectOnAnyQueue) {
     const auto unit = MetaUnit(1, 90, 1);
     controller_.PushReserved(unit);
     EXPECT_EQ(unit.use_count(), 1);
-    for (const std::size_t queue : {kVideo, kAudio, kMeta}) {
-        EXPECT_EQ(peer_.Queue(queue).Size(), 0U);
-    }
+    ExpectEmptyQueues();
 }
 
 TEST_F(ControllerStreamTest, The51stUnitOfAHeldUpQueueIsRefusedAndLoggedAndThe50BeforeArriveInOrder) {
@@ -308,8 +320,10 @@ TEST_F(ControllerStreamTest, AStartLeavesTheStopOfAClosedRecordingAlone) {
 TEST_F(ControllerStreamTest, AnyOtherOutputModeRecordsNothingAndNeverReadsTheFlag) {
     for (const char* mode : {"off", "", "ON", "Sync"}) {
         Run(mode);
-        controller_.PushMeta(MetaUnit(1, 180000, 2000, recFlag(true)));
-        ASSERT_TRUE(waitUntil([&] { return peer_.Queue(kMeta).Size() == 0; }));
+        const auto unit = MetaUnit(1, 180000, 2000, recFlag(true));
+        controller_.PushMeta(unit);
+        // The metadata thread has let go of it.
+        ASSERT_TRUE(waitUntil([&] { return unit.use_count() == 1; }));
         controller_.BufferingStart();
         EXPECT_TRUE(Recordings().empty()) << mode;
         EXPECT_TRUE(RecordLines().empty()) << mode;
@@ -320,8 +334,9 @@ TEST_F(ControllerStreamTest, AnyOtherOutputModeRecordsNothingAndNeverReadsTheFla
 
 TEST_F(ControllerStreamTest, InOnModeTheFlagIsNotRead) {
     Run("on");
-    controller_.PushMeta(MetaUnit(1, 180000, 2000, recFlag(true)));
-    ASSERT_TRUE(waitUntil([&] { return peer_.Queue(kMeta).Size() == 0; }));
+    const auto unit = MetaUnit(1, 180000, 2000, recFlag(true));
+    controller_.PushMeta(unit);
+    ASSERT_TRUE(waitUntil([&] { return unit.use_count() == 1; }));
     EXPECT_TRUE(RecordLines().empty());
 }
 
@@ -400,26 +415,16 @@ TEST_F(ControllerStreamTest, BufferingStopStopsEveryRecordingKeepsTheListAndFlus
     PushMeta(MetaUnit(1, 90, 1, recFlag(true)));
     log_.Clear();
     {
-        // One unit stands in front of the recordings, and one waits in each queue.
-        MutexLock held(peer_.StreamBuffersMutex());
-        for (const std::size_t queue : {kVideo, kAudio, kMeta}) {
-            ASSERT_TRUE(peer_.Queue(queue).Push(MetaUnit(2, 180, 2, recFlag(true))));
-            ASSERT_TRUE(waitUntil([&] { return peer_.Queue(queue).Size() == 0; }));
-            ASSERT_TRUE(peer_.Queue(queue).Push(MetaUnit(3, 270, 3, recFlag(true))));
-        }
-        // The flush happens outside the lock, so this test lets the stop come first: the log line tells.
-        std::thread stopper([&] { controller_.BufferingStop(); });
-        EXPECT_TRUE(log_.WaitForText("stream buffering stop."));
-        held.Unlock();
-        stopper.join();
+        HeldQueueThreads held(peer_);
+        ASSERT_TRUE(held.WaitReached());
+        FillQueues();
+        controller_.BufferingStop();
+        ExpectEmptyQueues();
     }
     EXPECT_EQ(TextsOf("BufferingStop"), (Texts{"start.", "stream buffering stop.", "end."}));
     EXPECT_EQ(host_.Statuses(), (std::vector<FakeHost::Status>{{3, 0}}));
     EXPECT_EQ(peer_.StreamBuffers().size(), 1U);
     EXPECT_EQ(log_.Count("OP: CHANGE STATE wait_state -> stop."), 1U);
-    for (const std::size_t queue : {kVideo, kAudio, kMeta}) {
-        EXPECT_EQ(peer_.Queue(queue).Size(), 0U);
-    }
 }
 
 // Events of recordings.
@@ -430,7 +435,13 @@ TEST_F(ControllerStreamTest, ARestartStopsAndStartsTheRecordingAndFlushesTheQueu
     RunEvent(std::make_shared<StopStreamingEvent>(MetaUnit(2, 900, 10)));
     log_.Clear();
     const auto buffer = peer_.StreamBuffers().at(0);
-    RunEvent(std::make_shared<RestartStreamingEvent>(buffer));
+    {
+        HeldQueueThreads held(peer_);
+        ASSERT_TRUE(held.WaitReached());
+        FillQueues();
+        RunEvent(std::make_shared<RestartStreamingEvent>(buffer));
+        ExpectEmptyQueues();
+    }
     EXPECT_EQ(RecordLines(), Texts{"OP: REC RESTART. RTPTS = 90 -> 900."});
     EXPECT_EQ(log_.Count("OP: CHANGE STATE wait_state -> stop."), 1U);
     EXPECT_EQ(log_.Count("OP: CHANGE STATE stop -> wait_state."), 1U);
@@ -442,23 +453,14 @@ TEST_F(ControllerStreamTest, ARestartFlushesTheQueuesAlsoWhenTheRecordingHasLeft
     Run("sync");
     const auto stranger = std::make_shared<StreamBuffer>(&controller_, 5, 6);
     {
-        auto gate = log_.BlockAt(
-            [](const CapturedLine& line) { return line.text.rfind("OP: REC RESTART.", 0) == 0; });
-        controller_.PostEvent(std::make_shared<RestartStreamingEvent>(stranger));
-        ASSERT_TRUE(gate.WaitReached());
-        MutexLock held(peer_.StreamBuffersMutex());
-        for (const std::size_t queue : {kVideo, kAudio}) {
-            ASSERT_TRUE(peer_.Queue(queue).Push(MetaUnit(2, 180, 2)));
-            ASSERT_TRUE(waitUntil([&] { return peer_.Queue(queue).Size() == 0; }));
-            ASSERT_TRUE(peer_.Queue(queue).Push(MetaUnit(3, 270, 3)));
-        }
-        gate.Release();
+        HeldQueueThreads held(peer_);
+        ASSERT_TRUE(held.WaitReached());
+        FillQueues();
+        RunEvent(std::make_shared<RestartStreamingEvent>(stranger));
+        ExpectEmptyQueues();
     }
-    ASSERT_TRUE(waitUntil([&] { return CountLines("OnRetartStream", "end.") == 1; }));
-    EXPECT_TRUE(log_.Contains("OP: REC RESTART. RTPTS = 5 -> 6."));
-    for (const std::size_t queue : {kVideo, kAudio, kMeta}) {
-        EXPECT_EQ(peer_.Queue(queue).Size(), 0U);
-    }
+    EXPECT_EQ(RecordLines(), Texts{"OP: REC RESTART. RTPTS = 5 -> 6."});
+    EXPECT_EQ(TextsOf("OnRetartStream"), (Texts{"start.", "end."}));
     EXPECT_EQ(log_.CountIf([](const CapturedLine& line) { return line.text.rfind("OP: CHANGE", 0) == 0; }),
               0U);
 }
