@@ -14,8 +14,9 @@ namespace clipfileModule {
 /// Returns true once the event thread of a running controller answers posts and has ended the drain of the
 /// last one: behind that it waits. `log` must have captured the controller's life, and nobody else may post.
 [[nodiscard]] inline bool settleEventLoop(Controller& controller, FakeHost& host, const LogCapture& log) {
-    // An event that is posted before the thread first waits lies until the next post.
-    const FakeHost::StatusMap settled = {{"settled", std::to_string(log.Lines().size())}};
+    // An event that is posted before the thread first waits lies until the next post. The number sets this
+    // status apart from those of earlier lives with the same host.
+    const FakeHost::StatusMap settled = {{"settled", std::to_string(host.Transmissions().size())}};
     const auto isDelivered = [&] {
         const auto sent = host.Transmissions();
         return std::find(sent.begin(), sent.end(), settled) != sent.end();
