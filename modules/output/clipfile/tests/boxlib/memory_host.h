@@ -39,6 +39,7 @@ class MemoryHost {
     std::map<void*, uint64_t> live;  // blocks not yet freed, with their sizes
     uint64_t liveBytes = 0;
     uint64_t peakBytes = 0;
+    std::vector<uint64_t> peaks;  // every value that peakBytes took
 
     MbxCallbacks callbacks() {
         return {
@@ -101,7 +102,10 @@ class MemoryHost {
         std::memset(block, 0xCD, size);  // whoever forgets to clear is found out
         host->live[block] = size;
         host->liveBytes += size;
-        host->peakBytes = std::max(host->peakBytes, host->liveBytes);
+        if (host->liveBytes > host->peakBytes) {
+            host->peakBytes = host->liveBytes;
+            host->peaks.push_back(host->peakBytes);
+        }
         return block;
     }
 
