@@ -8,6 +8,7 @@
 MbxStatus MbxBuildTkhd(MbxContext* context, const MbxOptions* options, const MbxTrackInMovie* track,
                        MbxTkhdBox* box) {
     if (MbxAnyNull(context, options, track, box)) return MBX_ERR_INVALID_ARG;
+    if (track->track->header.flags > 0xFFFFFF) return MBX_ERR_INVALID_ARG;
     box->values = track->track->header;
     if ((box->values.fieldsSet & MBX_TRACK_DURATION) == 0) {
         MBX_TRY(MbxComputeTrackDuration(track, &box->values.duration));

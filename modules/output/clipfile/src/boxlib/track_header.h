@@ -39,7 +39,7 @@ struct MbxTrackInMovie {
     uint32_t movieTimescale;  // ticks per second
 };
 
-// The duration is computed unless it was given.
+// The duration is computed unless it was given. MBX_ERR_INVALID_ARG for flags above 24 bits.
 MbxStatus MbxBuildTkhd(MbxContext* context, const MbxOptions* options, const MbxTrackInMovie* track,
                        MbxTkhdBox* box);
 MbxStatus MbxWriteTkhdPayload(MbxContext* context, MbxFile* file, uint64_t position, const MbxTkhdBox* box,

@@ -169,6 +169,17 @@ TEST_F(TrackHeaderTest, Version1HasWideTimes) {
                      kMatrix + Hex("07800000 04388000"));
 }
 
+TEST_F(TrackHeaderTest, FlagsAbove24BitsAreRefused) {
+    const MbxTrackInMovie inMovie = {&own, 1000};
+    MbxTkhdBox box = {};
+    own.header.flags = 0xFFFFFF;
+    ASSERT_EQ(MbxBuildTkhd(context, &options, &inMovie, &box), MBX_OK);
+    EXPECT_EQ(MbxWriteTkhdBox(context, &options, &file, 0, &box, nullptr, nullptr), MBX_OK);
+    EXPECT_BYTES(Bytes(file.bytes.begin() + 8, file.bytes.begin() + 12), Hex("00 FFFFFF"));
+    own.header.flags = 0x1000000;
+    EXPECT_EQ(MbxBuildTkhd(context, &options, &inMovie, &box), MBX_ERR_INVALID_ARG);
+}
+
 TEST_F(TrackHeaderTest, GivenDurationIsNotComputed) {
     own.header.fieldsSet |= MBX_TRACK_DURATION;
     segment.decodeDuration = UINT64_MAX;
