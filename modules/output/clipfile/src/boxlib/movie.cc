@@ -193,6 +193,7 @@ MbxStatus MbxFreeMovie(MbxContext* context, MbxMovie* movie) {
         MBX_TRY(MbxFreeList(context, &movie->tracks, MbxFreeTrack));
         MBX_TRY(MbxFreeIodsParams(context, movie->iods));
         MBX_TRY(MbxFreeList(context, &movie->pssh, MbxFreePsshParams));
+        MBX_TRY(MbxFreeLevels(context, movie));
         return MbxReleaseUserMetadata(context, &movie->userMetadata);
     });
 }

@@ -1,5 +1,6 @@
 #include "boxlib/movie_extends.h"
 
+#include "boxlib/movie.h"
 #include "registry.h"
 #include "sample_fixture.h"
 
@@ -208,6 +209,17 @@ TEST_F(MovieExtendsTest, LevaCutsACountAboveItsByteAndRefusesOneAbove65535) {
 }
 
 TEST_F(MovieExtendsTest, LevelsAreReleasedWithTheMovie) {
+    MbxMovie* owner = nullptr;
+    MbxLevel* level = nullptr;
+    const size_t before = host.live.size();
+    ASSERT_EQ(MbxNewMovie(context, 1000, &owner), MBX_OK);
+    ASSERT_EQ(MbxNew(context, &level), MBX_OK);
+    MbxListAppend(&owner->levels, level);
+    EXPECT_EQ(MbxFreeMovie(context, owner), MBX_OK);
+    EXPECT_EQ(host.live.size(), before);
+}
+
+TEST_F(MovieExtendsTest, FreeingLevelsIsSafeTwice) {
     MbxLevel* level = nullptr;
     ASSERT_EQ(MbxNew(context, &level), MBX_OK);
     MbxListAppend(&movie.levels, level);
