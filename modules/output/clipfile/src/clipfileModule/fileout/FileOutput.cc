@@ -1,44 +1,237 @@
 #include "fileout/FileOutput.h"
 
+#include <chrono>
+#include <map>
+#include <mutex>
+#include <utility>
+
 #include "common/Log.h"
+#include "controller/Event.h"
+#include "controller/Status.h"
+#include "fileout/FileOutputWork.h"
 
 namespace clipfileModule {
 
-FileOutput::FileOutput() = default;
+namespace {
+
+/// How long `Stop` waits for the thread.
+constexpr std::chrono::milliseconds stopWaitMilliSec(3500);
+/// How long it then waits for a call of the controller that the thread may be in.
+constexpr std::chrono::milliseconds kOwnerCallWait(500);
+
+}  // namespace
+
+FileOutput::FileOutput() : work(std::make_shared<Work>(nullptr, nullptr, std::string())) {}
 
 FileOutput::~FileOutput() = default;
 
 bool FileOutput::Initialize(ControllerInterface* owner, StreamBufferInterface* streamBuffer,
                             const std::string& fileType) {
+    CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "start.");
     controller = owner;
     buffer = streamBuffer;
     type = fileType;
-    // There is no muxer of any type yet, so nothing may look as if it recorded.
-    CLIPFILE_LOG(LOG_PRIORITY_ERROR, "mp4 file initialize error.");
-    controller->SetStatus(7, 2);
-    return false;
+    work = std::make_shared<Work>(owner, streamBuffer, fileType);
+    const bool result = createMp4FileObject(*work);
+    CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "end. func_result = %d.", result ? 1 : 0);
+    return result;
 }
 
 bool FileOutput::Uninitialize() {
+    CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "start.");
+    work->running = false;
+    leaveWork();
+    while (!deleteMp4FileObject(*work)) {
+    }
+    CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "end. func_result = %d.", 1);
     return true;
 }
 
 void FileOutput::Start(const OutputSettings& outputSettings) {
-    settings = outputSettings;
-    MutexLock lock(chunkMutex);
-    chunks.clear();
+    CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "start.");
+    leaveWork();
+    work->settings = outputSettings;
+    work->lastChunk.reset();
+    work->writtenVideoSamples = 0;
+    work->threadLock = std::make_shared<RecursiveTimedMutex>();
+    MutexLock lock(work->chunkMutex);
+    work->chunks.clear();
+    work->started = false;
+    work->running = true;
+    thread = std::make_shared<std::thread>([shared = work] { outputThread(*shared); });
+    // A `Stop` that took the lock of the thread before the thread does would wait for it for ever.
+    while (!work->started) {
+        lock.Wait(work->chunkCondition);
+    }
+    CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "end.");
 }
 
 void FileOutput::Stop() {
-    MutexLock lock(chunkMutex);
-    chunks.clear();
+    CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "start.");
+    {
+        // Either the thread sees the flag before it waits, or it waits and gets the signal below.
+        MutexLock lock(work->chunkMutex);
+        work->running = false;
+    }
+    if (thread == nullptr) {
+        CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "end.");
+        return;
+    }
+    work->chunkCondition.notify_one();
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "wait thread start...");
+    std::unique_lock lock(*work->threadLock, std::chrono::steady_clock::now() + stopWaitMilliSec);
+    if (lock.owns_lock()) {
+        if (thread->joinable()) {
+            thread->join();
+        }
+        lock.unlock();
+    } else {
+        work->owner.Cut(kOwnerCallWait);
+        CLIPFILE_LOG(LOG_PRIORITY_TRACE, "wait thread timeout...");
+        controller->SetStatus(kStatusFailed, kCauseFileClose);
+        GetPlatform().GiveUp(*thread);
+        thread.reset();
+        CLIPFILE_LOG(LOG_PRIORITY_TRACE, "terminate thread...");
+    }
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "wait thread end...");
+    CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "end.");
+}
+
+void FileOutput::leaveWork() {
+    if (work->owner.IsCut()) {
+        work = std::make_shared<Work>(controller, buffer, type);
+    }
 }
 
 std::size_t FileOutput::PushChunk(const std::shared_ptr<ChunkData>& chunk) {
-    MutexLock lock(chunkMutex);
-    chunks.push_back(chunk);
-    chunkCondition.notify_one();
-    return chunks.size();
+    MutexLock lock(work->chunkMutex);
+    work->chunks.push_back(chunk);
+    work->chunkCondition.notify_one();
+    return work->chunks.size();
+}
+
+void FileOutput::outputThread(Work& work) {
+    const std::shared_ptr<RecursiveTimedMutex> threadLock = work.threadLock;
+    std::unique_lock run(*threadLock);
+    {
+        MutexLock lock(work.chunkMutex);
+        work.started = true;
+    }
+    work.chunkCondition.notify_all();
+
+    notifyTransferStatus(work, kFileOutputStatusOutput);
+    const LogonToken token = useNetDrive(work);
+    const auto takeChunks = [&work](bool wait) {
+        std::deque<std::shared_ptr<ChunkData>> taken;
+        MutexLock lock(work.chunkMutex);
+        if (wait && work.chunks.empty() && work.running) {
+            lock.Wait(work.chunkCondition);
+        }
+        taken.swap(work.chunks);
+        return taken;
+    };
+    bool failed = false;
+    while (!failed && work.running) {
+        std::deque<std::shared_ptr<ChunkData>> taken = takeChunks(true);
+        failed = !taken.empty() && outputFile(work, taken);
+    }
+    if (!failed) {
+        // What `Stop` left.
+        std::deque<std::shared_ptr<ChunkData>> taken = takeChunks(false);
+        outputFile(work, taken);
+    }
+    if (!work.owner.IsCut() && work.IsFileOpen() && !work.CloseFile() && !work.owner.IsCut()) {
+        CLIPFILE_LOG(LOG_PRIORITY_ERROR, "mp4 file close error.");
+        work.owner.SetStatus(kStatusFailed, kCauseFileClose);
+    }
+    if (token != kNoLogon) {
+        GetPlatform().CloseLogon(token);
+    }
+    if (work.owner.IsCut()) {
+        // Nobody else uses it any more; its file is closed as it stands.
+        work.muxer->Uninitialize();
+        work.muxer.reset();
+    }
+    notifyTransferStatus(work, kFileOutputStatusStandby);
+    run.unlock();
+    if (!work.owner.IsCut()) {
+        CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "end.");
+    }
+}
+
+bool FileOutput::outputFile(Work& work, std::deque<std::shared_ptr<ChunkData>>& deque) {
+    bool limitReached = false;
+    std::uint64_t boxSize = 0;
+    while (!deque.empty()) {
+        const std::shared_ptr<ChunkData> chunk = std::move(deque.front());
+        deque.pop_front();
+        if (work.owner.IsCut()) {
+            return true;
+        }
+        if (work.IsFileOpen()) {
+            boxSize = work.muxer->GetBoxSize();
+            const std::uint64_t size = Work::fileSizeMargin + work.muxer->GetWrittenSize() + boxSize;
+            const std::uint64_t limit = work.muxer->MinutesToDuration(work.settings.maxFileSize);
+            const std::uint64_t written = work.muxer->GetDuration();
+            limitReached = written >= limit;
+            CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "file size. %llu\t%llu\t%llu\t%llu.",
+                         static_cast<unsigned long long>(limit), static_cast<unsigned long long>(written),
+                         static_cast<unsigned long long>(size), static_cast<unsigned long long>(boxSize));
+        } else if (!newFile(work, chunk)) {
+            return true;
+        }
+        if (limitReached) {
+            // A file ends only where audio and video are in step.
+            if (work.lastChunk != nullptr && work.lastChunk->sync) {
+                CLIPFILE_LOG(LOG_PRIORITY_TRACE, "mp4 file over %lld min.",
+                             static_cast<long long>(work.settings.maxFileSize));
+                CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: FILE ROTATION.");
+                if (!newFile(work, chunk)) {
+                    return true;
+                }
+            } else {
+                CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "mp4 file over. no a/v sync. %d",
+                             static_cast<int>(work.writtenVideoSamples));
+            }
+        }
+
+        std::uint64_t freeSpace = 0;
+        const int error = GetPlatform().AvailableSpace(work.settings.outputPath, freeSpace);
+        if (work.owner.IsCut()) {
+            return true;
+        }
+        if (error != 0) {
+            CLIPFILE_LOG(LOG_PRIORITY_ERROR, "disk size could not be obtained. error = %d.", error);
+            work.owner.SetStatus(kStatusFailed, kCauseFreeSpaceUnknown);
+            return true;
+        }
+        // The closing boxes must still find room.
+        if (freeSpace < Work::minFreeSpaceWrite + boxSize) {
+            CLIPFILE_LOG(LOG_PRIORITY_ERROR, "no disk freespace. %llu.",
+                         static_cast<unsigned long long>(freeSpace));
+            work.owner.SetStatus(kStatusFailed, kCauseDiskFull);
+            return true;
+        }
+
+        work.writtenVideoSamples += chunk->video.size();
+        CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "write chunk. %d", static_cast<int>(work.writtenVideoSamples));
+        const bool written = work.muxer->Write(chunk);
+        if (work.owner.IsCut()) {
+            return true;
+        }
+        if (!written) {
+            CLIPFILE_LOG(LOG_PRIORITY_ERROR, "mp4 file write error.");
+            work.owner.SetStatus(kStatusFailed, kCauseFileWrite);
+            return true;
+        }
+        work.lastChunk = chunk;
+    }
+    return false;
+}
+
+void FileOutput::notifyTransferStatus(Work& work, const std::string& value) {
+    work.owner.PostEvent(std::make_shared<TransferStatusNotifyEvent>(
+        std::map<std::string, std::string>{{kFileOutputStatusKey, value}}));
 }
 
 }  // namespace clipfileModule

@@ -1,0 +1,184 @@
+// What the file output thread does to get a place to write.
+
+#include <array>
+#include <cstdio>
+#include <string>
+
+#include "common/Log.h"
+#include "controller/Status.h"
+#include "fileout/FileOutput.h"
+#include "fileout/FileOutputWork.h"
+#include "mp4/Mp4MuxerFactory.h"
+
+namespace clipfileModule {
+
+bool FileOutput::newFile(Work& work, const std::shared_ptr<ChunkData>& chunk) {
+    CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "start.");
+    const auto end = [](bool result) {
+        CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "end. result = %d.", result ? 1 : 0);
+        return result;
+    };
+    const auto fail = [&](int cause) {
+        work.owner.SetStatus(kStatusFailed, cause);
+        return end(false);
+    };
+
+    const bool closed = !work.IsFileOpen() || work.CloseFile();
+    if (work.owner.IsCut()) {
+        return false;
+    }
+    if (!closed) {
+        CLIPFILE_LOG(LOG_PRIORITY_ERROR, "mp4 file close error.");
+        return fail(kCauseFileClose);
+    }
+
+    // The directory for today need not exist yet.
+    std::uint64_t freeSpace = 0;
+    const int error = GetPlatform().AvailableSpace(work.settings.outputPath, freeSpace);
+    if (work.owner.IsCut()) {
+        return false;
+    }
+    if (error != 0) {
+        CLIPFILE_LOG(LOG_PRIORITY_ERROR, "disk size could not be obtained. error = %d.", error);
+        return fail(kCauseFreeSpaceUnknown);
+    }
+    if (freeSpace < Work::minFreeSpaceOpen) {
+        CLIPFILE_LOG(LOG_PRIORITY_ERROR, "no disk free space. %llu.",
+                     static_cast<unsigned long long>(freeSpace));
+        return fail(kCauseDiskFull);
+    }
+
+    OutputSettings local = work.settings;
+    const bool made = makeOutputPath(work, local, local.outputPath);
+    if (work.owner.IsCut()) {
+        return false;
+    }
+    if (!made) {
+        CLIPFILE_LOG(LOG_PRIORITY_ERROR, "mp4 mkdir error. %s.", local.outputPath.c_str());
+        return fail(kCauseDirectory);
+    }
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "output path = \"%s\".", local.outputPath.c_str());
+
+    std::array<unsigned char, 4> timecode = {};
+    bool dropFrame = false;
+    bool hasTimecode = work.owner.MakeFileTimecode(chunk);
+    if (hasTimecode) {
+        hasTimecode = work.owner.GetFileTimecode(timecode.data(), &dropFrame);
+    } else {
+        CLIPFILE_LOG(LOG_PRIORITY_TRACE, "no tc.");
+    }
+
+    if (!createMp4FileObject(work)) {
+        CLIPFILE_LOG(LOG_PRIORITY_ERROR, "create mp4 file object failed.");
+        return fail(kCauseFileOpen);
+    }
+    const bool opened = work.muxer->Open(local, hasTimecode ? timecode.data() : nullptr, dropFrame);
+    if (work.owner.IsCut()) {
+        return false;
+    }
+    if (!opened) {
+        CLIPFILE_LOG(LOG_PRIORITY_ERROR, "mp4 file open error.");
+        return fail(kCauseFileOpen);
+    }
+    return end(true);
+}
+
+bool FileOutput::makeOutputPath(Work& work, const OutputSettings& settings, std::string& path) {
+    const PlatformInterface& platform = GetPlatform();
+    const LocalTime now = platform.ToLocalTime(platform.Now());
+    std::array<char, 40> date = {};
+    std::snprintf(date.data(), date.size(), "%04d%02d%02d", now.year, now.month, now.day);
+    std::string made = settings.outputPath;
+    if (made.empty() || made.back() != '\\') {
+        made += '\\';
+    }
+    made += date.data();
+    made += '\\';
+    made += settings.filePrefix;
+    if (!createOutputDirectory(work, made)) {
+        return false;
+    }
+    path = made;
+    return true;
+}
+
+bool FileOutput::createOutputDirectory(Work& work, const std::string& path) {
+    const PlatformInterface& platform = GetPlatform();
+    if (platform.Exists(path)) {
+        return true;
+    }
+    boost::system::error_code error;
+    if (!work.owner.IsCut() && platform.CreateDirectories(path, error) && !error) {
+        return true;
+    }
+    if (work.owner.IsCut()) {
+        return false;
+    }
+    CLIPFILE_LOG(LOG_PRIORITY_ERROR, "filename: %s, %s.", error.message().c_str(), path.c_str());
+    return false;
+}
+
+LogonToken FileOutput::useNetDrive(Work& work) {
+    const OutputSettings& settings = work.settings;
+    if (settings.outputPath.compare(0, 2, "\\\\") != 0) {
+        CLIPFILE_LOG(LOG_PRIORITY_TRACE, "is local drive.");
+        return kNoLogon;
+    }
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "is remote drive.");
+    if (settings.userName.empty()) {
+        return kNoLogon;
+    }
+    LogonToken token = kNoLogon;
+    const int logonError =
+        GetPlatform().Logon(settings.userName, settings.outputPath, settings.password, token);
+    if (work.owner.IsCut()) {
+        return token;
+    }
+    if (logonError != 0) {
+        CLIPFILE_LOG(LOG_PRIORITY_ERROR, "LogonUser call failed. %d, %x, %s, %s, %s", 0,
+                     static_cast<unsigned int>(logonError), settings.outputPath.c_str(),
+                     settings.userName.c_str(), settings.password.c_str());
+        work.owner.SetStatus(kStatusFailed, kCauseLogon);
+        return token;
+    }
+    if (const int error = GetPlatform().Impersonate(token)) {
+        CLIPFILE_LOG(LOG_PRIORITY_ERROR, "ImpersonateLoggedOnUser call failed. %d, %x.", 0,
+                     static_cast<unsigned int>(error));
+        work.owner.SetStatus(kStatusFailed, kCauseLogon);
+    }
+    return token;
+}
+
+bool FileOutput::createMp4FileObject(Work& work) {
+    CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "start.");
+    if (work.muxer != nullptr) {
+        deleteMp4FileObject(work);
+    }
+    const Mp4MuxerFactory factory;
+    if (!factory.Create(work.type, work.muxer)) {
+        CLIPFILE_LOG(LOG_PRIORITY_WARNING, "mp4 file create error. type = %s.", work.type.c_str());
+        factory.Create("normal", work.muxer);
+    }
+    const bool result = work.muxer != nullptr && work.muxer->Initialize();
+    if (!result) {
+        CLIPFILE_LOG(LOG_PRIORITY_ERROR, "mp4 file initialize error.");
+        work.owner.SetStatus(kStatusFailed, kCauseInitialize);
+    }
+    CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "end. func_result = %d.", result ? 1 : 0);
+    return result;
+}
+
+bool FileOutput::deleteMp4FileObject(Work& work) {
+    CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "start.");
+    // There is none after a thread was given up: its muxer is its own.
+    if (work.muxer != nullptr) {
+        if (!work.muxer->Uninitialize()) {
+            CLIPFILE_LOG(LOG_PRIORITY_WARNING, "mp4 file initialize failed.");
+        }
+        work.muxer.reset();
+    }
+    CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "end. func_result = %d.", 1);
+    return true;
+}
+
+}  // namespace clipfileModule
