@@ -185,7 +185,7 @@ MbxStatus MbxSetSignedOffsets(MbxSession* session, uint32_t track, uint32_t sign
 MbxStatus MbxAddSample(MbxSession* session, uint32_t track, const MbxSampleInfo* sample,
                        uint32_t randomAccess);
 
-// Closes the track's open chunk. MBX_ERR_BAD_STATE when none is open.
+// Closes the track's open chunk. MBX_ERR_BAD_STATE for a track that does not exist or has none open.
 MbxStatus MbxEndChunk(MbxSession* session, uint32_t track);
 
 // Adds `delta` to chunk offsets of what `moov` reports: of one track or with 0 of all, of one chunk or with 0

@@ -24,7 +24,6 @@
 namespace clipfileModule {
 namespace {
 
-namespace fs = std::filesystem;
 using std::chrono::milliseconds;
 using std::chrono::steady_clock;
 using ::testing::ElementsAre;

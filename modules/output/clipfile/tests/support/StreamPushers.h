@@ -72,17 +72,22 @@ class StreamPushers {
             stream_.PushVideo(clock_.Video(n, idr ? stream_units::kIdr : stream_units::kPicture));
         } else if (medium == 1) {
             for (std::uint64_t k = clock_.AudioBefore(n); k < clock_.AudioBefore(n + 1) && !muteAudio; ++k) {
-                stream_.PushAudio(clock_.Audio(k));
+                stream_.PushAudio(
+                    stream_units::AudioUnit(audioNumber_++, clock_.AudioRtp(k), clock_.AudioMilliSec(k)));
             }
         } else if (!muteMeta) {
             const stream_units::Timecode timecode{1, 2, 3, static_cast<unsigned char>(n % 25), false};
-            stream_.PushMeta(clock_.Meta(n, {recFlag.load(), timecode}));
+            stream_.PushMeta(stream_units::MetaUnit(metaNumber_++, clock_.VideoRtp(n),
+                                                    clock_.VideoMilliSec(n), {recFlag.load(), timecode}));
         }
     }
 
     QxModuleStreamInterface& stream_;
     const stream_units::StreamClock clock_;
     const std::function<bool(std::size_t)> mayPush_;
+    // Each used by its medium's thread alone: what is muted takes no number, so that a gap is always a loss.
+    std::uint64_t audioNumber_ = 0;
+    std::uint64_t metaNumber_ = 0;
     std::atomic<bool> done_ = false;
     std::array<std::atomic<std::uint64_t>, kMediumCount> frames_ = {};
     std::vector<std::thread> threads_;
