@@ -1,0 +1,19 @@
+#pragma once
+
+#include <cstdint>
+
+#include "boxlib/mbx_types.h"
+
+namespace clipfileModule {
+
+/// How muxers reach their files, and memory for the boxes.
+struct FileAccess {
+    MbxCallbacks callbacks;
+    /// Creates a file, or truncates it; contract as `MbxOpenFile`. The path is a native one.
+    MbxStatus (*open)(const char* path, std::uint32_t unused, MbxFile** file);
+};
+
+/// Through stdio and malloc.
+FileAccess GetFileAccess();
+
+}  // namespace clipfileModule

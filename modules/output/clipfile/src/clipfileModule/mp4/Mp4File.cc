@@ -1,0 +1,266 @@
+#include "mp4/Mp4File.h"
+
+#include <cstdio>
+#include <cstdlib>
+#include <ratio>
+
+#include "common/Log.h"
+#include "mp4/FileAccess.h"
+#include "mp4/FourCc.h"
+#include "mp4/MuxerRoutine.h"
+
+namespace clipfileModule {
+
+namespace {
+
+constexpr std::uint32_t kBrand = FourCc("ZQVC");
+constexpr std::uint32_t kMinorVersion = 0x01001FFF;
+
+/// The 16-byte header of `mdat`, which takes any payload when it is patched at the end.
+constexpr std::uint32_t kLargeHeader = 1;
+
+using Ticks = std::chrono::duration<std::int64_t, std::ratio<1, 10000000>>;
+
+}  // namespace
+
+void Mp4File::DestroyContext::operator()(MbxContext* context) const {
+    static_cast<void>(MbxDestroyContext(context));
+}
+
+void Mp4File::DestroySession::operator()(MbxSession* session) const {
+    static_cast<void>(MbxSessionDestroy(session));
+}
+
+void Mp4File::CloseCell::operator()(MbxFile* file) const {
+    if (file->stream != nullptr) {
+        std::fclose(file->stream);
+    }
+    std::free(file);
+}
+
+Mp4File::~Mp4File() = default;
+
+bool Mp4File::Initialize() {
+    MUXER_ROUTINE(routine);
+    Reset();
+    m_callbacks = GetFileAccess().callbacks;
+    FillSessionConfig(m_session_config);
+    MbxContext* context = nullptr;
+    if (routine.Failed(MbxCreateContext(&m_callbacks, &context), __LINE__)) {
+        return routine.Return(false);
+    }
+    m_context.reset(context);
+    MbxSession* session = nullptr;
+    if (routine.Failed(MbxSessionCreate(context, &m_session_config, &session), __LINE__)) {
+        return routine.Return(false);
+    }
+    m_session.reset(session);
+    return routine.Return(true);
+}
+
+bool Mp4File::Uninitialize() {
+    MUXER_ROUTINE(routine);
+    m_session.reset();
+    m_context.reset();
+    m_callbacks = {};
+    return routine.Return(true);
+}
+
+void Mp4File::FillSessionConfig(MbxSessionConfig& config) {
+    config = {};
+    config.options.chunk_offset_mode = 2;
+}
+
+void Mp4File::Reset() {
+    m_stream = {};
+    m_filename.clear();
+    m_file.reset();
+    m_session.reset();
+    m_context.reset();
+    m_callbacks = {};
+    m_session_config = {};
+    m_position = 0;
+    m_payload = 0;
+    m_mdat_position = 0;
+    m_fprf = 0;
+    m_aprf = {};
+    m_vprf = {};
+    m_track_ids = {};
+    m_entry_indexes = {};
+    m_info = {};
+    m_open_ticks = 0;
+    m_video_count = 0;
+    m_audio_count = 0;
+    m_meta_count = 0;
+    m_video_duration = 0;
+    m_records.clear();
+}
+
+bool Mp4File::Open(const OutputSettings& stream, const unsigned char* timecode, bool dropFrame) {
+    MUXER_ROUTINE(routine);
+    if (!chooseFile(stream, timecode)) {
+        return routine.Return(false);
+    }
+    if (routine.Failed(createFile(dropFrame), __LINE__) || routine.Failed(beginMdat(), __LINE__)) {
+        routine.Failed(closeFile(), __LINE__);
+        return routine.Return(false);
+    }
+    CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: FILE CREATE. (%s)", m_filename.c_str());
+    return routine.Return(true);
+}
+
+bool Mp4File::chooseFile(const OutputSettings& stream, const unsigned char* timecode) {
+    m_open_ticks = std::chrono::duration_cast<Ticks>(GetPlatform().Now().time_since_epoch()).count();
+    std::array<unsigned char, 4> first = {};
+    if (timecode != nullptr) {
+        first = {timecode[0], timecode[1], timecode[2], timecode[3]};
+    } else {
+        const LocalTime now = localOpenTime();
+        first = {static_cast<unsigned char>(now.hour), static_cast<unsigned char>(now.minute),
+                 static_cast<unsigned char>(now.second), 0};
+    }
+    m_stream = stream;
+    return createFilename(first);
+}
+
+bool Mp4File::createFilename(const std::array<unsigned char, 4>& timecode) {
+    MUXER_ROUTINE(routine);
+    char base[32];
+    std::snprintf(base, sizeof base, "%02u_%02u_%02u_%02u", timecode[0], timecode[1], timecode[2],
+                  timecode[3]);
+    std::string suffix;
+    for (std::uint64_t counter = 1;;) {
+        const std::string filename = base + suffix + ".MP4";
+        const int error = GetPlatform().TestExistence(m_stream.outputPath + "\\" + filename);
+        if (error == kNoSuchPath) {
+            m_filename = filename;
+            CLIPFILE_LOG_PLAIN(LOG_PRIORITY_TRACE, "ST: out_filename = \"%s\"", filename.c_str());
+            return routine.Return(true);
+        }
+        if (error != 0) {
+            CLIPFILE_LOG(LOG_PRIORITY_ERROR, "errno = %d.", error);
+            return routine.Return(false);
+        }
+        ++counter;
+        suffix = "(" + std::to_string(counter) + ")";
+    }
+}
+
+MbxStatus Mp4File::createFile(bool dropFrame) {
+    MUXER_ROUTINE(routine);
+    const std::string path = GetPlatform().NativePath(m_stream.outputPath + "\\" + m_filename);
+    MbxFile* file = nullptr;
+    MUXER_STEP(routine, GetFileAccess().open(path.c_str(), 0, &file));
+    m_file.reset(file);
+
+    m_info.MakeInputStreamInfo(m_stream);
+    if (!dropFrame) {
+        // The rate's bit is a permission; the flag decides.
+        m_info.tmcd_m_data_type_it &= ~1U;
+    }
+    MUXER_STEP(routine, createFtyp());
+    MUXER_STEP(routine, createUuidProf());
+    MUXER_STEP(routine, createMoov());
+    return routine.Return(MBX_OK);
+}
+
+MbxStatus Mp4File::createFtyp() {
+    MUXER_ROUTINE(routine);
+    MUXER_STEP(routine, MbxCreateFileType(m_session.get(), kBrand, kMinorVersion));
+    for (const std::uint32_t brand : {kBrand, FourCc("mp42"), FourCc("iso2")}) {
+        MUXER_STEP(routine, MbxAddCompatibleBrand(m_session.get(), brand));
+    }
+    std::uint64_t size = 0;
+    MUXER_STEP(routine, MbxWriteFileType(m_session.get(), m_file.get(), m_position, &size));
+    m_position += size;
+    return routine.Return(MBX_OK);
+}
+
+MbxStatus Mp4File::beginMdat() {
+    MUXER_ROUTINE(routine);
+    m_mdat_position = m_position;
+    std::uint64_t size = 0;
+    MUXER_STEP(routine, MbxWriteWideMdatHeader(m_session.get(), kLargeHeader, m_file.get(), m_mdat_position,
+                                               FourCc("mdat"), 0, &size));
+    m_position += size;
+    MUXER_STEP(routine, seekTo(m_position));
+    return routine.Return(MBX_OK);
+}
+
+std::uint64_t Mp4File::GetWrittenSize() {
+    return m_position + m_payload;
+}
+
+std::uint64_t Mp4File::GetBoxSize() {
+    MUXER_ROUTINE(routine);
+    std::uint64_t size = 0;
+    const MbxStatus status = MbxWriteMoov(m_session.get(), nullptr, 0, &size);
+    static_cast<void>(routine.Return(status));
+    return routine.Failed(status, __LINE__) ? 0 : size;
+}
+
+std::uint64_t Mp4File::GetDuration() {
+    return m_video_duration;
+}
+
+std::uint64_t Mp4File::MinutesToDuration(std::uint64_t minutes) {
+    return m_info.video_track_timescale * minutes * 60;
+}
+
+bool Mp4File::IsOpen() {
+    return m_file != nullptr;
+}
+
+void Mp4File::AddFileRecord(std::uint64_t value, const std::string& first, const std::string& second) {
+    m_records.push_back({value, first, second});
+}
+
+bool Mp4File::Close() {
+    MUXER_ROUTINE(routine);
+    if (!IsOpen()) {
+        return routine.ReturnNotOpen();
+    }
+    CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: FILE CLOSE. (%s)", m_filename.c_str());
+    const bool completed = !routine.Failed(completeFile(), __LINE__);
+    const bool closed = !routine.Failed(closeFile(), __LINE__);
+    return routine.Return(completed && closed);
+}
+
+MbxStatus Mp4File::completeFile() {
+    MUXER_ROUTINE(routine);
+    std::uint64_t size = 0;
+    MUXER_STEP(routine, MbxWriteWideMdatHeader(m_session.get(), kLargeHeader, m_file.get(), m_mdat_position,
+                                               FourCc("mdat"), m_payload, &size));
+    // Samples were entered with their distance from the start of the payload.
+    MUXER_STEP(routine, MbxShiftChunkOffsets(m_session.get(), 0, 0, static_cast<std::int64_t>(m_position)));
+    m_position += m_payload;
+    MUXER_STEP(routine, createElst());
+    MUXER_STEP(routine, updateTimestamp());
+    MUXER_STEP(routine, MbxWriteMoov(m_session.get(), m_file.get(), m_position, &size));
+    m_position += size;
+    return routine.Return(MBX_OK);
+}
+
+MbxStatus Mp4File::closeFile() {
+    if (m_file == nullptr) {
+        return MBX_OK;
+    }
+    const bool flushed = std::fflush(m_file->stream) == 0;
+    const bool closed = std::fclose(m_file->stream) == 0;
+    m_file->stream = nullptr;
+    m_file.reset();
+    return flushed && closed ? MBX_OK : MBX_ERR_IO;
+}
+
+MbxStatus Mp4File::seekTo(std::uint64_t position) {
+    return m_callbacks.seek(m_file.get(), static_cast<std::int64_t>(position), 0) == MBX_OK ? MBX_OK
+                                                                                            : MBX_ERR_IO;
+}
+
+LocalTime Mp4File::localOpenTime() const {
+    // The system's clock may tick coarser than ours, and its time has whole seconds in any case.
+    const std::chrono::seconds sinceEpoch(m_open_ticks / Ticks::period::den);
+    return GetPlatform().ToLocalTime(std::chrono::system_clock::time_point(sinceEpoch));
+}
+
+}  // namespace clipfileModule

@@ -1,0 +1,195 @@
+#include "mp4/Mp4FragmentMuxer.h"
+
+#include <cstdio>
+#include <limits>
+
+#include "common/Log.h"
+#include "mp4/FourCc.h"
+#include "mp4/MuxerRoutine.h"
+
+namespace clipfileModule {
+
+namespace {
+
+constexpr std::uint32_t kFragmentProfile = 0x30000000;
+constexpr std::uint32_t kMdat = FourCc("mdat");
+
+}  // namespace
+
+Mp4FragmentMuxer::~Mp4FragmentMuxer() = default;
+
+void Mp4FragmentMuxer::FillSessionConfig(MbxSessionConfig& config) {
+    config = {};
+    config.options.mehd_mode = 1;
+}
+
+void Mp4FragmentMuxer::Reset() {
+    Mp4File::Reset();
+    m_first = true;
+    m_chunk_count = 0;
+    m_sequence = 1;
+    m_moov_position = 0;
+    m_estimate = 0;
+    m_pending.clear();
+    m_moov_size = 0;
+}
+
+MbxStatus Mp4FragmentMuxer::createFprf() {
+    MUXER_ROUTINE(routine);
+    m_fprf = kFragmentProfile;
+    MUXER_STEP(routine, MbxCreateProfile(m_session.get(), m_fprf));
+    return routine.Return(MBX_OK);
+}
+
+std::uint32_t Mp4FragmentMuxer::IsFragmentOpen() {
+    return m_first ? 0 : 1;
+}
+
+bool Mp4FragmentMuxer::Open(const OutputSettings& stream, const unsigned char* timecode, bool dropFrame) {
+    MUXER_ROUTINE(routine);
+    if (!chooseFile(stream, timecode)) {
+        return routine.Return(false);
+    }
+    if (routine.Failed(createFile(dropFrame), __LINE__) || routine.Failed(seekTo(m_position), __LINE__)) {
+        routine.Failed(closeFile(), __LINE__);
+        return routine.Return(false);
+    }
+    CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: FILE CREATE. (%s)", m_filename.c_str());
+    return routine.Return(true);
+}
+
+bool Mp4FragmentMuxer::Write(const std::shared_ptr<ChunkData>& chunk) {
+    MUXER_ROUTINE(routine);
+    if (!IsOpen()) {
+        routine.Failed(MBX_ERR_INTERNAL, __LINE__);
+        return routine.ReturnNotOpen();
+    }
+    ++m_chunk_count;
+    if (routine.Failed(writeSampleInfo(m_info, *chunk), __LINE__)) {
+        return routine.Return(false);
+    }
+    m_pending.push_back(chunk);
+    m_estimate += m_chunk_estimate;
+    if (m_chunk_count % m_chunks_per_fragment == 0 && routine.Failed(closeMovie(), __LINE__)) {
+        return routine.Return(false);
+    }
+    return routine.Return(true);
+}
+
+MbxStatus Mp4FragmentMuxer::closeMovie() {
+    MUXER_ROUTINE(routine);
+    MUXER_STEP(routine, m_first ? closeMoov() : closeMoof());
+    m_first = false;
+    return routine.Return(MBX_OK);
+}
+
+MbxStatus Mp4FragmentMuxer::closeMoov() {
+    MUXER_ROUTINE(routine);
+    MbxSession* const session = m_session.get();
+    MUXER_STEP(routine, MbxSealFirstFragment(session));
+    MUXER_STEP(routine, createElst());
+    MUXER_STEP(routine, updateTimestamp());
+
+    std::uint64_t moovSize = 0;
+    std::uint64_t headerSize = 0;
+    MUXER_STEP(routine, MbxWriteMoov(session, nullptr, 0, &moovSize));
+    MUXER_STEP(routine, measureMdatHeader(headerSize));
+    const std::uint64_t payloadPosition = m_position + moovSize + headerSize;
+    MUXER_STEP(routine, MbxShiftChunkOffsets(session, 0, 0, static_cast<std::int64_t>(payloadPosition)));
+
+    m_moov_position = m_position;
+    MUXER_STEP(routine, MbxWriteMoov(session, m_file.get(), m_moov_position, &m_moov_size));
+    m_position += m_moov_size;
+    MUXER_STEP(routine, writeMdat());
+    return routine.Return(MBX_OK);
+}
+
+MbxStatus Mp4FragmentMuxer::closeMoof() {
+    MUXER_ROUTINE(routine);
+    MbxSession* const session = m_session.get();
+    MUXER_STEP(routine, MbxSealFragment(session));
+
+    std::uint64_t moofSize = 0;
+    std::uint64_t headerSize = 0;
+    MUXER_STEP(routine, MbxWriteMoof(session, nullptr, m_sequence, 0, &moofSize));
+    MUXER_STEP(routine, measureMdatHeader(headerSize));
+    const std::uint64_t payloadPosition = m_position + moofSize + headerSize;
+    MUXER_STEP(routine, MbxShiftFragmentOffsets(session, m_sequence, 0, 0,
+                                                static_cast<std::int64_t>(payloadPosition)));
+    MUXER_STEP(routine, MbxSetFragmentBase(session, m_sequence, m_position));
+
+    MUXER_STEP(routine, MbxWriteMoof(session, m_file.get(), m_sequence, m_position, &moofSize));
+    m_position += moofSize;
+    MUXER_STEP(routine, MbxReleaseFragment(session, m_sequence));
+    MUXER_STEP(routine, writeMdat());
+    ++m_sequence;
+    return routine.Return(MBX_OK);
+}
+
+MbxStatus Mp4FragmentMuxer::measureMdatHeader(std::uint64_t& size) {
+    return MbxWriteMdatHeader(m_session.get(), nullptr, 0, kMdat, 0, &size);
+}
+
+MbxStatus Mp4FragmentMuxer::writeMdat() {
+    MUXER_ROUTINE(routine);
+    std::uint64_t size = 0;
+    MUXER_STEP(routine,
+               MbxWriteMdatHeader(m_session.get(), m_file.get(), m_position, kMdat, m_payload, &size));
+    m_position += size;
+    MUXER_STEP(routine, seekTo(m_position));
+    for (const auto& chunk : m_pending) {
+        MUXER_STEP(routine, writeSample(*chunk));
+    }
+    // A process that dies keeps what it has given to the system: this fragment must not end in a buffer.
+    MUXER_STEP(routine, std::fflush(m_file->stream) == 0 ? MBX_OK : MBX_ERR_IO);
+    m_pending.clear();
+    m_position += m_payload;
+    m_payload = 0;
+    return routine.Return(MBX_OK);
+}
+
+std::uint64_t Mp4FragmentMuxer::GetBoxSize() {
+    MUXER_ROUTINE(routine);
+    if (!m_first) {
+        return m_tail_estimate + m_estimate;
+    }
+    std::uint64_t size = 0;
+    const MbxStatus status = MbxWriteMoov(m_session.get(), nullptr, 0, &size);
+    static_cast<void>(routine.Return(status));
+    return routine.Failed(status, __LINE__) ? std::numeric_limits<std::uint64_t>::max() : size + m_estimate;
+}
+
+bool Mp4FragmentMuxer::Close() {
+    MUXER_ROUTINE(routine);
+    if (!IsOpen()) {
+        routine.Failed(MBX_ERR_INTERNAL, __LINE__);
+        return routine.ReturnNotOpen();
+    }
+    CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: FILE CLOSE. (%s)", m_filename.c_str());
+    const bool completed = !routine.Failed(completeFragments(), __LINE__);
+    const bool closed = !routine.Failed(closeFile(), __LINE__);
+    return routine.Return(completed && closed);
+}
+
+MbxStatus Mp4FragmentMuxer::completeFragments() {
+    MUXER_ROUTINE(routine);
+    MUXER_STEP(routine, closeMovie());
+    MUXER_STEP(routine, rewriteMoov());
+    std::uint64_t size = 0;
+    MUXER_STEP(routine, MbxWriteMfra(m_session.get(), m_file.get(), m_position, &size));
+    m_position += size;
+    return routine.Return(MBX_OK);
+}
+
+MbxStatus Mp4FragmentMuxer::rewriteMoov() {
+    MUXER_ROUTINE(routine);
+    // The file's whole length is known only now. Where it needs more bits than it got room for, writing it
+    // would run over the samples behind.
+    std::uint64_t size = 0;
+    MUXER_STEP(routine, MbxWriteMoov(m_session.get(), nullptr, 0, &size));
+    MUXER_STEP(routine, size == m_moov_size ? MBX_OK : MBX_ERR_INTERNAL);
+    MUXER_STEP(routine, MbxWriteMoov(m_session.get(), m_file.get(), m_moov_position, &size));
+    return routine.Return(MBX_OK);
+}
+
+}  // namespace clipfileModule

@@ -1,0 +1,65 @@
+#pragma once
+
+#include <list>
+
+#include "mp4/Mp4File.h"
+
+namespace clipfileModule {
+
+/// Writes a fragmented file (ISO/IEC 14496-12 8.8): `ftyp`, `uuid`, `moov`, `mdat`, then pairs of `moof` and
+/// `mdat`, and `mfra`. The index of each 32 chunks is on disk before their bytes, so the file is readable up
+/// to its last complete fragment at any time after the first.
+///
+/// Chunks wait in memory until their fragment is written. A flush that fails keeps them, and the next one
+/// tries again from there.
+///
+/// `WriteTmcd` enters its sample in the waiting fragment and writes its bytes at the end of the one before,
+/// where the index of the waiting one then overwrites them. The sample's place in the file is left zero.
+class Mp4FragmentMuxer : public Mp4File {
+ public:
+    ~Mp4FragmentMuxer() override;
+
+    bool Open(const OutputSettings& stream, const unsigned char* timecode, bool dropFrame) override;
+    bool Write(const std::shared_ptr<ChunkData>& chunk) override;
+    /// An estimate once the first fragment is written, 2^64 - 1 when it cannot be told before.
+    std::uint64_t GetBoxSize() override;
+    /// Fails too when the `moov` that is written again would not fill the place of the first one exactly;
+    /// that one then stays as it is.
+    bool Close() override;
+
+ protected:
+    void FillSessionConfig(MbxSessionConfig& config) override;
+    MbxStatus createFprf() override;
+    std::uint32_t IsFragmentOpen() override;
+    void Reset() override;
+
+ private:
+    /// Writes the waiting chunks: as the part that `moov` describes the first time, as a fragment then.
+    MbxStatus closeMovie();
+    MbxStatus closeMoov();
+    MbxStatus closeMoof();
+    /// Size of a `mdat` header of the session.
+    MbxStatus measureMdatHeader(std::uint64_t& size);
+    /// Writes `mdat` at the position, and counts its bytes as complete.
+    MbxStatus writeMdat();
+    MbxStatus rewriteMoov();
+    MbxStatus completeFragments();
+
+    /// The next flush writes `moov`.
+    bool m_first = true;
+    std::uint32_t m_chunk_count = 0;
+    /// Number of the next `moof`.
+    std::uint32_t m_sequence = 1;
+    std::uint64_t m_moov_position = 0;
+    /// Bytes by which the index has grown, by estimate.
+    std::uint64_t m_estimate = 0;
+    /// Chunks whose bytes are not written yet.
+    std::list<std::shared_ptr<ChunkData>> m_pending;
+    const std::uint32_t m_chunks_per_fragment = 32;
+    const std::uint64_t m_tail_estimate = 600;  // bytes that closing adds
+    const std::uint64_t m_chunk_estimate = 57;  // bytes of index that a chunk adds
+    /// Bytes of the first `moov`.
+    std::uint64_t m_moov_size = 0;
+};
+
+}  // namespace clipfileModule

@@ -1,0 +1,236 @@
+// Whole files, byte for byte, at each frame rate.
+
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <memory>
+#include <string>
+
+#include "mp4/Mp4MuxerFactory.h"
+#include "support/FakePlatform.h"
+#include "support/GoldenFile.h"
+#include "support/MuxerStream.h"
+#include "support/TempDir.h"
+
+namespace clipfileModule {
+namespace {
+
+using namespace golden;
+using muxer_stream::ChunkShape;
+using muxer_stream::MakeChunk;
+
+// ---- The normal file: two chunks.
+
+const ChunkShape kFirstChunk = {{5, 5, 5, 5, 5, 5, 5, 5}, {6, 6, 7}, {20, 9, 9, 9, 9, 9, 9, 9}, 0};
+const ChunkShape kSecondChunk = {{5, 5, 5, 5, 5, 5, 5, 5}, {6, 6}, {9, 9, 9, 9, 15, 9, 9, 9}, 4};
+
+// Where things stand: `ftyp` 28 bytes, `uuid` 148, header of `mdat` 16, and from 192 on the samples: chunk 1
+// with metadata 40, audio 19, video 83; chunk 2 with metadata 40, audio 12, video 78; the timecode 4.
+constexpr std::uint32_t kNormalPayload = 276;
+
+Bytes normalMoov(const RateRow& row) {
+    const std::uint32_t length = 16 * row.duration;
+    const Bytes video =
+        Stts(1, U32(16) + U32(row.duration)) +  //
+        Stsc(1, U32(1) + U32(8) + U32(1)) +     //
+        Stsz(0, 16, U32(20) + Repeat(7, U32(9)) + Repeat(4, U32(9)) + U32(15) + Repeat(3, U32(9))) +
+        Co64(2, U64(192 + 59) + U64(192 + 194)) +  //
+        Stss(2, U32(1) + U32(13));
+    const Bytes audio =
+        Stts(1, U32(5) + U32(1024)) + Stsc(2, U32(1) + U32(3) + U32(1) + U32(2) + U32(2) + U32(1)) +
+        Stsz(0, 5, U32(6) + U32(6) + U32(7) + U32(6) + U32(6)) + Co64(2, U64(192 + 40) + U64(192 + 182));
+    const Bytes timecode = Stts(1, U32(1) + U32(length)) +      // one sample for the whole file
+                           Stsc(1, U32(1) + U32(1) + U32(1)) +  //
+                           Stsz(4, 1) + Co64(1, U64(192 + 272));
+    const Bytes meta = Stts(1, U32(16) + U32(row.duration)) +  //
+                       Stsc(1, U32(1) + U32(8) + U32(1)) +     //
+                       Stsz(5, 16) + Co64(2, U64(192) + U64(192 + 142));
+    return Box("moov", Mvhd(row, length) + VideoTrak(row, {length, length}, video) +
+                           AudioTrak({row.audio5, 5 * 1024}, audio) +
+                           TimecodeTrak(row, {length, length}, timecode) +
+                           MetaTrak(row, {length, length}, meta));
+}
+
+Bytes normalFile(const RateRow& row) {
+    return Ftyp() + UuidProf(row, 0x20000000) +
+           // The 16-byte form of the header: size 1, type, largesize.
+           U32(1) + Text("mdat") + U64(16 + kNormalPayload) +   //
+           muxer_stream::BytesOf(*MakeChunk(kFirstChunk, 1)) +  //
+           muxer_stream::BytesOf(*MakeChunk(kSecondChunk, 2)) + U32(row.frameNumber) + normalMoov(row);
+}
+
+// ---- The fragmented file: 32 chunks in `moov`, two in one fragment, of which the second has no audio and no
+// ---- sync picture.
+
+const ChunkShape kFragmentChunk = {{5, 5, 5, 5, 5, 5, 5, 5}, {6, 7}, {12, 9, 9, 9, 9, 9, 9, 9}, 0};
+const ChunkShape kLastChunk = {{5, 5, 5, 5, 5, 5, 5, 5}, {}, {9, 9, 9, 9, 9, 9, 9, 9}, -1};
+
+// A plain chunk has metadata 40, audio 12, video 75.
+constexpr std::uint32_t kPlainSize = 127;
+
+Bytes offsets(std::uint32_t first) {
+    Bytes rows;
+    for (std::uint32_t i = 0; i < 32; ++i) {
+        rows = rows + U32(first + i * kPlainSize);
+    }
+    return rows;
+}
+
+/// 8.8.3
+Bytes trex(std::uint32_t trackId, std::uint32_t duration, std::uint32_t size, std::uint32_t flags) {
+    return FullBox("trex", 0, 0, U32(trackId) + U32(1) + U32(duration) + U32(size) + U32(flags));
+}
+
+/// `payload` is where the samples begin.
+Bytes fragmentMoov(const RateRow& row, std::uint32_t payload) {
+    const std::uint32_t length = 256 * row.duration;
+    Bytes sync;
+    for (std::uint32_t i = 0; i < 32; ++i) {
+        sync = sync + U32(1 + 8 * i);
+    }
+    const Bytes video = Stts(1, U32(256) + U32(row.duration)) + Stsc(1, U32(1) + U32(8) + U32(1)) +
+                        Stsz(0, 256, Repeat(32, U32(12) + Repeat(7, U32(9)))) +
+                        Stco(32, offsets(payload + 52)) + Stss(32, sync);
+    const Bytes audio = Stts(1, U32(64) + U32(1024)) + Stsc(1, U32(1) + U32(2) + U32(1)) + Stsz(6, 64) +
+                        Stco(32, offsets(payload + 40));
+    const Bytes timecode = Stts(0, {}) + Stsc(0, {}) + Stsz(0, 0) + Stco(0, {});
+    const Bytes meta = Stts(1, U32(256) + U32(row.duration)) + Stsc(1, U32(1) + U32(8) + U32(1)) +
+                       Stsz(5, 256) + Stco(32, offsets(payload));
+    const Bytes mvex = Box("mvex", FullBox("mehd", 0, 0, U32(272 * row.duration)) +  //
+                                       trex(1, row.duration, 12, 0x00010000) +       //
+                                       trex(2, 1024, 6, 0) +                         //
+                                       trex(3, 272 * row.duration, 4, 0) +           //
+                                       trex(4, row.duration, 5, 0));
+    return Box("moov", Mvhd(row, length) + VideoTrak(row, {length, length}, video) +
+                           AudioTrak({row.audio64, 64 * 1024}, audio) + TimecodeTrak(row, {0, 0}, timecode) +
+                           MetaTrak(row, {length, length}, meta) + mvex);
+}
+
+/// 8.8.7, with the base data offset alone.
+Bytes tfhd(std::uint32_t trackId, std::uint32_t base) {
+    return FullBox("tfhd", 0, 0x000001, U32(trackId) + U64(base));
+}
+
+/// `payload` is where the fragment's samples begin: chunk 33 with metadata 40, audio 13, video 75; chunk 34
+/// with metadata 40, video 72; the timecode 4.
+Bytes fragmentMoof(std::uint32_t payload) {
+    const Bytes video = tfhd(1, payload + 53) +
+                        FullBox("trun", 0, 0x000205,      // data offset, first flags, sizes
+                                U32(8) + U32(0) + U32(0)  // count, data_offset, first_sample_flags
+                                    + U32(12) + Repeat(7, U32(9))) +
+                        FullBox("trun", 0, 0x000201, U32(8) + U32(115) + Repeat(8, U32(9)));
+    const Bytes audio =
+        tfhd(2, payload + 40) + FullBox("trun", 0, 0x000201, U32(2) + U32(0) + U32(6) + U32(7));
+    const Bytes timecode = tfhd(3, payload + 240) + FullBox("trun", 0, 0x000001, U32(1) + U32(0));
+    const Bytes meta = tfhd(4, payload) + FullBox("trun", 0, 0x000001, U32(8) + U32(0)) +
+                       FullBox("trun", 0, 0x000001, U32(8) + U32(128));
+    return Box("moof", FullBox("mfhd", 0, 0, U32(1)) + Box("traf", video) + Box("traf", audio) +
+                           Box("traf", timecode) + Box("traf", meta));
+}
+
+/// 8.8.10: a row each chunk, in the 64-bit form; numbers of `traf`, `trun` and sample in a byte each.
+Bytes tfra(std::uint32_t trackId, std::uint32_t count, const Bytes& rows) {
+    return FullBox("tfra", 1, 0, U32(trackId) + U32(0) + U32(count) + rows);
+}
+Bytes tfraRow(std::uint64_t time, std::uint64_t moof, int traf, int trun) {
+    return U64(time) + U64(moof) + U8(static_cast<std::uint64_t>(traf)) +
+           U8(static_cast<std::uint64_t>(trun)) + U8(1);
+}
+
+Bytes fragmentMfra(const RateRow& row, std::uint32_t moof) {
+    const std::uint64_t first = 256ULL * row.duration;
+    const std::uint64_t second = 264ULL * row.duration;
+    const Bytes tables = tfra(1, 2, tfraRow(first, moof, 1, 1) + tfraRow(second, moof, 1, 2)) +
+                         tfra(2, 1, tfraRow(64 * 1024, moof, 2, 1)) +
+                         tfra(4, 2, tfraRow(first, moof, 4, 1) + tfraRow(second, moof, 4, 2));
+    return Box("mfra", tables + FullBox("mfro", 0, 0, U32(8 + tables.size() + 16)));
+}
+
+Bytes fragmentFile(const RateRow& row) {
+    Bytes samples;
+    for (unsigned char i = 0; i < 32; ++i) {
+        samples = samples + muxer_stream::BytesOf(*MakeChunk(muxer_stream::kPlainChunk, i));
+    }
+    const auto moovSize = static_cast<std::uint32_t>(fragmentMoov(row, 0).size());
+    const auto moofSize = static_cast<std::uint32_t>(fragmentMoof(0).size());
+    const std::uint32_t payload = 176 + moovSize + 8;
+    const std::uint32_t moof = payload + 32 * kPlainSize;
+    return Ftyp() + UuidProf(row, 0x30000000) + fragmentMoov(row, payload) + Box("mdat", samples) +
+           fragmentMoof(moof + moofSize + 8) +
+           // The timecode sample has a place and no value.
+           Box("mdat", muxer_stream::BytesOf(*MakeChunk(kFragmentChunk, 32)) +
+                           muxer_stream::BytesOf(*MakeChunk(kLastChunk, 33)) + U32(0)) +
+           fragmentMfra(row, moof);
+}
+
+// ---- The comparison.
+
+/// Tells where two files part, so that the place can be found in the description.
+void expectSameFile(const Bytes& actual, const Bytes& expected) {
+    const auto [at, other] = std::mismatch(actual.begin(), actual.end(), expected.begin(), expected.end());
+    if (at == actual.end() && other == expected.end()) {
+        return;
+    }
+    const auto offset = at - actual.begin();
+    const auto from = std::max<std::ptrdiff_t>(0, offset - 24);
+    const auto excerpt = [&](const Bytes& bytes) {
+        std::string text;
+        const auto end = std::min<std::ptrdiff_t>(static_cast<std::ptrdiff_t>(bytes.size()), offset + 24);
+        for (auto i = from; i < end; ++i) {
+            char hex[8];
+            std::snprintf(hex, sizeof hex, i == offset ? "[%02X] " : "%02X ",
+                          bytes[static_cast<std::size_t>(i)]);
+            text += hex;
+        }
+        return text;
+    };
+    ADD_FAILURE() << "files of " << actual.size() << " and expected " << expected.size()
+                  << " bytes part at offset " << offset << ":\n  " << excerpt(actual) << "\nexpected:\n  "
+                  << excerpt(expected);
+}
+
+class WholeFile : public ::testing::TestWithParam<RateRow> {
+ protected:
+    void open(const std::string& type) {
+        muxer_stream::StopTheClock(platform);
+        ASSERT_TRUE(Mp4MuxerFactory().Create(type, muxer));
+        ASSERT_TRUE(muxer->Initialize());
+        ASSERT_TRUE(muxer->Open(muxer_stream::MakeSettings(directory, GetParam().key), kTimecode,
+                                /*dropFrame=*/true));
+    }
+    void close() {
+        ASSERT_TRUE(muxer->WriteTmcd(kTimecode));
+        ASSERT_TRUE(muxer->Close());
+        ASSERT_TRUE(muxer->Uninitialize());
+    }
+    Bytes file() const { return muxer_stream::ReadFile(directory.Path() / "01_02_03_04.MP4"); }
+
+    FakePlatform platform;
+    TempDir directory;
+    std::shared_ptr<Mp4Muxer> muxer;
+};
+
+TEST_P(WholeFile, ANormalFileIsAsDescribed) {
+    open("normal");
+    ASSERT_TRUE(muxer->Write(MakeChunk(kFirstChunk, 1)));
+    ASSERT_TRUE(muxer->Write(MakeChunk(kSecondChunk, 2)));
+    close();
+    expectSameFile(file(), normalFile(GetParam()));
+}
+
+TEST_P(WholeFile, AFragmentedFileIsAsDescribed) {
+    open("fragment");
+    for (unsigned char i = 0; i < 32; ++i) {
+        ASSERT_TRUE(muxer->Write(MakeChunk(muxer_stream::kPlainChunk, i)));
+    }
+    ASSERT_TRUE(muxer->Write(MakeChunk(kFragmentChunk, 32)));
+    ASSERT_TRUE(muxer->Write(MakeChunk(kLastChunk, 33)));
+    close();
+    expectSameFile(file(), fragmentFile(GetParam()));
+}
+
+INSTANTIATE_TEST_SUITE_P(Rates, WholeFile, ::testing::ValuesIn(kRates),
+                         [](const auto& rate) { return std::to_string(rate.param.key); });
+
+}  // namespace
+}  // namespace clipfileModule
