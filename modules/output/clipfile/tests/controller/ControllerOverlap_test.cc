@@ -98,7 +98,7 @@ class ControllerOverlapTest : public testing::Test {
         EXPECT_LE(distance, 21);
     }
 
-    const stream_units::StreamClock clock_;
+    const stream_units::StreamClock clock_{};
     LogCapture log_{LOG_PRIORITY_TRACE};
     FakeRegistry registry_;
     FileOutputRecorder outputs_;

@@ -27,7 +27,6 @@ using ::testing::Contains;
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 using ::testing::Key;
-using ::testing::Not;
 using ::testing::Pair;
 using ::testing::UnorderedElementsAre;
 
