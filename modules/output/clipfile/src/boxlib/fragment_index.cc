@@ -182,6 +182,13 @@ MbxStatus MbxFreeMfro(MbxContext* context, MbxMfroBox* box) {
     return MbxFreeBox(context, box);
 }
 
+MbxStatus MbxSetMfroParentSize(MbxMfroBox* box, uint64_t size) {
+    if (box == nullptr) return MBX_ERR_INVALID_ARG;
+    if (size > UINT32_MAX) return MBX_ERR_BAD_STATE;
+    box->params.parentSize = static_cast<uint32_t>(size);
+    return MBX_OK;
+}
+
 MbxStatus MbxBuildMfra(MbxContext* context, const MbxScratch* scratch, const MbxOptions* options,
                        const MbxMovie* params, MbxMfraBox* box) {
     if (MbxAnyNull(context, options, params, box)) return MBX_ERR_INVALID_ARG;
@@ -196,10 +203,8 @@ MbxStatus MbxBuildMfra(MbxContext* context, const MbxScratch* scratch, const Mbx
     const MbxMfroParams unknown = {0};
     MBX_TRY(MbxMakeBox(context, options, &box->mfro, &unknown, MbxBuildMfro, MbxFreeMfro));
     MBX_TRY(MbxMeasureBox(context, options, box, MbxWithScratch(scratch, MbxWriteMfraPayload)));
-    if (box->size > UINT32_MAX) return MBX_ERR_BAD_STATE;
     // The field has a fixed width, so that the size holds with its value.
-    box->mfro->params.parentSize = static_cast<uint32_t>(box->size);
-    return MBX_OK;
+    return MbxSetMfroParentSize(box->mfro, box->size);
 }
 
 // 8.8.9 Movie Fragment Random Access Box

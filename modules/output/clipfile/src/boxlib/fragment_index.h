@@ -60,6 +60,10 @@ MbxStatus MbxWriteMfroBox(MbxContext* context, const MbxOptions* options, MbxFil
                           const MbxMfroBox* box, uint64_t* written, uint64_t* accumulated);
 MbxStatus MbxFreeMfro(MbxContext* context, MbxMfroBox* box);
 
+// Tells `mfro` the size of the whole `mfra`, in bytes. MBX_ERR_BAD_STATE for one that needs more than 32
+// bits.
+MbxStatus MbxSetMfroParentSize(MbxMfroBox* box, uint64_t size);
+
 // `mfra`, mandatory: a `tfra` for every track with rows, then `mfro`. MBX_ERR_BAD_STATE when it needs more
 // than 32 bits to tell its size.
 MbxStatus MbxBuildMfra(MbxContext* context, const MbxScratch* scratch, const MbxOptions* options,

@@ -220,6 +220,16 @@ TEST_F(FragmentIndexTest, ThreeHundredRunsMakeATwoByteRunNumber) {
     EXPECT_BYTES(Bytes(bytes.end() - 4, bytes.end()), Hex("01 012C 01"));
 }
 
+TEST_F(FragmentIndexTest, ASampleNumberOf256MakesATwoByteSampleNumber) {
+    addTrack();
+    openFragment();
+    for (uint32_t i = 1; i <= 256; i++) ASSERT_EQ(add(sample(1, 1), 1, i >= 255), MBX_OK);
+    ASSERT_EQ(endChunk(), MBX_OK);
+    EXPECT_BYTES(tfra(), Hex("00000030 'tfra' 00000000 0000000A 00000001 00000002"
+                             "000000FE 00000000 01 01 00FF"
+                             "000000FF 00000000 01 01 0100"));
+}
+
 TEST_F(FragmentIndexTest, TrafNumbersAbove255TakeTwoBytes) {
     for (int i = 0; i < 256; i++) addTrack();
     openFragment();
@@ -265,6 +275,24 @@ TEST_F(FragmentIndexTest, TfraVersionInEachModeAtTheEdge) {
     }
 }
 
+TEST_F(FragmentIndexTest, TfraVersionLooksAtThePositionOfTheLastFragmentAlone) {
+    options.time_version_mode = 1;
+    MbxTrack* track = addTrack();
+    openFragment();
+    openFragment();
+    addRow(track, {1, 1, 1, 1, 1});
+    addRow(track, {2, 2, 1, 1, 1});
+    MbxFindSegment(track, 1)->fragmentOffset = 0x100000005;  // cut without a word
+    MbxFindSegment(track, 2)->fragmentOffset = 6;
+    EXPECT_BYTES(tfra(), Hex("0000002E 'tfra' 00000000 0000000A 00000000 00000002"
+                             "00000001 00000005 01 01 01"
+                             "00000002 00000006 01 01 01"));
+    MbxFindSegment(track, 2)->fragmentOffset = 0x100000006;
+    EXPECT_BYTES(tfra(), Hex("0000003E 'tfra' 01000000 0000000A 00000000 00000002"
+                             "0000000000000001 0000000100000005 01 01 01"
+                             "0000000000000002 0000000100000006 01 01 01"));
+}
+
 TEST_F(FragmentIndexTest, MehdMode0AndTimeVersionMode0StillMakeTfraVersion1) {
     options = {};
     MbxTrack* track = addTrack();
@@ -280,18 +308,31 @@ TEST_F(FragmentIndexTest, ARowOfAFragmentThatTheTrackLacksIsNotFound) {
     EXPECT_EQ(write(), MBX_ERR_NOT_FOUND);
 }
 
-TEST_F(FragmentIndexTest, RowsUseTheScratchUpTo8192Bytes) {
+TEST_F(FragmentIndexTest, RowsUseTheScratchUpTo8192BytesAndABlockBeyond) {
     MbxTrack* track = addTrack();
     openFragment();
-    for (uint32_t i = 0; i < 744; i++) addRow(track, {i, 1, 1, 1, 1});  // 744 rows of 11 bytes: 8184
-    const auto allocations = [&] {
+    // Rows of 16 bytes: four of the run number and three of the sample number.
+    const auto allocationsOf = [&](uint32_t rows) {
+        uint32_t present = 0;
+        EXPECT_EQ(MbxBlockListCount(&track->fragmentIndex, &present), MBX_OK);
+        for (; present < rows; present++) addRow(track, {present, 1, 1, 0x1000000, 0x10000});
         const uint64_t before = host.allocations;
         EXPECT_EQ(write(), MBX_OK);
+        EXPECT_EQ(size, 8U + 24 + rows * 16 + 16);
         return host.allocations - before;
     };
-    const uint64_t inScratch = allocations();
-    addRow(track, {744, 1, 1, 1, 1});
-    EXPECT_EQ(allocations(), inScratch + 3);  // measured in `tfra` and in `mfra`, and written
+    const uint64_t inScratch = allocationsOf(511);
+    EXPECT_EQ(allocationsOf(512), inScratch);      // 8192 bytes
+    EXPECT_EQ(allocationsOf(513), inScratch + 3);  // measured in `tfra` and in `mfra`, and written
+}
+
+TEST_F(FragmentIndexTest, AnMfraAbove32BitsIsBadState) {
+    MbxMfroBox box = {};
+    EXPECT_EQ(MbxSetMfroParentSize(&box, 0xFFFFFFFF), MBX_OK);
+    EXPECT_EQ(box.params.parentSize, 0xFFFFFFFFU);
+    EXPECT_EQ(MbxSetMfroParentSize(&box, 0x100000000), MBX_ERR_BAD_STATE);
+    EXPECT_EQ(box.params.parentSize, 0xFFFFFFFFU);
+    EXPECT_EQ(MbxSetMfroParentSize(nullptr, 1), MBX_ERR_INVALID_ARG);
 }
 
 TEST_F(FragmentIndexTest, MfraRefusesNullArguments) {

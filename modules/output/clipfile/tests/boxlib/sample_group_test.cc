@@ -170,6 +170,24 @@ TEST_F(SampleGroupTest, SgpdRawEntriesOfDifferentLengthsCarryTheirOwn) {
                                  "00000000"));
 }
 
+TEST_F(SampleGroupTest, SgpdRawEntriesWithoutBytesCarryTheirLength) {
+    std::list<MbxGroupDescription> raw(2);
+    ASSERT_EQ(sgpd({MbxCode("roll"), 1, linked(raw), nullptr}), MBX_OK);
+    EXPECT_BYTES(file.bytes, Hex("00000020 'sgpd' 01000000 'roll' 00000000 00000002 00000000 00000000"));
+}
+
+TEST_F(SampleGroupTest, SgpdRowsUseTheScratchUpTo8192BytesAndABlockBeyond) {
+    Bytes content = Repeat(0x5A, 8193);
+    for (const uint32_t length : {8191U, 8192U, 8193U}) {
+        std::list<MbxGroupDescription> raw(1);
+        raw.front().raw = {content.data(), length};
+        const uint64_t before = host.allocations;
+        ASSERT_EQ(sgpd({MbxCode("roll"), 1, linked(raw), nullptr}), MBX_OK);
+        EXPECT_EQ(host.allocations - before, length > 8192 ? 2U : 0U);  // measured and written
+        EXPECT_EQ(Bytes(file.bytes.begin() + 24, file.bytes.end()), Repeat(0x5A, length));
+    }
+}
+
 TEST_F(SampleGroupTest, SgpdTemporalLevelIsItsTopBit) {
     std::list<MbxGroupDescription> levels(2);
     levels.front().levelIndependentlyDecodable = 1;
@@ -203,6 +221,24 @@ TEST_F(SampleGroupTest, SubsVersionInEachModeAtTheEdge) {
                                          (c.version == 1 ? size : Bytes(size.begin() + 2, size.end())) +
                                          Hex("00 00 00000000"));
         }
+    }
+}
+
+TEST_F(SampleGroupTest, SubsRowsUseTheScratchUpTo8192BytesAndABlockBeyond) {
+    options.time_version_mode = 3;  // ten bytes a sub-sample
+    // Samples of six bytes each: 2 with 818 sub-samples are 8192 bytes, 3 with 818 are 8198.
+    for (const size_t entries : {size_t{1}, size_t{2}, size_t{3}}) {
+        std::list<MbxSubSample> subs(818);
+        std::list<MbxSubSampleParams> samples(entries);
+        const MbxList<MbxSubSampleParams> all = linked(samples);
+        samples.back().subSamples = linked(subs);
+        MbxSubsBox box = {};
+        const uint64_t before = host.allocations;
+        ASSERT_EQ(MbxBuildSubs(context, &session.scratch, &options, all.first, &box), MBX_OK);
+        EXPECT_EQ(MbxWriteSubsBox(context, &session.scratch, &options, &file, 0, &box, nullptr, nullptr),
+                  MBX_OK);
+        EXPECT_EQ(box.size, 16 + 6 * entries + 8180);
+        EXPECT_EQ(host.allocations - before, entries > 2 ? 2U : 0U);  // measured and written
     }
 }
 

@@ -109,6 +109,9 @@ class Recording {
         }
         if (refused_) return;
         fragments_ = fragments;
+        if (oneIn(&random_, 4)) {
+            EXPECT_EQ(MbxReleaseFragment(session_, 0), fragments != 0 ? MBX_OK : MBX_ERR_BAD_STATE);
+        }
         writeMoov();
         if (refused_) return;
         writeMfra();
@@ -128,6 +131,7 @@ class Recording {
             MbxTrackParams params = TrackParams(i + 1, plan.timescale);
             for (uint32_t& word : params.defaultsForced) word = below(&random_, 2);
             for (uint32_t& word : params.perSampleForced) word = below(&random_, 2);
+            if (oneIn(&random_, 3)) params.fragmentDefaults[0] = 2;
             if (oneIn(&random_, 3)) params.fragmentDefaults[1] = 7;
             if (oneIn(&random_, 3)) params.fragmentDefaults[2] = 17;
             if (oneIn(&random_, 3)) params.fragmentDefaults[3] = 0x00010000;
@@ -167,7 +171,8 @@ class Recording {
     uint64_t enterChunk(uint32_t index, uint32_t fragment, uint32_t description, uint32_t trun,
                         uint64_t payload) {
         EnteredTrack& track = tracks_[index];
-        const uint32_t count = 1 + below(&random_, 6);
+        // A long one makes a number in the index that needs two bytes.
+        const uint32_t count = oneIn(&random_, 100) ? 250 + below(&random_, 20) : 1 + below(&random_, 6);
         const uint64_t offset = payload;
         if (index == 0 && fragment == 0 && trun == 1) firstChunkSize_ = count;
         for (uint32_t i = 0; i < count; i++) {
@@ -448,6 +453,7 @@ TEST_P(SamplePropertyTest, AReaderGetsBackWhatWasEnteredOverAllConfigurations) {
         options.trun_offset_mode = draw(2);
         options.trun_version_mode = draw(2);
         options.tfdt_mode = draw(2);
+        options.reserved = rest;  // without effect
         for (int i = 0; i < 3; i++) {
             SCOPED_TRACE("seed " + std::to_string(++seed) + ", configuration " + print(options));
             Recording recording(options, seed);

@@ -1,3 +1,4 @@
+#include "boxlib/session.h"
 #include "fixture.h"
 #include "track_fixture.h"
 
@@ -30,6 +31,26 @@ class SessionFragmentTest : public SessionTest {
         sample.descriptionIndex = 1;
         ASSERT_EQ(MbxAddSample(session, 1, &sample, randomAccess), MBX_OK);
         ASSERT_EQ(MbxEndChunk(session, 1), MBX_OK);
+    }
+
+    // One fragment behind what `moov` reports, sealed and with a row in the index, written with one word of
+    // the configuration changed.
+    struct Outcome {
+        MbxStatus moov, moof, mfra;
+        Bytes fragment;
+    };
+
+    Outcome outcomeOf(uint32_t MbxOptions::*word, uint32_t value) {
+        const MbxOptions original = session->config;
+        session->config.*word = value;
+        Outcome outcome = {};
+        MemoryFile target;
+        outcome.moov = MbxWriteMoov(session, nullptr, 0, &size);
+        outcome.moof = MbxWriteMoof(session, &target, 1, 0, &size);
+        outcome.mfra = MbxWriteMfra(session, nullptr, 0, &size);
+        outcome.fragment = target.bytes;
+        session->config = original;
+        return outcome;
     }
 
     uint64_t size = 0;
@@ -80,6 +101,43 @@ TEST_F(SessionFragmentTest, AFragmentIsSealedPlacedWrittenReleasedAndIndexed) {
                                   "0000002B 'tfra' 01000000 00000007 00000000 00000001"
                                   "0000000000000064 0000000000000100 01 01 01"
                                   "00000010 'mfro' 00000000 00000043"));
+}
+
+// What no documented mode is: some words are refused, the others are taken for the mode next to them.
+TEST_F(SessionFragmentTest, EveryWordOfTheConfigurationHasItsAnswerToAnUnknownMode) {
+    createTrack();
+    addChunk(0x1000, 0);
+    ASSERT_EQ(MbxSealFirstFragment(session), MBX_OK);
+    addChunk(0x1010, 1);
+    addChunk(0x1020, 0);
+    ASSERT_EQ(MbxSealFragment(session), MBX_OK);
+    struct Case {
+        const char* name;
+        uint32_t MbxOptions::*word;
+        uint32_t unknown;
+        MbxStatus moov, moof, mfra;
+        uint32_t taken;  // the mode that it is taken for
+    };
+    constexpr MbxStatus kRefused = MBX_ERR_INVALID_ARG;
+    for (const Case& c :
+         {Case{"box size", &MbxOptions::box_size_mode, 3, kRefused, kRefused, kRefused, 3},
+          Case{"time version", &MbxOptions::time_version_mode, 4, MBX_ERR_INTERNAL, MBX_OK, MBX_OK, 2},
+          Case{"chunk offset", &MbxOptions::chunk_offset_mode, 3, MBX_OK, MBX_OK, MBX_OK, 1},
+          Case{"mehd", &MbxOptions::mehd_mode, 4, MBX_OK, MBX_OK, MBX_OK, 1},
+          Case{"base offset", &MbxOptions::base_offset_mode, 3, MBX_OK, kRefused, MBX_OK, 3},
+          Case{"trun offset", &MbxOptions::trun_offset_mode, 2, MBX_OK, MBX_OK, MBX_OK, 1},
+          Case{"trun version", &MbxOptions::trun_version_mode, 2, MBX_OK, MBX_OK, MBX_OK, 0},
+          Case{"tfdt", &MbxOptions::tfdt_mode, 2, MBX_OK, MBX_OK, MBX_OK, 0},
+          Case{"reserved", &MbxOptions::reserved, 7, MBX_OK, MBX_OK, MBX_OK, 0}}) {
+        SCOPED_TRACE(c.name);
+        const Outcome outcome = outcomeOf(c.word, c.unknown);
+        EXPECT_EQ(outcome.moov, c.moov);
+        EXPECT_EQ(outcome.moof, c.moof);
+        EXPECT_EQ(outcome.mfra, c.mfra);
+        if (c.moof == MBX_OK) {
+            EXPECT_BYTES(outcome.fragment, outcomeOf(c.word, c.taken).fragment);
+        }
+    }
 }
 
 }  // namespace

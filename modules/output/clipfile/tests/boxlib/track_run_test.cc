@@ -193,6 +193,29 @@ TEST_F(TrackRunTest, DataOffsetIsLeftOutWhereTheRunFollowsTheOneBeforeUnlessTheM
     EXPECT_BYTES(next(), Hex("00 000001 00000001 000000C9"));
 }
 
+TEST_F(TrackRunTest, ARunThatGoesBackToTheBaseHasADataOffset) {
+    options.trun_offset_mode = 1;
+    addSamples({sample()}, 1000);
+    addSamples({sample()}, 1000);  // a reader without an offset would go on at 1100
+    rewind();
+    EXPECT_BYTES(next(), Hex("00 000000 00000001"));
+    EXPECT_BYTES(next(), Hex("00 000001 00000001 00000000"));
+}
+
+TEST_F(TrackRunTest, ANegativeCompositionOffsetAloneIsListed) {
+    EXPECT_BYTES(only({withOffset(0), withOffset(-1)}), Hex("00 000801 00000002 00000000 00000000 FFFFFFFF"));
+}
+
+TEST_F(TrackRunTest, ARun2To31BytesBehindTheBaseOverflowsInBaseOffsetMode0AndPassesInMode1) {
+    addSamples({sample()}, 1000 + 0x80000000ULL);
+    rewind();
+    Bytes bytes;
+    EXPECT_EQ(next(&bytes), MBX_ERR_OVERFLOW);
+    options.base_offset_mode = 1;
+    rewind();
+    EXPECT_BYTES(next(), Hex("00 000001 00000001 80000000"));
+}
+
 TEST_F(TrackRunTest, AFarRunOverflowsInBaseOffsetMode0AndIsCutInTheOthers) {
     struct Case {
         uint64_t base, offset;

@@ -135,6 +135,16 @@ TEST_F(VersionTest, ValuesFollowTheModes) {
     EXPECT_EQ(value(3, false), "1");
 }
 
+TEST_F(VersionTest, UnknownModeIsAsMode2ForTheFragmentIndexAndValues) {
+    for (const uint32_t m : {4U, UINT32_MAX}) {
+        EXPECT_EQ(index(m, kFits, kFits), "0");
+        EXPECT_EQ(index(m, kWide, 0), "bad state");
+        EXPECT_EQ(index(m, 0, kWide), "bad state");
+        EXPECT_EQ(value(m, false), "0");
+        EXPECT_EQ(value(m, true), "bad state");
+    }
+}
+
 TEST_F(VersionTest, ChoosersRefuseNullArguments) {
     uint32_t version = 9;
     EXPECT_EQ(MbxChooseTimeVersion(nullptr, 0, 0, 0, &version), MBX_ERR_INVALID_ARG);
