@@ -193,24 +193,26 @@ MbxStatus MbxEndChunk(MbxSession* session, uint32_t track);
 // chunk.
 MbxStatus MbxShiftChunkOffsets(MbxSession* session, uint32_t track, uint32_t chunk, int64_t delta);
 
-// The same for one sealed fragment (0: all) instead of what `moov` reports. MBX_ERR_OVERFLOW is forgiven when
-// base_offset_mode is not 0.
+// The same for one fragment (0: all) instead of what `moov` reports. MBX_ERR_NOT_FOUND for a fragment that a
+// track lacks; MBX_ERR_OVERFLOW is forgiven when base_offset_mode is not 0.
 MbxStatus MbxShiftFragmentOffsets(MbxSession* session, uint32_t fragment, uint32_t track, uint32_t chunk,
                                   int64_t delta);
 
-// Tells where the fragment's `moof` stands, for the fragment index. MBX_ERR_NOT_FOUND when a track lacks the
-// fragment.
+// Tells where the fragment's `moof` stands, for the fragment index. MBX_ERR_INVALID_ARG for fragment 0,
+// MBX_ERR_NOT_FOUND when a track lacks the fragment.
 MbxStatus MbxSetFragmentBase(MbxSession* session, uint32_t fragment, uint64_t position);
 
-// Ends what `moov` reports and opens fragment 1. MBX_ERR_BAD_STATE with an open chunk, or the second time.
+// Ends what `moov` reports and opens fragment 1. MBX_ERR_BAD_STATE with an open chunk, or the second time;
+// MBX_ERR_OVERFLOW when a track's decode time leaves 64 bits. Nothing changes on failure.
 MbxStatus MbxSealFirstFragment(MbxSession* session);
 
 // Ends the open fragment and opens the next. MBX_ERR_BAD_STATE with an open chunk, or before
-// MbxSealFirstFragment.
+// MbxSealFirstFragment; otherwise as MbxSealFirstFragment.
 MbxStatus MbxSealFragment(MbxSession* session);
 
 // Releases the sample tables of a written fragment, or with 0 of all but the open one, for which there must
-// be at least two (MBX_ERR_BAD_STATE). The fragment keeps its times and position.
+// be at least two (MBX_ERR_BAD_STATE). MBX_ERR_BAD_STATE for the open fragment, MBX_ERR_NOT_FOUND beyond it.
+// The fragment keeps its times and position.
 MbxStatus MbxReleaseFragment(MbxSession* session, uint32_t fragment);
 
 // ---- Writing ----
@@ -230,11 +232,14 @@ MbxStatus MbxWriteWideMdatHeader(MbxSession* session, uint32_t form, MbxFile* fi
 // value needs 64 bits in a mode that forbids them.
 MbxStatus MbxWriteMoov(MbxSession* session, MbxFile* file, uint64_t position, uint64_t* size);
 
-// Measures, and with a file writes, the `moof` of a sealed fragment. MBX_ERR_BAD_STATE for the open fragment
-// or one with samples outside a chunk, MBX_ERR_NOT_FOUND beyond it, MBX_ERR_OVERFLOW for a run that its base
-// offset cannot reach.
+// Measures, and with a file writes, the `moof` of a sealed fragment. MBX_ERR_INVALID_ARG for fragment 0, an
+// unknown base_offset_mode or a forced word of a track above 1; MBX_ERR_BAD_STATE for the open fragment, one
+// with samples outside a chunk, or a time that the mode cannot carry; MBX_ERR_NOT_FOUND beyond the open
+// fragment; MBX_ERR_OVERFLOW for a run that its base offset cannot reach.
 MbxStatus MbxWriteMoof(MbxSession* session, MbxFile* file, uint32_t fragment, uint64_t position,
                        uint64_t* size);
 
 // Measures, and with a file writes, `mfra`: the fragment index of every track that has rows.
+// MBX_ERR_NOT_FOUND for a row of a fragment that its track lacks; MBX_ERR_BAD_STATE for a time or position
+// that the mode cannot carry, or a box above 32 bits.
 MbxStatus MbxWriteMfra(MbxSession* session, MbxFile* file, uint64_t position, uint64_t* size);

@@ -210,6 +210,80 @@ TEST_F(MovieHeaderTest, WideCreationTimeInMode1MakesThatOneBoxVersion1) {
     EXPECT_BYTES(Bytes(moov.begin() + 236, moov.begin() + 248), Hex("00000020 'mdhd' 00000000"));
 }
 
+// The bytes of a box, or none for a build that was refused as the mode's bad state.
+template <typename Box, typename Build, typename Write>
+Bytes writtenOrRefused(Build&& build, Write&& write) {
+    Box box = {};
+    const MbxStatus status = build(&box);
+    if (status == MBX_ERR_BAD_STATE) return {};
+    EXPECT_EQ(status, MBX_OK);
+    MemoryFile target;
+    EXPECT_EQ(write(&target, &box), MBX_OK);
+    return target.bytes;
+}
+
+TEST_F(MovieHeaderTest, TimeBoxesTakeTheirVersionInEachModeAtTheEdge) {
+    constexpr uint64_t kFits = UINT32_MAX;
+    constexpr uint64_t kWide = 0x100000005;
+    constexpr int kRefused = -1;
+    struct Case {
+        uint64_t creation, modification, duration;
+        int version[4];  // by mode
+    };
+    addTrack(1, 0);
+    MbxTrack* track = last();
+    const MbxTrackInMovie inMovie = {track, 1000};
+    for (const Case& c :
+         {Case{kFits, kFits, kFits, {0, 0, 0, 1}}, Case{kWide, kFits, kFits, {0, 1, 0, 1}},
+          Case{kFits, kWide, kFits, {0, 1, 0, 1}}, Case{kFits, kFits, kWide, {0, 1, 0, 1}},
+          Case{kFits, kWide, kWide, {0, 1, 0, 1}}, Case{kWide, kWide, kWide, {kRefused, 1, kRefused, 1}}}) {
+        movie->header.fieldsSet |= MBX_MOVIE_DURATION;
+        track->header.fieldsSet |= MBX_TRACK_DURATION;
+        track->mediaHeader.fieldsSet |= MBX_MEDIA_DURATION;
+        movie->header.creationTime = track->header.creationTime = track->mediaHeader.creationTime =
+            c.creation;
+        movie->header.modificationTime = track->header.modificationTime =
+            track->mediaHeader.modificationTime = c.modification;
+        movie->header.duration = track->header.duration = track->mediaHeader.duration = c.duration;
+        for (uint32_t mode = 0; mode < 4; mode++) {
+            SCOPED_TRACE(testing::Message() << "mode " << mode << ", times " << c.creation << " "
+                                            << c.modification << " " << c.duration);
+            options.time_version_mode = mode;
+            const Bytes mvhd = writtenOrRefused<MbxMvhdBox>(
+                [&](MbxMvhdBox* box) { return MbxBuildMvhd(context, &options, movie, box); },
+                [&](MbxFile* target, const MbxMvhdBox* box) {
+                    return MbxWriteMvhdBox(context, &options, target, 0, box, nullptr, nullptr);
+                });
+            const Bytes tkhd = writtenOrRefused<MbxTkhdBox>(
+                [&](MbxTkhdBox* box) { return MbxBuildTkhd(context, &options, &inMovie, box); },
+                [&](MbxFile* target, const MbxTkhdBox* box) {
+                    return MbxWriteTkhdBox(context, &options, target, 0, box, nullptr, nullptr);
+                });
+            const Bytes mdhd = writtenOrRefused<MbxMdhdBox>(
+                [&](MbxMdhdBox* box) { return MbxBuildMdhd(context, &options, track, box); },
+                [&](MbxFile* target, const MbxMdhdBox* box) {
+                    return MbxWriteMdhdBox(context, &options, target, 0, box, nullptr, nullptr);
+                });
+            if (c.version[mode] == kRefused) {
+                EXPECT_TRUE(mvhd.empty() && tkhd.empty() && mdhd.empty());
+                continue;
+            }
+            const bool isWide = c.version[mode] == 1;
+            ASSERT_EQ(mvhd.size(), isWide ? 120U : 108U);
+            ASSERT_EQ(tkhd.size(), isWide ? 104U : 92U);
+            ASSERT_EQ(mdhd.size(), isWide ? 44U : 32U);
+            // Version 0 holds the low 32 bits.
+            const auto creation = static_cast<uint32_t>(c.creation);
+            const Bytes expected =
+                isWide ? Words({static_cast<uint32_t>(c.creation >> 32), creation}) : Words({creation});
+            for (const Bytes* box : {&mvhd, &tkhd, &mdhd}) {
+                EXPECT_EQ((*box)[8], isWide ? 1U : 0U);
+                EXPECT_BYTES(Bytes(box->begin() + 12, box->begin() + (isWide ? 20 : 16)), expected);
+            }
+        }
+    }
+}
+
 TEST_F(MovieHeaderTest, MovieWithEmptyUserMetadataHasNoUuidBox) {
     addTrack(1, 100);
     const Bytes moov = writeMoov();

@@ -248,6 +248,39 @@ TEST_F(TrackHeaderTest, EditListOfVersion0CutsWhatTheChooserLetPass) {
     EXPECT_BYTES(file.bytes, Hex("0000001C 'elst' 00000000 00000001 23456789 00000005 0001 0000"));
 }
 
+TEST_F(TrackHeaderTest, EditListTakesItsVersionInEachModeAtTheEdge) {
+    constexpr uint64_t kWide = 1ULL << 32;
+    constexpr int64_t kLate = 1LL << 31;
+    constexpr int kRefused = -1;
+    struct Case {
+        uint64_t firstDuration, secondDuration;
+        int64_t firstTime, secondTime;
+        int version[4];  // by mode
+    };
+    for (const Case& c :
+         {Case{kWide - 1, 0, kLate - 1, -kLate, {0, 0, 0, 1}}, Case{kWide, kWide, 0, 0, {0, 1, 0, 1}},
+          Case{0, 0, kLate, -kLate - 1, {0, 1, 0, 1}}, Case{kWide, 0, kLate, 0, {kRefused, 1, kRefused, 1}},
+          Case{0, kWide, -kLate - 1, 0, {kRefused, 1, kRefused, 1}}}) {
+        MbxEdit second = {c.secondDuration, c.secondTime, 1, 0, nullptr};
+        MbxEdit first = {c.firstDuration, c.firstTime, 1, 0, &second};
+        editList.edits = {&first, &second};
+        for (uint32_t mode = 0; mode < 4; mode++) {
+            SCOPED_TRACE(testing::Message()
+                         << "mode " << mode << ", edits " << c.firstDuration << " " << c.firstTime << ", "
+                         << c.secondDuration << " " << c.secondTime);
+            options.time_version_mode = mode;
+            MbxElstBox box = {};
+            const MbxStatus status = MbxBuildElst(context, &options, &editList, &box);
+            EXPECT_EQ(status, c.version[mode] == kRefused ? MBX_ERR_BAD_STATE : MBX_OK);
+            if (status != MBX_OK) continue;
+            MemoryFile target;
+            EXPECT_EQ(MbxWriteElstBox(context, &options, &target, 0, &box, nullptr, nullptr), MBX_OK);
+            ASSERT_EQ(target.bytes.size(), c.version[mode] == 1 ? 56U : 40U);
+            EXPECT_EQ(target.bytes[8], c.version[mode]);
+        }
+    }
+}
+
 TEST_F(TrackHeaderTest, HolderWithoutAnEditIsWrittenAsAnEmptyList) {
     MbxEdtsBox* box = nullptr;
     ASSERT_EQ(MbxNew(context, &box), MBX_OK);
