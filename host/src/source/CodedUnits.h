@@ -1,0 +1,31 @@
+#pragma once
+
+#include <cstdint>
+#include <functional>
+#include <memory>
+
+namespace receiver {
+
+/// A coded picture on its way to a unit: an access unit as Annex B byte stream.
+struct CodedPicture {
+    std::shared_ptr<unsigned char> data;
+    std::size_t size = 0;
+    /// Ticks of 90000 a second, on the line of the source.
+    std::int64_t time = 0;
+    /// An IDR frame.
+    bool keyFrame = false;
+};
+
+/// A coded audio frame: AAC LC, 48 kHz, stereo, 1024 samples, with its ADTS header.
+struct CodedAudio {
+    std::shared_ptr<unsigned char> data;
+    std::size_t size = 0;
+    /// Ticks of 48000 a second, on the line of the source.
+    std::int64_t time = 0;
+};
+
+using PictureSink = std::function<void(const CodedPicture&)>;
+using AudioSink = std::function<void(const CodedAudio&)>;
+using NoticeSink = std::function<void(const std::string&)>;
+
+}  // namespace receiver

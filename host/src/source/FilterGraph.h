@@ -1,0 +1,28 @@
+#pragma once
+
+#include <string>
+
+#include "source/Libav.h"
+
+namespace receiver {
+
+/// A chain of libavfilter from sources within it, or from one that is fed, to one end.
+class FilterGraph {
+ public:
+    /// `chain` as FFmpeg's programs write it, from its sources on ("testsrc2=size=64x64,format=yuv420p").
+    /// `fed` names a source of the chain that `Feed` feeds, without arguments of its own: "buffer@in=...".
+    /// `video` tells what comes out. Throws `ReceiverError` (`kInternal`).
+    FilterGraph(const std::string& chain, bool video);
+
+    /// The next frame, into an empty `frame`. False when the chain has none (yet).
+    bool Pull(AVFrame& frame);
+    /// Gives a frame to the source `name` of the chain; null tells the end. Takes over its reference.
+    void Feed(const char* name, AVFrame* frame);
+    AVRational TimeBase() const;
+
+ private:
+    libav::Owner<AVFilterGraph> graph_;
+    AVFilterContext* sink_ = nullptr;
+};
+
+}  // namespace receiver

@@ -1,0 +1,26 @@
+#pragma once
+
+#include <deque>
+#include <string>
+#include <variant>
+
+#include "source/SourceInterface.h"
+
+namespace receiver {
+
+/// Units and sentences for the operator, in the order in which they came to be.
+using Batch = std::deque<std::variant<SourceUnit, std::string>>;
+
+/// Makes units as fast as it can, on a thread of its own.
+class ProducerInterface {
+ public:
+    virtual ~ProducerInterface() = default;
+    virtual const SourceDescription& Description() const = 0;
+    /// Appends what comes next, if anything. False when nothing follows. Waits where the source makes it
+    /// wait, but not beyond a stop. Throws `ReceiverError` when the source cannot be recorded after all.
+    virtual bool Produce(Batch& batch) = 0;
+    /// From any thread.
+    virtual SourceCounts Counts() const = 0;
+};
+
+}  // namespace receiver

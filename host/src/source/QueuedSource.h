@@ -1,0 +1,57 @@
+#pragma once
+
+#include <condition_variable>
+#include <exception>
+#include <memory>
+#include <mutex>
+#include <thread>
+
+#include "source/Interrupt.h"
+#include "source/ProducerInterface.h"
+#include "source/SourceInterface.h"
+#include "timing/Pacer.h"
+
+namespace receiver {
+
+/// A source whose units a producer makes on a thread of this class, so that no wait of the producer (network,
+/// decoder, a pause between attempts) holds up who reads; hands them over when they are due.
+class QueuedSource final : public SourceInterface {
+ public:
+    /// `interrupt` is the one that ends the producer's waits. The producer works ahead until `capacity` units
+    /// wait. `listener` must live as long as this.
+    QueuedSource(std::unique_ptr<ProducerInterface> producer, std::shared_ptr<Interrupt> interrupt,
+                 Pacer pacer, std::size_t capacity, SourceListenerInterface& listener);
+    QueuedSource(const QueuedSource&) = delete;
+    QueuedSource& operator=(const QueuedSource&) = delete;
+    ~QueuedSource() override;
+
+    const SourceDescription& Description() const override { return producer_->Description(); }
+    Result Read(SourceUnit& unit) override;
+    SourceCounts Counts() const override { return producer_->Counts(); }
+    void Stop() override;
+
+ private:
+    void Run();
+
+    const std::unique_ptr<ProducerInterface> producer_;
+    const std::shared_ptr<Interrupt> interrupt_;
+    const std::size_t capacity_;
+    SourceListenerInterface& listener_;
+    /// Of the reading thread alone.
+    Pacer pacer_;
+
+    /// Guards what follows.
+    std::mutex mutex_;
+    std::condition_variable changed_;
+    Batch queue_;
+    /// Bytes of the units in the queue.
+    std::size_t queued_ = 0;
+    bool stopped_ = false;
+    bool ended_ = false;
+    /// What ended the producer, until it was thrown once.
+    std::exception_ptr failure_;
+
+    std::thread thread_;
+};
+
+}  // namespace receiver

@@ -1,0 +1,54 @@
+#include "timing/AudioGrid.h"
+
+namespace receiver {
+namespace {
+
+/// What the stamps of a source may wander before a whole frame counts as missing or extra. Above half a
+/// frame, so that a correction does not call for its opposite.
+constexpr std::int64_t kTolerance = AudioGrid::kFrame * 3 / 4;
+
+/// `samples`, not below -512, in frames, to the nearest.
+constexpr std::int64_t Frames(std::int64_t samples) {
+    return (samples + AudioGrid::kFrame / 2) / AudioGrid::kFrame;
+}
+
+}  // namespace
+
+void AudioGrid::AddVideoGap(std::int64_t begin, std::int64_t length) {
+    gaps_.push_back({begin, length});
+}
+
+std::int64_t AudioGrid::End() {
+    while (!gaps_.empty() && gaps_.front().begin <= next_ + kFrame / 2) {
+        remainder_ += gaps_.front().length;
+        gaps_.pop_front();
+        const std::int64_t frames = Frames(remainder_);
+        remainder_ -= frames * kFrame;
+        next_ += frames * kFrame;
+        passedUntil_ = next_;
+    }
+    return next_;
+}
+
+std::int64_t AudioGrid::Append() {
+    const std::int64_t time = End();
+    begun_ = true;
+    next_ += kFrame;
+    return time;
+}
+
+AudioGrid::Place AudioGrid::Next(std::int64_t time) {
+    if (!begun_ && time >= 0) {
+        begun_ = true;
+        next_ = time % kFrame;
+    }
+    const std::int64_t end = End();
+    if (time < 0 || time < end - kTolerance) {
+        const bool passedOver = time >= 0 && time < passedUntil_;
+        return {passedOver ? Action::kVideoMissing : Action::kOverlap, time};
+    }
+    next_ += kFrame;
+    return {time > end + kTolerance ? Action::kFill : Action::kAccept, end};
+}
+
+}  // namespace receiver

@@ -1,0 +1,64 @@
+#pragma once
+
+#include <cstdint>
+#include <deque>
+
+namespace receiver {
+
+/// Puts audio frames of 1024 samples one directly behind the other. The recorder counts audio and video units
+/// and lays the two against each other by these counts, so a missing or an extra audio frame would move the
+/// sound of every later file against its picture. Therefore:
+///
+/// - a gap in the audio alone is filled with frames of silence, and a frame that overlaps what is there is
+/// left
+///   out;
+/// - where video frames are missing, the audio that belongs to them is left out too, and its time passes: the
+///   counts stay together, and so do sound and picture.
+///
+/// Samples at 48000 a second. Not for several threads.
+class AudioGrid {
+ public:
+    static constexpr std::int64_t kFrame = 1024;
+
+    /// Video is missing from `begin` on for `length` samples.
+    void AddVideoGap(std::int64_t begin, std::int64_t length);
+
+    enum class Action {
+        /// The frame stands at `time`.
+        kAccept,
+        /// A frame of silence stands at `time`; ask again for the same frame.
+        kFill,
+        /// The frame is left out: its place is taken, or it is from before the beginning.
+        kOverlap,
+        /// The frame is left out: it belongs to video that is missing.
+        kVideoMissing,
+    };
+    struct Place {
+        Action action = Action::kAccept;
+        std::int64_t time = 0;
+    };
+    /// The place of the next frame, which the source stamps with `time`. The first frame stands where it is,
+    /// and silence leads up to it.
+    Place Next(std::int64_t time);
+
+    /// Where the next frame would stand, the audio of missing video passed over.
+    std::int64_t End();
+    /// Enters a frame of silence at `End` that no frame of the source asked for, and gives its time.
+    std::int64_t Append();
+
+ private:
+    struct Gap {
+        std::int64_t begin = 0;
+        std::int64_t length = 0;
+    };
+
+    std::deque<Gap> gaps_;
+    /// What gaps left over that is less than half a frame, or was taken too much.
+    std::int64_t remainder_ = 0;
+    std::int64_t next_ = 0;
+    /// End of the time that was passed over last.
+    std::int64_t passedUntil_ = 0;
+    bool begun_ = false;
+};
+
+}  // namespace receiver

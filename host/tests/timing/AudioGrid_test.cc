@@ -1,0 +1,126 @@
+#include "timing/AudioGrid.h"
+
+#include <gtest/gtest.h>
+
+namespace receiver {
+
+using Action = AudioGrid::Action;
+
+static bool operator==(const AudioGrid::Place& a, const AudioGrid::Place& b) {
+    return a.action == b.action && a.time == b.time;
+}
+static void PrintTo(const AudioGrid::Place& place, std::ostream* out) {
+    *out << "action " << static_cast<int>(place.action) << " at " << place.time;
+}
+
+namespace {
+
+using Place = AudioGrid::Place;
+
+TEST(AudioGrid, FramesStandOneBehindTheOtherWhateverTheirStampsWander) {
+    AudioGrid grid;
+    EXPECT_EQ(grid.Next(10), (Place{Action::kAccept, 10}));
+    EXPECT_EQ(grid.Next(1034 + 700), (Place{Action::kAccept, 1034}));
+    EXPECT_EQ(grid.Next(2058 - 700), (Place{Action::kAccept, 2058}));
+}
+
+TEST(AudioGrid, SilenceLeadsUpToAFirstFrameThatComesLate) {
+    AudioGrid grid;
+    EXPECT_EQ(grid.Next(2058), (Place{Action::kFill, 10}));
+    EXPECT_EQ(grid.Next(2058), (Place{Action::kFill, 1034}));
+    EXPECT_EQ(grid.Next(2058), (Place{Action::kAccept, 2058}));
+}
+
+TEST(AudioGrid, AGapIsFilled) {
+    AudioGrid grid;
+    grid.Next(0);
+    EXPECT_EQ(grid.Next(3072 + 5), (Place{Action::kFill, 1024}));
+    EXPECT_EQ(grid.Next(3072 + 5), (Place{Action::kFill, 2048}));
+    EXPECT_EQ(grid.Next(3072 + 5), (Place{Action::kAccept, 3072}));
+}
+
+TEST(AudioGrid, FramesFromBeforeTheBeginningAreLeftOut) {
+    AudioGrid grid;
+    EXPECT_EQ(grid.Next(-1).action, Action::kOverlap);
+    EXPECT_EQ(grid.Next(1023), (Place{Action::kAccept, 1023}));
+}
+
+TEST(AudioGrid, AFrameThatOverlapsIsLeftOut) {
+    AudioGrid grid;
+    grid.Next(0);
+    EXPECT_EQ(grid.Next(100).action, Action::kOverlap);
+    EXPECT_EQ(grid.Next(1024), (Place{Action::kAccept, 1024}));
+}
+
+TEST(AudioGrid, AClockThatDriftsGivesOneFrameForEachFrameOfDriftAndNoMore) {
+    AudioGrid grid;
+    int fills = 0;
+    for (std::int64_t n = 0; n < 10000; ++n) {
+        // One frame in a thousand: ten in all.
+        const std::int64_t stamp = n * 1024 + n;
+        Place place = grid.Next(stamp);
+        while (place.action == Action::kFill) {
+            ++fills;
+            place = grid.Next(stamp);
+        }
+        ASSERT_EQ(place.action, Action::kAccept);
+    }
+    EXPECT_EQ(fills, 10);
+}
+
+TEST(AudioGrid, TheAudioOfMissingVideoIsLeftOutAndItsTimePasses) {
+    AudioGrid grid;
+    grid.Next(0);
+    grid.AddVideoGap(1024, 2048);
+    EXPECT_EQ(grid.Next(1024).action, Action::kVideoMissing);
+    EXPECT_EQ(grid.Next(2048).action, Action::kVideoMissing);
+    EXPECT_EQ(grid.Next(3072), (Place{Action::kAccept, 3072}));
+}
+
+TEST(AudioGrid, AGapOfBothMediaIsNotFilled) {
+    AudioGrid grid;
+    grid.Next(0);
+    grid.AddVideoGap(1024, 10240);
+    EXPECT_EQ(grid.Next(11264), (Place{Action::kAccept, 11264}));
+}
+
+TEST(AudioGrid, AudioThatWasMissingBeforeTheVideoIsFilledUpToIt) {
+    AudioGrid grid;
+    grid.Next(0);
+    grid.AddVideoGap(3072, 10240);
+    EXPECT_EQ(grid.Next(13312), (Place{Action::kFill, 1024}));
+    EXPECT_EQ(grid.Next(13312), (Place{Action::kFill, 2048}));
+    EXPECT_EQ(grid.Next(13312), (Place{Action::kAccept, 13312}));
+}
+
+TEST(AudioGrid, ManySmallGapsAddUpToWholeFrames) {
+    AudioGrid grid;
+    std::int64_t accepted = 0;
+    std::int64_t leftOut = 0;
+    // A frame of 1920 samples (25 a second) is missing in each of 100 seconds.
+    for (std::int64_t n = 0; n * 1024 < 100 * 48000; ++n) {
+        if (n % 47 == 0) {
+            grid.AddVideoGap(n * 1024 + 3000, 1920);
+        }
+        const Place place = grid.Next(n * 1024);
+        ASSERT_NE(place.action, Action::kFill);
+        ASSERT_NE(place.action, Action::kOverlap);
+        ++(place.action == Action::kAccept ? accepted : leftOut);
+    }
+    // 100 gaps of 1.875 frames.
+    EXPECT_NEAR(static_cast<double>(leftOut), 187.5, 1.0);
+    EXPECT_EQ(accepted + leftOut, 4688);
+}
+
+TEST(AudioGrid, SilenceCanBeMadeWithoutASource) {
+    AudioGrid grid;
+    EXPECT_EQ(grid.Append(), 0);
+    EXPECT_EQ(grid.Append(), 1024);
+    grid.AddVideoGap(2048, 1024);
+    EXPECT_EQ(grid.End(), 3072);
+    EXPECT_EQ(grid.Append(), 3072);
+    EXPECT_EQ(grid.Next(4096 + 5), (Place{Action::kAccept, 4096}));
+}
+
+}  // namespace
+}  // namespace receiver
