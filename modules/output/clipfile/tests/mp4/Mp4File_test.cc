@@ -110,6 +110,20 @@ TEST_F(Mp4FileTest, AMissingDirectoryFailsAtOpeningTheFile) {
     EXPECT_EQ(log.Texts(LOG_PRIORITY_OPERATOR).size(), 0U);
 }
 
+TEST_F(Mp4FileTest, AStepThatFailsInOpenIsLoggedOnceByOpen) {
+    initialize();
+    faults.FailAt(FaultyFiles::kOpen, 1);
+    log.Clear();
+    EXPECT_FALSE(muxer.Open(MakeSettings(directory, 25000), kTimecode, false));
+    const auto line = log.FindIf([](const CapturedLine& at) { return at.priority == LOG_PRIORITY_ERROR; });
+    ASSERT_TRUE(line.has_value());
+    EXPECT_EQ(line->function, "clipfileModule::Mp4File::Open");
+    EXPECT_TRUE(line->file->ends_with("clipfileModule/mp4/Mp4File.cc"));
+    EXPECT_EQ(line->text, "error. error_line = " + std::to_string(line->line) + ", result = 257.");
+    EXPECT_THAT(errorResults(), ElementsAre(MBX_ERR_IO));
+    EXPECT_TRUE(log.Contains(LOG_PRIORITY_DETAIL, "clipfileModule::Mp4File::Open", "end. ret = 0."));
+}
+
 TEST_F(Mp4FileTest, AnUnknownFrameRateFailsAfterTheProfileAndLeavesTheFile) {
     initialize();
     EXPECT_FALSE(muxer.Open(MakeSettings(directory, 26000), kTimecode, false));

@@ -47,6 +47,17 @@ class MuxerFixture : public ::testing::Test {
         return static_cast<std::size_t>(
             std::distance(std::filesystem::directory_iterator(directory.Path()), {}));
     }
+    /// Names of the routines in the order in which they began.
+    std::vector<std::string> routines() const {
+        std::vector<std::string> names;
+        for (const CapturedLine& line : log.Lines()) {
+            if (line.text == "start.") {
+                EXPECT_EQ(line.priority, LOG_PRIORITY_DETAIL);
+                names.push_back(line.function->substr(line.function->rfind(':') + 1));
+            }
+        }
+        return names;
+    }
     /// The numbers at the ends of the error lines, first to last.
     std::vector<long> errorResults() const {
         std::vector<long> results;

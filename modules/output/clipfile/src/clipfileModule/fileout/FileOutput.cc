@@ -205,8 +205,9 @@ bool FileOutput::outputFile(Work& work, std::deque<std::shared_ptr<ChunkData>>& 
             work.owner.SetStatus(kStatusFailed, kCauseFreeSpaceUnknown);
             return true;
         }
-        // The closing boxes must still find room.
-        if (freeSpace < Work::minFreeSpaceWrite + boxSize) {
+        // The closing boxes must still find room. Boxes that could not be measured count 2^64 - 1 bytes,
+        // which no disk has: the sum must not run over.
+        if (freeSpace < Work::minFreeSpaceWrite || freeSpace - Work::minFreeSpaceWrite < boxSize) {
             CLIPFILE_LOG(LOG_PRIORITY_ERROR, "no disk freespace. %llu.",
                          static_cast<unsigned long long>(freeSpace));
             work.owner.SetStatus(kStatusFailed, kCauseDiskFull);

@@ -46,12 +46,12 @@ bool Mp4File::Initialize() {
     m_callbacks = GetFileAccess().callbacks;
     FillSessionConfig(m_session_config);
     MbxContext* context = nullptr;
-    if (routine.Failed(MbxCreateContext(&m_callbacks, &context), __LINE__)) {
+    if (MUXER_FAILED(routine, MbxCreateContext(&m_callbacks, &context))) {
         return routine.Return(false);
     }
     m_context.reset(context);
     MbxSession* session = nullptr;
-    if (routine.Failed(MbxSessionCreate(context, &m_session_config, &session), __LINE__)) {
+    if (MUXER_FAILED(routine, MbxSessionCreate(context, &m_session_config, &session))) {
         return routine.Return(false);
     }
     m_session.reset(session);
@@ -101,8 +101,8 @@ bool Mp4File::Open(const OutputSettings& stream, const unsigned char* timecode, 
     if (!chooseFile(stream, timecode)) {
         return routine.Return(false);
     }
-    if (routine.Failed(createFile(dropFrame), __LINE__) || routine.Failed(beginMdat(), __LINE__)) {
-        routine.Failed(closeFile(), __LINE__);
+    if (createFile(routine, dropFrame) != MBX_OK || beginMdat(routine) != MBX_OK) {
+        MUXER_FAILED(routine, closeFile());
         return routine.Return(false);
     }
     CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: FILE CREATE. (%s)", m_filename.c_str());
@@ -146,8 +146,7 @@ bool Mp4File::createFilename(const std::array<unsigned char, 4>& timecode) {
     }
 }
 
-MbxStatus Mp4File::createFile(bool dropFrame) {
-    MUXER_ROUTINE(routine);
+MbxStatus Mp4File::createFile(MuxerRoutine& routine, bool dropFrame) {
     const std::string path = GetPlatform().NativePath(m_stream.outputPath + "\\" + m_filename);
     MbxFile* file = nullptr;
     MUXER_STEP(routine, GetFileAccess().open(path.c_str(), 0, &file));
@@ -176,8 +175,7 @@ MbxStatus Mp4File::createFtyp() {
     return routine.Return(MBX_OK);
 }
 
-MbxStatus Mp4File::beginMdat() {
-    MUXER_ROUTINE(routine);
+MbxStatus Mp4File::beginMdat(MuxerRoutine& routine) {
     m_mdat_position = m_position;
     std::uint64_t size = 0;
     MUXER_STEP(routine, MbxWriteWideMdatHeader(m_session.get(), kLargeHeader, m_file.get(), m_mdat_position,
@@ -196,7 +194,7 @@ std::uint64_t Mp4File::GetBoxSize() {
     std::uint64_t size = 0;
     const MbxStatus status = MbxWriteMoov(m_session.get(), nullptr, 0, &size);
     static_cast<void>(routine.Return(status));
-    return routine.Failed(status, __LINE__) ? 0 : size;
+    return MUXER_FAILED(routine, status) ? 0 : size;
 }
 
 std::uint64_t Mp4File::GetDuration() {
@@ -221,13 +219,12 @@ bool Mp4File::Close() {
         return routine.ReturnNotOpen();
     }
     CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: FILE CLOSE. (%s)", m_filename.c_str());
-    const bool completed = !routine.Failed(completeFile(), __LINE__);
-    const bool closed = !routine.Failed(closeFile(), __LINE__);
+    const bool completed = completeFile(routine) == MBX_OK;
+    const bool closed = !MUXER_FAILED(routine, closeFile());
     return routine.Return(completed && closed);
 }
 
-MbxStatus Mp4File::completeFile() {
-    MUXER_ROUTINE(routine);
+MbxStatus Mp4File::completeFile(MuxerRoutine& routine) {
     std::uint64_t size = 0;
     MUXER_STEP(routine, MbxWriteWideMdatHeader(m_session.get(), kLargeHeader, m_file.get(), m_mdat_position,
                                                FourCc("mdat"), m_payload, &size));

@@ -15,6 +15,8 @@
 
 namespace clipfileModule {
 
+class MuxerRoutine;
+
 /// What the kinds of file share, and the normal file. The file is modelled by the box library; sample bytes
 /// go past it.
 ///
@@ -55,9 +57,9 @@ class Mp4File : public Mp4Muxer {
     /// Takes over what the file is made from and chooses its name. False when no free name can be told;
     /// nothing was created then.
     bool chooseFile(const OutputSettings& stream, const unsigned char* timecode);
-    /// Creates the chosen file with what stands before its samples, and the movie in memory. A failure leaves
-    /// the file open.
-    MbxStatus createFile(bool dropFrame);
+    /// Creates the chosen file with what stands before its samples, and the movie in memory, as steps of
+    /// `routine`. A failure leaves the file open.
+    MbxStatus createFile(MuxerRoutine& routine, bool dropFrame);
     /// Flushes and closes the file. `MBX_ERR_IO` when bytes did not reach the system; the file is closed all
     /// the same.
     MbxStatus closeFile();
@@ -139,8 +141,9 @@ class Mp4File : public Mp4Muxer {
     MbxStatus createAudioTrack();
     MbxStatus createTimcdTrack();
     MbxStatus createRtmtaTrack();
-    MbxStatus beginMdat();
-    MbxStatus completeFile();
+    // Steps of `Open` and of `Close`.
+    MbxStatus beginMdat(MuxerRoutine& routine);
+    MbxStatus completeFile(MuxerRoutine& routine);
 
     MbxStatus enterSamples(const SamplePass& pass);
     MbxStatus writeTmcd(const unsigned char* timecode);

@@ -26,8 +26,8 @@ bool Mp4File::Write(const std::shared_ptr<ChunkData>& chunk) {
     if (!IsOpen()) {
         return routine.ReturnNotOpen();
     }
-    if (routine.Failed(writeSampleInfo(m_info, *chunk), __LINE__) ||
-        routine.Failed(writeSample(*chunk), __LINE__)) {
+    if (MUXER_FAILED(routine, writeSampleInfo(m_info, *chunk)) ||
+        MUXER_FAILED(routine, writeSample(*chunk))) {
         return routine.Return(false);
     }
     return routine.Return(true);
@@ -115,7 +115,7 @@ bool Mp4File::WriteTmcd(const unsigned char* timecode) {
     if (!IsOpen()) {
         return routine.ReturnNotOpen();
     }
-    return routine.Return(!routine.Failed(writeTmcd(timecode), __LINE__));
+    return routine.Return(!MUXER_FAILED(routine, writeTmcd(timecode)));
 }
 
 MbxStatus Mp4File::writeTmcd(const unsigned char* timecode) {

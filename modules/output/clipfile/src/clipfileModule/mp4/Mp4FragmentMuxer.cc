@@ -50,27 +50,27 @@ bool Mp4FragmentMuxer::Open(const OutputSettings& stream, const unsigned char* t
     if (!chooseFile(stream, timecode)) {
         return routine.Return(false);
     }
-    if (routine.Failed(createFile(dropFrame), __LINE__) || routine.Failed(seekTo(m_position), __LINE__)) {
-        routine.Failed(closeFile(), __LINE__);
+    if (createFile(routine, dropFrame) != MBX_OK || MUXER_FAILED(routine, seekTo(m_position))) {
+        MUXER_FAILED(routine, closeFile());
         return routine.Return(false);
     }
-    CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: FILE CREATE. (%s)", m_filename.c_str());
     return routine.Return(true);
 }
 
 bool Mp4FragmentMuxer::Write(const std::shared_ptr<ChunkData>& chunk) {
     MUXER_ROUTINE(routine);
     if (!IsOpen()) {
-        routine.Failed(MBX_ERR_INTERNAL, __LINE__);
-        return routine.ReturnNotOpen();
+        routine.ReturnNotOpen();
+        MUXER_FAILED(routine, MBX_ERR_INTERNAL);
+        return false;
     }
     ++m_chunk_count;
-    if (routine.Failed(writeSampleInfo(m_info, *chunk), __LINE__)) {
+    if (MUXER_FAILED(routine, writeSampleInfo(m_info, *chunk))) {
         return routine.Return(false);
     }
     m_pending.push_back(chunk);
     m_estimate += m_chunk_estimate;
-    if (m_chunk_count % m_chunks_per_fragment == 0 && routine.Failed(closeMovie(), __LINE__)) {
+    if (m_chunk_count % m_chunks_per_fragment == 0 && MUXER_FAILED(routine, closeMovie())) {
         return routine.Return(false);
     }
     return routine.Return(true);
@@ -100,8 +100,7 @@ MbxStatus Mp4FragmentMuxer::closeMoov() {
     m_moov_position = m_position;
     MUXER_STEP(routine, MbxWriteMoov(session, m_file.get(), m_moov_position, &m_moov_size));
     m_position += m_moov_size;
-    MUXER_STEP(routine, writeMdat());
-    return routine.Return(MBX_OK);
+    return writeMdat(routine);
 }
 
 MbxStatus Mp4FragmentMuxer::closeMoof() {
@@ -121,17 +120,18 @@ MbxStatus Mp4FragmentMuxer::closeMoof() {
     MUXER_STEP(routine, MbxWriteMoof(session, m_file.get(), m_sequence, m_position, &moofSize));
     m_position += moofSize;
     MUXER_STEP(routine, MbxReleaseFragment(session, m_sequence));
-    MUXER_STEP(routine, writeMdat());
-    ++m_sequence;
-    return routine.Return(MBX_OK);
+    const MbxStatus status = writeMdat(routine);
+    if (status == MBX_OK) {
+        ++m_sequence;
+    }
+    return status;
 }
 
 MbxStatus Mp4FragmentMuxer::measureMdatHeader(std::uint64_t& size) {
     return MbxWriteMdatHeader(m_session.get(), nullptr, 0, kMdat, 0, &size);
 }
 
-MbxStatus Mp4FragmentMuxer::writeMdat() {
-    MUXER_ROUTINE(routine);
+MbxStatus Mp4FragmentMuxer::writeMdat(MuxerRoutine& routine) {
     std::uint64_t size = 0;
     MUXER_STEP(routine,
                MbxWriteMdatHeader(m_session.get(), m_file.get(), m_position, kMdat, m_payload, &size));
@@ -156,39 +156,33 @@ std::uint64_t Mp4FragmentMuxer::GetBoxSize() {
     std::uint64_t size = 0;
     const MbxStatus status = MbxWriteMoov(m_session.get(), nullptr, 0, &size);
     static_cast<void>(routine.Return(status));
-    return routine.Failed(status, __LINE__) ? std::numeric_limits<std::uint64_t>::max() : size + m_estimate;
+    return MUXER_FAILED(routine, status) ? std::numeric_limits<std::uint64_t>::max() : size + m_estimate;
 }
 
 bool Mp4FragmentMuxer::Close() {
     MUXER_ROUTINE(routine);
     if (!IsOpen()) {
-        routine.Failed(MBX_ERR_INTERNAL, __LINE__);
-        return routine.ReturnNotOpen();
+        routine.ReturnNotOpen();
+        MUXER_FAILED(routine, MBX_ERR_INTERNAL);
+        return false;
     }
-    CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: FILE CLOSE. (%s)", m_filename.c_str());
-    const bool completed = !routine.Failed(completeFragments(), __LINE__);
-    const bool closed = !routine.Failed(closeFile(), __LINE__);
+    const bool completed = completeFragments(routine) == MBX_OK;
+    const bool closed = !MUXER_FAILED(routine, closeFile());
     return routine.Return(completed && closed);
 }
 
-MbxStatus Mp4FragmentMuxer::completeFragments() {
-    MUXER_ROUTINE(routine);
+MbxStatus Mp4FragmentMuxer::completeFragments(MuxerRoutine& routine) {
     MUXER_STEP(routine, closeMovie());
-    MUXER_STEP(routine, rewriteMoov());
-    std::uint64_t size = 0;
-    MUXER_STEP(routine, MbxWriteMfra(m_session.get(), m_file.get(), m_position, &size));
-    m_position += size;
-    return routine.Return(MBX_OK);
-}
 
-MbxStatus Mp4FragmentMuxer::rewriteMoov() {
-    MUXER_ROUTINE(routine);
     // The file's whole length is known only now. Where it needs more bits than it got room for, writing it
     // would run over the samples behind.
     std::uint64_t size = 0;
     MUXER_STEP(routine, MbxWriteMoov(m_session.get(), nullptr, 0, &size));
     MUXER_STEP(routine, size == m_moov_size ? MBX_OK : MBX_ERR_INTERNAL);
     MUXER_STEP(routine, MbxWriteMoov(m_session.get(), m_file.get(), m_moov_position, &size));
+
+    MUXER_STEP(routine, MbxWriteMfra(m_session.get(), m_file.get(), m_position, &size));
+    m_position += size;
     return routine.Return(MBX_OK);
 }
 

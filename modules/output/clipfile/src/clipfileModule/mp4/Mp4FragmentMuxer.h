@@ -40,10 +40,10 @@ class Mp4FragmentMuxer : public Mp4File {
     MbxStatus closeMoof();
     /// Size of a `mdat` header of the session.
     MbxStatus measureMdatHeader(std::uint64_t& size);
-    /// Writes `mdat` at the position, and counts its bytes as complete.
-    MbxStatus writeMdat();
-    MbxStatus rewriteMoov();
-    MbxStatus completeFragments();
+    /// Writes `mdat` at the position, and counts its bytes as complete. Steps of `closeMoov` and `closeMoof`.
+    MbxStatus writeMdat(MuxerRoutine& routine);
+    /// Writes the last fragment, `moov` again and the fragment index. Steps of `Close`.
+    MbxStatus completeFragments(MuxerRoutine& routine);
 
     /// The next flush writes `moov`.
     bool m_first = true;

@@ -13,11 +13,11 @@ MuxerRoutine::~MuxerRoutine() {
     }
 }
 
-bool MuxerRoutine::Failed(MbxStatus status, int line) const {
+bool MuxerRoutine::Failed(MbxStatus status, const char* file, int line) const {
     if (status == MBX_OK) {
         return false;
     }
-    Logger::Put(LOG_PRIORITY_ERROR, file_, function_, line, "error. error_line = %d, result = %d.", line,
+    Logger::Put(LOG_PRIORITY_ERROR, file, function_, line, "error. error_line = %d, result = %d.", line,
                 static_cast<int>(status));
     return true;
 }

@@ -14,8 +14,8 @@ class MuxerRoutine {
     MuxerRoutine& operator=(const MuxerRoutine&) = delete;
     ~MuxerRoutine();
 
-    /// True for a step that failed, which is logged with the source line it stands in.
-    bool Failed(MbxStatus status, int line) const;
+    /// True for a step that failed, which is logged as one of the routine, with the place where it stands.
+    bool Failed(MbxStatus status, const char* file, int line) const;
     /// Notes the result for the last line, and passes it on.
     MbxStatus Return(MbxStatus result);
     bool Return(bool result);
@@ -37,10 +37,13 @@ class MuxerRoutine {
     static constexpr ::clipfileModule::FunctionName kRoutineName(__PRETTY_FUNCTION__); \
     ::clipfileModule::MuxerRoutine routine(__FILE__, kRoutineName.text, __LINE__)
 
+/// Runs a step of a routine; true when it failed, which is logged.
+#define MUXER_FAILED(routine, step) ((routine).Failed((step), __FILE__, __LINE__))
+
 /// Runs a step of a routine that returns a status; a failure is logged and ends the routine with it.
-#define MUXER_STEP(routine, step)                                                    \
-    do {                                                                             \
-        if (const MbxStatus status_ = (step); (routine).Failed(status_, __LINE__)) { \
-            return (routine).Return(status_);                                        \
-        }                                                                            \
+#define MUXER_STEP(routine, step)                                                              \
+    do {                                                                                       \
+        if (const MbxStatus status_ = (step); (routine).Failed(status_, __FILE__, __LINE__)) { \
+            return (routine).Return(status_);                                                  \
+        }                                                                                      \
     } while (false)
