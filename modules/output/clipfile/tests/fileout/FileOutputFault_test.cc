@@ -3,8 +3,6 @@
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
-#include <signal.h>
-#include <sys/resource.h>
 
 #include <cerrno>
 #include <cstddef>
@@ -17,6 +15,7 @@
 
 #include "fileout/FileOutput.h"
 #include "support/FileOutputHarness.h"
+#include "support/ResourceLimit.h"
 #include "support/SmallFileSystem.h"
 
 namespace clipfileModule {
@@ -202,32 +201,13 @@ TEST_F(FileOutputFaultTest, Cause25WhenTheFileCannotBeCreated) {
     EXPECT_THAT(MuxerCalls(" gone"), ElementsAre("1 gone", "2 gone"));
 }
 
-/// No file of the process may grow beyond a size.
-class FileSizeLimit {
- public:
-    explicit FileSizeLimit(rlim_t bytes) : handler_(signal(SIGXFSZ, SIG_IGN)) {
-        getrlimit(RLIMIT_FSIZE, &before_);
-        const rlimit limit{bytes, before_.rlim_max};
-        setrlimit(RLIMIT_FSIZE, &limit);
-    }
-    ~FileSizeLimit() {
-        setrlimit(RLIMIT_FSIZE, &before_);
-        signal(SIGXFSZ, handler_);
-    }
-    FileSizeLimit(const FileSizeLimit&) = delete;
-    FileSizeLimit& operator=(const FileSizeLimit&) = delete;
-
- private:
-    rlimit before_ = {};
-    void (*handler_)(int);
-};
-
 TEST_F(FileOutputFaultTest, Cause26WhenAChunkCannotBeWritten) {
     Start();
     Push(0);
     ASSERT_TRUE(muxers.WaitForCall("2 Write 0"));
     {
-        const FileSizeLimit limit(1 << 16);
+        const ResourceLimit limit(RLIMIT_FSIZE);
+        limit.Set(1 << 16);
         Push(1, false, 1 << 20);
         WaitForEnd();
     }

@@ -113,8 +113,8 @@ TEST_F(Mp4FileTracksTest, OpeningRunsItsRoutinesInTheirOrder) {
     log.Clear();
     ASSERT_TRUE(muxer.Open(MakeSettings(directory, 25000), kTimecode, true));
     EXPECT_THAT(routines(),
-                ElementsAre("Open", "createFilename", "createFtyp", "createUuidProf", "createFprf", "createAprf",
-                            "createVprf", "createMoov", "createVideoTrack", "createAudioTrack",
+                ElementsAre("Open", "createFilename", "createFtyp", "createUuidProf", "createFprf",
+                            "createAprf", "createVprf", "createMoov", "createVideoTrack", "createAudioTrack",
                             "createTimcdTrack", "createRtmtaTrack"));
     for (const char* routine :
          {"createUuidProf", "createFprf", "createAprf", "createVprf", "createMoov", "createVideoTrack",

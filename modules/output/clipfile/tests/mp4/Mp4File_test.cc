@@ -4,13 +4,12 @@
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
-#include <sys/resource.h>
 
-#include <csignal>
 #include <limits>
 
 #include "mp4/Mp4NormalMuxer.h"
 #include "support/MuxerFixture.h"
+#include "support/ResourceLimit.h"
 
 namespace clipfileModule {
 namespace {
@@ -254,7 +253,6 @@ TEST_F(Mp4FileTest, AfterAFailedWriteTheFileCanStillBeClosed) {
 }
 
 TEST_F(Mp4FileTest, BytesThatDoNotReachTheSystemOnClosingMakeTheResultFalse) {
-    ::signal(SIGXFSZ, SIG_IGN);
     open();
     write();
     close();
@@ -266,14 +264,11 @@ TEST_F(Mp4FileTest, BytesThatDoNotReachTheSystemOnClosingMakeTheResultFalse) {
     ASSERT_TRUE(other.Write(MakeChunk(kPlainChunk)));
     ASSERT_TRUE(other.WriteTmcd(kTimecode));
     // The last bytes of the file wait in the stream's buffer until it is closed.
-    rlimit limit = {};
-    ASSERT_EQ(getrlimit(RLIMIT_FSIZE, &limit), 0);
-    const rlimit old = limit;
-    limit.rlim_cur = size - 1;
-    ASSERT_EQ(setrlimit(RLIMIT_FSIZE, &limit), 0);
+    const ResourceLimit limit(RLIMIT_FSIZE);
+    limit.Set(size - 1);
     log.Clear();
     EXPECT_FALSE(other.Close());
-    ASSERT_EQ(setrlimit(RLIMIT_FSIZE, &old), 0);
+    limit.Restore();
     EXPECT_FALSE(other.IsOpen());
     EXPECT_THAT(errorResults(), ElementsAre(MBX_ERR_IO));
 }

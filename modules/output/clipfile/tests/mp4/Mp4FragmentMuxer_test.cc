@@ -371,7 +371,8 @@ TEST_F(Mp4FragmentMuxerTest, OpeningFlushingAndClosingRunTheirRoutinesInOrder) {
         const std::string function = std::string("clipfileModule::Mp4FragmentMuxer::") + routine;
         EXPECT_TRUE(log.Contains(LOG_PRIORITY_DETAIL, function.c_str(), "end. ret = 0.")) << routine;
     }
-    EXPECT_TRUE(log.Contains(LOG_PRIORITY_DETAIL, "clipfileModule::Mp4FragmentMuxer::Close", "end. ret = 1."));
+    EXPECT_TRUE(
+        log.Contains(LOG_PRIORITY_DETAIL, "clipfileModule::Mp4FragmentMuxer::Close", "end. ret = 1."));
 }
 
 TEST_F(Mp4FragmentMuxerTest, InitializeStartsAnewWithTheStateAfterConstruction) {

@@ -2,7 +2,9 @@
 
 #include <array>
 #include <atomic>
-#include <string>
+#include <chrono>
+#include <condition_variable>
+#include <mutex>
 
 #include "boxlib/mbx_stdio.h"
 #include "mp4/FileAccess.h"
@@ -22,9 +24,45 @@ struct Plan {
     }
 };
 
+/// A write that hangs.
+class Hold {
+ public:
+    void Set(std::uint64_t nth) {
+        const std::lock_guard lock(mutex_);
+        at_ = nth;
+        held_ = false;
+        released_ = false;
+    }
+    void Pass(std::uint64_t number) {
+        std::unique_lock lock(mutex_);
+        if (number != at_) {
+            return;
+        }
+        held_ = true;
+        changed_.notify_all();
+        changed_.wait(lock, [this] { return released_; });
+    }
+    bool WaitHeld() {
+        std::unique_lock lock(mutex_);
+        return changed_.wait_for(lock, std::chrono::seconds(30), [this] { return held_; });
+    }
+    void Release() {
+        const std::lock_guard lock(mutex_);
+        released_ = true;
+        changed_.notify_all();
+    }
+
+ private:
+    std::mutex mutex_;
+    std::condition_variable changed_;
+    std::uint64_t at_ = 0;  // 0 for never
+    bool held_ = false;
+    bool released_ = false;
+};
+
 std::array<Plan, FaultyFiles::kOperationCount> plans;
+Hold hold;
 std::atomic<std::int64_t> blocks{0};
-std::string instead;
 
 MbxCallbacks real() {
     MbxCallbacks callbacks = {};
@@ -36,11 +74,13 @@ MbxStatus faultyOpen(const char* path, std::uint32_t unused, MbxFile** file) {
     if (plans[FaultyFiles::kOpen].Fails()) {
         return MBX_ERR_IO;
     }
-    return MbxOpenFile(instead.empty() ? path : instead.c_str(), unused, file);
+    return MbxOpenFile(path, unused, file);
 }
 
 MbxStatus faultyWrite(MbxFile* file, const void* buffer, std::uint64_t size, std::uint64_t* count) {
-    if (plans[FaultyFiles::kWrite].Fails()) {
+    const bool fails = plans[FaultyFiles::kWrite].Fails();
+    hold.Pass(plans[FaultyFiles::kWrite].count);
+    if (fails) {
         *count = 0;
         return MBX_ERR_IO;
     }
@@ -74,7 +114,6 @@ void clear() {
         plan.andAllAfter = false;
     }
     blocks = 0;
-    instead.clear();
 }
 
 }  // namespace
@@ -84,6 +123,7 @@ FaultyFiles::FaultyFiles() {
 }
 
 FaultyFiles::~FaultyFiles() {
+    hold.Release();
     clear();
 }
 
@@ -92,8 +132,20 @@ void FaultyFiles::FailAt(Operation operation, std::uint64_t nth, bool andAllAfte
     plans[operation].andAllAfter = andAllAfter;
 }
 
-void FaultyFiles::OpenInstead(const char* path) {
-    instead = path;
+void FaultyFiles::Reset() {
+    clear();
+}
+
+void FaultyFiles::HoldWriteAt(std::uint64_t nth) {
+    hold.Set(nth);
+}
+
+bool FaultyFiles::WaitHeld() const {
+    return hold.WaitHeld();
+}
+
+void FaultyFiles::Release() {
+    hold.Release();
 }
 
 std::uint64_t FaultyFiles::Count(Operation operation) const {

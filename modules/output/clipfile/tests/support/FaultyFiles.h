@@ -19,8 +19,13 @@ class FaultyFiles {
     /// The `nth` such operation from construction on fails, counted from 1; with `andAllAfter` every later
     /// one too, as on a disk that is full or gone. A short write reports success and half of the bytes.
     void FailAt(Operation operation, std::uint64_t nth, bool andAllAfter = false);
-    /// Opening a file opens `path` instead, a native one.
-    void OpenInstead(const char* path);
+    /// The `nth` write from construction on hangs, until `Release` or destruction.
+    void HoldWriteAt(std::uint64_t nth);
+    /// Waits until a write hangs. False when none did before the deadline.
+    [[nodiscard]] bool WaitHeld() const;
+    void Release();
+    /// As after construction.
+    void Reset();
     /// How many there were since construction.
     std::uint64_t Count(Operation operation) const;
     /// Blocks of memory that are out.
