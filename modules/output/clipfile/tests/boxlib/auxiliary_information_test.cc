@@ -1,7 +1,9 @@
 #include "boxlib/auxiliary_information.h"
 
 #include "boxlib/row_table.h"
+#include "boxlib/sample_store.h"
 #include "entry_fixture.h"
+#include "sample_fixture.h"
 
 namespace {
 
@@ -278,6 +280,20 @@ TEST_F(AuxiliaryInformationTest, SencOfSamplesWithoutInformationHoldsTheirCount)
     ASSERT_EQ(MbxBuildSenc(context, &options, &params, &box), MBX_OK);
     EXPECT_EQ(MbxWriteSencBox(context, &options, &file, 0, &box, nullptr, nullptr), MBX_OK);
     EXPECT_BYTES(file.bytes, Hex("00000010 'senc' 00000000 00000002"));
+}
+
+TEST_F(AuxiliaryInformationTest, SencRunsOverBlocksAndPassesOverSizesOfZero) {
+    sizes.list.capacity = 2;
+    for (uint8_t i = 0; i < 5; i++) {
+        const uint8_t bytes[] = {i, static_cast<uint8_t>(i + 0x10)};
+        ASSERT_EQ(MbxAddAuxSize(context, &sizes, i % 3, bytes), MBX_OK);
+    }
+    MbxSencBox box = {};
+    const MbxSencParams params = {0, &sizes};
+    ASSERT_EQ(MbxBuildSenc(context, &options, &params, &box), MBX_OK);
+    EXPECT_EQ(MbxWriteSencBox(context, &options, &file, 0, &box, nullptr, nullptr), MBX_OK);
+    EXPECT_BYTES(file.bytes, Hex("00000014 'senc' 00000000 00000005 01 0212 04"));
+    for (const MbxAuxSize& entry : Entries<MbxAuxSize>(sizes.list)) MbxFree(context, entry.data);
 }
 
 TEST_F(AuxiliaryInformationTest, BuildersRefuseNullArguments) {

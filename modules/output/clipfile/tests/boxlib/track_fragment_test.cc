@@ -241,6 +241,26 @@ TEST_F(TrackFragmentTest, TfdtVersionInEachModeAtTheEdge) {
     EXPECT_BYTES(tfdt(3, kWide, MBX_OK), wide);
 }
 
+// ---- `trik`
+// --------------------------------------------------------------------------------------------------------
+
+TEST_F(TrackFragmentTest, TrikRunsOverBlocks) {
+    track->trickEnabled = 1;
+    ASSERT_EQ(MbxFreeSegments(context, track), MBX_OK);
+    Bytes expected = Hex("000003FD 'trik' 00000000");
+    for (uint32_t i = 0; i < 1009; i++) {
+        MbxSampleInfo info = sample();
+        info.pictureType = static_cast<uint8_t>(i % 4);
+        info.dependencyLevel = static_cast<uint8_t>(i % 64);
+        ASSERT_EQ(add(info), MBX_OK);
+        expected.push_back(static_cast<uint8_t>(i % 4 * 64 + i % 64));
+    }
+    MbxTrikBox box = {};
+    ASSERT_EQ(MbxBuildTrik(context, &options, &segment()->trickBytes, &box), MBX_OK);
+    EXPECT_EQ(MbxWriteTrikBox(context, &options, &file, 0, &box, nullptr, nullptr), MBX_OK);
+    EXPECT_BYTES(file.bytes, expected);
+}
+
 // ---- `traf`
 // --------------------------------------------------------------------------------------------------------
 
