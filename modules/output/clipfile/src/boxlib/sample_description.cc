@@ -2,107 +2,63 @@
 
 namespace {
 
-// Makes the box that the kind stands for.
-MbxStatus buildEntry(MbxContext* context, const MbxOptions* options, uint32_t timescale, uint32_t version,
-                     const MbxSampleEntry* entry, MbxSampleEntryBox* box) {
-    box->kind = entry->kind;
-    switch (box->kind) {
+// Which box each kind stands for: calls `visit(slot, build, writeBox, release)` with the place of the box in
+// the union and the box's functions. MBX_ERR_INTERNAL for an unknown kind.
+template <typename Body, typename Visit>
+MbxStatus visitBody(uint32_t kind, Body& body, Visit&& visit) {
+    switch (kind) {
         case MBX_ENTRY_MP4V:
         case MBX_ENTRY_AVC1:
         case MBX_ENTRY_HVC1:
-            return MbxMakeBox(context, options, &box->body.visual, entry, MbxBuildVisualEntry,
-                              MbxFreeVisualEntry);
+            return visit(&body.visual, MbxBuildVisualEntry, MbxWriteVisualEntryBox, MbxFreeVisualEntry);
         case MBX_ENTRY_MP4A:
-            return MbxMakeChild(
-                context, &box->body.audio,
-                [&](MbxAudioEntryBox* audio) {
-                    return MbxBuildAudioEntry(context, options, timescale, version, entry, audio);
-                },
-                MbxFreeAudioEntry);
+            return visit(&body.audio, MbxBuildAudioEntry, MbxWriteAudioEntryBox, MbxFreeAudioEntry);
         case MBX_ENTRY_SYSTEMS:
-            return MbxMakeBox(context, options, &box->body.systems, entry, MbxBuildSystemsEntry,
-                              MbxFreeSystemsEntry);
+            return visit(&body.systems, MbxBuildSystemsEntry, MbxWriteSystemsEntryBox, MbxFreeSystemsEntry);
         case MBX_ENTRY_PLAIN:
         case MBX_ENTRY_PLAIN2:
-            return MbxMakeBox(context, options, &box->body.plain, entry, MbxBuildPlainEntry,
-                              MbxFreePlainEntry);
+            return visit(&body.plain, MbxBuildPlainEntry, MbxWritePlainEntryBox, MbxFreePlainEntry);
         case MBX_ENTRY_RTMD:
-            return MbxMakeBox(context, options, &box->body.meta, entry, MbxBuildMetaEntry, MbxFreeMetaEntry);
+            return visit(&body.meta, MbxBuildMetaEntry, MbxWriteMetaEntryBox, MbxFreeMetaEntry);
         case MBX_ENTRY_GRAPHICS:
         case MBX_ENTRY_GRAPHICS_3D:
-            return MbxMakeBox(context, options, &box->body.graphics, entry, MbxBuildGraphicsEntry,
-                              MbxFreeGraphicsEntry);
+            return visit(&body.graphics, MbxBuildGraphicsEntry, MbxWriteGraphicsEntryBox,
+                         MbxFreeGraphicsEntry);
         case MBX_ENTRY_TEXT:
-            return MbxMakeBox(context, options, &box->body.text, entry, MbxBuildTextEntry, MbxFreeTextEntry);
+            return visit(&body.text, MbxBuildTextEntry, MbxWriteTextEntryBox, MbxFreeTextEntry);
         case MBX_ENTRY_TMCD:
-            return MbxMakeBox(context, options, &box->body.timecode, entry, MbxBuildTimecodeEntry,
-                              MbxFreeTimecodeEntry);
+            return visit(&body.timecode, MbxBuildTimecodeEntry, MbxWriteTimecodeEntryBox,
+                         MbxFreeTimecodeEntry);
         default:
             return MBX_ERR_INTERNAL;
     }
+}
+
+MbxStatus buildEntry(MbxContext* context, const MbxOptions* options, uint32_t timescale, uint32_t version,
+                     const MbxSampleEntry* entry, MbxSampleEntryBox* box) {
+    box->kind = entry->kind;
+    return visitBody(box->kind, box->body, [&](auto** slot, auto build, auto, auto release) {
+        const auto fill = [&](auto* made) {
+            if constexpr (std::is_same_v<decltype(made), MbxAudioEntryBox*>) {
+                return build(context, options, timescale, version, entry, made);
+            } else {
+                return build(context, options, entry, made);
+            }
+        };
+        return MbxMakeChild(context, slot, fill, release);
+    });
 }
 
 MbxStatus writeEntry(MbxContext* context, const MbxOptions* options, MbxFile* file, uint64_t position,
                      const MbxSampleEntryBox* box, uint64_t* written, uint64_t* accumulated) {
-    switch (box->kind) {
-        case MBX_ENTRY_MP4V:
-        case MBX_ENTRY_AVC1:
-        case MBX_ENTRY_HVC1:
-            return MbxWriteVisualEntryBox(context, options, file, position, box->body.visual, written,
-                                          accumulated);
-        case MBX_ENTRY_MP4A:
-            return MbxWriteAudioEntryBox(context, options, file, position, box->body.audio, written,
-                                         accumulated);
-        case MBX_ENTRY_SYSTEMS:
-            return MbxWriteSystemsEntryBox(context, options, file, position, box->body.systems, written,
-                                           accumulated);
-        case MBX_ENTRY_PLAIN:
-        case MBX_ENTRY_PLAIN2:
-            return MbxWritePlainEntryBox(context, options, file, position, box->body.plain, written,
-                                         accumulated);
-        case MBX_ENTRY_RTMD:
-            return MbxWriteMetaEntryBox(context, options, file, position, box->body.meta, written,
-                                        accumulated);
-        case MBX_ENTRY_GRAPHICS:
-        case MBX_ENTRY_GRAPHICS_3D:
-            return MbxWriteGraphicsEntryBox(context, options, file, position, box->body.graphics, written,
-                                            accumulated);
-        case MBX_ENTRY_TEXT:
-            return MbxWriteTextEntryBox(context, options, file, position, box->body.text, written,
-                                        accumulated);
-        case MBX_ENTRY_TMCD:
-            return MbxWriteTimecodeEntryBox(context, options, file, position, box->body.timecode, written,
-                                            accumulated);
-        default:
-            return MBX_ERR_INTERNAL;
-    }
+    return visitBody(box->kind, box->body, [&](auto* slot, auto, auto writeBox, auto) {
+        return writeBox(context, options, file, position, *slot, written, accumulated);
+    });
 }
 
 MbxStatus freeBody(MbxContext* context, const MbxSampleEntryBox& box) {
-    switch (box.kind) {
-        case MBX_ENTRY_MP4V:
-        case MBX_ENTRY_AVC1:
-        case MBX_ENTRY_HVC1:
-            return MbxFreeVisualEntry(context, box.body.visual);
-        case MBX_ENTRY_MP4A:
-            return MbxFreeAudioEntry(context, box.body.audio);
-        case MBX_ENTRY_SYSTEMS:
-            return MbxFreeSystemsEntry(context, box.body.systems);
-        case MBX_ENTRY_PLAIN:
-        case MBX_ENTRY_PLAIN2:
-            return MbxFreePlainEntry(context, box.body.plain);
-        case MBX_ENTRY_RTMD:
-            return MbxFreeMetaEntry(context, box.body.meta);
-        case MBX_ENTRY_GRAPHICS:
-        case MBX_ENTRY_GRAPHICS_3D:
-            return MbxFreeGraphicsEntry(context, box.body.graphics);
-        case MBX_ENTRY_TEXT:
-            return MbxFreeTextEntry(context, box.body.text);
-        case MBX_ENTRY_TMCD:
-            return MbxFreeTimecodeEntry(context, box.body.timecode);
-        default:
-            return MBX_ERR_INTERNAL;
-    }
+    return visitBody(box.kind, box.body,
+                     [&](auto* slot, auto, auto, auto release) { return release(context, *slot); });
 }
 
 // An entry of unknown kind owns no body, so its record goes all the same.
