@@ -279,6 +279,12 @@ TEST_F(TrackFragmentTest, TrafHasOneRunPerChunkAndOptionalBoxesOnlyWhereAskedFor
     EXPECT_EQ(children(), "tfhd trik trun trun trun");
 }
 
+TEST_F(TrackFragmentTest, TfdtStandsBetweenTfhdAndTrik) {
+    options.tfdt_mode = 1;
+    track->trickEnabled = 1;
+    EXPECT_EQ(children(), "tfhd tfdt trik trun");
+}
+
 TEST_F(TrackFragmentTest, TrafMovesTheRunningBaseToTheEndOfItsData) {
     addChunk(1, 5000);
     options.base_offset_mode = 1;
