@@ -1,15 +1,9 @@
 #include "boxlib/mbx_stdio.h"
 
-#include <fcntl.h>
-#include <sys/file.h>
-#include <sys/stat.h>
-#include <unistd.h>
-
-#include <cerrno>
 #include <cstdlib>
 #include <cstring>
 
-static_assert(sizeof(off_t) == 8, "positions need 64 bits: build this file with _FILE_OFFSET_BITS=64");
+#include "boxlib/platform/stream_file.h"
 
 namespace {
 
@@ -36,33 +30,6 @@ bool isUtf8(const char* text) {
         }
     }
     return true;
-}
-
-// False when another writer holds the file. A file system without locks protects nothing, but can be recorded
-// to.
-bool lockAgainstWriters(int descriptor) {
-    int result = 0;
-    do {
-        result = flock(descriptor, LOCK_EX | LOCK_NB);
-    } while (result != 0 && errno == EINTR);
-    return result == 0 || errno != EWOULDBLOCK;
-}
-
-// Truncates what has a length. As with fopen, a FIFO or a device is taken as it is.
-bool truncateFile(int descriptor) {
-    struct stat status = {};
-    if (fstat(descriptor, &status) != 0) return false;
-    return !S_ISREG(status.st_mode) || ftruncate(descriptor, 0) == 0;
-}
-
-std::FILE* openLocked(const char* path) {
-    // Not fopen: its "w" truncates before a lock can be taken.
-    const int descriptor = open(path, O_RDWR | O_CREAT | O_CLOEXEC, 0666);
-    if (descriptor < 0) return nullptr;
-    std::FILE* stream = nullptr;
-    if (lockAgainstWriters(descriptor) && truncateFile(descriptor)) stream = fdopen(descriptor, "w+b");
-    if (stream == nullptr) close(descriptor);
-    return stream;
 }
 
 bool isOpen(const MbxFile* file) {
@@ -114,7 +81,7 @@ MbxStatus MbxOpenFile(const char* path, uint32_t, MbxFile** file) {
         std::free(cell);
         return MBX_ERR_INVALID_ARG;
     }
-    cell->stream = openLocked(path);
+    cell->stream = MbxOpenStream(path);
     if (cell->stream == nullptr) {
         std::free(cell);
         return MBX_ERR_IO;
@@ -161,12 +128,12 @@ MbxStatus MbxStdioWrite(MbxFile* file, const void* buffer, uint64_t size, uint64
 MbxStatus MbxStdioSeek(MbxFile* file, int64_t offset, uint32_t origin) {
     static constexpr int kOrigins[] = {SEEK_SET, SEEK_CUR, SEEK_END};
     if (!isOpen(file) || origin > 2) return MBX_ERR_INVALID_ARG;
-    return fseeko(file->stream, offset, kOrigins[origin]) == 0 ? MBX_OK : MBX_ERR_IO;
+    return MbxSeekStream(file->stream, offset, kOrigins[origin]) ? MBX_OK : MBX_ERR_IO;
 }
 
 MbxStatus MbxStdioTell(MbxFile* file, uint64_t* position) {
     if (!isOpen(file) || position == nullptr) return MBX_ERR_INVALID_ARG;
-    const off_t at = ftello(file->stream);
+    const int64_t at = MbxTellStream(file->stream);
     if (at < 0) return MBX_ERR_IO;
     *position = static_cast<uint64_t>(at);
     return MBX_OK;
@@ -174,10 +141,10 @@ MbxStatus MbxStdioTell(MbxFile* file, uint64_t* position) {
 
 MbxStatus MbxStdioSize(MbxFile* file, uint64_t* length) {
     if (!isOpen(file) || length == nullptr) return MBX_ERR_INVALID_ARG;
-    const off_t at = ftello(file->stream);
-    if (at < 0 || fseeko(file->stream, 0, SEEK_END) != 0) return MBX_ERR_IO;
-    const off_t end = ftello(file->stream);
-    if (fseeko(file->stream, at, SEEK_SET) != 0 || end < 0) return MBX_ERR_IO;
+    const int64_t at = MbxTellStream(file->stream);
+    if (at < 0 || !MbxSeekStream(file->stream, 0, SEEK_END)) return MBX_ERR_IO;
+    const int64_t end = MbxTellStream(file->stream);
+    if (!MbxSeekStream(file->stream, at, SEEK_SET) || end < 0) return MBX_ERR_IO;
     *length = static_cast<uint64_t>(end);
     return MBX_OK;
 }

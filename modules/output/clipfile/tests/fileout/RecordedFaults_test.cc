@@ -184,18 +184,24 @@ TEST_P(RecordedFaultsTest, Cause25WhenNoNameCanBeTold) {
 
 TEST_P(RecordedFaultsTest, Cause25WhenTheProcessMayOpenNoMoreFiles) {
     const ResourceLimit limit(RLIMIT_NOFILE);
-    AtRoutine("createFilename", 2, [&limit] {
+    AtRoutine("createFilename", 2, [&] {
         // The lowest number that is free is the next one that would be given out.
         const int next = open("/dev/null", O_RDONLY);
         close(next);
         limit.Set(static_cast<rlim_t>(next));
+        // Sanitizers open files of their own: they get them back as soon as ours could not be opened.
+        log.OnLine([&limit](const CapturedLine& line) {
+            if (line.priority == LOG_PRIORITY_ERROR) {
+                limit.Restore();
+            }
+        });
     });
     RecordTwo();
     WaitForEnd();
     Finish();
+    log.OnLine(nullptr);
     EXPECT_THAT(Statuses(), ElementsAre("7 25"));
-    EXPECT_THAT(Errors().back(), "mp4 file open error.");
-    limit.Restore();
+    EXPECT_EQ(Errors().back(), "mp4 file open error.");
     ASSERT_THAT(Files(), ElementsAre(kFirst));
     ExpectHolds(kFirst, 0, 1);
 }

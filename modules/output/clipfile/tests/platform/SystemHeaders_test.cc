@@ -29,7 +29,7 @@ TEST(SystemHeaders, AreIncludedInTheFoldersOfThePlatformsAlone) {
             continue;
         }
         const fs::path folder = path.lexically_relative(root).parent_path();
-        const bool isPlatform = folder.parent_path() == "platform";
+        const bool isPlatform = folder.parent_path().filename() == "platform";
         std::ifstream file(path);
         for (std::string line; std::getline(file, line);) {
             std::smatch match;
@@ -44,8 +44,9 @@ TEST(SystemHeaders, AreIncludedInTheFoldersOfThePlatformsAlone) {
             EXPECT_TRUE(isPortable(match[1])) << path << ": " << line;
         }
     }
-    EXPECT_GT(outside, 50u);
-    EXPECT_GT(inside, 0u);
+    // Of the module, and of its box library.
+    EXPECT_GT(outside, 100u);
+    EXPECT_GT(inside, 5u);
 }
 
 }  // namespace
