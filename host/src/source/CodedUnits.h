@@ -3,6 +3,10 @@
 #include <cstdint>
 #include <functional>
 #include <memory>
+#include <optional>
+#include <string>
+
+#include "common/Timecode.h"
 
 namespace receiver {
 
@@ -14,6 +18,8 @@ struct CodedPicture {
     std::int64_t time = 0;
     /// An IDR frame.
     bool keyFrame = false;
+    /// What the picture itself tells of its address.
+    std::optional<Timecode> timecode;
 };
 
 /// A coded audio frame: AAC LC, 48 kHz, stereo, 1024 samples, with its ADTS header.

@@ -40,12 +40,20 @@ bool FilterGraph::Pull(AVFrame& frame) {
     return true;
 }
 
-void FilterGraph::Feed(const char* name, AVFrame* frame) {
+AVFilterContext* FilterGraph::SourceOf(const char* name) {
     AVFilterContext* const source = avfilter_graph_get_filter(graph_.get(), name);
     if (source == nullptr) {
         throw ReceiverError(ExitCode::kInternal, "cannot find the beginning of a chain of filters");
     }
-    libav::Check(av_buffersrc_add_frame(source, frame), "filter a frame");
+    return source;
+}
+
+void FilterGraph::Feed(const char* name, AVFrame& frame) {
+    libav::Check(av_buffersrc_add_frame(SourceOf(name), &frame), "filter a frame");
+}
+
+void FilterGraph::End(const char* name, std::int64_t pts) {
+    libav::Check(av_buffersrc_close(SourceOf(name), pts, 0), "filter a frame");
 }
 
 AVRational FilterGraph::TimeBase() const {

@@ -16,11 +16,15 @@ class FilterGraph {
 
     /// The next frame, into an empty `frame`. False when the chain has none (yet).
     bool Pull(AVFrame& frame);
-    /// Gives a frame to the source `name` of the chain; null tells the end. Takes over its reference.
-    void Feed(const char* name, AVFrame* frame);
+    /// Gives a frame to the source `name` of the chain, and takes over its reference.
+    void Feed(const char* name, AVFrame& frame);
+    /// Tells the source `name` that nothing follows, and when its last frame was over.
+    void End(const char* name, std::int64_t pts);
     AVRational TimeBase() const;
 
  private:
+    AVFilterContext* SourceOf(const char* name);
+
     libav::Owner<AVFilterGraph> graph_;
     AVFilterContext* sink_ = nullptr;
 };

@@ -1,6 +1,6 @@
 #include <utility>
 
-#include "common/ReceiverError.h"
+#include "source/InputProducer.h"
 #include "source/QueuedSource.h"
 #include "source/TestPicture.h"
 
@@ -9,19 +9,32 @@ namespace {
 
 /// Units that a file or the test picture is read ahead: two seconds and more at any rate.
 constexpr std::size_t kFileAhead = 250;
+/// Units of a live source that may wait for the reader: 15 seconds and more.
+constexpr std::size_t kLiveAhead = 2000;
+/// How many times real time a live source's units come when a burst has been held back somewhere: slow enough
+/// for the module's queues of 50 units.
+constexpr double kBurst = 8;
 
 }  // namespace
 
 std::unique_ptr<SourceInterface> OpenSource(const SourceOptions& options, SourceListenerInterface& listener,
-                                            bool (* /*stop*/)()) {
+                                            bool (*stop)()) {
     libav::CollectMessages();
     auto interrupt = std::make_shared<Interrupt>();
     if (options.url == "test:") {
         return std::make_unique<QueuedSource>(std::make_unique<TestPicture>(options), std::move(interrupt),
                                               Pacer::ForFile(options.speed), kFileAhead, listener);
     }
-    throw ReceiverError(ExitCode::kSourceUnavailable,
-                        "'" + options.url + "' is no address that can be opened");
+    try {
+        auto producer = std::make_unique<InputProducer>(options, interrupt, stop);
+        const bool recorded = producer->Recorded();
+        return std::make_unique<QueuedSource>(
+            std::move(producer), std::move(interrupt),
+            recorded ? Pacer::ForFile(options.speed) : Pacer::ForLive(kBurst),
+            recorded ? kFileAhead : kLiveAhead, listener);
+    } catch (const Stopped&) {
+        return nullptr;
+    }
 }
 
 }  // namespace receiver

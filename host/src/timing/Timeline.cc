@@ -25,16 +25,10 @@ void Timeline::Anchor(std::int64_t stamp, std::int64_t time) {
 
 Timeline::Place Timeline::TimeOf(std::int64_t stamp, std::int64_t expected, std::int64_t elapsed,
                                  std::int64_t back) {
-    const std::int64_t time = stamp + *offset_;
     if (previous_ && expected > jumped_ + kOverlap) {
         previous_.reset();
     }
-    if (previous_) {
-        const std::int64_t before = stamp + *previous_;
-        if (std::abs(before - expected) < std::abs(time - expected)) {
-            return {before, 0};
-        }
-    }
+    const std::int64_t time = Nearest(stamp, expected);
     if (time >= expected - back && time <= expected + elapsed + kLongestGap) {
         return {time, 0};
     }
@@ -43,6 +37,17 @@ Timeline::Place Timeline::TimeOf(std::int64_t stamp, std::int64_t expected, std:
     offset_ = now - stamp;
     jumped_ = now;
     return {now, time - now};
+}
+
+std::int64_t Timeline::Nearest(std::int64_t stamp, std::int64_t expected) const {
+    const std::int64_t time = stamp + *offset_;
+    if (previous_) {
+        const std::int64_t before = stamp + *previous_;
+        if (std::abs(before - expected) < std::abs(time - expected)) {
+            return before;
+        }
+    }
+    return time;
 }
 
 }  // namespace receiver

@@ -28,7 +28,7 @@ SourceTest::~SourceTest() {
 }
 
 std::string SourceTest::Shell(const std::string& command) const {
-    const std::string whole = "cd '" + folder_.string() + "' && " + command + " 2>errors.txt";
+    const std::string whole = "cd '" + folder_.string() + "' && ( " + command + " ) 2>errors.txt";
     std::FILE* const pipe = popen(whole.c_str(), "r");
     EXPECT_NE(pipe, nullptr);
     std::string text;

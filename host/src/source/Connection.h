@@ -1,0 +1,110 @@
+#pragma once
+
+#include <chrono>
+#include <deque>
+#include <memory>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "common/ReceiverError.h"
+#include "source/AudioPath.h"
+#include "source/Input.h"
+#include "source/KlvPackets.h"
+#include "source/UnitAssembler.h"
+#include "source/VideoPath.h"
+#include "timing/Timeline.h"
+
+namespace receiver {
+
+/// The source came back as one that the present recording cannot go on with.
+class SourceChanged : public ReceiverError {
+ public:
+    explicit SourceChanged(const std::string& sentence)
+        : ReceiverError(ExitCode::kSourceUnsuitable, sentence) {}
+};
+
+/// One opened input, from its packets to what an assembler takes.
+class Connection {
+ public:
+    /// Chooses streams, looks at the first second, and decides what passes and what is converted. `before`:
+    /// what the source was in an earlier connection, or null. Throws `ReceiverError` (`kSourceUnsuitable`)
+    /// when it cannot be recorded, `SourceLost` and `Stopped`.
+    Connection(std::unique_ptr<Input> input, const SourceOptions& options, const SourceDescription* before);
+
+    const SourceDescription& Description() const { return description_; }
+    /// Files and servers of files.
+    bool Recorded() const { return input_->Recorded(); }
+    /// Sentences about what is converted.
+    const std::vector<std::string>& Notices() const { return notices_; }
+
+    /// From here on what the source carries goes to `assembler`; its first IDR frame stands at `begin`.
+    /// `assembler` must outlive this.
+    void Begin(UnitAssembler& assembler, std::int64_t begin);
+    /// Passes one packet on. False at the end of the source, after everything was given out. Throws like
+    /// `Input`, and `ReceiverError` when the source changed to what cannot be recorded.
+    bool Pump();
+
+    /// Packets that could not be used, and were left out.
+    std::uint64_t Damaged() const;
+
+ private:
+    using Clock = std::chrono::steady_clock;
+
+    /// A stream of the input that is used.
+    struct Stream {
+        const AVStream* stream = nullptr;
+        /// The last stamp, unwrapped, in the stream's own time base.
+        std::optional<std::int64_t> last;
+        /// Where the next packet would stand if nothing is missing, and when the last one came.
+        std::int64_t expected = 0;
+        Clock::time_point arrived;
+    };
+
+    void Choose();
+    void LookAhead();
+    void DecideVideo(const SourceOptions& options, const SourceDescription* before);
+    void DecideAudio();
+    void ReadTimecodeTag();
+    bool NextPacket();
+    void Handle(AVPacket& packet);
+    void HandleVideo(AVPacket& packet);
+    void HandleAudio(AVPacket& packet);
+    void HandleKlv(const AVPacket& packet);
+    void Finish();
+    Stream* StreamOf(const AVPacket& packet);
+    /// The packet's stamp, unwrapped, in ticks of 90000. Nothing when it has none.
+    std::optional<std::int64_t> StampOf(Stream& stream, const AVPacket& packet);
+    std::int64_t Elapsed(Stream& stream, std::int64_t usual);
+    std::int64_t TimeOf(Stream& stream, std::int64_t stamp, std::int64_t usual, std::int64_t back);
+    PictureSink ToPictures();
+    AudioSink ToAudio();
+
+    const std::unique_ptr<Input> input_;
+    SourceDescription description_;
+    std::vector<std::string> notices_;
+    Stream video_;
+    std::optional<Stream> audio_;
+    std::deque<Stream> klv_;
+    std::unique_ptr<VideoPathInterface> videoPath_;
+    std::unique_ptr<AudioPathInterface> audioPath_;
+    KlvPackets klvPackets_;
+    libav::Owner<AVPacket> packet_;
+    /// Packets that were read to look at them, then those that wait for the first IDR frame.
+    std::deque<libav::Owner<AVPacket>> ahead_;
+    std::deque<libav::Owner<AVPacket>> early_;
+
+    UnitAssembler* assembler_ = nullptr;
+    std::int64_t begin_ = 0;
+    Timeline line_;
+    /// The last stamp of any stream, in ticks of 90000, which tells the others how often the counter has
+    /// wrapped.
+    std::optional<std::int64_t> reference_;
+    std::optional<std::int64_t> firstVideoStamp_;
+    std::optional<Timecode> tag_;
+    std::uint64_t damaged_ = 0;
+    std::uint64_t withoutStart_ = 0;
+    bool passes_ = true;
+};
+
+}  // namespace receiver

@@ -1,0 +1,53 @@
+#pragma once
+
+#include <atomic>
+#include <chrono>
+#include <memory>
+#include <optional>
+
+#include "source/Connection.h"
+#include "source/Interrupt.h"
+#include "source/ProducerInterface.h"
+
+namespace receiver {
+
+/// The units of an address: of one connection after the other, since a live source that was lost is tried
+/// again, after pauses that grow, until it is back or somebody stops.
+class InputProducer final : public ProducerInterface {
+ public:
+    /// Opens the source. `stop` may be null; asked until this returns. Throws `ReceiverError`, and `Stopped`.
+    InputProducer(const SourceOptions& options, std::shared_ptr<Interrupt> interrupt, bool (*stop)());
+
+    const SourceDescription& Description() const override { return description_; }
+    bool Produce(Batch& batch) override;
+    SourceCounts Counts() const override;
+    /// Files and servers of files.
+    bool Recorded() const { return recorded_; }
+
+ private:
+    using Clock = std::chrono::steady_clock;
+
+    void Lose(const std::string& reason);
+    void TryAgain();
+    void Publish();
+
+    const SourceOptions options_;
+    const std::shared_ptr<Interrupt> interrupt_;
+    std::unique_ptr<Connection> connection_;
+    SourceDescription description_;
+    bool recorded_ = false;
+    UnitAssembler assembler_;
+    /// When the present connection began, and when the source last gave a picture.
+    Clock::time_point connected_;
+    Clock::time_point lastPicture_;
+    Clock::time_point lost_;
+    /// Which pause comes next.
+    std::size_t attempts_ = 0;
+    std::uint64_t damagedBefore_ = 0;
+
+    std::atomic<std::uint64_t> lostFrames_{0};
+    std::atomic<std::uint64_t> damaged_{0};
+    std::atomic<std::uint64_t> reconnections_{0};
+};
+
+}  // namespace receiver

@@ -1,0 +1,135 @@
+#include "source/VideoCheck.h"
+
+#include <algorithm>
+#include <array>
+#include <cmath>
+#include <cstdio>
+#include <vector>
+
+#include "source/PictureParser.h"
+
+namespace receiver {
+namespace {
+
+struct Stamps {
+    std::int64_t shown = 0;
+    std::optional<std::int64_t> decoded;
+};
+
+std::vector<Stamps> StampsOf(const AVStream& stream, const std::deque<libav::Owner<AVPacket>>& packets) {
+    std::vector<Stamps> stamps;
+    for (const auto& packet : packets) {
+        if (packet->stream_index == stream.index && packet->pts != AV_NOPTS_VALUE) {
+            stamps.push_back(
+                {packet->pts, packet->dts == AV_NOPTS_VALUE ? std::optional<std::int64_t>() : packet->dts});
+        }
+    }
+    return stamps;
+}
+
+bool Reordered(const AVStream& stream, const std::vector<Stamps>& stamps) {
+    std::optional<std::int64_t> delay;
+    for (std::size_t at = 0; at < stamps.size(); ++at) {
+        // A counter that wraps goes back by far more.
+        const std::int64_t step = at == 0 ? 1 : stamps[at].shown - stamps[at - 1].shown;
+        if (step < 0 && av_rescale_q(-step, stream.time_base, {1, 1}) < 10) {
+            return true;
+        }
+        if (stamps[at].decoded) {
+            const std::int64_t now = stamps[at].shown - *stamps[at].decoded;
+            if (delay && now != *delay) {
+                return true;
+            }
+            delay = now;
+        }
+    }
+    // The encoder announces reordering and stamps for it, though it has not come to it yet.
+    return delay && *delay > 0 && stream.codecpar->video_delay > 0;
+}
+
+/// The middle one of the distances between pictures in seconds, 0 when there are none.
+double Spacing(const AVStream& stream, const std::vector<Stamps>& stamps) {
+    std::vector<std::int64_t> shown;
+    std::transform(stamps.begin(), stamps.end(), std::back_inserter(shown),
+                   [](const Stamps& stamp) { return stamp.shown; });
+    std::sort(shown.begin(), shown.end());
+    std::vector<std::int64_t> steps;
+    for (std::size_t at = 1; at < shown.size(); ++at) {
+        steps.push_back(shown[at] - shown[at - 1]);
+    }
+    if (steps.empty()) {
+        return 0;
+    }
+    std::nth_element(steps.begin(), steps.begin() + static_cast<std::ptrdiff_t>(steps.size() / 2),
+                     steps.end());
+    return static_cast<double>(steps[steps.size() / 2]) * av_q2d(stream.time_base);
+}
+
+/// Stamps in milliseconds move a distance by up to one.
+bool Fits(AVRational rate, double spacing) {
+    return spacing <= 0 || std::abs(av_q2d(av_inv_q(rate)) - spacing) < 0.0015;
+}
+
+}  // namespace
+
+VideoFindings CheckVideo(AVFormatContext& format, AVStream& stream,
+                         const std::deque<libav::Owner<AVPacket>>& packets, const FrameRate* expected) {
+    VideoFindings findings;
+    const std::vector<Stamps> stamps = StampsOf(stream, packets);
+    findings.reordered = Reordered(stream, stamps);
+    AVRational pictureRate{0, 1};
+    if (stream.codecpar->codec_id == AV_CODEC_ID_H264) {
+        PictureParser parser(*stream.codecpar);
+        for (const auto& packet : packets) {
+            if (packet->stream_index == stream.index) {
+                findings.fields |= parser.Parse({packet->data, static_cast<std::size_t>(packet->size)}).field;
+            }
+        }
+        pictureRate = parser.FrameRate();
+    }
+    const double spacing = Spacing(stream, stamps) * (findings.fields ? 2 : 1);
+    if (expected != nullptr &&
+        Fits({static_cast<int>(expected->numerator), static_cast<int>(expected->denominator)}, spacing)) {
+        findings.rate = *expected;
+    }
+    const std::array<AVRational, 4> told{pictureRate, stream.avg_frame_rate, stream.r_frame_rate,
+                                         av_guess_frame_rate(&format, &stream, nullptr)};
+    for (const AVRational& rate : told) {
+        if (rate.num <= 0 || rate.den <= 0 || !Fits(rate, spacing)) {
+            continue;
+        }
+        if (findings.toldRate.num == 0) {
+            findings.toldRate = rate;
+        }
+        if (!findings.rate) {
+            findings.rate = NearestFrameRate(rate.num, rate.den);
+        }
+    }
+    if (findings.toldRate.num == 0 && spacing > 0) {
+        findings.toldRate = av_d2q(1 / spacing, 100000);
+    }
+    return findings;
+}
+
+std::string WhyNotPassed(const AVCodecParameters& parameters, const VideoFindings& findings) {
+    if (parameters.codec_id != AV_CODEC_ID_H264) {
+        return std::string("the video is ") + avcodec_get_name(parameters.codec_id) +
+               ", and only H.264 is recorded as it comes: set the encoder to H.264";
+    }
+    if (findings.fields) {
+        return "the video is interlaced with single fields: set the encoder to progressive pictures";
+    }
+    if (findings.reordered) {
+        return "the video has reordered pictures (B frames): set the encoder to no B frames";
+    }
+    if (!findings.rate) {
+        std::array<char, 32> rate{};
+        std::snprintf(rate.data(), rate.size(), "%.5g",
+                      findings.toldRate.num == 0 ? 0 : av_q2d(findings.toldRate));
+        return "the video has " + std::string(rate.data()) +
+               " frames a second: set the encoder to 23.976, 24, 25, 29.97, 30, 50, 59.94 or 60";
+    }
+    return "";
+}
+
+}  // namespace receiver

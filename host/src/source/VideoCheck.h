@@ -1,0 +1,33 @@
+#pragma once
+
+#include <deque>
+#include <optional>
+#include <string>
+
+#include "common/FrameRate.h"
+#include "source/Libav.h"
+
+namespace receiver {
+
+/// What the first second of a source's video shows.
+struct VideoFindings {
+    /// The rate of the table, or nothing when the source has another one.
+    std::optional<FrameRate> rate;
+    /// What the source says of its rate; 0/1 when nothing.
+    AVRational toldRate{0, 1};
+    /// Pictures are sent in another order than they are shown in.
+    bool reordered = false;
+    /// Packets hold single fields.
+    bool fields = false;
+};
+
+/// Looks at the packets of `stream` among `packets`. `expected`: a rate that is taken for granted while the
+/// packets do not speak against it (of an earlier connection), or null.
+VideoFindings CheckVideo(AVFormatContext& format, AVStream& stream,
+                         const std::deque<libav::Owner<AVPacket>>& packets, const FrameRate* expected);
+
+/// Why such video cannot be recorded untouched, as the beginning of a sentence: "the video is hevc, not
+/// H.264". Empty when it can.
+std::string WhyNotPassed(const AVCodecParameters& parameters, const VideoFindings& findings);
+
+}  // namespace receiver

@@ -1,0 +1,38 @@
+#pragma once
+
+#include <memory>
+
+#include "source/AnnexB.h"
+#include "source/PictureParser.h"
+#include "source/TimecodeReader.h"
+#include "source/VideoPath.h"
+
+namespace receiver {
+
+/// Passes H.264 on untouched: as byte stream, with both parameter sets in front of each IDR frame. What
+/// already is so is not changed by a byte, and not copied.
+class VideoPass final : public VideoPathInterface {
+ public:
+    explicit VideoPass(const AVCodecParameters& parameters);
+
+    bool IsStart(const AVPacket& packet) override;
+    void Push(const AVPacket& packet, const PictureSink& sink) override;
+    void Finish(const PictureSink& sink) override;
+    std::uint64_t Damaged() const override { return damaged_; }
+
+ private:
+    /// The packet as byte stream.
+    AVPacket& Filter(const AVPacket& packet);
+    void CheckSize(const AVPacket& stream);
+
+    libav::Owner<AVBSFContext> filter_;
+    libav::Owner<AVPacket> packet_;
+    ParameterSets sets_;
+    std::unique_ptr<PictureParser> parser_;
+    std::unique_ptr<TimecodeReader> timecodes_;
+    std::uint32_t width_ = 0;
+    std::uint32_t height_ = 0;
+    std::uint64_t damaged_ = 0;
+};
+
+}  // namespace receiver
