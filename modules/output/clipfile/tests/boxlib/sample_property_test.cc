@@ -267,6 +267,7 @@ class Recording {
             ASSERT_EQ(MbxShiftFragmentOffsets(session_, fragment, 0, 0, delta), MBX_OK);
             shifted = target;
         }
+        refuseFarRun(fragment);
         ASSERT_EQ(MbxSetFragmentBase(session_, fragment, position), MBX_OK);
         uint64_t written = 0;
         ASSERT_EQ(MbxWriteMoof(session_, &file_, fragment, position, &written), MBX_OK);
@@ -277,6 +278,22 @@ class Recording {
         }
         place(fragment, position, position + size + mdatHeader(payload));
         writeMdat(payload);
+    }
+
+    // A run out of reach of the base data offset is refused where `tfhd` carries one, and taken once it is
+    // back.
+    void refuseFarRun(uint32_t fragment) {
+        uint32_t runs = 0;
+        for (const Entered& entered : tracks_[0].samples) {
+            if (entered.sample.fragment == fragment) runs = entered.sample.trunNumber;
+        }
+        if (runs < 2 || !oneIn(&random_, 4)) return;
+        constexpr int64_t kOutOfReach = 1LL << 31;
+        const MbxStatus expected = options_.base_offset_mode == 0 ? MBX_ERR_OVERFLOW : MBX_OK;
+        uint64_t size = 0;
+        ASSERT_EQ(MbxShiftFragmentOffsets(session_, fragment, 1, runs, kOutOfReach), MBX_OK);
+        ASSERT_EQ(MbxWriteMoof(session_, nullptr, fragment, 0, &size), expected);
+        ASSERT_EQ(MbxShiftFragmentOffsets(session_, fragment, 1, runs, -kOutOfReach), MBX_OK);
     }
 
     bool narrowTimes() const { return options_.time_version_mode == 0 || options_.time_version_mode == 2; }
