@@ -3,9 +3,12 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
+#include <array>
 #include <memory>
 #include <string>
+#include <vector>
 
+#include "boxlib/support/IsoReader.h"
 #include "mp4/Mp4MuxerFactory.h"
 #include "support/FakePlatform.h"
 #include "support/GoldenFile.h"
@@ -204,6 +207,39 @@ class WholeFile : public ::testing::TestWithParam<RateRow> {
         ASSERT_TRUE(muxer->Uninitialize());
     }
     Bytes file() const { return muxer_stream::ReadFile(directory.Path() / "01_02_03_04.MP4"); }
+    /// What a reader that knows the standard alone makes of the file: `counts` samples in the four tracks,
+    /// with times that run on without a gap.
+    static void expectMovie(const iso::Movie& movie, const std::array<std::size_t, 4>& counts) {
+        const RateRow& row = GetParam();
+        const std::array<std::uint32_t, 4> timescales = {row.timescale, 48000, row.timescale, row.timescale};
+        const std::array<std::uint64_t, 4> durations = {row.duration, 1024, counts[0] * row.duration,
+                                                        row.duration};
+        const std::array<const char*, 4> entries = {"avc1", "mp4a", "tmcd", "rtmd"};
+        const std::array<const char*, 4> handlers = {"vide", "soun", "tmcd", "meta"};
+        ASSERT_EQ(movie.tracks.size(), 4U);
+        EXPECT_EQ(movie.timescale, row.timescale);
+        EXPECT_EQ(movie.nextTrackId, 5U);
+        for (std::size_t i = 0; i < 4; ++i) {
+            const iso::Track& track = movie.tracks[i];
+            EXPECT_EQ(track.trackId, i + 1);
+            EXPECT_EQ(track.flags, 7U);
+            EXPECT_EQ(track.handler, handlers[i]);
+            EXPECT_EQ(track.entryTypes, std::vector<std::string>{entries[i]});
+            EXPECT_EQ(track.timescale, timescales[i]);
+            EXPECT_EQ(track.language, 0x15C7);
+            EXPECT_EQ(track.edits.size(), 1U);
+            ASSERT_EQ(track.samples.size(), counts[i]) << entries[i];
+            for (std::size_t n = 0; n < counts[i]; ++n) {
+                EXPECT_EQ(track.samples[n].decodeTime, n * durations[i]);
+                EXPECT_EQ(track.samples[n].duration, durations[i]);
+                EXPECT_EQ(track.samples[n].compositionOffset, 0);
+                EXPECT_EQ(track.samples[n].descriptionIndex, 1U);
+            }
+        }
+        if (movie.fragmented) {
+            EXPECT_EQ(movie.fragmentDuration, counts[0] * row.duration);
+        }
+    }
 
     FakePlatform platform;
     TempDir directory;
@@ -216,6 +252,7 @@ TEST_P(WholeFile, ANormalFileIsAsDescribed) {
     ASSERT_TRUE(muxer->Write(MakeChunk(kSecondChunk, 2)));
     close();
     expectSameFile(file(), normalFile(GetParam()));
+    expectMovie(iso::ReadMovie(file()), {16, 5, 1, 16});
 }
 
 TEST_P(WholeFile, AFragmentedFileIsAsDescribed) {
@@ -227,6 +264,7 @@ TEST_P(WholeFile, AFragmentedFileIsAsDescribed) {
     ASSERT_TRUE(muxer->Write(MakeChunk(kLastChunk, 33)));
     close();
     expectSameFile(file(), fragmentFile(GetParam()));
+    expectMovie(iso::ReadMovie(file()), {272, 66, 1, 272});
 }
 
 INSTANTIATE_TEST_SUITE_P(Rates, WholeFile, ::testing::ValuesIn(kRates),
