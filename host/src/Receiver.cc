@@ -1,0 +1,415 @@
+#include "Receiver.h"
+
+#include <stdlib.h>
+
+#include <atomic>
+#include <chrono>
+#include <exception>
+#include <optional>
+#include <utility>
+
+#include "OutputFolder.h"
+#include "QxRegistry.h"
+#include "Recorder.h"
+#include "StreamRates.h"
+#include "module/Host.h"
+#include "module/ModuleLibrary.h"
+#include "module/ModuleLog.h"
+#include "module/ModuleSession.h"
+#include "module/SettingsFile.h"
+#include "operator/Keyboard.h"
+
+namespace receiver {
+namespace {
+
+using Clock = std::chrono::steady_clock;
+
+constexpr std::chrono::milliseconds kDisplayInterval{250};
+constexpr std::chrono::seconds kFreeSpaceInterval{1};
+/// The end of a recording needs two chunks more of the stream; when that has dried up, nobody waits for it.
+constexpr std::chrono::seconds kFinishPatience{4};
+constexpr const char* kDefaultOutput = "recordings";
+
+/// A fault of the stream; the recording begins anew.
+constexpr int kStatusFault = 6;
+/// With it: the host went offline, which is how each run ends.
+constexpr int kCauseOffline = 26;
+
+/// The signals of the run, for the one callback that knows of no object.
+std::atomic<Signals*> currentSignals{nullptr};
+
+bool QuitRequested() {
+    Signals* const signals = currentSignals;
+    return signals != nullptr && signals->QuitRequested();
+}
+
+/// Where files go. The module's rule, with an output of our own where it would refuse: start parameter, else
+/// settings store.
+std::string OutputOf(const Options& options) {
+    std::string folder;
+    if (options.output) {
+        folder = *options.output;
+    } else if (!QxRegistry::GetInstance()->getValue("Qx/Other/MP4FileOut", "MP4OutputPath", folder) ||
+               folder.empty()) {
+        folder = kDefaultOutput;
+    }
+    while (folder.size() > 1 && folder.ends_with('/')) {
+        folder.pop_back();
+    }
+    // The module takes this word for "not set".
+    return folder == "none" ? "./none" : folder;
+}
+
+void SetUpLog(const Options& options, const std::string& output) {
+    const char* const set = getenv("QX_LOG");
+    if (options.log) {
+        setenv("QX_LOG", *options.log == "-" ? "" : options.log->c_str(), 1);
+    } else if (set == nullptr || *set == '\0') {
+        setenv("QX_LOG", (output + "/receiver.log").c_str(), 1);
+    }
+    if (options.logPriority) {
+        setenv("QX_LOG_PRIORITY", std::to_string(*options.logPriority).c_str(), 1);
+    }
+}
+
+StartParameters ParametersOf(const Options& options, const std::string& output,
+                             const SourceDescription& description) {
+    StartParameters parameters;
+    parameters.texts = {{"-outputPath", output},
+                        {"-fileType", options.fileType},
+                        {"-naluType", options.naluType},
+                        {"-outputMode", options.mode == OutputMode::kOn ? "on" : "sync"}};
+    const auto add = [&](const char* key, const std::optional<std::string>& value) {
+        if (value) {
+            parameters.texts[key] = *value;
+        }
+    };
+    add("-filePrefix", options.prefix);
+    add("-userName", options.user);
+    add("-password", options.password);
+    parameters.numbers = {{"-encodedHeight", static_cast<int>(description.height)},
+                          {"-encodedWidth", static_cast<int>(description.width)},
+                          {"-encodedFPS", static_cast<int>(description.frameRate.key)}};
+    if (description.bitrate != 0) {
+        parameters.numbers["-encodedBPS"] = static_cast<int>(description.bitrate);
+    }
+    return parameters;
+}
+
+void CheckTimecode(const Options& options, const FrameRate& rate) {
+    if (!options.timecode) {
+        return;
+    }
+    if (!IsValid(*options.timecode, rate.timecodeFrames) ||
+        (options.timecode->dropFrame && !rate.dropFrame)) {
+        throw ReceiverError(ExitCode::kUsage,
+                            "--timecode " + ToString(*options.timecode) +
+                                " does not exist at the frame rate of the source, which counts " +
+                                std::to_string(rate.timecodeFrames) + " frames a second.");
+    }
+}
+
+Recorder::Settings RecorderSettings(const Options& options, const FrameRate& rate) {
+    Recorder::Settings settings;
+    settings.mode = options.mode;
+    settings.frameRate = rate;
+    settings.timecode = options.timecode;
+    settings.dropFrame = options.dropFrame;
+    if (settings.timecode && rate.dropFrame && options.dropFrame) {
+        // The rate asks for drop frame, also where the address was written with a colon.
+        settings.timecode->dropFrame = true;
+        if (!IsValid(*settings.timecode, rate.timecodeFrames)) {
+            throw ReceiverError(ExitCode::kUsage, "--timecode " + ToString(*options.timecode) +
+                                                      " is left out by the drop-frame rule; choose another "
+                                                      "one, or forbid drop frame with --no-drop-frame.");
+        }
+    }
+    if (options.seconds) {
+        settings.length = static_cast<std::int64_t>(*options.seconds * static_cast<double>(kVideoClock));
+    }
+    settings.followDisk = !IsLive(options.source.url);
+    return settings;
+}
+
+/// A run with its module and its display.
+class Running final : public SourceListenerInterface {
+ public:
+    Running(const Options& options, Signals& signals, DisplayInterface& display, int keyboard)
+        : options_(options), signals_(signals), display_(display), keyboard_(keyboard) {}
+
+    void OnNotice(const std::string& sentence) override { display_.Notice(sentence); }
+
+    ExitCode Record(const SourceOpener& open);
+
+ private:
+    void Loop(SourceInterface& source, Recorder& recorder);
+    void TakeCommands(Recorder& recorder);
+    void TakeKey(char key, Recorder& recorder);
+    void StartRecording();
+    void StopRecording();
+    void TakeStatuses(bool ending);
+    void TakeModuleEvents();
+    void Show(const SourceInterface& source, const Recorder& recorder);
+    std::uint64_t Lost(const SourceInterface& source) const;
+    Summary Summarise(const SourceInterface& source) const;
+
+    const Options& options_;
+    Signals& signals_;
+    DisplayInterface& display_;
+    Keyboard keyboard_;
+    std::string output_;
+    ModuleLog* log_ = nullptr;
+    Host* host_ = nullptr;
+    RecordPlan plan_{options_.record};
+    StreamRates rates_;
+    std::vector<std::string> files_;
+    std::string openFile_;
+    std::uint64_t faults_ = 0;
+    bool sourceOver_ = false;
+    std::optional<Clock::time_point> finishSince_;
+    Clock::time_point shown_{};
+    Clock::time_point spaceRead_{};
+    std::optional<std::uint64_t> freeBytes_;
+};
+
+ExitCode Running::Record(const SourceOpener& open) {
+    const SettingsFile settings(options_.settings, options_.maxMinutes);
+    output_ = OutputOf(options_);
+    if (PrepareOutputFolder(output_)) {
+        display_.Notice("made the output folder " + output_);
+    }
+    SetUpLog(options_, output_);
+    const ModuleLibrary library(options_.module.value_or(ModuleLibrary::DefaultFile()));
+    ModuleLog log;
+    log_ = &log;
+
+    const std::unique_ptr<SourceInterface> source = open(options_.source, *this, QuitRequested);
+    if (source == nullptr) {
+        display_.Finish({});
+        return ExitCode::kSuccess;
+    }
+    const SourceDescription& description = source->Description();
+    display_.Notice("source: " + description.summary);
+    CheckTimecode(options_, description.frameRate);
+    const Recorder::Settings recorderSettings = RecorderSettings(options_, description.frameRate);
+
+    Host host(ParametersOf(options_, output_, description));
+    host_ = &host;
+    std::optional<ReceiverError> failure;
+    {
+        ModuleSession session(library.Module(), host);
+        if (options_.mode == OutputMode::kSync) {
+            session.GoOnline();
+        }
+        Recorder recorder(recorderSettings, session, log, plan_);
+        try {
+            Loop(*source, recorder);
+        } catch (const ReceiverError& error) {
+            failure = error;
+        }
+        if (!host.Failed()) {
+            const std::uint64_t left = recorder.Close(sourceOver_ || failure);
+            if (left != 0) {
+                display_.Notice("the stream ended while it was recorded: its last " + std::to_string(left) +
+                                (left == 1 ? " frame is" : " frames are") +
+                                " not in the file, which grows by 8 frames at a time");
+            }
+        }
+        TakeStatuses(false);
+        session.End();
+    }
+    TakeModuleEvents();
+    TakeStatuses(true);
+
+    Summary summary = Summarise(*source);
+    if (failure) {
+        summary.exitCode = failure->Code();
+    }
+    display_.Finish(summary);
+    if (failure) {
+        display_.Failure(failure->Code(), failure->what());
+    }
+    return summary.exitCode;
+}
+
+void Running::Loop(SourceInterface& source, Recorder& recorder) {
+    while (!host_->Failed()) {
+        SourceUnit unit;
+        const SourceInterface::Result result = source.Read(unit);
+        if (result == SourceInterface::Result::kEnd || result == SourceInterface::Result::kStopped) {
+            sourceOver_ = true;
+            return;
+        }
+        if (result == SourceInterface::Result::kUnit) {
+            rates_.Count(unit);
+            recorder.Put(std::move(unit));
+        }
+        TakeCommands(recorder);
+        if (recorder.Finishing()) {
+            finishSince_ = finishSince_.value_or(Clock::now());
+            if (recorder.Done() || Clock::now() - *finishSince_ > kFinishPatience) {
+                return;
+            }
+        }
+        if (Clock::now() - shown_ >= kDisplayInterval) {
+            Show(source, recorder);
+        }
+    }
+}
+
+void Running::TakeCommands(Recorder& recorder) {
+    const SignalCommands commands = signals_.Take();
+    if (commands.start) {
+        StartRecording();
+    }
+    if (commands.stop) {
+        StopRecording();
+    }
+    if (commands.hangup) {
+        keyboard_.Abandon();
+        display_.Notice("the terminal is gone; the run goes on until SIGTERM");
+    }
+    if (commands.quit && !recorder.Finishing()) {
+        display_.Notice("ending in order; a second signal ends at once");
+        recorder.Finish();
+    }
+    if (const std::optional<char> key = keyboard_.Take()) {
+        TakeKey(*key, recorder);
+    }
+}
+
+void Running::TakeKey(char key, Recorder& recorder) {
+    switch (key) {
+        case 'r':
+            StartRecording();
+            break;
+        case 's':
+            StopRecording();
+            break;
+        case 'q':
+            recorder.Finish();
+            break;
+        default:
+            display_.Notice("keys: r records, s stops, q ends");
+            break;
+    }
+}
+
+void Running::StartRecording() {
+    if (options_.mode == OutputMode::kOn) {
+        display_.Notice("in mode on the whole run is one recording; --mode sync takes record commands");
+        return;
+    }
+    plan_.Start();
+}
+
+void Running::StopRecording() {
+    if (options_.mode == OutputMode::kOn) {
+        display_.Notice("in mode on the whole run is one recording; --mode sync takes record commands");
+        return;
+    }
+    plan_.Stop();
+}
+
+void Running::TakeStatuses(bool ending) {
+    for (const ModuleStatus& status : host_->TakeStatuses()) {
+        if (status.status == kStatusFault) {
+            if (ending && status.cause == kCauseOffline) {
+                continue;
+            }
+            ++faults_;
+        }
+        display_.Status(status);
+    }
+}
+
+void Running::TakeModuleEvents() {
+    for (const ModuleEvent& event : log_->TakeEvents()) {
+        switch (event.kind) {
+            case ModuleEvent::Kind::kFileOpened:
+                openFile_ = event.text;
+                files_.push_back(event.text);
+                display_.FileOpened(event.text);
+                break;
+            case ModuleEvent::Kind::kFileClosed:
+                if (openFile_ == event.text) {
+                    openFile_.clear();
+                }
+                display_.FileClosed(event.text);
+                break;
+            case ModuleEvent::Kind::kRecordRestarted:
+                display_.Notice("the recording begins anew after a fault");
+                break;
+            case ModuleEvent::Kind::kError:
+                display_.Notice("module log: " + event.text);
+                break;
+            case ModuleEvent::Kind::kRecordStarted:
+            case ModuleEvent::Kind::kRecordStopped:
+            case ModuleEvent::Kind::kRecordRemoved:
+                break;
+        }
+    }
+}
+
+void Running::Show(const SourceInterface& source, const Recorder& recorder) {
+    shown_ = Clock::now();
+    if (shown_ - spaceRead_ >= kFreeSpaceInterval) {
+        spaceRead_ = shown_;
+        freeBytes_ = FreeBytes(output_);
+    }
+    TakeModuleEvents();
+    TakeStatuses(false);
+    Snapshot snapshot;
+    snapshot.timecode = recorder.LastTimecode();
+    snapshot.seconds = static_cast<double>(recorder.Elapsed()) / static_cast<double>(kVideoClock);
+    snapshot.recording = options_.mode == OutputMode::kOn ? log_->OpenRecordings() > 0 : plan_.Recording();
+    snapshot.waiting = options_.mode == OutputMode::kSync && plan_.Wanted() && !plan_.Recording();
+    snapshot.framesPerSecond = rates_.FramesPerSecond();
+    snapshot.videoKilobits = rates_.VideoKilobits();
+    snapshot.audioKilobits = rates_.AudioKilobits();
+    snapshot.klvPackets = rates_.KlvPackets();
+    snapshot.status = host_->Status();
+    snapshot.file = openFile_;
+    snapshot.freeBytes = freeBytes_;
+    snapshot.lost = Lost(source);
+    display_.Show(snapshot);
+}
+
+std::uint64_t Running::Lost(const SourceInterface& source) const {
+    const SourceCounts counts = source.Counts();
+    return log_->Losses().Total() + counts.lostFrames + counts.damagedPackets;
+}
+
+Summary Running::Summarise(const SourceInterface& source) const {
+    Summary summary;
+    for (const std::string& file : files_) {
+        summary.files.push_back(ReadBack(file));
+    }
+    summary.lost = Lost(source);
+    if (host_->Failed()) {
+        summary.exitCode = ExitCode::kRecordingFailed;
+    } else if (summary.lost != 0 || faults_ != 0 || source.Counts().reconnections != 0) {
+        summary.exitCode = ExitCode::kLost;
+    }
+    return summary;
+}
+
+}  // namespace
+
+ExitCode Run(const Options& options, const SourceOpener& open, Signals& signals, DisplayInterface& display,
+             int keyboard) {
+    currentSignals = &signals;
+    ExitCode code = ExitCode::kInternal;
+    try {
+        code = Running(options, signals, display, keyboard).Record(open);
+    } catch (const ReceiverError& error) {
+        code = error.Code();
+        display.Failure(code, error.what());
+    } catch (const std::exception& error) {
+        display.Failure(code, error.what());
+    }
+    currentSignals = nullptr;
+    return code;
+}
+
+}  // namespace receiver

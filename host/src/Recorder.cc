@@ -1,0 +1,213 @@
+#include "Recorder.h"
+
+#include <algorithm>
+#include <array>
+#include <chrono>
+#include <memory>
+#include <utility>
+
+#include "metadata/RecordMetadata.h"
+
+namespace receiver {
+namespace {
+
+/// The module cuts its caches into chunks of so many frames, when twice as many are there.
+constexpr std::uint64_t kChunkFrames = 8;
+constexpr std::int64_t kAudioFrame = 1024;
+
+/// The event thread of the module needs far less, unless the module has failed.
+constexpr std::chrono::milliseconds kStopPatience{1000};
+
+/// Where frames lie further apart than this, in ticks, something is missing. The module does not notice: it
+/// counts units, so its media would drift apart and the timecode of the file would be wrong behind the gap.
+constexpr std::int64_t kGap = kVideoClock / 2;
+
+/// An access unit delimiter (ISO/IEC 14496-10 7.3.2.4): a unit for the count that holds no picture.
+constexpr std::array<unsigned char, 6> kEmptyVideo{0x00, 0x00, 0x00, 0x01, 0x09, 0xF0};
+
+/// How often the chunk thread is nudged at the end, and how long it gets each time: it takes a look at its
+/// caches for each unit that comes, and cuts one chunk a look.
+constexpr int kNudges = 200;
+constexpr std::chrono::milliseconds kNudgePause{5};
+
+/// A disk is slow, not hung, as long as it needs less than this for the chunks of one wait.
+constexpr std::chrono::seconds kDiskPatience{30};
+
+}  // namespace
+
+void Recorder::Put(SourceUnit unit) {
+    interleaver_.Put(std::move(unit));
+    while (const std::optional<SourceUnit> next = interleaver_.Take()) {
+        Push(*next);
+    }
+}
+
+void Recorder::Finish() {
+    finishing_ = true;
+    plan_.Finish();
+}
+
+bool Recorder::Done() const {
+    if (!finishing_) {
+        return false;
+    }
+    // Going offline has no timestamp. The run ends with a whole chunk, so that none of it is lost.
+    return settings_.mode == OutputMode::kOn ? onlineFrames_ % kChunkFrames == 0 : log_.OpenRecordings() == 0;
+}
+
+std::int64_t Recorder::Elapsed() const {
+    return firstFrame_ ? lastFrame_ - *firstFrame_ : 0;
+}
+
+void Recorder::Push(const SourceUnit& unit) {
+    switch (unit.medium) {
+        case Medium::kVideo:
+            PushFrame(unit);
+            break;
+        case Medium::kAudio:
+            if (settings_.mode == OutputMode::kSync || online_) {
+                feed_.PushAudio(unit.time, unit.data, unit.size);
+            }
+            lastAudio_ = unit.time;
+            break;
+        case Medium::kKlv:
+            packets_.emplace_back(unit.data.get(), unit.data.get() + unit.size);
+            break;
+    }
+}
+
+void Recorder::PushFrame(const SourceUnit& unit) {
+    if (!firstFrame_) {
+        firstFrame_ = unit.time;
+    } else if (unit.time - lastFrame_ > kGap) {
+        BridgeGap(lastFrame_);
+    }
+    lastFrame_ = unit.time;
+    if (settings_.length && Elapsed() >= *settings_.length) {
+        Finish();
+    }
+    timecode_ = NextTimecode(unit);
+    if (settings_.mode == OutputMode::kOn) {
+        if (!PushOnlineFrame(unit, *timecode_)) {
+            packets_.clear();
+            return;
+        }
+    } else {
+        PushSyncFrame(unit, *timecode_);
+    }
+    packets_.clear();
+    feed_.PushVideo(unit.time, unit.data, unit.size);
+    if (settings_.followDisk) {
+        feed_.WaitForDisk();
+    }
+}
+
+bool Recorder::PushOnlineFrame(const SourceUnit& unit, const Timecode& timecode) {
+    if (!online_) {
+        if (!unit.keyFrame || finishing_) {
+            return false;
+        }
+        // Online with the first IDR frame and not before: what came earlier would only be trimmed.
+        online_ = true;
+        session_.GoOnline();
+    } else if (Done()) {
+        return false;
+    }
+    ++onlineFrames_;
+    feed_.PushMeta(unit.time, BuildMetadata(true, timecode, packets_));
+    return true;
+}
+
+void Recorder::PushSyncFrame(const SourceUnit& unit, const Timecode& timecode) {
+    const bool before = plan_.Recording();
+    const bool record = plan_.Next(Elapsed(), unit.keyFrame);
+    const int stops = log_.Stops();
+    if (record && !before) {
+        feed_.Settle();
+    }
+    feed_.PushMeta(unit.time, BuildMetadata(record, timecode, packets_));
+    if (record && !before) {
+        feed_.Settle();
+    }
+    if (before && !record && log_.OpenRecordings() > 0) {
+        log_.WaitForStops(stops + 1, kStopPatience);
+    }
+}
+
+void Recorder::BridgeGap(std::int64_t time) {
+    if (settings_.mode != OutputMode::kSync || !plan_.Recording()) {
+        return;
+    }
+    // The recording ends where the stream did, and a new one begins with the first IDR frame behind the gap.
+    const int stops = log_.Stops();
+    plan_.Interrupt();
+    feed_.PushMeta(FrameTime(time, 1), BuildMetadata(false, std::nullopt, {}));
+    if (log_.OpenRecordings() > 0) {
+        log_.WaitForStops(stops + 1, kStopPatience);
+    }
+}
+
+Timecode Recorder::NextTimecode(const SourceUnit& unit) {
+    if (!counter_) {
+        const FrameRate& rate = settings_.frameRate;
+        const bool dropFrame = rate.dropFrame && settings_.dropFrame;
+        counter_.emplace(
+            rate, settings_.timecode ? *settings_.timecode : TimecodeOfDay(SecondsOfDay(), rate, dropFrame));
+    }
+    return counter_->Next(unit.time, unit.timecode);
+}
+
+std::int64_t Recorder::FrameTime(std::int64_t from, std::int64_t frames) const {
+    const FrameRate& rate = settings_.frameRate;
+    return from + frames * kVideoClock * rate.denominator / rate.numerator;
+}
+
+void Recorder::PushPadding() {
+    const std::shared_ptr<unsigned char> empty(new unsigned char[kEmptyVideo.size()],
+                                               std::default_delete<unsigned char[]>());
+    std::copy(kEmptyVideo.begin(), kEmptyVideo.end(), empty.get());
+    const std::vector<unsigned char> meta = BuildMetadata(false, std::nullopt, {});
+    std::int64_t frame = 0;
+    const auto pushMetaAndAudio = [&] {
+        const std::int64_t time = FrameTime(lastFrame_, ++frame);
+        feed_.PushMeta(time, meta);
+        // Audio a little ahead of the frames, so that it reaches beyond the end of the last chunk.
+        while (lastAudio_ * kVideoClock < (time + kVideoClock / 10) * kAudioClock) {
+            lastAudio_ += kAudioFrame;
+            feed_.PushAudio(lastAudio_, empty, kEmptyVideo.size());
+        }
+    };
+    // Enough for every whole chunk to be cut, too few to be cut themselves.
+    for (std::uint64_t i = 0; i < kChunkFrames; ++i) {
+        pushMetaAndAudio();
+        feed_.PushVideo(FrameTime(lastFrame_, frame), empty, kEmptyVideo.size());
+    }
+    for (int i = 0; i < kNudges && !feed_.Frames().WaitForUncut(2 * kChunkFrames - 1, kNudgePause); ++i) {
+        pushMetaAndAudio();
+    }
+}
+
+std::uint64_t Recorder::Close(bool over) {
+    if (over) {
+        interleaver_.Finish();
+        while (const std::optional<SourceUnit> next = interleaver_.Take()) {
+            Push(*next);
+        }
+    }
+    if (log_.OpenRecordings() <= 0) {
+        return 0;
+    }
+    feed_.Settle();
+    const std::size_t uncut = feed_.Frames().UncutUnits();
+    std::uint64_t left = 0;
+    if (uncut > 0) {
+        PushPadding();
+        const std::size_t held = feed_.Frames().UncutUnits();
+        left = held > kChunkFrames ? held - kChunkFrames : 0;
+    }
+    // The writer holds on to the chunk that it wrote last.
+    feed_.Frames().WaitForChunks(1, kDiskPatience);
+    return left;
+}
+
+}  // namespace receiver

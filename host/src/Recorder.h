@@ -1,0 +1,94 @@
+#pragma once
+
+#include <cstdint>
+#include <optional>
+#include <vector>
+
+#include "common/FrameRate.h"
+#include "metadata/TimecodeCounter.h"
+#include "module/Interleaver.h"
+#include "module/ModuleLog.h"
+#include "module/ModuleSession.h"
+#include "module/StreamFeed.h"
+#include "operator/RecordPlan.h"
+#include "options/Options.h"
+
+namespace receiver {
+
+/// Brings a source's units into the module: in one order of time, each frame behind its metadata unit with
+/// timecode, record flag and the source's own packets, and record commands so that no schedule of the
+/// module's threads moves them by a frame.
+///
+/// A record command travels in the metadata unit of its frame, which goes first. Before a recording begins
+/// and again before its first frame follows, the feed waits until the module has worked off everything: so no
+/// earlier audio gets into the recording, and its IDR frame cannot overtake the command on the way through
+/// the module's three queue threads, which would cost a whole group of pictures. A stop is waited for too, so
+/// that a fast source does not run on beyond it.
+///
+/// One thread at a time.
+class Recorder {
+ public:
+    struct Settings {
+        OutputMode mode = OutputMode::kSync;
+        FrameRate frameRate;
+        /// Address of the first frame where the source has none; time of day when not set.
+        std::optional<Timecode> timecode;
+        bool dropFrame = true;
+        /// Length of the run in ticks of 90000 a second since the first frame.
+        std::optional<std::int64_t> length;
+        /// The source waits for us: follow the disk.
+        bool followDisk = false;
+    };
+
+    /// All references must outlive the recorder.
+    Recorder(const Settings& settings, ModuleSession& session, const ModuleLog& log, RecordPlan& plan)
+        : settings_(settings), session_(session), log_(log), plan_(plan), feed_(session.Stream()) {}
+
+    void Put(SourceUnit unit);
+
+    /// The run is to end: nothing is recorded from the next frame on. More of the stream is needed until
+    /// `Done`, for the module to cut what came before.
+    void Finish();
+    bool Finishing() const { return finishing_; }
+    /// Everything up to the end is on its way to the disk.
+    bool Done() const;
+    /// Ends a stream of which nothing more comes: what waits for order is pushed, then units that are never
+    /// written, which let the module cut all whole chunks that it still holds. `over` says that the source
+    /// itself has ended. Returns the number of frames that stay out of the recording: a chunk is 8 frames.
+    std::uint64_t Close(bool over);
+
+    /// Of the last frame.
+    const std::optional<Timecode>& LastTimecode() const { return timecode_; }
+    /// Stream time of the last frame since the first one, in ticks of 90000 a second.
+    std::int64_t Elapsed() const;
+
+ private:
+    void Push(const SourceUnit& unit);
+    void PushFrame(const SourceUnit& unit);
+    bool PushOnlineFrame(const SourceUnit& unit, const Timecode& timecode);
+    void PushSyncFrame(const SourceUnit& unit, const Timecode& timecode);
+    void BridgeGap(std::int64_t time);
+    Timecode NextTimecode(const SourceUnit& unit);
+    std::int64_t FrameTime(std::int64_t from, std::int64_t frames) const;
+    void PushPadding();
+
+    const Settings settings_;
+    ModuleSession& session_;
+    const ModuleLog& log_;
+    RecordPlan& plan_;
+    StreamFeed feed_;
+    Interleaver interleaver_;
+    std::optional<TimecodeCounter> counter_;
+    std::optional<Timecode> timecode_;
+    std::optional<std::int64_t> firstFrame_;
+    std::int64_t lastFrame_ = 0;
+    std::int64_t lastAudio_ = 0;
+    /// KLV packets since the last frame.
+    std::vector<std::vector<unsigned char>> packets_;
+    bool finishing_ = false;
+    bool online_ = false;
+    /// Frames pushed since going online.
+    std::uint64_t onlineFrames_ = 0;
+};
+
+}  // namespace receiver

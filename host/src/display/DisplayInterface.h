@@ -1,0 +1,61 @@
+#pragma once
+
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "common/ReceiverError.h"
+#include "common/Timecode.h"
+#include "display/FileReport.h"
+#include "module/Host.h"
+
+namespace receiver {
+
+/// What the receiver does at one moment.
+struct Snapshot {
+    /// Of the last frame.
+    std::optional<Timecode> timecode;
+    /// Length of the stream so far.
+    double seconds = 0;
+    /// The record flag of the last frame; `waiting` says that the recording is commanded and waits for an IDR
+    /// frame.
+    bool recording = false;
+    bool waiting = false;
+    double framesPerSecond = 0;
+    double videoKilobits = 0;
+    double audioKilobits = 0;
+    std::uint64_t klvPackets = 0;
+    ModuleStatus status;
+    /// The file that is open; empty when there is none.
+    std::string file;
+    /// Bytes that may still be written where files go.
+    std::optional<std::uint64_t> freeBytes;
+    /// Units that were lost anywhere between the source and the files.
+    std::uint64_t lost = 0;
+};
+
+/// The end of a run.
+struct Summary {
+    std::vector<RecordedFile> files;
+    std::uint64_t lost = 0;
+    ExitCode exitCode = ExitCode::kSuccess;
+};
+
+/// Tells an operator, or a program in his place, what happens. One thread at a time.
+class DisplayInterface {
+ public:
+    virtual ~DisplayInterface() = default;
+    /// A whole sentence that the operator should see.
+    virtual void Notice(const std::string& sentence) = 0;
+    /// A failure that ends the program.
+    virtual void Failure(ExitCode code, const std::string& sentence) = 0;
+    virtual void Status(const ModuleStatus& status) = 0;
+    virtual void FileOpened(const std::string& path) = 0;
+    virtual void FileClosed(const std::string& path) = 0;
+    /// Called several times a second.
+    virtual void Show(const Snapshot& snapshot) = 0;
+    virtual void Finish(const Summary& summary) = 0;
+};
+
+}  // namespace receiver

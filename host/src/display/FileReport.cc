@@ -1,0 +1,133 @@
+#include "display/FileReport.h"
+
+extern "C" {
+#include <libavformat/avformat.h>
+}
+
+#include <algorithm>
+#include <array>
+#include <cmath>
+#include <cstdio>
+#include <filesystem>
+#include <iomanip>
+#include <memory>
+
+namespace receiver {
+namespace {
+
+struct CloseInput {
+    void operator()(AVFormatContext* context) const { avformat_close_input(&context); }
+};
+struct FreePacket {
+    void operator()(AVPacket* packet) const { av_packet_free(&packet); }
+};
+
+std::string Problem(int error) {
+    std::array<char, AV_ERROR_MAX_STRING_SIZE> text{};
+    av_strerror(error, text.data(), text.size());
+    return text.data();
+}
+
+/// The sample table of a normal file knows; in a fragmented one the samples have to be counted.
+std::uint64_t CountFrames(AVFormatContext& context, const AVStream& stream) {
+    if (stream.nb_frames > 0) {
+        return static_cast<std::uint64_t>(stream.nb_frames);
+    }
+    const std::unique_ptr<AVPacket, FreePacket> packet(av_packet_alloc());
+    std::uint64_t frames = 0;
+    while (packet && av_read_frame(&context, packet.get()) >= 0) {
+        frames += packet->stream_index == stream.index ? 1 : 0;
+        av_packet_unref(packet.get());
+    }
+    return frames;
+}
+
+}  // namespace
+
+RecordedFile ReadBack(const std::string& path) {
+    RecordedFile file;
+    file.path = path;
+    std::error_code error;
+    const std::uintmax_t bytes = std::filesystem::file_size(path, error);
+    if (error) {
+        file.problem = error.message();
+        return file;
+    }
+    file.bytes = bytes;
+
+    AVFormatContext* opened = nullptr;
+    // The prefix keeps a path with a colon from being taken for an address.
+    const int result = avformat_open_input(&opened, ("file:" + path).c_str(), nullptr, nullptr);
+    if (result < 0) {
+        file.problem = Problem(result);
+        return file;
+    }
+    const std::unique_ptr<AVFormatContext, CloseInput> context(opened);
+    const AVStream* video = nullptr;
+    for (unsigned int i = 0; i < context->nb_streams; ++i) {
+        const AVStream* const stream = context->streams[i];
+        if (stream->codecpar->codec_type == AVMEDIA_TYPE_VIDEO) {
+            video = stream;
+        }
+        const AVDictionaryEntry* const timecode = av_dict_get(stream->metadata, "timecode", nullptr, 0);
+        if (timecode != nullptr) {
+            file.startTimecode = timecode->value;
+        }
+    }
+    if (video == nullptr) {
+        file.problem = "there is no video in it";
+        return file;
+    }
+    if (context->duration > 0) {
+        file.seconds = static_cast<double>(context->duration) / AV_TIME_BASE;
+    }
+    file.frames = CountFrames(*context, *video);
+    return file;
+}
+
+std::string FormatBytes(std::uint64_t bytes) {
+    constexpr std::array<const char*, 5> kUnits{"B", "kB", "MB", "GB", "TB"};
+    auto value = static_cast<double>(bytes);
+    std::size_t unit = 0;
+    // 999.95 would be printed as 1000.0.
+    while (value >= 999.95 && unit + 1 < kUnits.size()) {
+        value /= 1000;
+        ++unit;
+    }
+    std::array<char, 32> text{};
+    std::snprintf(text.data(), text.size(), unit == 0 ? "%.0f %s" : "%.1f %s", value, kUnits[unit]);
+    return text.data();
+}
+
+std::string FormatSeconds(double seconds) {
+    const long long milliseconds = std::llround(std::max(seconds, 0.0) * 1000);
+    std::array<char, 48> text{};
+    std::snprintf(text.data(), text.size(), "%02lld:%02lld:%02lld.%03lld", milliseconds / 3600000,
+                  milliseconds / 60000 % 60, milliseconds / 1000 % 60, milliseconds % 1000);
+    return text.data();
+}
+
+void PrintFiles(std::ostream& out, const std::vector<RecordedFile>& files) {
+    if (files.empty()) {
+        return;
+    }
+    std::size_t width = 4;
+    for (const RecordedFile& file : files) {
+        width = std::max(width, file.path.size());
+    }
+    const auto column = static_cast<int>(width);
+    out << std::left << std::setw(column) << "File" << std::right << std::setw(11) << "Size" << std::setw(13)
+        << "Start" << std::setw(14) << "Length" << std::setw(9) << "Frames" << '\n';
+    for (const RecordedFile& file : files) {
+        out << std::left << std::setw(column) << file.path << std::right << std::setw(11)
+            << FormatBytes(file.bytes);
+        if (file.problem.empty()) {
+            out << std::setw(13) << (file.startTimecode.empty() ? "-" : file.startTimecode) << std::setw(14)
+                << FormatSeconds(file.seconds) << std::setw(9) << file.frames << '\n';
+        } else {
+            out << "  cannot be read: " << file.problem << '\n';
+        }
+    }
+}
+
+}  // namespace receiver

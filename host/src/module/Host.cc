@@ -1,0 +1,59 @@
+#include "module/Host.h"
+
+#include <utility>
+
+namespace receiver {
+namespace {
+
+/// The module has failed; it sets no status after this one.
+constexpr int kStatusFailed = 7;
+
+}  // namespace
+
+void Host::SetStatus(int status, int cause) {
+    const std::lock_guard lock(mutex_);
+    status_ = {status, cause};
+    statuses_.push_back(status_);
+}
+
+int Host::GetStatus() {
+    return Status().status;
+}
+
+void Host::GetParameter(std::string key, int& value, int defaultValue) {
+    const auto found = parameters_.numbers.find(key);
+    value = found != parameters_.numbers.end() ? found->second : defaultValue;
+}
+
+void Host::GetParameter(std::string key, std::string& value, std::string defaultValue) {
+    const auto found = parameters_.texts.find(key);
+    value = found != parameters_.texts.end() ? found->second : std::move(defaultValue);
+}
+
+int Host::SendTransmissionStatus(const std::map<std::string, std::string>& status) {
+    const std::lock_guard lock(mutex_);
+    map_ = status;
+    return 0;
+}
+
+ModuleStatus Host::Status() const {
+    const std::lock_guard lock(mutex_);
+    return status_;
+}
+
+bool Host::Failed() const {
+    return Status().status == kStatusFailed;
+}
+
+std::vector<ModuleStatus> Host::TakeStatuses() {
+    const std::lock_guard lock(mutex_);
+    return std::exchange(statuses_, {});
+}
+
+bool Host::Writing() const {
+    const std::lock_guard lock(mutex_);
+    const auto found = map_.find("file_output_status");
+    return found != map_.end() && found->second == "output";
+}
+
+}  // namespace receiver

@@ -1,0 +1,47 @@
+#include "module/ModuleSession.h"
+
+#include <string>
+
+#include "common/ReceiverError.h"
+
+namespace receiver {
+
+ModuleSession::ModuleSession(QxModuleInterface& module, Host& host) : module_(module) {
+    if (!module_.Initialize(&host)) {
+        const ModuleStatus status = host.Status();
+        // The contract allows no further call, Uninitialize included.
+        throw ReceiverError(ExitCode::kModule, "the module refuses to start (status " +
+                                                   std::to_string(status.status) + ", cause " +
+                                                   std::to_string(status.cause) + "); its log tells why.");
+    }
+    module_.GetStreamInterface(&stream_);
+    module_.GetNotifyInterface(&notify_);
+    module_.Execute();
+    // There is no connect notification. It would tell the module the rate once more, but halves 50, 59.94 and
+    // 60 on its way, so that files of these rates would carry wrong times; and what else it says is settled
+    // by the start parameters, which carry the exact rate.
+}
+
+ModuleSession::~ModuleSession() {
+    End();
+}
+
+void ModuleSession::GoOnline() {
+    if (!online_) {
+        online_ = true;
+        notify_->NotifyOnlineStatus();
+    }
+}
+
+void ModuleSession::End() {
+    if (ended_) {
+        return;
+    }
+    ended_ = true;
+    if (online_) {
+        notify_->NotifyOfflineStatus();
+    }
+    module_.Uninitialize();
+}
+
+}  // namespace receiver

@@ -1,0 +1,46 @@
+#pragma once
+
+#include <chrono>
+#include <condition_variable>
+#include <cstdint>
+#include <memory>
+#include <mutex>
+
+#include "StreamData.h"
+
+namespace receiver {
+
+/// Tells how full one of the module's queues can be. The module says nothing about its queues but that it
+/// dropped a unit, when it is too late; so marks travel with the units: a mark is a unit without payload,
+/// which the queue's thread lets go unseen. When that releases a mark, everything in front of it has left the
+/// queue.
+///
+/// One thread enters and waits; marks are released on the module's threads.
+class QueueGauge {
+ public:
+    QueueGauge() : state_(std::make_shared<State>()) {}
+
+    /// Takes note of one more unit or mark on its way into the queue.
+    void Enter();
+    /// A mark behind everything that has entered. The caller pushes it and keeps no reference.
+    std::shared_ptr<StreamData> MakeMark();
+    /// At most so many units and marks are in the queue.
+    std::uint64_t Bound() const;
+    /// Waits until `Bound()` is not above `bound`. False after `patience`.
+    bool WaitForBound(std::uint64_t bound, std::chrono::milliseconds patience) const;
+
+ private:
+    struct State {
+        std::mutex mutex;
+        std::condition_variable changed;
+        /// How many had entered when the last mark that came through was made. Guarded by mutex.
+        std::uint64_t passed = 0;
+    };
+
+    /// Marks own it too: they may outlive the gauge in a module that hangs.
+    const std::shared_ptr<State> state_;
+    /// Touched by the entering thread alone.
+    std::uint64_t entered_ = 0;
+};
+
+}  // namespace receiver

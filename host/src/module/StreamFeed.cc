@@ -1,0 +1,98 @@
+#include "module/StreamFeed.h"
+
+#include <algorithm>
+#include <memory>
+
+namespace receiver {
+namespace {
+
+/// Where the timeline of a run begins. Not 0, which the module takes for "from the beginning of everything".
+constexpr std::int64_t kOriginSeconds = 10;
+
+/// A queue of the module holds 50; above this one the feed waits.
+constexpr std::uint64_t kQueueBound = 40;
+/// Units from one mark to the next.
+constexpr int kUnitsPerMark = 8;
+/// The module can be held up for 3.5 s by a disk that hangs, and goes on then.
+constexpr std::chrono::milliseconds kPatience{5000};
+
+/// Half of the 48 chunks that may wait for the disk.
+constexpr std::size_t kChunkBound = 24;
+/// Far below the 600 units that the module caches, far above what a late medium needs.
+constexpr std::size_t kUncutBound = 250;
+/// A pause for the thread that cuts chunks. It cannot be waited for: it may need more of the stream.
+constexpr std::chrono::milliseconds kUncutPause{5};
+
+std::shared_ptr<StreamData> MakeUnit(std::int64_t time, std::int64_t clock,
+                                     const std::shared_ptr<unsigned char>& data, std::size_t size,
+                                     std::function<void()> released) {
+    const std::shared_ptr<StreamData> unit(new StreamData,
+                                           [released = std::move(released)](StreamData* gone) {
+                                               delete gone;
+                                               if (released) {
+                                                   released();
+                                               }
+                                           });
+    unit->rtp_timestamp = static_cast<std::uint64_t>(time + kOriginSeconds * clock);
+    unit->timestamp = unit->rtp_timestamp * 1000 / static_cast<std::uint64_t>(clock);
+    unit->data = data;
+    unit->size = size;
+    unit->payload = data.get();
+    return unit;
+}
+
+}  // namespace
+
+void StreamFeed::PushVideo(std::int64_t time, const std::shared_ptr<unsigned char>& data, std::size_t size) {
+    Push(video_, MakeUnit(time, kVideoClock, data, size, frames_.Enter()));
+}
+
+void StreamFeed::PushAudio(std::int64_t time, const std::shared_ptr<unsigned char>& data, std::size_t size) {
+    Push(audio_, MakeUnit(time, kAudioClock, data, size, {}));
+}
+
+void StreamFeed::PushMeta(std::int64_t time, const std::vector<unsigned char>& bytes) {
+    const std::shared_ptr<unsigned char> data(new unsigned char[bytes.size()],
+                                              std::default_delete<unsigned char[]>());
+    std::copy(bytes.begin(), bytes.end(), data.get());
+    Push(meta_, MakeUnit(time, kVideoClock, data, bytes.size(), {}));
+}
+
+void StreamFeed::Push(Queue& queue, const std::shared_ptr<StreamData>& unit) {
+    // One place for the unit, one for the mark behind it.
+    WaitFor(queue, kQueueBound - 2);
+    queue.gauge.Enter();
+    (stream_.*queue.push)(unit);
+    if (++queue.sinceMark >= kUnitsPerMark) {
+        PushMark(queue);
+    }
+}
+
+void StreamFeed::PushMark(Queue& queue) {
+    queue.sinceMark = 0;
+    (stream_.*queue.push)(queue.gauge.MakeMark());
+}
+
+void StreamFeed::WaitFor(Queue& queue, std::uint64_t bound) {
+    const std::chrono::milliseconds patience = stalled_ ? std::chrono::milliseconds(0) : kPatience;
+    if (queue.gauge.Bound() > bound) {
+        stalled_ = !queue.gauge.WaitForBound(bound, patience);
+    }
+}
+
+void StreamFeed::Settle() {
+    for (Queue* const queue : {&video_, &audio_, &meta_}) {
+        PushMark(*queue);
+    }
+    for (Queue* const queue : {&video_, &audio_, &meta_}) {
+        WaitFor(*queue, 0);
+    }
+}
+
+void StreamFeed::WaitForDisk() {
+    if (stalled_ || frames_.WaitForChunks(kChunkBound, kPatience)) {
+        frames_.WaitForUncut(kUncutBound, kUncutPause);
+    }
+}
+
+}  // namespace receiver

@@ -1,0 +1,64 @@
+#pragma once
+
+#include <chrono>
+#include <cstdint>
+#include <vector>
+
+#include "QxModuleStreamInterface.h"
+#include "module/FrameLedger.h"
+#include "module/QueueGauge.h"
+#include "source/SourceInterface.h"
+
+namespace receiver {
+
+/// Pushes a stream into the module, no faster than it can take it: the module drops what its queues have no
+/// room for and has no other way of saying that it is too much.
+///
+/// Timestamps. `rtp_timestamp` is the unit's time plus ten seconds on the clock of its medium, 64 bits wide
+/// and never wrapped. `timestamp` is the same in whole milliseconds, rounded down for all media, as the
+/// module does when it compares a record's limits with it.
+///
+/// One thread at a time.
+class StreamFeed {
+ public:
+    explicit StreamFeed(QxModuleStreamInterface& stream) : stream_(stream) {}
+    StreamFeed(const StreamFeed&) = delete;
+    StreamFeed& operator=(const StreamFeed&) = delete;
+
+    /// Times in ticks of 90000 a second, for audio of 48000.
+    void PushVideo(std::int64_t time, const std::shared_ptr<unsigned char>& data, std::size_t size);
+    void PushAudio(std::int64_t time, const std::shared_ptr<unsigned char>& data, std::size_t size);
+    void PushMeta(std::int64_t time, const std::vector<unsigned char>& bytes);
+
+    /// Waits until the module has taken everything that was pushed out of its first queues. A record command
+    /// among it has then been carried out, but for a stop.
+    void Settle();
+
+    /// For sources that can wait: waits until the module is near the end of what it has. A file at full speed
+    /// would otherwise outrun the disk, which costs a recording.
+    void WaitForDisk();
+
+    /// What the module holds of the video.
+    const FrameLedger& Frames() const { return frames_; }
+
+ private:
+    struct Queue {
+        void (QxModuleStreamInterface::*push)(const std::shared_ptr<StreamData>&);
+        QueueGauge gauge{};
+        int sinceMark = 0;
+    };
+
+    void Push(Queue& queue, const std::shared_ptr<StreamData>& unit);
+    void PushMark(Queue& queue);
+    void WaitFor(Queue& queue, std::uint64_t bound);
+
+    QxModuleStreamInterface& stream_;
+    Queue video_{&QxModuleStreamInterface::PushVideo};
+    Queue audio_{&QxModuleStreamInterface::PushAudio};
+    Queue meta_{&QxModuleStreamInterface::PushMeta};
+    FrameLedger frames_;
+    /// The module did not move for the whole patience; nobody waits for it again until it does.
+    bool stalled_ = false;
+};
+
+}  // namespace receiver

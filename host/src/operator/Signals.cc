@@ -1,0 +1,71 @@
+#include "operator/Signals.h"
+
+#include <pthread.h>
+#include <unistd.h>
+
+namespace receiver {
+namespace {
+
+/// Wakes the signal thread when the object goes.
+constexpr int kWake = SIGURG;
+constexpr int kExitBySignal = 128;
+
+}  // namespace
+
+Signals::Signals(void (*beforeExit)()) : beforeExit_(beforeExit) {
+    sigemptyset(&received_);
+    for (const int number : {SIGINT, SIGTERM, SIGHUP, SIGUSR1, SIGUSR2, kWake}) {
+        sigaddset(&received_, number);
+    }
+    sigset_t blocked = received_;
+    // A recorder in the background that looks at its terminal shall not be stopped for it, and one whose
+    // output nobody reads any more goes on.
+    for (const int number : {SIGPIPE, SIGTTIN, SIGTTOU}) {
+        sigaddset(&blocked, number);
+    }
+    pthread_sigmask(SIG_BLOCK, &blocked, &previous_);
+    thread_ = std::thread(&Signals::Receive, this);
+}
+
+Signals::~Signals() {
+    ended_ = true;
+    pthread_kill(thread_.native_handle(), kWake);
+    thread_.join();
+    // A signal that came meanwhile and was left over is delivered here, as if nobody had listened.
+    pthread_sigmask(SIG_SETMASK, &previous_, nullptr);
+}
+
+SignalCommands Signals::Take() {
+    return {start_.exchange(false), stop_.exchange(false), QuitRequested(), hangup_.exchange(false)};
+}
+
+void Signals::Receive() {
+    while (!ended_) {
+        int number = 0;
+        if (sigwait(&received_, &number) != 0) {
+            continue;
+        }
+        switch (number) {
+            case SIGUSR1:
+                start_ = true;
+                break;
+            case SIGUSR2:
+                stop_ = true;
+                break;
+            case SIGHUP:
+                hangup_ = true;
+                break;
+            case SIGINT:
+            case SIGTERM:
+                if (++quits_ > 1) {
+                    beforeExit_();
+                    _exit(kExitBySignal + number);
+                }
+                break;
+            default:
+                break;
+        }
+    }
+}
+
+}  // namespace receiver

@@ -1,0 +1,304 @@
+#include "options/Options.h"
+
+#include <CLI/CLI.hpp>
+#include <charconv>
+#include <cstring>
+#include <fstream>
+#include <limits>
+
+#include "common/ReceiverError.h"
+#include "options/OptionText.h"
+
+namespace receiver {
+namespace {
+
+ReceiverError Wrong(const std::string& sentence) {
+    return {ExitCode::kUsage, sentence};
+}
+
+/// Options as they stand on the command line, before anything is made of them.
+struct Texts {
+    std::string frameRate;
+    std::string size;
+    std::string record;
+    std::string timecode;
+    std::string mode = "sync";
+    std::string passwordFile;
+    bool noDropFrame = false;
+    bool noReconnect = false;
+};
+
+std::uint32_t ParseDimension(std::string_view text, const std::string& size) {
+    constexpr std::uint32_t kLargest = 8192;
+    std::uint32_t value = 0;
+    const auto [stop, error] = std::from_chars(text.data(), text.data() + text.size(), value);
+    if (error != std::errc() || stop != text.data() + text.size() || value < 16 || value > kLargest ||
+        value % 2 != 0) {
+        throw Wrong("--size " + size +
+                    " is no picture size: write WIDTHxHEIGHT, both even and from 16 to 8192.");
+    }
+    return value;
+}
+
+void ReadSize(const std::string& text, SourceOptions& source) {
+    const std::size_t x = text.find('x');
+    const std::string_view view = text;
+    source.width = ParseDimension(view.substr(0, x), text);
+    source.height = ParseDimension(x == std::string::npos ? std::string_view() : view.substr(x + 1), text);
+}
+
+std::string ReadPassword(const std::string& file) {
+    std::ifstream stream(file);
+    std::string line;
+    if (!std::getline(stream, line)) {
+        throw Wrong("--password-file " + file + " cannot be read, or is empty.");
+    }
+    if (line.ends_with('\r')) {
+        line.pop_back();
+    }
+    return line;
+}
+
+void Interpret(const Texts& texts, Options& options) {
+    if (!texts.frameRate.empty()) {
+        options.source.frameRate = ParseFrameRate(texts.frameRate);
+        if (!options.source.frameRate) {
+            throw Wrong(
+                "--fps " + texts.frameRate +
+                " is no rate that can be recorded: choose 23.98, 24, 25, 29.97, 30, 50, 59.94 or 60.");
+        }
+    }
+    if (!texts.size.empty()) {
+        ReadSize(texts.size, options.source);
+    }
+    if (!texts.record.empty()) {
+        const auto ranges = ParseRecordRanges(texts.record);
+        if (!ranges) {
+            throw Wrong(
+                "--record " + texts.record +
+                " cannot be read: write ascending ranges of seconds that do not touch, such as 2-9,12-20 "
+                "or 5-.");
+        }
+        options.record = *ranges;
+    }
+    if (!texts.timecode.empty()) {
+        options.timecode = ParseTimecode(texts.timecode);
+        if (!options.timecode || !IsValid(*options.timecode, 60)) {
+            throw Wrong("--timecode " + texts.timecode +
+                        " is no timecode: write HH:MM:SS:FF, or HH:MM:SS;FF for drop frame.");
+        }
+    }
+    if (!texts.passwordFile.empty()) {
+        options.password = ReadPassword(texts.passwordFile);
+    }
+    options.mode = texts.mode == "on" ? OutputMode::kOn : OutputMode::kSync;
+    options.dropFrame = !texts.noDropFrame;
+    options.source.reconnect = !texts.noReconnect;
+}
+
+/// Options that are right by themselves and contradict each other.
+void CheckTogether(const CLI::App& app, const Options& options) {
+    const bool encodes = options.source.url == "test:" || options.source.transcode;
+    for (const char* const name : {"--fps", "--size", "--bitrate", "--gop"}) {
+        if (!encodes && app.count(name) != 0) {
+            throw Wrong(std::string(name) +
+                        " has no effect on a source that is recorded as it is: it goes with --input test: or "
+                        "--transcode.");
+        }
+    }
+    if (app.count("--speed") != 0 && IsLive(options.source.url)) {
+        throw Wrong("--speed goes with files and test:; a live source has the speed that it has.");
+    }
+    if (!options.record.empty() && options.mode == OutputMode::kOn) {
+        throw Wrong("--record goes with --mode sync; in mode on the whole run is one recording.");
+    }
+    if (options.timecode && options.timecode->dropFrame && !options.dropFrame) {
+        throw Wrong("--timecode with ';' asks for drop frame and --no-drop-frame forbids it.");
+    }
+    if (options.output && options.output->find('\\') != std::string::npos) {
+        throw Wrong(
+            "--output must not contain a backslash: the module takes it for the separator of folders.");
+    }
+    if (options.prefix && options.prefix->find_first_of("/\\") != std::string::npos) {
+        throw Wrong("--prefix is the name of one folder and must contain neither / nor \\.");
+    }
+}
+
+void AddSourceOptions(CLI::App& app, Options& options, Texts& texts) {
+    const auto group = "Source";
+    app.add_option(
+           "-i,--input", options.source.url,
+           "Address as FFmpeg writes it (udp://, srt://, rtsp://, http://, an .sdp file for RTP), a file, "
+           "or test: for a picture and a tone")
+        ->type_name("URL")
+        ->capture_default_str()
+        ->group(group);
+    app.add_option("--speed", options.source.speed, "Files and test: how many times real time")
+        ->check(CLI::Range(0.01, 100000.0))
+        ->type_name("N")
+        ->capture_default_str()
+        ->group(group);
+    app.add_option("--timeout", options.source.timeout,
+                   "Seconds of silence after which a source counts as lost")
+        ->check(CLI::Range(0.1, 3600.0))
+        ->type_name("SECONDS")
+        ->capture_default_str()
+        ->group(group);
+    app.add_flag("--no-reconnect", texts.noReconnect, "End when the source is lost instead of trying again")
+        ->group(group);
+    app.add_flag("--transcode", options.source.transcode,
+                 "Convert video that cannot be recorded as it is: reordered pictures, another codec or rate")
+        ->group(group);
+    app.add_option("--fps", texts.frameRate, "Frame rate: 23.98, 24, 25, 29.97, 30, 50, 59.94 or 60")
+        ->type_name("RATE")
+        ->group("test: and --transcode");
+    app.add_option("--size", texts.size, "Picture size in pixels")
+        ->type_name("WxH")
+        ->group("test: and --transcode");
+    app.add_option("--bitrate", options.source.bitrate, "Kilobits a second of the video")
+        ->check(CLI::Range(100u, 200000u))
+        ->type_name("KBITS")
+        ->capture_default_str()
+        ->group("test: and --transcode");
+    app.add_option("--gop", options.source.pictureGroup,
+                   "Frames from one IDR frame to the next; as many as in a second when not given")
+        ->check(CLI::Range(1u, 600u))
+        ->type_name("FRAMES")
+        ->group("test: and --transcode");
+}
+
+void AddFileOptions(CLI::App& app, Options& options, Texts& texts) {
+    const auto group = "Files";
+    app.add_option(
+           "-o,--output", options.output,
+           "Folder under which files appear; else MP4OutputPath of the settings store, else recordings")
+        ->type_name("DIR")
+        ->group(group);
+    app.add_option("--prefix", options.prefix,
+                   "Last folder of the path of a file; Unknown-Model when not given")
+        ->type_name("NAME")
+        ->group(group);
+    app.add_option("--file-type", options.fileType,
+                   "normal: index at the end; fragment: readable while it grows")
+        ->check(CLI::IsMember({"normal", "fragment"}))
+        ->type_name("normal|fragment")
+        ->capture_default_str()
+        ->group(group);
+    app.add_option(
+           "--max-minutes", options.maxMinutes,
+           "Minutes of video after which a new file begins; 0 is as often as possible, 120 when not given")
+        ->type_name("N")
+        ->group(group);
+    app.add_option("--user", options.user, "User name for a network share")->type_name("NAME")->group(group);
+    CLI::Option* const password =
+        app.add_option("--password", options.password, "Its password; others may see it, so rather:")
+            ->type_name("TEXT")
+            ->group(group);
+    app.add_option("--password-file", texts.passwordFile, "File whose first line is the password")
+        ->type_name("FILE")
+        ->excludes(password)
+        ->group(group);
+}
+
+void AddRecordOptions(CLI::App& app, Options& options, Texts& texts) {
+    const auto group = "Recording";
+    app.add_option(
+           "--mode", texts.mode,
+           "sync: the record flag in the metadata starts and stops; on: from the first frame to the last")
+        ->check(CLI::IsMember({"sync", "on"}))
+        ->type_name("sync|on")
+        ->capture_default_str()
+        ->group(group);
+    app.add_option("--record", texts.record,
+                   "What to record, in seconds of stream: 2-9,12-20 or 5-; from the start when not given")
+        ->type_name("RANGES")
+        ->group(group);
+    app.add_option("--seconds", options.seconds, "End after so much stream")
+        ->check(CLI::Range(0.001, 366.0 * 86400))
+        ->type_name("N")
+        ->group(group);
+    app.add_option("--timecode", texts.timecode,
+                   "Timecode of the first frame where the source has none; the time of day when not given")
+        ->type_name("HH:MM:SS:FF")
+        ->group(group);
+    app.add_flag("--no-drop-frame", texts.noDropFrame, "Count timecode without drop frame at 29.97 and 59.94")
+        ->group(group);
+}
+
+void AddProgramOptions(CLI::App& app, Options& options) {
+    const auto group = "Program";
+    app.add_option("--module", options.module, "Another build of the module than the one beside this program")
+        ->type_name("FILE")
+        ->group(group);
+    app.add_option("--settings", options.settings,
+                   "Settings store; else the one that QX_SETTINGS names, else /etc/qx/settings.ini")
+        ->type_name("FILE")
+        ->group(group);
+    app.add_option("--nalu-type", options.naluType, "Start parameter -naluType of the module")
+        ->check(CLI::IsMember({"normal", "direct"}))
+        ->type_name("normal|direct")
+        ->capture_default_str()
+        ->group(group);
+    app.add_option(
+           "--log", options.log,
+           "Log of the module, - for standard error; else what QX_LOG names, else OUTPUT/receiver.log")
+        ->type_name("FILE")
+        ->group(group);
+    app.add_option("--log-priority", options.logPriority, "Finest priority that is logged; 6 when not given")
+        ->check(CLI::Range(0u, 13u))
+        ->type_name("0-13")
+        ->group(group);
+    app.add_flag("--json", options.json, "Say everything as JSON on standard output, one object a line")
+        ->group(group);
+    app.set_version_flag("--version", RECEIVER_VERSION, "Print the version and exit")->group(group);
+    app.set_help_flag("-h,--help", "Print this and exit")->group(group);
+}
+
+}  // namespace
+
+bool IsLive(const std::string& url) {
+    return url.ends_with(".sdp") || (url.find("://") != std::string::npos && !url.starts_with("file://"));
+}
+
+std::optional<Options> ParseOptions(int argc, const char* const* argv, std::string& text) {
+    Options options;
+    Texts texts;
+    CLI::App app(kHelpIntroduction, "receiver");
+    app.footer(kHelpFooter);
+    app.get_formatter()->column_width(34);
+    app.option_defaults()->multi_option_policy(CLI::MultiOptionPolicy::Throw);
+    AddSourceOptions(app, options, texts);
+    AddFileOptions(app, options, texts);
+    AddRecordOptions(app, options, texts);
+    AddProgramOptions(app, options);
+    try {
+        app.parse(argc, argv);
+    } catch (const CLI::CallForHelp&) {
+        text = app.help();
+        return std::nullopt;
+    } catch (const CLI::CallForVersion& version) {
+        text = std::string("receiver ") + version.what() + "\n";
+        return std::nullopt;
+    } catch (const CLI::ParseError& error) {
+        std::string reason = error.what();
+        std::replace(reason.begin(), reason.end(), '\n', ' ');
+        throw Wrong(reason + "; receiver --help lists the options.");
+    }
+    Interpret(texts, options);
+    CheckTogether(app, options);
+    return options;
+}
+
+void HidePassword(int argc, char** argv) {
+    constexpr std::string_view kName = "--password";
+    for (int i = 1; i < argc; ++i) {
+        const std::string_view argument = argv[i];
+        if (argument == kName && i + 1 < argc) {
+            std::memset(argv[i + 1], 'x', std::strlen(argv[i + 1]));
+        } else if (argument.starts_with(kName) && argument.substr(kName.size()).starts_with('=')) {
+            std::memset(argv[i] + kName.size() + 1, 'x', argument.size() - kName.size() - 1);
+        }
+    }
+}
+
+}  // namespace receiver

@@ -1,0 +1,58 @@
+#pragma once
+
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "common/Timecode.h"
+#include "operator/RecordPlan.h"
+#include "source/SourceInterface.h"
+
+namespace receiver {
+
+/// Where record commands come from: the record flag in the metadata, or the host going online.
+enum class OutputMode { kSync, kOn };
+
+/// What the operator asked for. Options that are not set leave the matter to the settings store and to the
+/// module.
+struct Options {
+    SourceOptions source;
+
+    std::optional<std::string> output;
+    std::optional<std::string> prefix;
+    std::optional<std::string> user;
+    std::optional<std::string> password;
+    std::string fileType = "normal";
+    std::string naluType = "normal";
+    OutputMode mode = OutputMode::kSync;
+    std::optional<unsigned int> maxMinutes;
+
+    /// Empty: from the start. Only in mode "sync".
+    std::vector<RecordRange> record;
+    /// Length of the run in seconds of stream.
+    std::optional<double> seconds;
+    std::optional<Timecode> timecode;
+    bool dropFrame = true;
+
+    std::optional<std::string> module;
+    std::optional<std::string> settings;
+    /// "-" is standard error.
+    std::optional<std::string> log;
+    std::optional<unsigned int> logPriority;
+    bool json = false;
+};
+
+/// True for addresses whose stream goes on whether or not it is read: not for files and "test:", which wait.
+bool IsLive(const std::string& url);
+
+/// Reads a command line. Throws `ReceiverError` with `kUsage` and a sentence that names the option when
+/// something is wrong with it. Gives nothing, and the text to print in `text`, when that is all that was
+/// asked for (`--help`, `--version`).
+std::optional<Options> ParseOptions(int argc, const char* const* argv, std::string& text);
+
+/// Overwrites the value of `--password` in the arguments of the process, so that it no longer stands in the
+/// list of processes.
+void HidePassword(int argc, char** argv);
+
+}  // namespace receiver
