@@ -5,6 +5,7 @@
 #include <atomic>
 #include <chrono>
 #include <exception>
+#include <filesystem>
 #include <optional>
 #include <utility>
 
@@ -76,6 +77,7 @@ StartParameters ParametersOf(const Options& options, const std::string& output,
                              const SourceDescription& description) {
     StartParameters parameters;
     parameters.texts = {{"-outputPath", output},
+
                         {"-fileType", options.fileType},
                         {"-naluType", options.naluType},
                         {"-outputMode", options.mode == OutputMode::kOn ? "on" : "sync"}};
@@ -127,6 +129,7 @@ Recorder::Settings RecorderSettings(const Options& options, const FrameRate& rat
     if (options.seconds) {
         settings.length = static_cast<std::int64_t>(*options.seconds * static_cast<double>(kVideoClock));
     }
+    settings.fragments = options.fileType == "fragment";
     settings.followDisk = !IsLive(options.source.url);
     return settings;
 }
@@ -149,9 +152,15 @@ class Running final : public SourceListenerInterface {
     void StopRecording();
     void TakeStatuses(bool ending);
     void TakeModuleEvents();
+    void FileClosed(const std::string& path);
     void Show(const SourceInterface& source, const Recorder& recorder);
     std::uint64_t Lost(const SourceInterface& source) const;
     Summary Summarise(const SourceInterface& source) const;
+
+    struct WrittenFile {
+        std::string path;
+        bool closed;
+    };
 
     const Options& options_;
     Signals& signals_;
@@ -162,7 +171,7 @@ class Running final : public SourceListenerInterface {
     Host* host_ = nullptr;
     RecordPlan plan_{options_.record};
     StreamRates rates_;
-    std::vector<std::string> files_;
+    std::vector<WrittenFile> files_;
     std::string openFile_;
     std::uint64_t faults_ = 0;
     bool sourceOver_ = false;
@@ -328,14 +337,11 @@ void Running::TakeModuleEvents() {
         switch (event.kind) {
             case ModuleEvent::Kind::kFileOpened:
                 openFile_ = event.text;
-                files_.push_back(event.text);
+                files_.push_back({event.text, false});
                 display_.FileOpened(event.text);
                 break;
             case ModuleEvent::Kind::kFileClosed:
-                if (openFile_ == event.text) {
-                    openFile_.clear();
-                }
-                display_.FileClosed(event.text);
+                FileClosed(event.text);
                 break;
             case ModuleEvent::Kind::kRecordRestarted:
                 display_.Notice("the recording begins anew after a fault");
@@ -351,6 +357,16 @@ void Running::TakeModuleEvents() {
     }
 }
 
+void Running::FileClosed(const std::string& path) {
+    for (WrittenFile& file : files_) {
+        file.closed = file.closed || file.path == path;
+    }
+    if (openFile_ == path) {
+        openFile_.clear();
+    }
+    display_.FileClosed(path);
+}
+
 void Running::Show(const SourceInterface& source, const Recorder& recorder) {
     shown_ = Clock::now();
     if (shown_ - spaceRead_ >= kFreeSpaceInterval) {
@@ -363,7 +379,9 @@ void Running::Show(const SourceInterface& source, const Recorder& recorder) {
     snapshot.timecode = recorder.LastTimecode();
     snapshot.seconds = static_cast<double>(recorder.Elapsed()) / static_cast<double>(kVideoClock);
     snapshot.recording = options_.mode == OutputMode::kOn ? log_->OpenRecordings() > 0 : plan_.Recording();
-    snapshot.waiting = options_.mode == OutputMode::kSync && plan_.Wanted() && !plan_.Recording();
+    snapshot.waiting =
+        recorder.LastTimecode() && options_.mode == OutputMode::kSync && plan_.Wanted() && !plan_.Recording();
+    snapshot.since = recorder.Since();
     snapshot.framesPerSecond = rates_.FramesPerSecond();
     snapshot.videoKilobits = rates_.VideoKilobits();
     snapshot.audioKilobits = rates_.AudioKilobits();
@@ -382,8 +400,11 @@ std::uint64_t Running::Lost(const SourceInterface& source) const {
 
 Summary Running::Summarise(const SourceInterface& source) const {
     Summary summary;
-    for (const std::string& file : files_) {
-        summary.files.push_back(ReadBack(file));
+    for (const WrittenFile& file : files_) {
+        // One that could not be made was announced and has told why.
+        if (file.closed || std::filesystem::exists(file.path)) {
+            summary.files.push_back(ReadBack(file.path));
+        }
     }
     summary.lost = Lost(source);
     if (host_->Failed()) {

@@ -30,6 +30,13 @@ constexpr std::array<unsigned char, 6> kEmptyVideo{0x00, 0x00, 0x00, 0x01, 0x09,
 constexpr int kNudges = 200;
 constexpr std::chrono::milliseconds kNudgePause{5};
 
+/// Half of the 48 chunks that may wait for the disk.
+constexpr std::size_t kChunksAhead = 24;
+/// What a recording holds although nothing waits: its first frame, and the chunk that it wrote last.
+constexpr std::size_t kKeptChunks = 2;
+/// A fragment is written when it has so many chunks.
+constexpr std::size_t kFragmentChunks = 32;
+
 /// A disk is slow, not hung, as long as it needs less than this for the chunks of one wait.
 constexpr std::chrono::seconds kDiskPatience{30};
 
@@ -98,7 +105,7 @@ void Recorder::PushFrame(const SourceUnit& unit) {
     packets_.clear();
     feed_.PushVideo(unit.time, unit.data, unit.size);
     if (settings_.followDisk) {
-        feed_.WaitForDisk();
+        feed_.WaitForDisk(KeptChunks() + kChunksAhead);
     }
 }
 
@@ -109,6 +116,7 @@ bool Recorder::PushOnlineFrame(const SourceUnit& unit, const Timecode& timecode)
         }
         // Online with the first IDR frame and not before: what came earlier would only be trimmed.
         online_ = true;
+        since_ = timecode;
         session_.GoOnline();
     } else if (Done()) {
         return false;
@@ -121,6 +129,9 @@ bool Recorder::PushOnlineFrame(const SourceUnit& unit, const Timecode& timecode)
 void Recorder::PushSyncFrame(const SourceUnit& unit, const Timecode& timecode) {
     const bool before = plan_.Recording();
     const bool record = plan_.Next(Elapsed(), unit.keyFrame);
+    if (record != before) {
+        since_ = timecode;
+    }
     const int stops = log_.Stops();
     if (record && !before) {
         feed_.Settle();
@@ -205,9 +216,13 @@ std::uint64_t Recorder::Close(bool over) {
         const std::size_t held = feed_.Frames().UncutUnits();
         left = held > kChunkFrames ? held - kChunkFrames : 0;
     }
-    // The writer holds on to the chunk that it wrote last.
-    feed_.Frames().WaitForChunks(1, kDiskPatience);
+    feed_.Frames().WaitForChunks(KeptChunks(), kDiskPatience);
     return left;
+}
+
+std::size_t Recorder::KeptChunks() const {
+    const std::size_t kept = kKeptChunks + (settings_.fragments ? kFragmentChunks : 0);
+    return kept * static_cast<std::size_t>(std::max(log_.OpenRecordings(), 1));
 }
 
 }  // namespace receiver

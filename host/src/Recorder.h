@@ -38,6 +38,8 @@ class Recorder {
         std::optional<std::int64_t> length;
         /// The source waits for us: follow the disk.
         bool followDisk = false;
+        /// Files are fragmented.
+        bool fragments = false;
     };
 
     /// All references must outlive the recorder.
@@ -59,6 +61,8 @@ class Recorder {
 
     /// Of the last frame.
     const std::optional<Timecode>& LastTimecode() const { return timecode_; }
+    /// The first frame with the record flag that the last one has.
+    const std::optional<Timecode>& Since() const { return since_; }
     /// Stream time of the last frame since the first one, in ticks of 90000 a second.
     std::int64_t Elapsed() const;
 
@@ -71,6 +75,7 @@ class Recorder {
     Timecode NextTimecode(const SourceUnit& unit);
     std::int64_t FrameTime(std::int64_t from, std::int64_t frames) const;
     void PushPadding();
+    std::size_t KeptChunks() const;
 
     const Settings settings_;
     ModuleSession& session_;
@@ -80,6 +85,7 @@ class Recorder {
     Interleaver interleaver_;
     std::optional<TimecodeCounter> counter_;
     std::optional<Timecode> timecode_;
+    std::optional<Timecode> since_;
     std::optional<std::int64_t> firstFrame_;
     std::int64_t lastFrame_ = 0;
     std::int64_t lastAudio_ = 0;

@@ -22,6 +22,8 @@ struct Snapshot {
     /// frame.
     bool recording = false;
     bool waiting = false;
+    /// The first frame with the present record flag.
+    std::optional<Timecode> since;
     double framesPerSecond = 0;
     double videoKilobits = 0;
     double audioKilobits = 0;

@@ -12,6 +12,9 @@ extern "C" {
 #include <iomanip>
 #include <memory>
 
+#include "StreamAnalyzer.h"
+#include "common/Timecode.h"
+
 namespace receiver {
 namespace {
 
@@ -28,18 +31,57 @@ std::string Problem(int error) {
     return text.data();
 }
 
-/// The sample table of a normal file knows; in a fragmented one the samples have to be counted.
-std::uint64_t CountFrames(AVFormatContext& context, const AVStream& stream) {
-    if (stream.nb_frames > 0) {
-        return static_cast<std::uint64_t>(stream.nb_frames);
+constexpr std::uint32_t kTimecodeTag = MKTAG('t', 'm', 'c', 'd');
+constexpr std::uint32_t kMetadataTag = MKTAG('r', 't', 'm', 'd');
+
+const AVStream* FindStream(const AVFormatContext& context, bool (*matches)(const AVCodecParameters&)) {
+    for (unsigned int i = 0; i < context.nb_streams; ++i) {
+        if (matches(*context.streams[i]->codecpar)) {
+            return context.streams[i];
+        }
     }
+    return nullptr;
+}
+
+double Seconds(std::int64_t ticks, const AVStream& stream) {
+    return static_cast<double>(ticks) * av_q2d(stream.time_base);
+}
+
+/// The address in a metadata sample; empty when it has none.
+std::string TimecodeOfMetadata(const AVPacket& packet) {
+    const auto unit = std::make_shared<StreamData>();
+    unit->size = static_cast<std::uint64_t>(packet.size);
+    unit->payload = packet.data;
+    std::shared_ptr<nal_access::SampleData> sample;
+    bool dropFrame = false;
+    nal_access::StreamAnalyzer().ConvertTmcd(unit, sample, dropFrame, 0, 0);
+    if (sample == nullptr) {
+        return {};
+    }
+    const unsigned char* const fields = sample->GetData();
+    return ToString(Timecode{fields[0], fields[1], fields[2], fields[3], dropFrame});
+}
+
+/// The tables of a fragmented file are empty: length and frames come from its fragments, and the first
+/// address from its metadata, since its timecode track holds no value.
+void ReadFragments(AVFormatContext& context, const AVStream& video, RecordedFile& file) {
+    const AVStream* const metadata =
+        FindStream(context, [](const AVCodecParameters& codec) { return codec.codec_tag == kMetadataTag; });
     const std::unique_ptr<AVPacket, FreePacket> packet(av_packet_alloc());
-    std::uint64_t frames = 0;
+    std::int64_t end = 0;
+    file.startTimecode.clear();
+    bool first = true;
     while (packet && av_read_frame(&context, packet.get()) >= 0) {
-        frames += packet->stream_index == stream.index ? 1 : 0;
+        if (packet->stream_index == video.index) {
+            ++file.frames;
+            end = std::max(end, packet->pts + packet->duration);
+        } else if (metadata != nullptr && packet->stream_index == metadata->index && first) {
+            file.startTimecode = TimecodeOfMetadata(*packet);
+            first = false;
+        }
         av_packet_unref(packet.get());
     }
-    return frames;
+    file.seconds = Seconds(end, video);
 }
 
 }  // namespace
@@ -63,25 +105,23 @@ RecordedFile ReadBack(const std::string& path) {
         return file;
     }
     const std::unique_ptr<AVFormatContext, CloseInput> context(opened);
-    const AVStream* video = nullptr;
-    for (unsigned int i = 0; i < context->nb_streams; ++i) {
-        const AVStream* const stream = context->streams[i];
-        if (stream->codecpar->codec_type == AVMEDIA_TYPE_VIDEO) {
-            video = stream;
-        }
-        const AVDictionaryEntry* const timecode = av_dict_get(stream->metadata, "timecode", nullptr, 0);
-        if (timecode != nullptr) {
-            file.startTimecode = timecode->value;
-        }
-    }
+    const AVStream* const video = FindStream(
+        *context, [](const AVCodecParameters& codec) { return codec.codec_type == AVMEDIA_TYPE_VIDEO; });
     if (video == nullptr) {
         file.problem = "there is no video in it";
         return file;
     }
+    const AVStream* const timecode =
+        FindStream(*context, [](const AVCodecParameters& codec) { return codec.codec_tag == kTimecodeTag; });
+    const AVDictionaryEntry* const first =
+        timecode != nullptr ? av_dict_get(timecode->metadata, "timecode", nullptr, 0) : nullptr;
+    file.startTimecode = first != nullptr ? first->value : "";
     if (context->duration > 0) {
         file.seconds = static_cast<double>(context->duration) / AV_TIME_BASE;
+        file.frames = static_cast<std::uint64_t>(std::max<std::int64_t>(video->nb_frames, 0));
+    } else {
+        ReadFragments(*context, *video, file);
     }
-    file.frames = CountFrames(*context, *video);
     return file;
 }
 

@@ -5,8 +5,8 @@
 namespace receiver {
 namespace {
 
-std::string At(const Snapshot& snapshot) {
-    return snapshot.timecode ? " at " + ToString(*snapshot.timecode) : "";
+std::string At(const std::optional<Timecode>& timecode) {
+    return timecode ? " at " + ToString(*timecode) : "";
 }
 
 }  // namespace
@@ -48,10 +48,10 @@ void TextDisplay::Show(const Snapshot& snapshot) {
         Line("recording begins with the next IDR frame");
     }
     if (snapshot.recording != recording_) {
-        Line((snapshot.recording ? "recording" : "not recording") + At(snapshot));
+        Line((snapshot.recording ? "recording" : "not recording") + At(snapshot.since));
     }
     if (snapshot.lost != lost_) {
-        Line("lost: " + Counted(snapshot.lost, "unit") + " so far" + At(snapshot));
+        Line("lost: " + Counted(snapshot.lost, "unit") + " so far" + At(snapshot.timecode));
     }
     waiting_ = snapshot.waiting;
     recording_ = snapshot.recording;

@@ -1,21 +1,24 @@
 #include "module/ModuleLog.h"
 
 #include <algorithm>
+#include <map>
 #include <optional>
+#include <thread>
 #include <utility>
 
 namespace receiver {
 namespace {
 
-/// The path in a line such as "OP: FILE CREATE. (path)", or nothing when `text` does not begin with `prefix`.
-std::optional<std::string> PathAfter(std::string_view text, std::string_view prefix) {
-    if (!text.starts_with(prefix) || !text.ends_with(')')) {
+/// What stands between `prefix` and `suffix` in a line, with slashes for the backslashes that separate
+/// folders inside the module. Nothing when the line is another one.
+std::optional<std::string> PathBetween(std::string_view text, std::string_view prefix,
+                                       std::string_view suffix) {
+    if (!text.starts_with(prefix) || !text.ends_with(suffix) || text.size() < prefix.size() + suffix.size()) {
         return std::nullopt;
     }
     text.remove_prefix(prefix.size());
-    text.remove_suffix(1);
+    text.remove_suffix(suffix.size());
     std::string path(text);
-    // Inside the module the separator of folders is a backslash.
     std::replace(path.begin(), path.end(), '\\', '/');
     return path;
 }
@@ -25,31 +28,22 @@ std::optional<std::string> PathAfter(std::string_view text, std::string_view pre
 class ModuleLog::Sink final : public LogSinkInterface {
  public:
     void OnLine(const LogLine& line) override {
-        using Kind = ModuleEvent::Kind;
-        const std::lock_guard lock(mutex);
-        if (line.priority == LOG_PRIORITY_WARNING) {
-            losses.video += line.text == "queue overflow (video)" ? 1 : 0;
-            losses.audio += line.text == "queue overflow (audio)" ? 1 : 0;
-            losses.meta += line.text == "queue overflow (meta)" ? 1 : 0;
-        } else if (line.priority == LOG_PRIORITY_ERROR) {
-            events.push_back({Kind::kError, std::string(line.text)});
-        } else if (auto created = PathAfter(line.text, "OP: FILE CREATE. (")) {
-            events.push_back({Kind::kFileOpened, std::move(*created)});
-        } else if (auto closed = PathAfter(line.text, "OP: FILE CLOSE. (")) {
-            events.push_back({Kind::kFileClosed, std::move(*closed)});
-        } else if (line.text.starts_with("OP: REC START.")) {
-            ++openRecordings;
-            events.push_back({Kind::kRecordStarted, {}});
-        } else if (line.text.starts_with("OP: REC STOP.")) {
-            ++stops;
-            events.push_back({Kind::kRecordStopped, {}});
-        } else if (line.text.starts_with("OP: REMOVE STREAM.")) {
-            --openRecordings;
-            events.push_back({Kind::kRecordRemoved, {}});
-        } else if (line.text.starts_with("OP: REC RESTART.")) {
-            events.push_back({Kind::kRecordRestarted, {}});
+        switch (line.priority) {
+            case LOG_PRIORITY_OPERATOR:
+                OnOperatorLine(line.text);
+                break;
+            case LOG_PRIORITY_ERROR:
+                Add({ModuleEvent::Kind::kError, std::string(line.text)});
+                break;
+            case LOG_PRIORITY_WARNING:
+                OnWarning(line.text);
+                break;
+            case LOG_PRIORITY_TRACE:
+                OnTrace(line.text);
+                break;
+            default:
+                break;
         }
-        changed.notify_all();
     }
 
     std::mutex mutex;
@@ -59,10 +53,80 @@ class ModuleLog::Sink final : public LogSinkInterface {
     QueueLosses losses;
     int openRecordings = 0;
     int stops = 0;
+
+ private:
+    /// What a writer works on.
+    struct Writer {
+        std::string folder;
+        /// Empty when none is open.
+        std::string file;
+    };
+
+    void Add(ModuleEvent event) {
+        const std::lock_guard lock(mutex);
+        events.push_back(std::move(event));
+    }
+
+    void OnOperatorLine(std::string_view text) {
+        using Kind = ModuleEvent::Kind;
+        const std::lock_guard lock(mutex);
+        if (text.starts_with("OP: FILE CLOSE.")) {
+            Close(writers_[std::this_thread::get_id()]);
+        } else if (text.starts_with("OP: REC START.")) {
+            ++openRecordings;
+            events.push_back({Kind::kRecordStarted, {}});
+        } else if (text.starts_with("OP: REC STOP.")) {
+            ++stops;
+            events.push_back({Kind::kRecordStopped, {}});
+        } else if (text.starts_with("OP: REMOVE STREAM.")) {
+            --openRecordings;
+            events.push_back({Kind::kRecordRemoved, {}});
+        } else if (text.starts_with("OP: REC RESTART.")) {
+            events.push_back({Kind::kRecordRestarted, {}});
+        }
+        changed.notify_all();
+    }
+
+    void OnWarning(std::string_view text) {
+        const std::lock_guard lock(mutex);
+        losses.video += text == "queue overflow (video)" ? 1 : 0;
+        losses.audio += text == "queue overflow (audio)" ? 1 : 0;
+        losses.meta += text == "queue overflow (meta)" ? 1 : 0;
+    }
+
+    /// The trace has a few lines for each unit, so most of them are passed over without the lock.
+    void OnTrace(std::string_view text) {
+        if (std::optional<std::string> folder = PathBetween(text, "output path = \"", "\".")) {
+            const std::lock_guard lock(mutex);
+            writers_[std::this_thread::get_id()].folder = std::move(*folder);
+        } else if (const std::optional<std::string> name = PathBetween(text, "ST: out_filename = \"", "\"")) {
+            const std::lock_guard lock(mutex);
+            Writer& writer = writers_[std::this_thread::get_id()];
+            Close(writer);
+            writer.file = writer.folder.empty() ? *name : writer.folder + "/" + *name;
+            events.push_back({ModuleEvent::Kind::kFileOpened, writer.file});
+        } else if (text == "start. event_id = 6.") {
+            const std::lock_guard lock(mutex);
+            const auto writer = writers_.find(std::this_thread::get_id());
+            if (writer != writers_.end()) {
+                Close(writer->second);
+                writers_.erase(writer);
+            }
+        }
+    }
+
+    void Close(Writer& writer) {
+        if (!writer.file.empty()) {
+            events.push_back({ModuleEvent::Kind::kFileClosed, std::exchange(writer.file, {})});
+        }
+    }
+
+    /// Guarded by mutex.
+    std::map<std::thread::id, Writer> writers_;
 };
 
 ModuleLog::ModuleLog() : sink_(std::make_shared<Sink>()) {
-    LogSinks::Add(sink_, LOG_PRIORITY_WARNING);
+    LogSinks::Add(sink_, LOG_PRIORITY_TRACE);
 }
 
 ModuleLog::~ModuleLog() {

@@ -25,8 +25,9 @@ struct QueueLosses {
 /// Something that the module wrote to its log and that the receiver tells its operator.
 struct ModuleEvent {
     enum class Kind {
-        /// `text` is the path of a file, with slashes.
+        /// `text` is the path of a file, with slashes. It is about to be made.
         kFileOpened,
+        /// It is complete.
         kFileClosed,
         /// A recording was commanded, was stopped, is over, began anew after a fault.
         kRecordStarted,
@@ -41,7 +42,11 @@ struct ModuleEvent {
 };
 
 /// Follows the module through its log, which is its only word about files and about units that it had to
-/// drop. Lines arrive on the module's threads; the operations may be called from any thread.
+/// drop. Only the trace tells of fragmented files and of folders: a writer's thread names the folder, then
+/// the file, and the file is closed when it says so, when the same thread names the next one, or when it
+/// posts the status of its end.
+///
+/// Lines arrive on the module's threads; the operations may be called from any thread.
 class ModuleLog {
  public:
     /// Listens from now on.

@@ -16,8 +16,8 @@ constexpr int kUnitsPerMark = 8;
 /// The module can be held up for 3.5 s by a disk that hangs, and goes on then.
 constexpr std::chrono::milliseconds kPatience{5000};
 
-/// Half of the 48 chunks that may wait for the disk.
-constexpr std::size_t kChunkBound = 24;
+/// A disk that hangs slows the feed down and does not stop it: the module has to find out and say so.
+constexpr std::chrono::milliseconds kDiskPause{1000};
 /// Far below the 600 units that the module caches, far above what a late medium needs.
 constexpr std::size_t kUncutBound = 250;
 /// A pause for the thread that cuts chunks. It cannot be waited for: it may need more of the stream.
@@ -89,10 +89,9 @@ void StreamFeed::Settle() {
     }
 }
 
-void StreamFeed::WaitForDisk() {
-    if (stalled_ || frames_.WaitForChunks(kChunkBound, kPatience)) {
-        frames_.WaitForUncut(kUncutBound, kUncutPause);
-    }
+void StreamFeed::WaitForDisk(std::size_t chunks) {
+    frames_.WaitForChunks(chunks, kDiskPause);
+    frames_.WaitForUncut(kUncutBound, kUncutPause);
 }
 
 }  // namespace receiver

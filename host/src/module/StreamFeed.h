@@ -34,9 +34,10 @@ class StreamFeed {
     /// among it has then been carried out, but for a stop.
     void Settle();
 
-    /// For sources that can wait: waits until the module is near the end of what it has. A file at full speed
-    /// would otherwise outrun the disk, which costs a recording.
-    void WaitForDisk();
+    /// For sources that can wait: waits a little when more than `chunks` wait for the disk, or when the
+    /// module is behind with cutting them. A file at full speed would otherwise outrun the disk, which costs
+    /// a recording.
+    void WaitForDisk(std::size_t chunks);
 
     /// What the module holds of the video.
     const FrameLedger& Frames() const { return frames_; }

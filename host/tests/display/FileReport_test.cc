@@ -1,0 +1,49 @@
+#include "display/FileReport.h"
+
+#include <gtest/gtest.h>
+#include <stdlib.h>
+#include <unistd.h>
+
+#include <fstream>
+
+namespace receiver {
+namespace {
+
+TEST(FileReport, BytesHaveUnitsOfAThousand) {
+    EXPECT_EQ(FormatBytes(0), "0 B");
+    EXPECT_EQ(FormatBytes(999), "999 B");
+    EXPECT_EQ(FormatBytes(1000), "1.0 kB");
+    EXPECT_EQ(FormatBytes(999949), "999.9 kB");
+    EXPECT_EQ(FormatBytes(999999), "1.0 MB");
+    EXPECT_EQ(FormatBytes(157286400), "157.3 MB");
+    EXPECT_EQ(FormatBytes(2000000000000000), "2000.0 TB");
+}
+
+TEST(FileReport, SecondsAreHoursMinutesSecondsAndMilliseconds) {
+    EXPECT_EQ(FormatSeconds(0), "00:00:00.000");
+    EXPECT_EQ(FormatSeconds(59.9996), "00:01:00.000");
+    EXPECT_EQ(FormatSeconds(3723.25), "01:02:03.250");
+    EXPECT_EQ(FormatSeconds(360000), "100:00:00.000");
+    EXPECT_EQ(FormatSeconds(-1), "00:00:00.000");
+}
+
+TEST(FileReport, AFileThatIsGoneHasAProblem) {
+    const RecordedFile file = ReadBack("/no/such/file.MP4");
+    EXPECT_EQ(file.path, "/no/such/file.MP4");
+    EXPECT_EQ(file.problem, "No such file or directory");
+}
+
+TEST(FileReport, AFileThatIsNoRecordingHasAProblemAndASize) {
+    std::string path = ::testing::TempDir() + "receiver_report_XXXXXX";
+    const int descriptor = mkstemp(path.data());
+    ASSERT_GE(descriptor, 0);
+    close(descriptor);
+    std::ofstream(path) << "no recording";
+    const RecordedFile file = ReadBack(path);
+    EXPECT_EQ(file.bytes, 12u);
+    EXPECT_EQ(file.problem, "Invalid data found when processing input");
+    unlink(path.c_str());
+}
+
+}  // namespace
+}  // namespace receiver

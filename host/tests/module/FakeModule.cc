@@ -1,0 +1,124 @@
+// A module that records nothing but the calls that it gets. The environment variable FAKE_MODULE makes it
+// misbehave: "none" gives no object, "refuse" fails its initialisation, "fail" sets status 7 with the first
+// video unit, "overflow" reports the first video unit as lost, "fault" sets status 6 with it.
+
+#include <cstdlib>
+#include <string>
+
+#include "Logger.h"
+#include "QxModuleInterface.h"
+
+namespace {
+
+std::string& Calls() {
+    static std::string calls;
+    return calls;
+}
+
+bool Behaves(const char* how) {
+    const char* const set = std::getenv("FAKE_MODULE");
+    return set != nullptr && std::string(set) == how;
+}
+
+class FakeModule final : public QxModuleInterface,
+                         public QxModuleStreamInterface,
+                         public QxModuleNotifyInterface {
+ public:
+    bool Initialize(QxModuleHostInterface* host) override {
+        host_ = host;
+        std::string mode;
+        int rate = 0;
+        host->GetParameter("-outputMode", mode, "on");
+        host->GetParameter("-encodedFPS", rate, 0);
+        Calls() = "Initialize(" + mode + "," + std::to_string(rate) + ")";
+        pushed_ = false;
+        if (Behaves("refuse")) {
+            host->SetStatus(7, 2);
+            return false;
+        }
+        return true;
+    }
+    bool Uninitialize() override { return Called("Uninitialize"); }
+    bool Execute() override {
+        host_->SendTransmissionStatus({{"file_output_status", "standby"}});
+        return Called("Execute");
+    }
+    bool GetModuleInterval(unsigned int* value) override {
+        *value = 10000;
+        return true;
+    }
+    bool ReservedOperationA() override { return true; }
+    bool ReservedOperationB() override { return true; }
+    bool GetStreamInterface(QxModuleStreamInterface** out) override {
+        *out = this;
+        return Called("GetStreamInterface");
+    }
+    bool GetNotifyInterface(QxModuleNotifyInterface** out) override {
+        *out = this;
+        return Called("GetNotifyInterface");
+    }
+    int ReservedOperationC() override { return 0; }
+
+    void PushReserved(const std::shared_ptr<StreamData>&) override {}
+    void PushVideo(const std::shared_ptr<StreamData>& unit) override {
+        if (pushed_ || unit->payload == nullptr) {
+            return;
+        }
+        pushed_ = true;
+        Called("PushVideo");
+        if (Behaves("fail")) {
+            host_->SetStatus(7, 26);
+        } else if (Behaves("fault")) {
+            host_->SetStatus(6, 22);
+        } else if (Behaves("overflow")) {
+            Logger::Put(LOG_PRIORITY_WARNING, nullptr, nullptr, 0, "queue overflow (video)");
+        }
+    }
+    void PushAudio(const std::shared_ptr<StreamData>&) override {}
+    void PushMeta(const std::shared_ptr<StreamData>&) override {}
+
+    std::uint32_t NotifyInputOutputConnectRequest(const QxInputOutputConnectRequest*) override {
+        Called("Connect");
+        return 0;
+    }
+    std::uint32_t NotifyModuleConnectionRequestReply(const void*) override { return 0; }
+    std::uint32_t NotifyInputOutputDisconnectionRequest(const QxInputOutputDisconnectionRequest*) override {
+        return 0;
+    }
+    std::uint32_t NotifySetPropertiesRequest(const void*) override { return 0; }
+    void NotifyOnlineStatus() override {
+        Called("Online");
+        host_->SetStatus(4, 0);
+    }
+    void NotifyOfflineStatus() override {
+        Called("Offline");
+        host_->SetStatus(6, 26);
+        host_->SetStatus(3, 0);
+    }
+
+ private:
+    static bool Called(const char* name) {
+        Calls().append(" ").append(name);
+        return true;
+    }
+
+    QxModuleHostInterface* host_ = nullptr;
+    bool pushed_ = false;
+};
+
+FakeModule fakeModule;
+
+}  // namespace
+
+extern "C" bool GetQxModuleInterface(QxModuleInterface** out) {
+    if (Behaves("none")) {
+        return false;
+    }
+    *out = &fakeModule;
+    return true;
+}
+
+/// The calls since `Initialize`, with blanks between them.
+extern "C" const char* FakeModuleCalls() {
+    return Calls().c_str();
+}

@@ -1,0 +1,5 @@
+// A shared library that is no module.
+
+extern "C" int SomethingElse() {
+    return 1;
+}

@@ -1,0 +1,60 @@
+#include "module/QueueGauge.h"
+
+#include <gtest/gtest.h>
+
+#include <thread>
+
+namespace receiver {
+namespace {
+
+constexpr std::chrono::milliseconds kNow{0};
+constexpr std::chrono::seconds kDeadline{30};
+
+TEST(QueueGauge, CountsEverythingThatEnteredUntilAMarkComesThrough) {
+    QueueGauge gauge;
+    gauge.Enter();
+    gauge.Enter();
+    std::shared_ptr<StreamData> mark = gauge.MakeMark();
+    gauge.Enter();
+    EXPECT_EQ(gauge.Bound(), 4u);
+    mark.reset();
+    EXPECT_EQ(gauge.Bound(), 1u);
+}
+
+TEST(QueueGauge, AMarkIsAUnitWithoutPayload) {
+    QueueGauge gauge;
+    EXPECT_EQ(gauge.MakeMark()->payload, nullptr);
+}
+
+TEST(QueueGauge, AMarkThatIsReleasedLateTakesNothingBack) {
+    QueueGauge gauge;
+    std::shared_ptr<StreamData> first = gauge.MakeMark();
+    std::shared_ptr<StreamData> second = gauge.MakeMark();
+    second.reset();
+    EXPECT_EQ(gauge.Bound(), 0u);
+    first.reset();
+    EXPECT_EQ(gauge.Bound(), 0u);
+}
+
+TEST(QueueGauge, WaitsForTheMarkAndNoLongerThanItsPatience) {
+    QueueGauge gauge;
+    gauge.Enter();
+    std::shared_ptr<StreamData> mark = gauge.MakeMark();
+    EXPECT_FALSE(gauge.WaitForBound(1, kNow));
+    EXPECT_TRUE(gauge.WaitForBound(2, kNow));
+    std::thread queue([taken = std::move(mark)]() mutable { taken.reset(); });
+    EXPECT_TRUE(gauge.WaitForBound(0, kDeadline));
+    queue.join();
+}
+
+TEST(QueueGauge, AMarkMayOutliveTheGauge) {
+    std::shared_ptr<StreamData> mark;
+    {
+        QueueGauge gauge;
+        mark = gauge.MakeMark();
+    }
+    mark.reset();
+}
+
+}  // namespace
+}  // namespace receiver

@@ -1,0 +1,195 @@
+#include "module/StreamFeed.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <atomic>
+#include <condition_variable>
+#include <deque>
+#include <mutex>
+#include <string>
+#include <thread>
+
+namespace receiver {
+namespace {
+
+using ::testing::ElementsAre;
+
+std::shared_ptr<unsigned char> Bytes(std::size_t size) {
+    return {new unsigned char[size](), std::default_delete<unsigned char[]>()};
+}
+
+/// A module that keeps what it gets until it is told to let go.
+class KeepingModule : public QxModuleStreamInterface {
+ public:
+    virtual ~KeepingModule() = default;
+    void PushReserved(const std::shared_ptr<StreamData>&) override {}
+    void PushVideo(const std::shared_ptr<StreamData>& unit) override { video.push_back(unit); }
+    void PushAudio(const std::shared_ptr<StreamData>& unit) override { audio.push_back(unit); }
+    void PushMeta(const std::shared_ptr<StreamData>& unit) override { meta.push_back(unit); }
+
+    std::deque<std::shared_ptr<StreamData>> video;
+    std::deque<std::shared_ptr<StreamData>> audio;
+    std::deque<std::shared_ptr<StreamData>> meta;
+};
+
+/// A module with a bounded queue for video that a thread of its own empties slowly, and that drops when full.
+class QueueingModule final : public KeepingModule {
+ public:
+    static constexpr std::size_t kCapacity = 50;
+
+    QueueingModule() : thread_([this] { Run(); }) {}
+    ~QueueingModule() override {
+        {
+            const std::lock_guard lock(mutex_);
+            ended_ = true;
+        }
+        changed_.notify_all();
+        thread_.join();
+    }
+
+    void PushVideo(const std::shared_ptr<StreamData>& unit) override {
+        const std::lock_guard lock(mutex_);
+        if (queue_.size() >= kCapacity) {
+            ++dropped;
+            return;
+        }
+        queue_.push_back(unit);
+        changed_.notify_all();
+    }
+
+    void PushAudio(const std::shared_ptr<StreamData>&) override {}
+    void PushMeta(const std::shared_ptr<StreamData>&) override {}
+
+    int dropped = 0;
+    int taken = 0;
+
+ private:
+    void Run() {
+        std::unique_lock lock(mutex_);
+        while (true) {
+            changed_.wait(lock, [this] { return ended_ || !queue_.empty(); });
+            if (queue_.empty()) {
+                return;
+            }
+            const std::shared_ptr<StreamData> unit = std::move(queue_.front());
+            queue_.pop_front();
+            taken += unit->payload != nullptr ? 1 : 0;
+            lock.unlock();
+            std::this_thread::yield();
+            lock.lock();
+        }
+    }
+
+    std::mutex mutex_;
+    std::condition_variable changed_;
+    std::deque<std::shared_ptr<StreamData>> queue_;
+    bool ended_ = false;
+    std::thread thread_;
+};
+
+TEST(StreamFeed, UnitsCarryTheirTimesOnTheirClocksTenSecondsOn) {
+    KeepingModule module;
+    StreamFeed feed(module);
+    const auto data = Bytes(3);
+    feed.PushVideo(3003, data, 3);
+    feed.PushAudio(1024, data, 3);
+    feed.PushMeta(3003, {0x01, 0x02});
+    ASSERT_EQ(module.video.size(), 1u);
+    EXPECT_EQ(module.video[0]->rtp_timestamp, 903003u);
+    // 10033.37 and 10021.33 ms.
+    EXPECT_EQ(module.video[0]->timestamp, 10033u);
+    EXPECT_EQ(module.video[0]->data, data);
+    EXPECT_EQ(module.video[0]->payload, data.get());
+    EXPECT_EQ(module.video[0]->size, 3u);
+    EXPECT_EQ(module.audio[0]->rtp_timestamp, 481024u);
+    EXPECT_EQ(module.audio[0]->timestamp, 10021u);
+    EXPECT_EQ(module.meta[0]->rtp_timestamp, 903003u);
+    EXPECT_EQ(module.meta[0]->timestamp, 10033u);
+    EXPECT_THAT(std::vector<unsigned char>(module.meta[0]->payload, module.meta[0]->payload + 2),
+                ElementsAre(1, 2));
+}
+
+TEST(StreamFeed, TimesGoOnBeyondTheWrapsOfShorterClocks) {
+    KeepingModule module;
+    StreamFeed feed(module);
+    const std::int64_t wrapped33 = (std::int64_t{1} << 33) + 5;
+    feed.PushVideo(wrapped33, Bytes(1), 1);
+    EXPECT_EQ(module.video[0]->rtp_timestamp, 8589934597u + 900000u);
+    EXPECT_EQ(module.video[0]->timestamp, (8589934597u + 900000u) / 90);
+}
+
+TEST(StreamFeed, AnEighthUnitIsFollowedByAMark) {
+    KeepingModule module;
+    StreamFeed feed(module);
+    for (int i = 0; i < 8; ++i) {
+        feed.PushVideo(i, Bytes(1), 1);
+    }
+    ASSERT_EQ(module.video.size(), 9u);
+    EXPECT_EQ(module.video[8]->payload, nullptr);
+}
+
+TEST(StreamFeed, WaitsWhenAQueueFillsUpSoThatNothingIsDropped) {
+    QueueingModule module;
+    StreamFeed feed(module);
+    for (int i = 0; i < 3000; ++i) {
+        feed.PushVideo(i, Bytes(1), 1);
+    }
+    feed.Settle();
+    EXPECT_EQ(module.dropped, 0);
+    EXPECT_EQ(module.taken, 3000);
+}
+
+/// Lets go of everything, on a thread of its own, when the last of the three marks has come.
+class ReleasingModule final : public KeepingModule {
+ public:
+    ~ReleasingModule() override { thread_.join(); }
+
+    void PushMeta(const std::shared_ptr<StreamData>& unit) override {
+        KeepingModule::PushMeta(unit);
+        thread_ = std::thread([this] {
+            released = true;
+            video.clear();
+            audio.clear();
+            meta.clear();
+        });
+    }
+
+    std::atomic<bool> released{false};
+
+ private:
+    std::thread thread_;
+};
+
+TEST(StreamFeed, SettlingWaitsUntilEveryQueueHasLetGo) {
+    ReleasingModule module;
+    StreamFeed feed(module);
+    feed.PushVideo(0, Bytes(1), 1);
+    feed.PushAudio(0, Bytes(1), 1);
+    feed.Settle();
+    EXPECT_TRUE(module.released);
+}
+
+TEST(StreamFeed, TheLedgerFollowsTheVideoUnits) {
+    KeepingModule module;
+    StreamFeed feed(module);
+    feed.PushVideo(0, Bytes(1), 1);
+    feed.PushVideo(1, Bytes(1), 1);
+    EXPECT_EQ(feed.Frames().UncutUnits(), 2u);
+    module.video.clear();
+    EXPECT_EQ(feed.Frames().UncutUnits(), 0u);
+}
+
+TEST(StreamFeed, UnitsMayOutliveTheFeed) {
+    KeepingModule module;
+    {
+        StreamFeed feed(module);
+        feed.PushVideo(0, Bytes(1), 1);
+        feed.PushMeta(0, {0x01});
+    }
+    module.video.clear();
+    module.meta.clear();
+}
+
+}  // namespace
+}  // namespace receiver

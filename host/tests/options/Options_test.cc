@@ -1,0 +1,212 @@
+#include "options/Options.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <stdlib.h>
+#include <unistd.h>
+
+#include <fstream>
+
+#include "common/ReceiverError.h"
+
+namespace receiver {
+namespace {
+
+using ::testing::AllOf;
+using ::testing::HasSubstr;
+using ::testing::Not;
+
+std::optional<Options> Parse(std::vector<const char*> arguments, std::string& text) {
+    arguments.insert(arguments.begin(), "receiver");
+    return ParseOptions(static_cast<int>(arguments.size()), arguments.data(), text);
+}
+
+Options Parsed(const std::vector<const char*>& arguments) {
+    std::string text;
+    const std::optional<Options> options = Parse(arguments, text);
+    EXPECT_TRUE(options);
+    return options.value_or(Options());
+}
+
+/// The sentence with which a command line is refused.
+std::string Refusal(const std::vector<const char*>& arguments) {
+    std::string text;
+    try {
+        Parse(arguments, text);
+    } catch (const ReceiverError& error) {
+        EXPECT_EQ(error.Code(), ExitCode::kUsage);
+        EXPECT_THAT(error.what(), Not(HasSubstr("\n")));
+        return error.what();
+    }
+    ADD_FAILURE() << "was accepted";
+    return {};
+}
+
+TEST(Options, WithoutAnyTheTestPictureIsRecordedFromTheStart) {
+    const Options options = Parsed({});
+    EXPECT_EQ(options.source.url, "test:");
+    EXPECT_EQ(options.source.speed, 1.0);
+    EXPECT_TRUE(options.source.reconnect);
+    EXPECT_FALSE(options.source.transcode);
+    EXPECT_EQ(options.mode, OutputMode::kSync);
+    EXPECT_EQ(options.fileType, "normal");
+    EXPECT_EQ(options.naluType, "normal");
+    EXPECT_TRUE(options.record.empty());
+    EXPECT_TRUE(options.dropFrame);
+    EXPECT_FALSE(options.json);
+    for (const auto* const unset : {&options.output, &options.prefix, &options.user, &options.password,
+                                    &options.module, &options.settings, &options.log}) {
+        EXPECT_FALSE(*unset);
+    }
+    EXPECT_FALSE(options.maxMinutes);
+    EXPECT_FALSE(options.seconds);
+    EXPECT_FALSE(options.timecode);
+    EXPECT_FALSE(options.logPriority);
+}
+
+TEST(Options, EachOneReachesItsPlace) {
+    const Options options =
+        Parsed({"--input",        "test:",       "--speed",        "8",        "--timeout",     "2.5",
+                "--no-reconnect", "--transcode", "--fps",          "59.94",    "--size",        "1920x1080",
+                "--bitrate",      "12000",       "--gop",          "30",       "--output",      "/srv/rec",
+                "--prefix",       "CAM1",        "--file-type",    "fragment", "--max-minutes", "0",
+                "--user",         "u",           "--password",     "p",        "--mode",        "sync",
+                "--record",       "2-9,12-",     "--seconds",      "20",       "--timecode",    "10:00:00;00",
+                "--module",       "m.so",        "--settings",     "s.ini",    "--nalu-type",   "direct",
+                "--log",          "l.log",       "--log-priority", "13",       "--json"});
+    EXPECT_EQ(options.source.speed, 8);
+    EXPECT_EQ(options.source.timeout, 2.5);
+    EXPECT_FALSE(options.source.reconnect);
+    EXPECT_TRUE(options.source.transcode);
+    EXPECT_EQ(options.source.frameRate->key, 59940u);
+    EXPECT_EQ(options.source.width, 1920u);
+    EXPECT_EQ(options.source.height, 1080u);
+    EXPECT_EQ(options.source.bitrate, 12000u);
+    EXPECT_EQ(options.source.pictureGroup, 30u);
+    EXPECT_EQ(options.output, "/srv/rec");
+    EXPECT_EQ(options.prefix, "CAM1");
+    EXPECT_EQ(options.fileType, "fragment");
+    EXPECT_EQ(options.maxMinutes, 0u);
+    EXPECT_EQ(options.user, "u");
+    EXPECT_EQ(options.password, "p");
+    EXPECT_EQ(options.record, (std::vector<RecordRange>{{180000, 810000}, {1080000, std::nullopt}}));
+    EXPECT_EQ(options.seconds, 20);
+    EXPECT_EQ(options.timecode, (Timecode{10, 0, 0, 0, true}));
+    EXPECT_EQ(options.module, "m.so");
+    EXPECT_EQ(options.settings, "s.ini");
+    EXPECT_EQ(options.naluType, "direct");
+    EXPECT_EQ(options.log, "l.log");
+    EXPECT_EQ(options.logPriority, 13u);
+    EXPECT_TRUE(options.json);
+    EXPECT_EQ(Parsed({"--mode", "on"}).mode, OutputMode::kOn);
+    EXPECT_FALSE(Parsed({"--no-drop-frame"}).dropFrame);
+}
+
+TEST(Options, EachErrorNamesItsOptionInOneSentence) {
+    const struct {
+        std::vector<const char*> arguments;
+        const char* part;
+    } cases[] = {
+        {{"--inptu", "test:"}, "--inptu"},
+        {{"match.ts"}, "match.ts"},
+        {{"--input"}, "--input"},
+        {{"--output", "a", "--output", "b"}, "--output"},
+        {{"--fps", "26"}, "--fps 26"},
+        {{"--fps", "fast"}, "59.94"},
+        {{"--size", "1280"}, "--size 1280"},
+        {{"--size", "1280x"}, "WIDTHxHEIGHT"},
+        {{"--size", "1281x720"}, "even"},
+        {{"--size", "0x0"}, "--size 0x0"},
+        {{"--size", "1280x720x3"}, "--size"},
+        {{"--bitrate", "5"}, "--bitrate"},
+        {{"--bitrate", "many"}, "--bitrate"},
+        {{"--gop", "0"}, "--gop"},
+        {{"--speed", "0"}, "--speed"},
+        {{"--speed", "-1"}, "--speed"},
+        {{"--timeout", "0"}, "--timeout"},
+        {{"--seconds", "0"}, "--seconds"},
+        {{"--seconds", "-5"}, "--seconds"},
+        {{"--record", "9-2"}, "--record 9-2"},
+        {{"--record", "2-9,9-12"}, "do not touch"},
+        {{"--timecode", "10:00:00"}, "HH:MM:SS:FF"},
+        {{"--timecode", "25:00:00:00"}, "--timecode 25:00:00:00"},
+        {{"--file-type", "mov"}, "--file-type"},
+        {{"--mode", "off"}, "--mode"},
+        {{"--nalu-type", "x"}, "--nalu-type"},
+        {{"--max-minutes", "-1"}, "--max-minutes"},
+        {{"--max-minutes", "soon"}, "--max-minutes"},
+        {{"--log-priority", "14"}, "--log-priority"},
+        {{"--password-file", "/no/such/file"}, "--password-file /no/such/file"},
+        {{"--password", "p", "--password-file", "f"}, "--password-file"},
+        {{"--output", "a\\b"}, "backslash"},
+        {{"--prefix", "a/b"}, "--prefix"},
+    };
+    for (const auto& one : cases) {
+        EXPECT_THAT(Refusal(one.arguments), HasSubstr(one.part)) << one.arguments[0];
+    }
+}
+
+TEST(Options, ContradictionsAreErrors) {
+    EXPECT_THAT(Refusal({"--input", "a.ts", "--fps", "25"}), HasSubstr("--fps has no effect"));
+    EXPECT_THAT(Refusal({"--input", "a.ts", "--size", "1280x720"}), HasSubstr("--transcode"));
+    EXPECT_THAT(Refusal({"--input", "a.ts", "--bitrate", "8000"}), HasSubstr("--bitrate has no effect"));
+    EXPECT_THAT(Refusal({"--input", "a.ts", "--gop", "25"}), HasSubstr("--gop has no effect"));
+    EXPECT_THAT(Refusal({"--input", "udp://:9000", "--speed", "2"}), HasSubstr("--speed goes with files"));
+    EXPECT_THAT(Refusal({"--mode", "on", "--record", "2-9"}), HasSubstr("--record goes with --mode sync"));
+    EXPECT_THAT(Refusal({"--timecode", "10:00:00;02", "--no-drop-frame"}), HasSubstr("--no-drop-frame"));
+    EXPECT_TRUE(Parsed({"--input", "a.ts", "--transcode", "--fps", "25"}).source.transcode);
+}
+
+TEST(Options, HelpTellsOfEveryOptionOfTheExamplesAndOfTheExitCodes) {
+    std::string text;
+    EXPECT_FALSE(Parse({"--help"}, text));
+    for (const char* const part :
+         {"--input",         "--output",       "--prefix",   "--user",          "--password",
+          "--password-file", "--file-type",    "--mode",     "--nalu-type",     "--max-minutes",
+          "--fps",           "--size",         "--bitrate",  "--gop",           "--seconds",
+          "--speed",         "--record",       "--timecode", "--no-drop-frame", "--transcode",
+          "--module",        "--settings",     "--log",      "--log-priority",  "--json",
+          "--timeout",       "--no-reconnect", "--version",  "Examples",        "Exit codes",
+          "SIGUSR1"}) {
+        EXPECT_THAT(text, HasSubstr(part));
+    }
+}
+
+TEST(Options, VersionIsPrinted) {
+    std::string text;
+    EXPECT_FALSE(Parse({"--version"}, text));
+    EXPECT_THAT(text, ::testing::MatchesRegex("receiver [0-9]+\\.[0-9]+\\.[0-9]+\n"));
+}
+
+TEST(Options, APasswordComesFromTheFirstLineOfItsFile) {
+    std::string file = ::testing::TempDir() + "receiver_password_XXXXXX";
+    const int descriptor = mkstemp(file.data());
+    ASSERT_GE(descriptor, 0);
+    close(descriptor);
+    std::ofstream(file) << "top secret \r\nnot this\n";
+    EXPECT_EQ(Parsed({"--password-file", file.c_str()}).password, "top secret ");
+    unlink(file.c_str());
+}
+
+TEST(Options, APasswordOnTheCommandLineIsOverwritten) {
+    std::string program = "receiver", name = "--password", value = "secret", joined = "--password=hidden",
+                file = "--password-file=keep";
+    char* arguments[] = {program.data(), name.data(), value.data(), joined.data(), file.data()};
+    HidePassword(5, arguments);
+    EXPECT_EQ(value, "xxxxxx");
+    EXPECT_EQ(joined, "--password=xxxxxx");
+    EXPECT_EQ(file, "--password-file=keep");
+}
+
+TEST(IsLive, FilesAndTheTestPictureWait) {
+    for (const char* const url : {"test:", "match.ts", "/srv/a.mp4", "file:///srv/a.ts"}) {
+        EXPECT_FALSE(IsLive(url)) << url;
+    }
+    for (const char* const url :
+         {"udp://239.0.0.1:5000", "srt://host:9000", "rtsp://camera/1", "camera.sdp"}) {
+        EXPECT_TRUE(IsLive(url)) << url;
+    }
+}
+
+}  // namespace
+}  // namespace receiver
