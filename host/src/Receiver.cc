@@ -44,6 +44,10 @@ bool QuitRequested() {
     return signals != nullptr && signals->QuitRequested();
 }
 
+std::string WithFullStop(std::string sentence) {
+    return sentence.ends_with('.') ? sentence : sentence + ".";
+}
+
 /// Where files go. The module's rule, with an output of our own where it would refuse: start parameter, else
 /// settings store.
 std::string OutputOf(const Options& options) {
@@ -236,7 +240,7 @@ ExitCode Running::Record(const SourceOpener& open) {
     }
     display_.Finish(summary);
     if (failure) {
-        display_.Failure(failure->Code(), failure->what());
+        display_.Failure(failure->Code(), WithFullStop(failure->what()));
     }
     return summary.exitCode;
 }
@@ -425,9 +429,9 @@ ExitCode Run(const Options& options, const SourceOpener& open, Signals& signals,
         code = Running(options, signals, display, keyboard).Record(open);
     } catch (const ReceiverError& error) {
         code = error.Code();
-        display.Failure(code, error.what());
+        display.Failure(code, WithFullStop(error.what()));
     } catch (const std::exception& error) {
-        display.Failure(code, error.what());
+        display.Failure(code, WithFullStop(error.what()));
     }
     currentSignals = nullptr;
     return code;

@@ -2,10 +2,12 @@
 
 #include <gtest/gtest.h>
 
+#include <chrono>
 #include <filesystem>
 #include <map>
 #include <memory>
 #include <string>
+#include <thread>
 #include <vector>
 
 #include "support/Process.h"
@@ -31,6 +33,19 @@ class ReceiverFixture : public ::testing::Test {
     std::vector<std::filesystem::path> Recordings() const { return RecordingsIn(OutputFolder()); }
     /// The module's log.
     std::string Log() const;
+
+    /// True as soon as `condition` holds; false when that takes longer than any healthy program needs.
+    template <typename Condition>
+    [[nodiscard]] static bool WaitFor(Condition condition) {
+        const auto deadline = std::chrono::steady_clock::now() + kPatience;
+        while (!condition()) {
+            if (std::chrono::steady_clock::now() > deadline) {
+                return false;
+            }
+            std::this_thread::sleep_for(std::chrono::milliseconds(10));
+        }
+        return true;
+    }
 
     TemporaryFolder folder;
     std::map<std::string, std::string> environment;

@@ -112,6 +112,20 @@ Bytes withoutAdtsHeader(const Bytes& frame) {
     return frame;
 }
 
+/// A file with the streams of `input`, open and without header.
+Output makeTransportStream(const AVFormatContext& input, const std::filesystem::path& target) {
+    AVFormatContext* context = nullptr;
+    check(avformat_alloc_output_context2(&context, nullptr, "mpegts", target.c_str()), "mpegts");
+    Output output(context);
+    for (unsigned i = 0; i < input.nb_streams; ++i) {
+        AVStream* stream = avformat_new_stream(context, nullptr);
+        check(avcodec_parameters_copy(stream->codecpar, input.streams[i]->codecpar), "copy parameters");
+        stream->codecpar->codec_tag = 0;
+    }
+    check(avio_open(&context->pb, target.c_str(), AVIO_FLAG_WRITE), "create " + target.string());
+    return output;
+}
+
 }  // namespace
 
 CodedMedia ReadCodedMedia(const std::filesystem::path& file) {
@@ -142,18 +156,11 @@ CodedMedia ReadCodedMedia(const std::filesystem::path& file) {
 void AddKlvStream(const std::filesystem::path& source, const std::filesystem::path& target,
                   std::size_t picturesPerPacket) {
     const Input input = openInput(source);
-    AVFormatContext* context = nullptr;
-    check(avformat_alloc_output_context2(&context, nullptr, "mpegts", target.c_str()), "mpegts");
-    const Output output(context);
-    for (unsigned i = 0; i < input->nb_streams; ++i) {
-        AVStream* stream = avformat_new_stream(context, nullptr);
-        check(avcodec_parameters_copy(stream->codecpar, input->streams[i]->codecpar), "copy parameters");
-        stream->codecpar->codec_tag = 0;
-    }
+    const Output output = makeTransportStream(*input, target);
+    AVFormatContext* const context = output.get();
     AVStream* klv = avformat_new_stream(context, nullptr);
     klv->codecpar->codec_type = AVMEDIA_TYPE_DATA;
     klv->codecpar->codec_id = AV_CODEC_ID_SMPTE_KLV;
-    check(avio_open(&context->pb, target.c_str(), AVIO_FLAG_WRITE), "create " + target.string());
     check(avformat_write_header(context, nullptr), "header");
 
     std::size_t pictures = 0;
@@ -178,6 +185,43 @@ void AddKlvStream(const std::filesystem::path& source, const std::filesystem::pa
         check(av_interleaved_write_frame(context, packet.get()), "write");
     }
     check(av_write_trailer(context), "trailer");
+}
+
+void RepeatMaterial(const std::filesystem::path& source, const std::filesystem::path& target,
+                    std::size_t pictures, std::size_t sounds, std::size_t times, int rate) {
+    const Input input = openInput(source);
+    std::vector<Packet> video;
+    std::vector<Packet> audio;
+    Packet packet(av_packet_alloc());
+    while (av_read_frame(input.get(), packet.get()) >= 0) {
+        const bool isVideo = input->streams[packet->stream_index]->codecpar->codec_type == AVMEDIA_TYPE_VIDEO;
+        (isVideo ? video : audio).push_back(std::move(packet));
+        packet.reset(av_packet_alloc());
+    }
+    if (video.size() < pictures || audio.size() < sounds) {
+        throw std::runtime_error("the material is too short");
+    }
+    const Output output = makeTransportStream(*input, target);
+    check(avformat_write_header(output.get(), nullptr), "header");
+    const auto write = [&](const AVPacket& from, std::size_t number, AVRational timeBase) {
+        const Packet copy(av_packet_clone(&from));
+        copy->pts = copy->dts = static_cast<std::int64_t>(number);
+        copy->duration = 1;
+        copy->pos = -1;
+        av_packet_rescale_ts(copy.get(), timeBase, output->streams[copy->stream_index]->time_base);
+        check(av_interleaved_write_frame(output.get(), copy.get()), "write");
+    };
+    std::size_t sound = 0;
+    for (std::size_t picture = 0; picture < pictures * times; ++picture) {
+        write(*video[picture % pictures], picture, {1, rate});
+        // As much sound as goes with the pictures so far.
+        for (; sound < sounds * times && av_compare_ts(static_cast<std::int64_t>(sound), {1024, 48000},
+                                                       static_cast<std::int64_t>(picture + 1), {1, rate}) < 0;
+             ++sound) {
+            write(*audio[sound % sounds], sound, {1024, 48000});
+        }
+    }
+    check(av_write_trailer(output.get()), "trailer");
 }
 
 }  // namespace endtoend

@@ -35,6 +35,12 @@ CodedMedia ReadCodedMedia(const std::filesystem::path& file);
 void AddKlvStream(const std::filesystem::path& source, const std::filesystem::path& target,
                   std::size_t picturesPerPacket);
 
+/// Writes the MPEG transport stream `target`: the `pictures` pictures and the first `sounds` AAC frames of
+/// `source`, `times` times over, at times that go on without a gap: pictures at `rate` a second, AAC frames
+/// of 1024 samples at 48 kHz.
+void RepeatMaterial(const std::filesystem::path& source, const std::filesystem::path& target,
+                    std::size_t pictures, std::size_t sounds, std::size_t times, int rate);
+
 /// Where `part` stands in `whole` as one unbroken run; `whole.size()` when it does not.
 template <typename Item>
 std::size_t FindRun(const std::vector<Item>& whole, const std::vector<Item>& part) {

@@ -13,7 +13,7 @@ std::filesystem::path MakeMaterial(const TemporaryFolder& folder, const Material
         "ffmpeg",       "-v",
         "error",        "-y",
         "-f",           "lavfi",
-        "-i",           "testsrc2=size=320x180:rate=" + options.rate,
+        "-i",           "testsrc2=size=" + options.size + ":rate=" + options.rate,
         "-f",           "lavfi",
         "-i",           "sine=frequency=440:sample_rate=48000",
         "-t",           std::to_string(options.seconds),

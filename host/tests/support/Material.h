@@ -12,6 +12,7 @@ namespace endtoend {
 struct MaterialOptions {
     /// As ffmpeg writes it: "25", "30000/1001".
     std::string rate = "25";
+    std::string size = "320x180";
     double seconds = 4;
     /// Pictures from one IDR frame to the next.
     int pictureGroup = 10;

@@ -85,6 +85,24 @@ TEST(MaterialTest, HoldsWhatTheTestsCompareWith) {
     EXPECT_EQ(AskMediaInfo(file, "Video").value("Format", ""), "AVC");
 }
 
+TEST(MaterialTest, IsRepeatedWithoutAGap) {
+    const TemporaryFolder folder;
+    MaterialOptions options;
+    options.seconds = 0.7;
+    const auto once = MakeMaterial(folder, options);
+    const auto thrice = folder.Path() / "thrice.ts";
+    // 0.64 s are 16 pictures and 30 AAC frames.
+    RepeatMaterial(once, thrice, 16, 30, 3, 25);
+    const CodedMedia media = ReadCodedMedia(thrice);
+    ASSERT_EQ(media.video.size(), 48U);
+    ASSERT_EQ(media.audio.size(), 90U);
+    EXPECT_EQ(media.video[15], media.video[47]);
+    EXPECT_EQ(media.audio[0], media.audio[60]);
+    const auto answer = AskFfprobe(thrice);
+    EXPECT_EQ(StreamOf(answer, "video").value("duration", ""), "1.920000");
+    EXPECT_EQ(StreamOf(answer, "audio").value("duration", ""), "1.920000");
+}
+
 TEST(MaterialTest, ThePicturesOfTwoContainersAreTheSame) {
     const TemporaryFolder folder;
     MaterialOptions options;

@@ -1,0 +1,145 @@
+// Every way into the receiver, with ffmpeg as the sender and programs of others as judges.
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "endtoend/ReceiverFixture.h"
+#include "endtoend/RecordingCheck.h"
+#include "support/Material.h"
+#include "support/Senders.h"
+
+namespace endtoend {
+namespace {
+
+using ::testing::EndsWith;
+using ::testing::HasSubstr;
+
+enum class Road { kUdp, kRtp, kSrtListener, kSrtCaller, kFile };
+
+struct Case {
+    const char* name;
+    Road road;
+    const char* rate;       // as the receiver writes it
+    const char* exactRate;  // as ffmpeg writes it
+    bool fragmented;
+    const char* timecode;
+    bool klv;
+    const char* container;
+};
+
+std::ostream& operator<<(std::ostream& out, const Case& parameters) {
+    return out << parameters.name;
+}
+
+class SourcesTest : public ReceiverFixture, public ::testing::WithParamInterface<Case> {
+ protected:
+    /// Sends the material over the road of this case and records `kSeconds` of it.
+    Outcome Record(const std::filesystem::path& material) {
+        const FreePorts ports;
+        const std::string port = std::to_string(ports.First());
+        std::vector<std::string> options = {"--timecode", GetParam().timecode, "--file-type",
+                                            GetParam().fragmented ? "fragment" : "normal"};
+        const auto add = [&](const std::vector<std::string>& more) {
+            options.insert(options.end(), more.begin(), more.end());
+        };
+        std::unique_ptr<Process> receiver;
+        std::unique_ptr<Process> sender;
+        switch (GetParam().road) {
+            case Road::kUdp:
+                add({"--input", "udp://127.0.0.1:" + port, "--seconds", kSeconds});
+                receiver = Start(options);
+                EXPECT_TRUE(WaitUntilBound(ports.First())) << receiver->AllText();
+                sender = SendTransportStream(material, "udp://127.0.0.1:" + port + "?pkt_size=1316");
+                break;
+            case Road::kRtp: {
+                const auto description = folder.Path() / "stream.sdp";
+                WriteSessionDescription(material, ports, description);
+                add({"--input", description.string(), "--seconds", kSeconds});
+                receiver = Start(options);
+                EXPECT_TRUE(WaitUntilBound(static_cast<std::uint16_t>(ports.First() + 2)))
+                    << receiver->AllText();
+                sender = SendRtp(material, ports);
+                break;
+            }
+            case Road::kSrtListener:
+                add({"--input", "srt://127.0.0.1:" + port + "?mode=listener", "--seconds", kSeconds});
+                receiver = Start(options);
+                EXPECT_TRUE(WaitUntilBound(ports.First())) << receiver->AllText();
+                sender = SendTransportStream(material, "srt://127.0.0.1:" + port + "?mode=caller");
+                break;
+            case Road::kSrtCaller:
+                sender = SendTransportStream(material, "srt://127.0.0.1:" + port + "?mode=listener");
+                EXPECT_TRUE(WaitUntilBound(ports.First())) << sender->AllText();
+                add({"--input", "srt://127.0.0.1:" + port, "--seconds", kSeconds});
+                receiver = Start(options);
+                break;
+            case Road::kFile:
+                // To its end, and faster than it was made.
+                add({"--input", material.string(), "--speed", "4"});
+                receiver = Start(options);
+                break;
+        }
+        Outcome outcome;
+        outcome.code = receiver->Wait().value_or(-1);
+        outcome.output = receiver->Output();
+        outcome.errors = receiver->Errors();
+        return outcome;
+    }
+
+    static constexpr const char* kSeconds = "2.5";
+};
+
+TEST_P(SourcesTest, IsRecordedByteForByte) {
+    MaterialOptions options;
+    options.rate = GetParam().exactRate;
+    options.container = GetParam().container;
+    // Of a file there is more, so that the fragmented one has fragments.
+    options.seconds = GetParam().road == Road::kFile ? 7 : 4;
+    options.picturesPerKlv = GetParam().klv ? 2 : 0;
+    const Sent sent(MakeMaterial(folder, options));
+
+    const Outcome outcome = Record(sent.file);
+
+    ASSERT_EQ(outcome.code, 0) << outcome.output << outcome.errors << Log();
+    const auto recordings = Recordings();
+    ASSERT_EQ(recordings.size(), 1U) << outcome.output << outcome.errors;
+    Expected expected;
+    expected.rate = *receiver::ParseFrameRate(GetParam().rate);
+    expected.fragmented = GetParam().fragmented;
+    expected.timecode = *receiver::ParseTimecode(GetParam().timecode);
+    expected.timecode.dropFrame = expected.rate.dropFrame;
+    expected.klv = GetParam().klv;
+    // libavformat has no time for the first picture of an RTP session, so the receiver begins with the next
+    // IDR frame.
+    expected.joined = GetParam().road == Road::kRtp;
+    const Range range = CheckRecording(recordings.front(), sent, expected);
+    // The table at the end tells the same.
+    EXPECT_THAT(outcome.output, HasSubstr(recordings.front().string()));
+    EXPECT_THAT(outcome.output, HasSubstr("  " + receiver::ToString(range.timecode) + "  "));
+    EXPECT_THAT(outcome.output, EndsWith(" " + std::to_string(range.count) + "\n"));
+    if (GetParam().road == Road::kFile) {
+        // All of it, in whole chunks.
+        EXPECT_EQ(range.first, 0U);
+        EXPECT_EQ(range.count, sent.media.video.size() / 8 * 8);
+    } else {
+        EXPECT_LE(range.first, expected.joined ? 10U : 0U);
+        EXPECT_GE(static_cast<double>(range.count), 1.5 * expected.rate.timecodeFrames);
+    }
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    Roads, SourcesTest,
+    ::testing::Values(
+        Case{"UdpNormal25WithKlv", Road::kUdp, "25", "25", false, "10:20:30:12", true, "ts"},
+        Case{"UdpFragment2997WithKlv", Road::kUdp, "29.97", "30000/1001", true, "09:59:58;20", true, "ts"},
+        Case{"RtpNormal5994", Road::kRtp, "59.94", "60000/1001", false, "10:00:59;50", false, "mp4"},
+        Case{"RtpFragment25", Road::kRtp, "25", "25", true, "23:59:59:20", false, "mp4"},
+        Case{"SrtListenerNormal50", Road::kSrtListener, "50", "50", false, "00:00:00:00", false, "ts"},
+        Case{"SrtCallerFragment25WithKlv", Road::kSrtCaller, "25", "25", true, "01:02:03:04", true, "ts"},
+        Case{"FileNormal2997", Road::kFile, "29.97", "30000/1001", false, "10:00:58;28", false, "mp4"},
+        Case{"FileFragment50WithKlv", Road::kFile, "50", "50", true, "12:34:56:49", true, "ts"},
+        Case{"FileFragment5994", Road::kFile, "59.94", "60000/1001", true, "00:09:59;59", false, "mkv"}),
+    ::testing::PrintToStringParamName());
+
+}  // namespace
+}  // namespace endtoend
