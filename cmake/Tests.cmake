@@ -15,13 +15,15 @@ if(CLIPFILE_TEST_PCH)
         <functional> <map> <memory> <mutex> <string> <string_view> <thread> <vector>)
 endif()
 
-# clipfile_add_test(NAME SOURCES x_test.cc ... [LIBRARIES ...] [TIMEOUT seconds] [ENVIRONMENT A=b ...] [SERIAL])
+# clipfile_add_test(NAME SOURCES x_test.cc ... [LIBRARIES ...] [TIMEOUT seconds] [ENVIRONMENT A=b ...] [SERIAL]
+#                   [FILTER pattern])
 #
 # Registers the sources, builds the program NAME from them and enters each of its cases with ctest. A *_test.cc
 # that no call names fails the configure step (clipfile_check_tests_registered). SERIAL is for measurements of a
-# whole process (memory, open files); everything else runs in parallel.
+# whole process (memory, open files); everything else runs in parallel. Of a FILTER, in the form of --gtest_filter, only
+# the cases that it matches are entered.
 function(clipfile_add_test name)
-    cmake_parse_arguments(ARG "SERIAL" "TIMEOUT" "SOURCES;LIBRARIES;ENVIRONMENT" ${ARGN})
+    cmake_parse_arguments(ARG "SERIAL" "TIMEOUT;FILTER" "SOURCES;LIBRARIES;ENVIRONMENT" ${ARGN})
     if(ARG_UNPARSED_ARGUMENTS OR NOT ARG_SOURCES)
         message(FATAL_ERROR "clipfile_add_test(${name}): SOURCES are missing or '${ARG_UNPARSED_ARGUMENTS}' is not understood.")
     endif()
@@ -48,7 +50,11 @@ function(clipfile_add_test name)
     if(ARG_ENVIRONMENT)
         list(APPEND properties ENVIRONMENT "${ARG_ENVIRONMENT}")
     endif()
-    gtest_discover_tests(${name} TEST_PREFIX "${name}." DISCOVERY_TIMEOUT 120 PROPERTIES ${properties})
+    set(filter)
+    if(ARG_FILTER)
+        set(filter TEST_FILTER "${ARG_FILTER}")
+    endif()
+    gtest_discover_tests(${name} ${filter} TEST_PREFIX "${name}." DISCOVERY_TIMEOUT 120 PROPERTIES ${properties})
 
     list(TRANSFORM ARG_SOURCES PREPEND "${CMAKE_CURRENT_SOURCE_DIR}/")
     set_property(GLOBAL APPEND PROPERTY CLIPFILE_REGISTERED_TESTS ${ARG_SOURCES})
