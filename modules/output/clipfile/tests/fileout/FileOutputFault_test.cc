@@ -11,6 +11,7 @@
 #include <map>
 #include <ostream>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "fileout/FileOutput.h"
@@ -373,6 +374,32 @@ TEST_P(FileOutputSweepTest, EachFailureGivesItsCauseAndLeavesEveryOtherFileClose
     // As many muxers were released as were made.
     EXPECT_EQ(MuxerCalls("create").size(), MuxerCalls("gone").size());
     EXPECT_EQ(MuxerCalls("create").size(), MuxerCalls("Uninitialize").size());
+}
+
+TEST_P(FileOutputSweepTest, AFaultIsLoggedBeforeItIsReported) {
+    int count = 0;
+    // The first muxer is the one that is never opened.
+    const int failing = std::string(GetParam().name) == "Initialize" ? 2 : 1;
+    GetParam().arm(platform, muxers, count, failing);
+    std::vector<std::pair<std::string, std::size_t>> lines;
+    log.OnLine([&](const CapturedLine& line) {
+        if (line.priority == LOG_PRIORITY_ERROR) {
+            lines.emplace_back(line.text, Statuses().size());
+        }
+    });
+    Start();
+    Push(0, true);
+    Finish();
+    log.OnLine(nullptr);
+    ASSERT_FALSE(lines.empty());
+    std::size_t reported = 0;
+    for (const auto& [text, statuses] : lines) {
+        EXPECT_EQ(statuses, reported) << text;
+        // The reason why a directory cannot be made has a line of its own, which is no report.
+        reported += text.starts_with("filename: ") ? 0 : 1;
+    }
+    EXPECT_EQ(Statuses().size(), reported);
+    EXPECT_EQ(Statuses()[0], GetParam().cause);
 }
 
 INSTANTIATE_TEST_SUITE_P(Steps, FileOutputSweepTest, testing::ValuesIn(kSteps),

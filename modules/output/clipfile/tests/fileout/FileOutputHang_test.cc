@@ -56,7 +56,17 @@ TEST_F(FileOutputHangTest, AWriteThatHangsEndsWithCause27AndAFileWithoutClosingB
     Push(0, false, 4 << 20);
     Push(1);
     ASSERT_TRUE(muxers.WaitForCall("2 Write 0"));
+    std::vector<std::string> order;
+    log.OnLine([&](const CapturedLine& line) {
+        if (line.text.find("thread") != std::string::npos) {
+            order.push_back(line.text + " " + std::to_string(Statuses().size()));
+        }
+    });
     StopHanging();
+    log.OnLine(nullptr);
+    // Each line with the number of statuses that were set before it.
+    EXPECT_THAT(order, ElementsAre("wait thread start... 0", "wait thread timeout... 0",
+                                   "terminate thread... 1", "wait thread end... 1"));
 
     EXPECT_THAT(TextsOf("Stop"), ElementsAre("start.", "wait thread start...", "wait thread timeout...",
                                              "terminate thread...", "wait thread end...", "end."));

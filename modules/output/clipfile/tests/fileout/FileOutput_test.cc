@@ -2,10 +2,12 @@
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <pthread.h>
 
 #include <future>
 #include <memory>
 #include <string>
+#include <system_error>
 #include <thread>
 #include <vector>
 
@@ -115,6 +117,29 @@ TEST_F(FileOutputTest, StopTellsItsSteps) {
     EXPECT_TRUE(Logged(LOG_PRIORITY_DETAIL, "Stop", "end."));
     EXPECT_TRUE(Logged(LOG_PRIORITY_DETAIL, "outputThread", "end."));
     EXPECT_EQ(log.Find("wait thread start...")->file, kSource + "FileOutput.cc");
+}
+
+TEST_F(FileOutputTest, StartThrowsWhenNoThreadCanBeMadeAndCanBeTriedAgain) {
+    ASSERT_TRUE(Initialize());
+    pthread_attr_t before;
+    ASSERT_EQ(pthread_getattr_default_np(&before), 0);
+    pthread_attr_t tooLarge;
+    ASSERT_EQ(pthread_attr_init(&tooLarge), 0);
+    // More than there are addresses.
+    ASSERT_EQ(pthread_attr_setstacksize(&tooLarge, std::size_t{1} << 47), 0);
+    ASSERT_EQ(pthread_setattr_default_np(&tooLarge), 0);
+    EXPECT_THROW(output->Start(settings), std::system_error);
+    ASSERT_EQ(pthread_setattr_default_np(&before), 0);
+    pthread_attr_destroy(&tooLarge);
+    pthread_attr_destroy(&before);
+    output->Stop();
+    EXPECT_THAT(TextsOf("Stop"), ElementsAre("start.", "end."));
+    EXPECT_THAT(controller.Calls(), IsEmpty());
+
+    output->Start(settings);
+    Push(0);
+    Finish();
+    EXPECT_THAT(Disk(), Contains(Pair(kToday + "1.txt", "open, chunk 0, tmcd 01:02:03:00, closed")));
 }
 
 TEST_F(FileOutputTest, StopWithoutStartDoesNothing) {

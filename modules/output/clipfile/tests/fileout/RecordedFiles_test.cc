@@ -66,6 +66,27 @@ TEST_P(RecordedFilesTest, AFileEndsAtTheFirstSyncChunkWhoseEndReachesTheMinute) 
     EXPECT_EQ(log.Count("mp4 file over 1 min."), 1u);
 }
 
+TEST_P(RecordedFilesTest, ALimitReachedInTheMiddleOfASyncPeriodAddsUpToOnePeriod) {
+    settings.framerate = 29970;
+    settings.maxFileSize = 1;
+    const ChunkShape eightPictures = {{}, {}, std::vector<std::size_t>(8, 1), 0};
+    Start();
+    // A period has 640 pictures, 21.35 s. A minute is reached with picture 1799; the third period ends at
+    // 1920.
+    for (int chunk = 0; chunk < 242; ++chunk) {
+        Push(static_cast<unsigned char>(chunk), (chunk + 1) % 80 == 0, eightPictures);
+    }
+    Finish();
+    ASSERT_THAT(Files(), ElementsAre(kToday + "01_02_03_00.MP4", kToday + "01_02_03_240.MP4"));
+    EXPECT_EQ(iso::ReadMovie(File(Files()[0])).track(1).samples.size(), 1920u);
+    EXPECT_EQ(iso::ReadMovie(File(Files()[1])).track(1).samples.size(), 16u);
+    EXPECT_FALSE(log.Contains("mp4 file over. no a/v sync. 1792"));
+    EXPECT_TRUE(Logged(LOG_PRIORITY_DETAIL, "outputFile", "mp4 file over. no a/v sync. 1800"));
+    EXPECT_TRUE(Logged(LOG_PRIORITY_DETAIL, "outputFile", "mp4 file over. no a/v sync. 1912"));
+    // The count of samples runs on across the files.
+    EXPECT_TRUE(Logged(LOG_PRIORITY_DETAIL, "outputFile", "write chunk. 1936"));
+}
+
 TEST_P(RecordedFilesTest, TheSecondFileAtATimecodeIsCountedInItsDirectoryAlone) {
     settings.maxFileSize = 0;
     Start();
