@@ -257,6 +257,9 @@ void Running::Loop(SourceInterface& source, Recorder& recorder) {
             rates_.Count(unit);
             recorder.Put(std::move(unit));
         }
+        if (result == SourceInterface::Result::kIdle && source.Counts().away) {
+            recorder.Interrupt();
+        }
         TakeCommands(recorder);
         if (recorder.Finishing()) {
             finishSince_ = finishSince_.value_or(Clock::now());

@@ -87,7 +87,7 @@ void Recorder::PushFrame(const SourceUnit& unit) {
     if (!firstFrame_) {
         firstFrame_ = unit.time;
     } else if (unit.time - lastFrame_ > kGap) {
-        BridgeGap(lastFrame_);
+        EndBeforeGap();
     }
     lastFrame_ = unit.time;
     if (settings_.length && Elapsed() >= *settings_.length) {
@@ -145,16 +145,39 @@ void Recorder::PushSyncFrame(const SourceUnit& unit, const Timecode& timecode) {
     }
 }
 
-void Recorder::BridgeGap(std::int64_t time) {
+void Recorder::Interrupt() {
+    while (const std::optional<SourceUnit> next = interleaver_.TakeRest()) {
+        Push(*next);
+    }
+    EndBeforeGap();
+}
+
+void Recorder::EndBeforeGap() {
     if (settings_.mode != OutputMode::kSync || !plan_.Recording()) {
         return;
     }
-    // The recording ends where the stream did, and a new one begins with the first IDR frame behind the gap.
-    const int stops = log_.Stops();
     plan_.Interrupt();
-    feed_.PushMeta(FrameTime(time, 1), BuildMetadata(false, std::nullopt, {}));
-    if (log_.OpenRecordings() > 0) {
-        log_.WaitForStops(stops + 1, kStopPatience);
+    if (log_.OpenRecordings() <= 0) {
+        return;
+    }
+    feed_.Settle();
+    PushPadding(true);
+    const std::size_t held = feed_.Frames().UncutUnits();
+    const auto left = static_cast<std::int64_t>(held > kChunkFrames ? held - kChunkFrames : 0);
+    // Between the last frame of the last whole chunk and the one behind it.
+    PushStop(FrameTime(lastFrame_, -left) + FrameTime(0, 1) / 2);
+}
+
+void Recorder::PushStop(std::int64_t time) {
+    const int stops = log_.Stops();
+    const int open = log_.OpenRecordings();
+    const std::vector<unsigned char> meta = BuildMetadata(false, std::nullopt, {});
+    feed_.PushMeta(time, meta);
+    log_.WaitForStops(stops + 1, kStopPatience);
+    // The chunk thread looks for the end when a unit comes, and none does on its own.
+    for (int i = 0; i < kNudges && log_.OpenRecordings() >= open; ++i) {
+        feed_.PushMeta(time, meta);
+        feed_.Frames().WaitForUncut(0, kNudgePause);
     }
 }
 
@@ -173,11 +196,11 @@ std::int64_t Recorder::FrameTime(std::int64_t from, std::int64_t frames) const {
     return from + frames * kVideoClock * rate.denominator / rate.numerator;
 }
 
-void Recorder::PushPadding() {
+void Recorder::PushPadding(bool record) {
     const std::shared_ptr<unsigned char> empty(new unsigned char[kEmptyVideo.size()],
                                                std::default_delete<unsigned char[]>());
     std::copy(kEmptyVideo.begin(), kEmptyVideo.end(), empty.get());
-    const std::vector<unsigned char> meta = BuildMetadata(false, std::nullopt, {});
+    const std::vector<unsigned char> meta = BuildMetadata(record, std::nullopt, {});
     std::int64_t frame = 0;
     const auto pushMetaAndAudio = [&] {
         const std::int64_t time = FrameTime(lastFrame_, ++frame);
@@ -212,7 +235,7 @@ std::uint64_t Recorder::Close(bool over) {
     const std::size_t uncut = feed_.Frames().UncutUnits();
     std::uint64_t left = 0;
     if (uncut > 0) {
-        PushPadding();
+        PushPadding(false);
         const std::size_t held = feed_.Frames().UncutUnits();
         left = held > kChunkFrames ? held - kChunkFrames : 0;
     }

@@ -48,6 +48,11 @@ class Recorder {
 
     void Put(SourceUnit unit);
 
+    /// The source is away: what waits for order is pushed, and a recording in mode sync ends with the last
+    /// whole chunk, so that its file is closed and holds nothing of what comes behind the gap. The next one
+    /// begins with the first IDR frame there. A repetition has no effect.
+    void Interrupt();
+
     /// The run is to end: nothing is recorded from the next frame on. More of the stream is needed until
     /// `Done`, for the module to cut what came before.
     void Finish();
@@ -71,10 +76,11 @@ class Recorder {
     void PushFrame(const SourceUnit& unit);
     bool PushOnlineFrame(const SourceUnit& unit, const Timecode& timecode);
     void PushSyncFrame(const SourceUnit& unit, const Timecode& timecode);
-    void BridgeGap(std::int64_t time);
+    void EndBeforeGap();
     Timecode NextTimecode(const SourceUnit& unit);
     std::int64_t FrameTime(std::int64_t from, std::int64_t frames) const;
-    void PushPadding();
+    void PushPadding(bool record);
+    void PushStop(std::int64_t time);
     std::size_t KeptChunks() const;
 
     const Settings settings_;

@@ -37,13 +37,24 @@ void Interleaver::Put(SourceUnit unit) {
     waiting_[index].push_back(std::move(unit));
 }
 
-std::optional<SourceUnit> Interleaver::Take() {
+std::deque<SourceUnit>* Interleaver::Next() {
     std::deque<SourceUnit>* first = nullptr;
     for (std::deque<SourceUnit>& units : waiting_) {
         if (!units.empty() && (first == nullptr || CommonTime(units.front()) < CommonTime(first->front()))) {
             first = &units;
         }
     }
+    return first;
+}
+
+SourceUnit Interleaver::PopFront(std::deque<SourceUnit>& units) {
+    SourceUnit unit = std::move(units.front());
+    units.pop_front();
+    return unit;
+}
+
+std::optional<SourceUnit> Interleaver::Take() {
+    std::deque<SourceUnit>* const first = Next();
     if (first == nullptr) {
         return std::nullopt;
     }
@@ -53,9 +64,12 @@ std::optional<SourceUnit> Interleaver::Take() {
     if (!finished_ && !complete && newest - time <= kPatienceSeconds * kCommonClock) {
         return std::nullopt;
     }
-    SourceUnit unit = std::move(first->front());
-    first->pop_front();
-    return unit;
+    return PopFront(*first);
+}
+
+std::optional<SourceUnit> Interleaver::TakeRest() {
+    std::deque<SourceUnit>* const first = Next();
+    return first != nullptr ? std::optional<SourceUnit>(PopFront(*first)) : std::nullopt;
 }
 
 }  // namespace receiver

@@ -23,11 +23,17 @@ class Interleaver {
     void Put(SourceUnit unit);
     /// The next unit, if nothing earlier is to be expected.
     std::optional<SourceUnit> Take();
+    /// The next unit, whatever is to be expected: the source was lost, and what follows lies behind a gap.
+    std::optional<SourceUnit> TakeRest();
     /// Nothing more comes: everything that waits may be taken.
     void Finish() { finished_ = true; }
 
  private:
     static constexpr std::size_t kMedia = 3;
+
+    /// The medium whose unit is the next one; null when there is none.
+    std::deque<SourceUnit>* Next();
+    static SourceUnit PopFront(std::deque<SourceUnit>& units);
 
     /// In the order in which units of the same instant come out.
     std::array<std::deque<SourceUnit>, kMedia> waiting_;

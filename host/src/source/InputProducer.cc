@@ -41,6 +41,11 @@ InputProducer::InputProducer(const SourceOptions& options, std::shared_ptr<Inter
 }
 
 bool InputProducer::Produce(Batch& batch) {
+    if (end_) {
+        throw ReceiverError(*end_);
+    }
+    // Not before the units that came last are on their way.
+    away_ = connection_ == nullptr;
     bool more = true;
     try {
         if (!connection_) {
@@ -58,7 +63,9 @@ bool InputProducer::Produce(Batch& batch) {
         }
     } catch (const SourceLost& loss) {
         Lose(loss.what());
-        more = options_.reconnect && !recorded_;
+        if (!options_.reconnect || recorded_) {
+            end_.emplace(ExitCode::kSourceUnavailable, "the source was lost: " + std::string(loss.what()));
+        }
     } catch (const Stopped&) {
         more = false;
     }
@@ -74,9 +81,10 @@ void InputProducer::Lose(const std::string& reason) {
         attempts_ = 0;
     }
     assembler_.Finish();
-    const bool again = options_.reconnect && !recorded_;
-    assembler_.AddNotice("the source was lost: " + reason +
-                         (again ? "; trying again in " + std::to_string(kPauses[attempts_]) + " s" : ""));
+    if (options_.reconnect && !recorded_) {
+        assembler_.AddNotice("the source was lost: " + reason + "; trying again in " +
+                             std::to_string(kPauses[attempts_]) + " s");
+    }
     damagedBefore_ += connection_->Damaged();
     connection_.reset();
     lost_ = now;
@@ -112,7 +120,7 @@ void InputProducer::Publish() {
 }
 
 SourceCounts InputProducer::Counts() const {
-    return {lostFrames_, damaged_, reconnections_};
+    return {lostFrames_, damaged_, reconnections_, away_};
 }
 
 }  // namespace receiver

@@ -5,6 +5,7 @@
 #include <memory>
 #include <optional>
 
+#include "common/ReceiverError.h"
 #include "source/Connection.h"
 #include "source/Interrupt.h"
 #include "source/ProducerInterface.h"
@@ -44,10 +45,13 @@ class InputProducer final : public ProducerInterface {
     /// Which pause comes next.
     std::size_t attempts_ = 0;
     std::uint64_t damagedBefore_ = 0;
+    /// Ends the source when all that came before it has been handed over.
+    std::optional<ReceiverError> end_;
 
     std::atomic<std::uint64_t> lostFrames_{0};
     std::atomic<std::uint64_t> damaged_{0};
     std::atomic<std::uint64_t> reconnections_{0};
+    std::atomic<bool> away_{false};
 };
 
 }  // namespace receiver

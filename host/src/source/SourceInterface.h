@@ -53,6 +53,8 @@ struct SourceCounts {
     /// Packets that arrived damaged and were not passed on.
     std::uint64_t damagedPackets = 0;
     std::uint64_t reconnections = 0;
+    /// The source is lost and not back yet.
+    bool away = false;
 };
 
 /// Hears of what an operator should know, one sentence each ("the source was lost: ...; trying again in 4 s",

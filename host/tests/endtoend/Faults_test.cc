@@ -11,6 +11,7 @@
 #include "endtoend/RecordingCheck.h"
 #include "support/Judges.h"
 #include "support/Material.h"
+#include "support/Senders.h"
 
 namespace endtoend {
 namespace {
@@ -52,6 +53,50 @@ TEST_F(FaultsTest, ADiskThatIsFullFromTheBeginningIsSaidBeforeAnythingIsMade) {
     EXPECT_THAT(outcome.errors, HasSubstr("is full: 104.9 MB are free"));
     EXPECT_THAT(Recordings(), SizeIs(0));
     umount(OutputFolder().c_str());
+}
+
+TEST_F(FaultsTest, ASourceThatVanishesAndReturnsGoesOnInANewFile) {
+    const FreePorts ports;
+    const std::string port = std::to_string(ports.First());
+    MaterialOptions options;
+    options.seconds = 3;
+    const Sent sent(MakeMaterial(folder, options));
+    const auto receiver =
+        Start({"--input", "udp://127.0.0.1:" + port, "--timeout", "1", "--timecode", "10:00:00:00"});
+    ASSERT_TRUE(WaitUntilBound(ports.First())) << receiver->AllText();
+    const std::string address = "udp://127.0.0.1:" + port + "?pkt_size=1316";
+    ASSERT_EQ(SendTransportStream(sent.file, address)->Wait(), 0);
+    ASSERT_TRUE(receiver->WaitForText("lost")) << receiver->AllText();
+    // Its file is complete while it is away.
+    ASSERT_TRUE(WaitFor([&] { return Log().find("OP: FILE CLOSE.") != std::string::npos; })) << Log();
+    ASSERT_THAT(Recordings(), SizeIs(1));
+    EXPECT_EQ(ReadCodedMedia(Recordings().front()).video.size(), sent.media.video.size() / 8 * 8);
+    const auto again = SendTransportStream(sent.file, address);
+    ASSERT_TRUE(WaitFor([&] { return Recordings().size() == 2; })) << receiver->AllText() << Log();
+    ASSERT_EQ(again->Wait(), 0);
+    receiver->Signal(SIGINT);
+    EXPECT_EQ(receiver->Wait(), 8) << receiver->AllText();
+    for (const auto& recording : Recordings()) {
+        const CodedMedia recorded = ReadCodedMedia(recording);
+        EXPECT_GE(recorded.video.size(), 40U);
+        EXPECT_LT(FindRun(sent.media.video, recorded.video), sent.media.video.size()) << recording;
+        EXPECT_EQ(DecodeVideo(recording).messages, "") << recording;
+    }
+}
+
+TEST_F(FaultsTest, WithoutReconnectionALostSourceEndsTheRun) {
+    const FreePorts ports;
+    const std::string port = std::to_string(ports.First());
+    MaterialOptions options;
+    options.seconds = 2;
+    const auto material = MakeMaterial(folder, options);
+    const auto receiver = Start({"--input", "udp://127.0.0.1:" + port, "--timeout", "0.5", "--no-reconnect"});
+    ASSERT_TRUE(WaitUntilBound(ports.First())) << receiver->AllText();
+    const auto sender = SendTransportStream(material, "udp://127.0.0.1:" + port + "?pkt_size=1316");
+    EXPECT_EQ(receiver->Wait(), 3) << receiver->AllText();
+    EXPECT_THAT(receiver->Errors(), HasSubstr("receiver: the source was lost: "));
+    ASSERT_THAT(Recordings(), SizeIs(1));
+    EXPECT_EQ(DecodeVideo(Recordings().front()).messages, "");
 }
 
 TEST_F(FaultsTest, TwoReceiversOnOneFolderKeepTheirFilesApart) {

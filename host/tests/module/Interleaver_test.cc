@@ -57,6 +57,21 @@ TEST(Interleaver, AudioThatTheSourceSendsLateComesInItsPlace) {
     EXPECT_EQ(TakeAll(interleaver), " v0 a30 v40 v80 a90");
 }
 
+TEST(Interleaver, TheRestComesInOrderWhenTheSourceIsLostAndWaitingGoesOnBehindIt) {
+    Interleaver interleaver;
+    PutVideo(interleaver, 0);
+    PutKlv(interleaver, 40);
+    PutVideo(interleaver, 40);
+    EXPECT_EQ(interleaver.TakeRest()->time, 0);
+    EXPECT_EQ(interleaver.TakeRest()->medium, Medium::kKlv);
+    EXPECT_EQ(interleaver.TakeRest()->medium, Medium::kVideo);
+    EXPECT_FALSE(interleaver.TakeRest());
+    PutVideo(interleaver, 5000);
+    EXPECT_EQ(TakeAll(interleaver), "");
+    PutAudio(interleaver, 5010);
+    EXPECT_EQ(TakeAll(interleaver), " v5000");
+}
+
 TEST(Interleaver, AtTheSameInstantKlvComesBeforeVideoAndVideoBeforeAudio) {
     Interleaver interleaver;
     PutAudio(interleaver, 40);
