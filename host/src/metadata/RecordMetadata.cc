@@ -40,7 +40,12 @@ std::vector<unsigned char> BuildMetadata(bool record, const std::optional<Timeco
                                    static_cast<unsigned char>(timecode->dropFrame ? 1 : 0)});
     }
 
+    std::size_t size = 1 + kLocalSet.size() + 1 + items.size();
+    for (const std::vector<unsigned char>& packet : packets) {
+        size += 1 + packet.size();
+    }
     std::vector<unsigned char> unit;
+    unit.reserve(size);
     unit.push_back(kPacket);
     Append(unit, kLocalSet);
     // 34 bytes at the most, so the length has its short form.
