@@ -3,12 +3,17 @@
 #include <pthread.h>
 #include <unistd.h>
 
+#include <array>
+
 namespace receiver {
 namespace {
 
 /// Wakes the signal thread when the object goes.
 constexpr int kWake = SIGURG;
 constexpr int kExitBySignal = 128;
+/// A recorder in the background that looks at its terminal shall not be stopped for it, and one whose output
+/// nobody reads any more goes on.
+constexpr std::array<int, 3> kIgnored{SIGPIPE, SIGTTIN, SIGTTOU};
 
 }  // namespace
 
@@ -18,9 +23,7 @@ Signals::Signals(void (*beforeExit)()) : beforeExit_(beforeExit) {
         sigaddset(&received_, number);
     }
     sigset_t blocked = received_;
-    // A recorder in the background that looks at its terminal shall not be stopped for it, and one whose
-    // output nobody reads any more goes on.
-    for (const int number : {SIGPIPE, SIGTTIN, SIGTTOU}) {
+    for (const int number : kIgnored) {
         sigaddset(&blocked, number);
     }
     pthread_sigmask(SIG_BLOCK, &blocked, &previous_);
@@ -31,7 +34,16 @@ Signals::~Signals() {
     ended_ = true;
     pthread_kill(thread_.native_handle(), kWake);
     thread_.join();
-    // A signal that came meanwhile and was left over is delivered here, as if nobody had listened.
+    // What had no effect has none afterwards either.
+    sigset_t ignored;
+    sigemptyset(&ignored);
+    for (const int number : kIgnored) {
+        sigaddset(&ignored, number);
+    }
+    const timespec now{};
+    while (sigtimedwait(&ignored, nullptr, &now) > 0) {
+    }
+    // Another signal that came meanwhile and was left over is delivered here, as if nobody had listened.
     pthread_sigmask(SIG_SETMASK, &previous_, nullptr);
 }
 

@@ -122,6 +122,17 @@ TEST_F(FaultsTest, ATerminalThatIsClosedDoesNotEndTheRecording) {
     EXPECT_GE(DecodeVideo(Recordings().front()).checksums.size(), 48U);
 }
 
+TEST_F(FaultsTest, AReaderOfTheOutputThatGoesAwayDoesNotEndTheRecording) {
+    std::vector<std::string> command = {"bash", "-c", "\"$@\" | head -n 1; exit ${PIPESTATUS[0]}",
+                                        "receiver"};
+    const auto receiver = CommandOf(Small({"--seconds", "2", "--json"}));
+    command.insert(command.end(), receiver.begin(), receiver.end());
+    const Outcome outcome = RunProgram(command, environment);
+    EXPECT_EQ(outcome.code, 0) << outcome.errors;
+    ASSERT_THAT(Recordings(), SizeIs(1));
+    EXPECT_EQ(DecodeVideo(Recordings().front()).checksums.size(), 56U);
+}
+
 TEST_F(FaultsTest, KeysOnATerminalDriveTheRecord) {
     const auto receiver = Start(Small({"--seconds", "60"}), Process::Terminal::kPseudoTerminal);
     ASSERT_TRUE(receiver->WaitForText("REC ")) << receiver->AllText();
