@@ -28,7 +28,7 @@ using Clock = std::chrono::steady_clock;
 constexpr std::chrono::milliseconds kDisplayInterval{250};
 constexpr std::chrono::seconds kFreeSpaceInterval{1};
 /// The end of a recording needs two chunks more of the stream; when that has dried up, nobody waits for it.
-constexpr std::chrono::seconds kFinishPatience{4};
+constexpr std::chrono::seconds kFinishPatience{2};
 constexpr const char* kDefaultOutput = "recordings";
 
 /// A fault of the stream; the recording begins anew.
@@ -178,6 +178,7 @@ class Running final : public SourceListenerInterface {
     std::vector<WrittenFile> files_;
     std::string openFile_;
     std::uint64_t faults_ = 0;
+    ModuleStatus told_;
     bool sourceOver_ = false;
     std::optional<Clock::time_point> finishSince_;
     Clock::time_point shown_{};
@@ -335,7 +336,11 @@ void Running::TakeStatuses(bool ending) {
             }
             ++faults_;
         }
-        display_.Status(status);
+        // The module says more than once that buffering has stopped.
+        if (status != told_) {
+            told_ = status;
+            display_.Status(status);
+        }
     }
 }
 
@@ -424,8 +429,8 @@ Summary Running::Summarise(const SourceInterface& source) const {
 
 }  // namespace
 
-ExitCode Run(const Options& options, const SourceOpener& open, Signals& signals, DisplayInterface& display,
-             int keyboard) {
+ExitCode RunReceiver(const Options& options, const SourceOpener& open, Signals& signals,
+                     DisplayInterface& display, int keyboard) {
     currentSignals = &signals;
     ExitCode code = ExitCode::kInternal;
     try {

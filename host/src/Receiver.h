@@ -20,7 +20,7 @@ using SourceOpener = std::function<std::unique_ptr<SourceInterface>(
 ///
 /// Sets the environment variables of the module's log and settings, so it must be called before anything has
 /// been logged. `keyboard` is the descriptor of a terminal, or anything else where there are no keys.
-ExitCode Run(const Options& options, const SourceOpener& open, Signals& signals, DisplayInterface& display,
-             int keyboard);
+ExitCode RunReceiver(const Options& options, const SourceOpener& open, Signals& signals,
+                     DisplayInterface& display, int keyboard);
 
 }  // namespace receiver

@@ -59,7 +59,8 @@ bool Recorder::Done() const {
         return false;
     }
     // Going offline has no timestamp. The run ends with a whole chunk, so that none of it is lost.
-    return settings_.mode == OutputMode::kOn ? onlineFrames_ % kChunkFrames == 0 : log_.OpenRecordings() == 0;
+    return settings_.mode == OutputMode::kOn ? recordedFrames_ % kChunkFrames == 0
+                                             : log_.OpenRecordings() == 0;
 }
 
 std::int64_t Recorder::Elapsed() const {
@@ -72,7 +73,7 @@ void Recorder::Push(const SourceUnit& unit) {
             PushFrame(unit);
             break;
         case Medium::kAudio:
-            if (settings_.mode == OutputMode::kSync || online_) {
+            if (commanded_) {
                 feed_.PushAudio(unit.time, unit.data, unit.size);
             }
             lastAudio_ = unit.time;
@@ -94,55 +95,59 @@ void Recorder::PushFrame(const SourceUnit& unit) {
         Finish();
     }
     timecode_ = NextTimecode(unit);
-    if (settings_.mode == OutputMode::kOn) {
-        if (!PushOnlineFrame(unit, *timecode_)) {
-            packets_.clear();
-            return;
-        }
-    } else {
-        PushSyncFrame(unit, *timecode_);
-    }
+    const bool pushed =
+        settings_.mode == OutputMode::kOn ? PushOnlineMeta(unit, *timecode_) : PushSyncMeta(unit, *timecode_);
     packets_.clear();
+    if (!pushed) {
+        return;
+    }
     feed_.PushVideo(unit.time, unit.data, unit.size);
     if (settings_.followDisk) {
         feed_.WaitForDisk(KeptChunks() + kChunksAhead);
     }
 }
 
-bool Recorder::PushOnlineFrame(const SourceUnit& unit, const Timecode& timecode) {
-    if (!online_) {
+bool Recorder::PushOnlineMeta(const SourceUnit& unit, const Timecode& timecode) {
+    if (!commanded_) {
         if (!unit.keyFrame || finishing_) {
             return false;
         }
         // Online with the first IDR frame and not before: what came earlier would only be trimmed.
-        online_ = true;
+        commanded_ = true;
         since_ = timecode;
         session_.GoOnline();
     } else if (Done()) {
         return false;
     }
-    ++onlineFrames_;
+    ++recordedFrames_;
     feed_.PushMeta(unit.time, BuildMetadata(true, timecode, packets_));
     return true;
 }
 
-void Recorder::PushSyncFrame(const SourceUnit& unit, const Timecode& timecode) {
+bool Recorder::PushSyncMeta(const SourceUnit& unit, const Timecode& timecode) {
     const bool before = plan_.Recording();
     const bool record = plan_.Next(Elapsed(), unit.keyFrame);
     if (record != before) {
         since_ = timecode;
+        recordedFrames_ = 0;
+    }
+    recordedFrames_ += record ? 1 : 0;
+    commanded_ = commanded_ || record;
+    if (!commanded_) {
+        return false;
     }
     const int stops = log_.Stops();
-    if (record && !before) {
+    if (record != before) {
         feed_.Settle();
     }
     feed_.PushMeta(unit.time, BuildMetadata(record, timecode, packets_));
     if (record && !before) {
         feed_.Settle();
     }
-    if (before && !record && log_.OpenRecordings() > 0) {
+    if (before && !record) {
         log_.WaitForStops(stops + 1, kStopPatience);
     }
+    return true;
 }
 
 void Recorder::Interrupt() {
@@ -161,9 +166,7 @@ void Recorder::EndBeforeGap() {
         return;
     }
     feed_.Settle();
-    PushPadding(true);
-    const std::size_t held = feed_.Frames().UncutUnits();
-    const auto left = static_cast<std::int64_t>(held > kChunkFrames ? held - kChunkFrames : 0);
+    const auto left = static_cast<std::int64_t>(CutWholeChunks(true));
     // Between the last frame of the last whole chunk and the one behind it.
     PushStop(FrameTime(lastFrame_, -left) + FrameTime(0, 1) / 2);
 }
@@ -196,7 +199,7 @@ std::int64_t Recorder::FrameTime(std::int64_t from, std::int64_t frames) const {
     return from + frames * kVideoClock * rate.denominator / rate.numerator;
 }
 
-void Recorder::PushPadding(bool record) {
+void Recorder::PushPadding(bool record, std::size_t uncut) {
     const std::shared_ptr<unsigned char> empty(new unsigned char[kEmptyVideo.size()],
                                                std::default_delete<unsigned char[]>());
     std::copy(kEmptyVideo.begin(), kEmptyVideo.end(), empty.get());
@@ -216,7 +219,8 @@ void Recorder::PushPadding(bool record) {
         pushMetaAndAudio();
         feed_.PushVideo(FrameTime(lastFrame_, frame), empty, kEmptyVideo.size());
     }
-    for (int i = 0; i < kNudges && !feed_.Frames().WaitForUncut(2 * kChunkFrames - 1, kNudgePause); ++i) {
+    for (int i = 0;
+         i < kNudges && log_.OpenRecordings() > 0 && !feed_.Frames().WaitForUncut(uncut, kNudgePause); ++i) {
         pushMetaAndAudio();
     }
 }
@@ -232,15 +236,21 @@ std::uint64_t Recorder::Close(bool over) {
         return 0;
     }
     feed_.Settle();
-    const std::size_t uncut = feed_.Frames().UncutUnits();
-    std::uint64_t left = 0;
-    if (uncut > 0) {
-        PushPadding(false);
-        const std::size_t held = feed_.Frames().UncutUnits();
-        left = held > kChunkFrames ? held - kChunkFrames : 0;
-    }
+    const bool recording = settings_.mode == OutputMode::kOn || plan_.Recording();
+    const std::uint64_t left = CutWholeChunks(false);
     feed_.Frames().WaitForChunks(KeptChunks(), kDiskPatience);
-    return left;
+    return recording ? left : 0;
+}
+
+std::uint64_t Recorder::CutWholeChunks(bool record) {
+    // Nothing is held where a recording still waits for its first frame.
+    if (feed_.Frames().UncutUnits() == 0) {
+        return 0;
+    }
+    const std::uint64_t left = recordedFrames_ % kChunkFrames;
+    PushPadding(record, kChunkFrames + left);
+    const std::size_t held = feed_.Frames().UncutUnits();
+    return std::max<std::uint64_t>(left, held > kChunkFrames ? held - kChunkFrames : 0);
 }
 
 std::size_t Recorder::KeptChunks() const {

@@ -22,8 +22,10 @@ namespace receiver {
 /// A record command travels in the metadata unit of its frame, which goes first. Before a recording begins
 /// and again before its first frame follows, the feed waits until the module has worked off everything: so no
 /// earlier audio gets into the recording, and its IDR frame cannot overtake the command on the way through
-/// the module's three queue threads, which would cost a whole group of pictures. A stop is waited for too, so
-/// that a fast source does not run on beyond it.
+/// the module's three queue threads, which would cost a whole group of pictures. A stop is waited for too:
+/// the module carries it out on another thread, and it ends whatever recording is open by then, so that a
+/// late one would end the next recording. For the same reason nothing is pushed before the first recording:
+/// the module takes a first unit without the flag for a stop.
 ///
 /// One thread at a time.
 class Recorder {
@@ -74,12 +76,17 @@ class Recorder {
  private:
     void Push(const SourceUnit& unit);
     void PushFrame(const SourceUnit& unit);
-    bool PushOnlineFrame(const SourceUnit& unit, const Timecode& timecode);
-    void PushSyncFrame(const SourceUnit& unit, const Timecode& timecode);
+    /// False when the frame does not go to the module.
+    bool PushOnlineMeta(const SourceUnit& unit, const Timecode& timecode);
+    bool PushSyncMeta(const SourceUnit& unit, const Timecode& timecode);
     void EndBeforeGap();
     Timecode NextTimecode(const SourceUnit& unit);
     std::int64_t FrameTime(std::int64_t from, std::int64_t frames) const;
-    void PushPadding(bool record);
+    /// Until no more than `uncut` units are left, padding included. `record` is the record flag of the
+    /// padding.
+    void PushPadding(bool record, std::size_t uncut);
+    /// The number of frames that are left over.
+    std::uint64_t CutWholeChunks(bool record);
     void PushStop(std::int64_t time);
     std::size_t KeptChunks() const;
 
@@ -98,9 +105,10 @@ class Recorder {
     /// KLV packets since the last frame.
     std::vector<std::vector<unsigned char>> packets_;
     bool finishing_ = false;
-    bool online_ = false;
-    /// Frames pushed since going online.
-    std::uint64_t onlineFrames_ = 0;
+    /// A recording was commanded: by going online, or by the first record flag.
+    bool commanded_ = false;
+    /// Frames of the present recording.
+    std::uint64_t recordedFrames_ = 0;
 };
 
 }  // namespace receiver

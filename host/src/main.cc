@@ -44,5 +44,6 @@ int main(int argc, char** argv) {
     receiver::HidePassword(argc, argv);
     receiver::Signals signals(receiver::Keyboard::RestoreTerminal);
     const std::unique_ptr<receiver::DisplayInterface> display = MakeDisplay(*options);
-    return static_cast<int>(receiver::Run(*options, receiver::OpenSource, signals, *display, STDIN_FILENO));
+    return static_cast<int>(
+        receiver::RunReceiver(*options, receiver::OpenSource, signals, *display, STDIN_FILENO));
 }

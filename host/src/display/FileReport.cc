@@ -6,6 +6,7 @@ extern "C" {
 
 #include <algorithm>
 #include <array>
+#include <cerrno>
 #include <cmath>
 #include <cstdio>
 #include <filesystem>
@@ -97,7 +98,13 @@ RecordedFile ReadBack(const std::string& path) {
     }
     file.bytes = bytes;
 
-    AVFormatContext* opened = nullptr;
+    AVFormatContext* opened = avformat_alloc_context();
+    if (opened == nullptr) {
+        file.problem = Problem(AVERROR(ENOMEM));
+        return file;
+    }
+    // What stands in the samples is of no interest here.
+    opened->flags |= AVFMT_FLAG_NOPARSE | AVFMT_FLAG_NOFILLIN;
     // The prefix keeps a path with a colon from being taken for an address.
     const int result = avformat_open_input(&opened, ("file:" + path).c_str(), nullptr, nullptr);
     if (result < 0) {

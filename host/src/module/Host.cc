@@ -33,6 +33,7 @@ void Host::GetParameter(std::string key, std::string& value, std::string default
 int Host::SendTransmissionStatus(const std::map<std::string, std::string>& status) {
     const std::lock_guard lock(mutex_);
     map_ = status;
+    changed_.notify_all();
     return 0;
 }
 
@@ -48,6 +49,11 @@ bool Host::Failed() const {
 std::vector<ModuleStatus> Host::TakeStatuses() {
     const std::lock_guard lock(mutex_);
     return std::exchange(statuses_, {});
+}
+
+bool Host::WaitForMap(std::chrono::milliseconds patience) const {
+    std::unique_lock lock(mutex_);
+    return changed_.wait_for(lock, patience, [this] { return !map_.empty(); });
 }
 
 bool Host::Writing() const {

@@ -1,5 +1,7 @@
 #pragma once
 
+#include <chrono>
+#include <condition_variable>
 #include <map>
 #include <mutex>
 #include <string>
@@ -41,12 +43,15 @@ class Host final : public QxModuleHostInterface {
     bool Failed() const;
     /// The statuses set since the last call, in their order.
     std::vector<ModuleStatus> TakeStatuses();
+    /// Waits until the module has sent a status map. False after `patience`.
+    bool WaitForMap(std::chrono::milliseconds patience) const;
     /// True while the status map says that a recording has its writer.
     bool Writing() const;
 
  private:
     const StartParameters parameters_;
     mutable std::mutex mutex_;
+    mutable std::condition_variable changed_;
     // Guarded by mutex_:
     ModuleStatus status_;
     std::vector<ModuleStatus> statuses_;

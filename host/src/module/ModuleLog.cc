@@ -39,7 +39,7 @@ class ModuleLog::Sink final : public LogSinkInterface {
                 OnWarning(line.text);
                 break;
             case LOG_PRIORITY_TRACE:
-                OnTrace(line.text);
+                OnTrace(line.text, line.function);
                 break;
             default:
                 break;
@@ -76,7 +76,6 @@ class ModuleLog::Sink final : public LogSinkInterface {
             ++openRecordings;
             events.push_back({Kind::kRecordStarted, {}});
         } else if (text.starts_with("OP: REC STOP.")) {
-            ++stops;
             events.push_back({Kind::kRecordStopped, {}});
         } else if (text.starts_with("OP: REMOVE STREAM.")) {
             --openRecordings;
@@ -84,7 +83,6 @@ class ModuleLog::Sink final : public LogSinkInterface {
         } else if (text.starts_with("OP: REC RESTART.")) {
             events.push_back({Kind::kRecordRestarted, {}});
         }
-        changed.notify_all();
     }
 
     void OnWarning(std::string_view text) {
@@ -95,7 +93,7 @@ class ModuleLog::Sink final : public LogSinkInterface {
     }
 
     /// The trace has a few lines for each unit, so most of them are passed over without the lock.
-    void OnTrace(std::string_view text) {
+    void OnTrace(std::string_view text, const char* function) {
         if (std::optional<std::string> folder = PathBetween(text, "output path = \"", "\".")) {
             const std::lock_guard lock(mutex);
             writers_[std::this_thread::get_id()].folder = std::move(*folder);
@@ -112,6 +110,11 @@ class ModuleLog::Sink final : public LogSinkInterface {
                 Close(writer->second);
                 writers_.erase(writer);
             }
+        } else if (text == "end." && function != nullptr &&
+                   std::string_view(function).ends_with("Controller::OnStopStream")) {
+            const std::lock_guard lock(mutex);
+            ++stops;
+            changed.notify_all();
         }
     }
 

@@ -60,9 +60,11 @@ class ModuleLog {
     QueueLosses Losses() const;
     /// Recordings that were commanded and have not ended.
     int OpenRecordings() const;
-    /// Waits until the module has taken note of `count` stop commands in all. False after `patience`.
-    bool WaitForStops(int count, std::chrono::milliseconds patience) const;
+    /// Stop commands that the module's event thread has carried out, whether or not there was anything to
+    /// stop.
     int Stops() const;
+    /// Waits until there are `count` of them. False after `patience`.
+    bool WaitForStops(int count, std::chrono::milliseconds patience) const;
 
  private:
     class Sink;

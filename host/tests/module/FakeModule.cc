@@ -92,8 +92,10 @@ class FakeModule final : public QxModuleInterface,
     }
     void NotifyOfflineStatus() override {
         Called("Offline");
-        host_->SetStatus(6, 26);
-        host_->SetStatus(3, 0);
+        if (host_->GetStatus() != 7) {
+            host_->SetStatus(6, 26);
+            host_->SetStatus(3, 0);
+        }
     }
 
  private:

@@ -49,7 +49,9 @@ TEST(Host, StatusSevenIsTheFailure) {
 TEST(Host, TheStatusMapTellsWhetherAFileIsWritten) {
     Host host({});
     EXPECT_FALSE(host.Writing());
+    EXPECT_FALSE(host.WaitForMap(std::chrono::milliseconds(0)));
     EXPECT_EQ(host.SendTransmissionStatus({{"file_output_status", "output"}}), 0);
+    EXPECT_TRUE(host.WaitForMap(std::chrono::milliseconds(0)));
     EXPECT_TRUE(host.Writing());
     EXPECT_EQ(host.SendTransmissionStatus({{"file_output_status", "standby"}}), 0);
     EXPECT_FALSE(host.Writing());

@@ -1,0 +1,332 @@
+// Whole runs, with the real module unless a test needs one that misbehaves.
+
+#include "Receiver.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <stdlib.h>
+#include <unistd.h>
+
+#include <csignal>
+#include <filesystem>
+
+#include "fakes/FakeDisplay.h"
+#include "fakes/FakeSource.h"
+
+namespace receiver {
+namespace {
+
+using ::testing::Contains;
+using ::testing::ElementsAre;
+using ::testing::HasSubstr;
+using ::testing::IsEmpty;
+using ::testing::Not;
+
+class ReceiverTest : public ::testing::Test {
+ protected:
+    ReceiverTest() : folder_(::testing::TempDir() + "receiver_XXXXXX") {
+        EXPECT_NE(mkdtemp(folder_.data()), nullptr);
+        setenv("QX_SETTINGS", (folder_ + "/none.ini").c_str(), 1);
+        setenv("QX_LOG", "/dev/null", 0);
+        options_.output = folder_;
+        options_.module = CLIPFILE_MODULE;
+        options_.timecode = Timecode{10, 0, 0, 0, false};
+    }
+    ~ReceiverTest() override {
+        unsetenv("FAKE_MODULE");
+        std::filesystem::remove_all(folder_);
+    }
+
+    ExitCode Record(std::unique_ptr<FakeSource> source) {
+        const auto open = [&](const SourceOptions&, SourceListenerInterface&, bool (*)()) {
+            return std::move(source);
+        };
+        return RunReceiver(options_, open, signals_, display_, -1);
+    }
+    ExitCode Record(std::int64_t frames) { return Record(std::make_unique<FakeSource>(frames)); }
+
+    ExitCode RecordWith(const char* behaviour) {
+        setenv("FAKE_MODULE", behaviour, 1);
+        options_.module = FAKE_MODULE;
+        return Record(60);
+    }
+
+    /// Frames of the files, in their order.
+    std::vector<std::uint64_t> Frames() const {
+        std::vector<std::uint64_t> frames;
+        for (const RecordedFile& file : display_.summary.files) {
+            EXPECT_EQ(file.problem, "") << file.path;
+            frames.push_back(file.frames);
+        }
+        return frames;
+    }
+    std::vector<std::string> Starts() const {
+        std::vector<std::string> starts;
+        for (const RecordedFile& file : display_.summary.files) {
+            starts.push_back(file.startTimecode);
+        }
+        return starts;
+    }
+
+    std::string folder_;
+    Options options_;
+    FakeDisplay display_;
+    Signals signals_{[] {}};
+};
+
+TEST_F(ReceiverTest, RecordsWhatTheLengthAsksForInWholeChunks) {
+    options_.seconds = 2;
+    EXPECT_EQ(Record(150), ExitCode::kSuccess);
+    EXPECT_THAT(Frames(), ElementsAre(56));
+    EXPECT_THAT(Starts(), ElementsAre("10:00:00:00"));
+    EXPECT_EQ(display_.opened, display_.closed);
+    EXPECT_THAT(display_.opened, ElementsAre(HasSubstr("/Unknown-Model/10_00_00_00.MP4")));
+    EXPECT_EQ(display_.finished, 1);
+    EXPECT_EQ(display_.failure, "");
+    EXPECT_THAT(display_.notices, Contains("source: a source of the tests"));
+    EXPECT_THAT(display_.statuses, ElementsAre(ModuleStatus{4, 0}, ModuleStatus{3, 0}));
+    EXPECT_EQ(display_.summary.exitCode, ExitCode::kSuccess);
+}
+
+TEST_F(ReceiverTest, RangesGiveAFileEachFromTheIdrFrameAtOrAfterTheirBegin) {
+    options_.record = {{90000, 2 * 90000}, {2 * 90000 + 1, 4 * 90000}};
+    EXPECT_EQ(Record(200), ExitCode::kSuccess);
+    EXPECT_THAT(Frames(), ElementsAre(32, 32));
+    EXPECT_THAT(Starts(), ElementsAre("10:00:01:00", "10:00:03:00"));
+}
+
+TEST_F(ReceiverTest, ASourceThatEndsLeavesAllWholeChunksInTheFile) {
+    EXPECT_EQ(Record(100), ExitCode::kSuccess);
+    EXPECT_THAT(Frames(), ElementsAre(96));
+    EXPECT_THAT(display_.notices, Contains(HasSubstr("its last 4 frames are not in the file")));
+}
+
+TEST_F(ReceiverTest, ASourceThatEndsWithAChunkLeavesNothingOut) {
+    EXPECT_EQ(Record(96), ExitCode::kSuccess);
+    EXPECT_THAT(Frames(), ElementsAre(96));
+    EXPECT_THAT(display_.notices, Not(Contains(HasSubstr("not in the file"))));
+}
+
+TEST_F(ReceiverTest, FragmentedFilesAreListedWithTheirTimecodeToo) {
+    options_.fileType = "fragment";
+    options_.prefix = "CAM1";
+    EXPECT_EQ(Record(96), ExitCode::kSuccess);
+    EXPECT_THAT(Frames(), ElementsAre(96));
+    EXPECT_THAT(Starts(), ElementsAre("10:00:00:00"));
+    EXPECT_THAT(display_.closed, ElementsAre(HasSubstr("/CAM1/10_00_00_00.MP4")));
+}
+
+TEST_F(ReceiverTest, InModeOnTheRunIsOneRecording) {
+    options_.mode = OutputMode::kOn;
+    options_.seconds = 1;
+    EXPECT_EQ(Record(150), ExitCode::kSuccess);
+    EXPECT_THAT(Frames(), ElementsAre(32));
+    EXPECT_THAT(display_.statuses, ElementsAre(ModuleStatus{4, 0}, ModuleStatus{3, 0}));
+}
+
+TEST_F(ReceiverTest, SigtermEndsInOrderWithTheFileClosed) {
+    auto source = std::make_unique<FakeSource>(400);
+    source->Before([this](std::size_t read) {
+        if (read == 100) {
+            kill(getpid(), SIGTERM);
+            while (!signals_.QuitRequested()) {
+                std::this_thread::yield();
+            }
+        }
+    });
+    EXPECT_EQ(Record(std::move(source)), ExitCode::kSuccess);
+    ASSERT_EQ(display_.summary.files.size(), 1u);
+    EXPECT_EQ(Frames()[0] % 8, 0u);
+    EXPECT_LT(Frames()[0], 100u);
+    EXPECT_EQ(display_.closed.size(), 1u);
+    EXPECT_THAT(display_.notices, Contains(HasSubstr("ending in order")));
+}
+
+TEST_F(ReceiverTest, UserSignalsStopAndStartARecording) {
+    auto source = std::make_unique<FakeSource>(400);
+    std::size_t stoppedAt = 0;
+    source->Before([&stoppedAt](std::size_t read) {
+        // The signal thread needs a moment; both commands have 300 units to be seen.
+        if (read == 120) {
+            kill(getpid(), SIGUSR2);
+            stoppedAt = read;
+        } else if (read == 420) {
+            kill(getpid(), SIGUSR1);
+        }
+        if (read % 100 == 21) {
+            std::this_thread::sleep_for(std::chrono::milliseconds(20));
+        }
+    });
+    EXPECT_EQ(Record(std::move(source)), ExitCode::kSuccess);
+    EXPECT_EQ(display_.summary.files.size(), 2u);
+}
+
+TEST_F(ReceiverTest, ASourceThatDriesUpAtTheEndHoldsNobodyUp) {
+    auto source = std::make_unique<FakeSource>(60);
+    source->MakeEndless();
+    source->Before([](std::size_t read) {
+        static bool sent = false;
+        if (read >= 140 && !sent) {
+            sent = true;
+            kill(getpid(), SIGINT);
+        }
+    });
+    EXPECT_EQ(Record(std::move(source)), ExitCode::kSuccess);
+    ASSERT_EQ(display_.summary.files.size(), 1u);
+    EXPECT_EQ(Frames()[0] % 8, 0u);
+}
+
+TEST_F(ReceiverTest, SnapshotsTellOfTheRecording) {
+    auto source = std::make_unique<FakeSource>(200);
+    source->Before([](std::size_t read) {
+        if (read == 250) {
+            // Longer than the display's interval.
+            std::this_thread::sleep_for(std::chrono::milliseconds(300));
+        }
+    });
+    EXPECT_EQ(Record(std::move(source)), ExitCode::kSuccess);
+    ASSERT_THAT(display_.snapshots, Not(IsEmpty()));
+    const Snapshot& last = display_.snapshots.back();
+    EXPECT_TRUE(last.recording);
+    EXPECT_EQ(last.status, (ModuleStatus{4, 0}));
+    EXPECT_EQ(last.since, (Timecode{10, 0, 0, 0, false}));
+    EXPECT_EQ(last.framesPerSecond, 25);
+    EXPECT_GT(last.freeBytes.value_or(0), 0u);
+    EXPECT_EQ(last.lost, 0u);
+}
+
+TEST_F(ReceiverTest, AModuleThatIsNotThereHasItsExitCode) {
+    options_.module = "/no/such/module.so";
+    EXPECT_EQ(Record(10), ExitCode::kModule);
+    EXPECT_EQ(display_.failureCode, ExitCode::kModule);
+    EXPECT_THAT(display_.failure, HasSubstr("/no/such/module.so"));
+}
+
+TEST_F(ReceiverTest, AModuleThatRefusesHasItsExitCode) {
+    EXPECT_EQ(RecordWith("refuse"), ExitCode::kModule);
+    EXPECT_THAT(display_.failure, HasSubstr("refuses to start"));
+}
+
+TEST_F(ReceiverTest, AModuleThatFailsEndsTheRun) {
+    EXPECT_EQ(RecordWith("fail"), ExitCode::kRecordingFailed);
+    EXPECT_THAT(display_.statuses, Contains(ModuleStatus{7, 26}));
+    EXPECT_EQ(display_.summary.exitCode, ExitCode::kRecordingFailed);
+}
+
+TEST_F(ReceiverTest, LostUnitsMakeTheRunALoss) {
+    EXPECT_EQ(RecordWith("overflow"), ExitCode::kLost);
+    EXPECT_EQ(display_.summary.lost, 1u);
+}
+
+TEST_F(ReceiverTest, AFaultOfTheStreamMakesTheRunALoss) {
+    EXPECT_EQ(RecordWith("fault"), ExitCode::kLost);
+    EXPECT_THAT(display_.statuses, Contains(ModuleStatus{6, 22}));
+}
+
+TEST_F(ReceiverTest, WhatTheSourceLostIsALoss) {
+    for (SourceCounts counts : {SourceCounts{2, 0, 0}, SourceCounts{0, 3, 0}, SourceCounts{0, 0, 1}}) {
+        auto source = std::make_unique<FakeSource>(60);
+        source->ChangeCounts() = counts;
+        EXPECT_EQ(Record(std::move(source)), ExitCode::kLost);
+        EXPECT_EQ(display_.summary.lost, counts.lostFrames + counts.damagedPackets);
+    }
+}
+
+TEST_F(ReceiverTest, GoingOfflineAtTheEndIsNoFault) {
+    setenv("FAKE_MODULE", "", 1);
+    options_.module = FAKE_MODULE;
+    EXPECT_EQ(Record(60), ExitCode::kSuccess);
+    EXPECT_THAT(display_.statuses, ElementsAre(ModuleStatus{4, 0}, ModuleStatus{3, 0}));
+    EXPECT_THAT(display_.summary.files, IsEmpty());
+}
+
+TEST_F(ReceiverTest, AnOutputThatCannotBeUsedIsFoundBeforeAnythingElse) {
+    options_.output = folder_ + "/a/b";
+    options_.module = "/no/such/module.so";
+    EXPECT_EQ(Record(10), ExitCode::kOutput);
+    EXPECT_THAT(display_.failure, HasSubstr("/a/b"));
+}
+
+TEST_F(ReceiverTest, AMissingOutputFolderIsMadeWithANotice) {
+    options_.output = folder_ + "/new/";
+    EXPECT_EQ(Record(60), ExitCode::kSuccess);
+    EXPECT_THAT(display_.notices, Contains("made the output folder " + folder_ + "/new"));
+    EXPECT_THAT(display_.closed, ElementsAre(HasSubstr(folder_ + "/new/20")));
+}
+
+TEST_F(ReceiverTest, AFolderMayBeCalledNone) {
+    std::filesystem::current_path(folder_);
+    options_.output = "none";
+    EXPECT_EQ(Record(60), ExitCode::kSuccess);
+    EXPECT_THAT(display_.closed, ElementsAre(HasSubstr("./none/20")));
+    std::filesystem::current_path("/");
+}
+
+TEST_F(ReceiverTest, ASourceThatCannotBeOpenedEndsTheRunWithItsSentence) {
+    const auto open = [](const SourceOptions&, SourceListenerInterface&,
+                         bool (*)()) -> std::unique_ptr<SourceInterface> {
+        throw ReceiverError(ExitCode::kSourceUnavailable, "no answer from 'udp://:9'.");
+    };
+    EXPECT_EQ(RunReceiver(options_, open, signals_, display_, -1), ExitCode::kSourceUnavailable);
+    EXPECT_EQ(display_.failure, "no answer from 'udp://:9'.");
+}
+
+TEST_F(ReceiverTest, AnEndDuringTheOpeningIsOrderly) {
+    const auto open = [this](const SourceOptions&, SourceListenerInterface&,
+                             bool (*stop)()) -> std::unique_ptr<SourceInterface> {
+        EXPECT_FALSE(stop());
+        kill(getpid(), SIGINT);
+        while (!stop()) {
+            std::this_thread::yield();
+        }
+        EXPECT_TRUE(signals_.QuitRequested());
+        return nullptr;
+    };
+    EXPECT_EQ(RunReceiver(options_, open, signals_, display_, -1), ExitCode::kSuccess);
+    EXPECT_EQ(display_.finished, 1);
+}
+
+TEST_F(ReceiverTest, ASourceThatTurnsUnsuitableStillClosesItsFile) {
+    auto source = std::make_unique<FakeSource>(100);
+    source->Before([](std::size_t read) {
+        if (read == 180) {
+            throw ReceiverError(ExitCode::kSourceUnsuitable,
+                                "the source came back with another picture size.");
+        }
+    });
+    EXPECT_EQ(Record(std::move(source)), ExitCode::kSourceUnsuitable);
+    EXPECT_EQ(display_.summary.files.size(), 1u);
+    EXPECT_EQ(display_.closed.size(), 1u);
+    EXPECT_EQ(display_.failure, "the source came back with another picture size.");
+    EXPECT_EQ(display_.summary.exitCode, ExitCode::kSourceUnsuitable);
+}
+
+TEST_F(ReceiverTest, ATimecodeThatTheRateDoesNotHaveIsAUsageError) {
+    options_.timecode = Timecode{10, 0, 0, 25, false};
+    EXPECT_EQ(Record(10), ExitCode::kUsage);
+    EXPECT_THAT(display_.failure, HasSubstr("--timecode 10:00:00:25"));
+    options_.timecode = Timecode{10, 0, 0, 0, true};
+    EXPECT_EQ(Record(10), ExitCode::kUsage);
+}
+
+TEST_F(ReceiverTest, ATimecodeThatDropFrameLeavesOutIsAUsageError) {
+    const auto record = [this] {
+        auto source = std::make_unique<FakeSource>(10);
+        source->ChangeDescription().frameRate = ParseFrameRate("29.97").value();
+        return Record(std::move(source));
+    };
+    options_.timecode = Timecode{10, 1, 0, 0, false};
+    EXPECT_EQ(record(), ExitCode::kUsage);
+    EXPECT_THAT(display_.failure, HasSubstr("drop-frame rule"));
+    options_.dropFrame = false;
+    EXPECT_EQ(record(), ExitCode::kSuccess);
+}
+
+TEST_F(ReceiverTest, ASettingsFileThatIsMissingIsAUsageError) {
+    options_.settings = folder_ + "/missing.ini";
+    EXPECT_EQ(Record(10), ExitCode::kUsage);
+    EXPECT_THAT(display_.failure, HasSubstr("missing.ini' cannot be read"));
+}
+
+}  // namespace
+}  // namespace receiver

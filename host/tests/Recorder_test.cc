@@ -1,0 +1,280 @@
+#include "Recorder.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <string>
+#include <vector>
+
+#include "Logger.h"
+#include "fakes/FakeSource.h"
+
+namespace receiver {
+namespace {
+
+using ::testing::ElementsAre;
+
+/// Where the record flag stands in a metadata unit: behind packet byte, label, length, identifier, tag and
+/// length.
+constexpr std::size_t kFlagAt = 1 + 16 + 1 + 20 + 4;
+constexpr std::uint64_t kOrigin = 900000;
+
+/// A module that lets go of everything at once, writes down what comes, and says about recordings what the
+/// real one says.
+class ScriptedModule final : public QxModuleInterface,
+                             public QxModuleStreamInterface,
+                             public QxModuleNotifyInterface {
+ public:
+    bool Initialize(QxModuleHostInterface* host) override {
+        host->SendTransmissionStatus({{"file_output_status", "standby"}});
+        return true;
+    }
+    bool Uninitialize() override { return true; }
+    bool Execute() override { return true; }
+    bool GetModuleInterval(unsigned int*) override { return true; }
+    bool ReservedOperationA() override { return true; }
+    bool ReservedOperationB() override { return true; }
+    bool GetStreamInterface(QxModuleStreamInterface** out) override {
+        *out = this;
+        return true;
+    }
+    bool GetNotifyInterface(QxModuleNotifyInterface** out) override {
+        *out = this;
+        return true;
+    }
+    int ReservedOperationC() override { return 0; }
+
+    void PushReserved(const std::shared_ptr<StreamData>&) override {}
+    void PushVideo(const std::shared_ptr<StreamData>& unit) override { Write("v", *unit, 3600); }
+    void PushAudio(const std::shared_ptr<StreamData>& unit) override { Write("a", *unit, 1024); }
+    void PushMeta(const std::shared_ptr<StreamData>& unit) override {
+        if (unit->payload == nullptr) {
+            Write("m", *unit, 3600);
+            return;
+        }
+        const bool flag = unit->payload[kFlagAt] == 1;
+        Write(flag ? "M" : "m", *unit, 3600);
+        metas.emplace_back(unit->payload, unit->payload + unit->size);
+        if (flag && !recording_) {
+            Say("OP: REC START. 00:00:00:00. RTPTS = 0. -> -1");
+        } else if (!flag && recording_) {
+            Logger::Put(LOG_PRIORITY_TRACE, "a.cc", "clipfileModule::Controller::OnStopStream", 1, "end.");
+            Say("OP: REMOVE STREAM. RTPTS = 0 -> 1.");
+        }
+        recording_ = flag;
+    }
+
+    std::uint32_t NotifyInputOutputConnectRequest(const QxInputOutputConnectRequest*) override { return 0; }
+    std::uint32_t NotifyModuleConnectionRequestReply(const void*) override { return 0; }
+    std::uint32_t NotifyInputOutputDisconnectionRequest(const QxInputOutputDisconnectionRequest*) override {
+        return 0;
+    }
+    std::uint32_t NotifySetPropertiesRequest(const void*) override { return 0; }
+    void NotifyOnlineStatus() override { calls.push_back("online"); }
+    void NotifyOfflineStatus() override { calls.push_back("offline"); }
+
+    /// "v3": the fourth frame; "M3" and "m3" its metadata with and without record flag; "a2" the third audio
+    /// frame; "v-" and so on a mark.
+    std::vector<std::string> calls;
+    std::vector<std::vector<unsigned char>> metas;
+
+    /// The calls but the marks.
+    std::vector<std::string> Units() const {
+        std::vector<std::string> units;
+        for (const std::string& call : calls) {
+            if (!call.ends_with('-')) {
+                units.push_back(call);
+            }
+        }
+        return units;
+    }
+
+ private:
+    static void Say(const char* text) { Logger::Put(LOG_PRIORITY_OPERATOR, nullptr, nullptr, 0, "%s", text); }
+    void Write(std::string name, const StreamData& unit, std::uint64_t duration) {
+        const std::uint64_t origin = duration == 1024 ? 480000 : kOrigin;
+        name += unit.payload == nullptr ? "-" : std::to_string((unit.rtp_timestamp - origin) / duration);
+        calls.push_back(name);
+    }
+
+    bool recording_ = false;
+};
+
+class RecorderTest : public ::testing::Test {
+ protected:
+    Recorder& Make(const Recorder::Settings& settings) {
+        recorder_.emplace(settings, session_, log_, plan_);
+        return *recorder_;
+    }
+    static Recorder::Settings Sync() {
+        Recorder::Settings settings;
+        settings.frameRate = ParseFrameRate("25").value();
+        settings.timecode = Timecode{10, 0, 0, 0, false};
+        return settings;
+    }
+    static Recorder::Settings On() {
+        Recorder::Settings settings = Sync();
+        settings.mode = OutputMode::kOn;
+        return settings;
+    }
+    void PutFrame(std::int64_t frame, bool keyFrame) {
+        recorder_->Put(MakeFrame(frame * 3600, keyFrame, static_cast<std::uint32_t>(frame)));
+    }
+    /// Audio 1.9 s ahead, so that no frame waits for it; itself it comes after the frames of a test.
+    void PutLateAudio() { recorder_->Put(MakeAudio(std::int64_t{1024} * 89)); }
+
+    ScriptedModule module_;
+    Host host_{{}};
+    ModuleSession session_{module_, host_};
+    ModuleLog log_;
+    RecordPlan plan_{{}};
+    std::optional<Recorder> recorder_;
+};
+
+TEST_F(RecorderTest, EachFrameComesBehindItsMetadataAndAudioInItsPlace) {
+    Make(Sync());
+    PutFrame(0, true);
+    PutFrame(1, false);
+    // 21.3 ms, 42.7 ms and 64 ms; the second frame is at 40 ms.
+    for (std::int64_t audio = 1; audio <= 3; ++audio) {
+        recorder_->Put(MakeAudio(audio * 1024));
+    }
+    PutFrame(2, false);
+    EXPECT_THAT(module_.Units(), ElementsAre("M0", "v0", "a1", "M1", "v1", "a2", "a3"));
+}
+
+// The flag must be carried out before the frame is pushed, and everything before it worked off before the
+// flag.
+TEST_F(RecorderTest, ABeginningIsFencedOffOnBothSides) {
+    Make(Sync());
+    PutLateAudio();
+    PutFrame(0, true);
+    EXPECT_THAT(module_.calls, ElementsAre("v-", "a-", "m-", "M0", "v-", "a-", "m-", "v0"));
+}
+
+// A stop that overtakes the first frame would cancel the recording.
+TEST_F(RecorderTest, AStopIsFencedOffFromWhatComesBefore) {
+    Make(Sync());
+    PutLateAudio();
+    PutFrame(0, true);
+    module_.calls.clear();
+    plan_.Stop();
+    PutFrame(1, false);
+    EXPECT_THAT(module_.calls, ElementsAre("v-", "a-", "m-", "m1", "v1"));
+}
+
+// The module takes a first unit without the flag for a stop, and may carry it out when the recording is open.
+TEST_F(RecorderTest, NothingIsPushedBeforeTheFirstRecording) {
+    Make(Sync());
+    recorder_->Put(MakeAudio(0));
+    PutLateAudio();
+    PutFrame(0, false);
+    PutFrame(1, true);
+    EXPECT_THAT(module_.Units(), ElementsAre("M1", "v1"));
+    EXPECT_EQ(recorder_->Since(), (Timecode{10, 0, 0, 1, false}));
+}
+
+TEST_F(RecorderTest, TheUnitOfAFrameHoldsItsTimecodeAndThePacketsSinceTheLastOne) {
+    Make(Sync());
+    PutLateAudio();
+    PutFrame(0, true);
+    recorder_->Put(MakeSourceUnit(Medium::kKlv, 1000, {0xAA}));
+    recorder_->Put(MakeSourceUnit(Medium::kKlv, 3600, {0xBB}));
+    recorder_->Put(MakeSourceUnit(Medium::kKlv, 3601, {0xCC}));
+    PutFrame(1, false);
+    PutFrame(2, false);
+    ASSERT_EQ(module_.metas.size(), 3u);
+    const auto tail = [&](std::size_t unit, std::ptrdiff_t count) {
+        return std::vector<unsigned char>(module_.metas[unit].end() - count, module_.metas[unit].end());
+    };
+    EXPECT_THAT(tail(0, 5), ElementsAre(10, 0, 0, 0, 0));
+    EXPECT_THAT(tail(1, 9), ElementsAre(10, 0, 0, 1, 0, 0x01, 0xAA, 0x01, 0xBB));
+    EXPECT_THAT(tail(2, 7), ElementsAre(10, 0, 0, 2, 0, 0x01, 0xCC));
+}
+
+TEST_F(RecorderTest, TheSourcesTimecodeGoesBeforeTheOperators) {
+    Make(Sync());
+    PutLateAudio();
+    SourceUnit frame = MakeFrame(0, true, 0);
+    frame.timecode = Timecode{1, 2, 3, 4, false};
+    recorder_->Put(frame);
+    EXPECT_EQ(recorder_->LastTimecode(), (Timecode{1, 2, 3, 4, false}));
+}
+
+TEST_F(RecorderTest, AGapEndsTheRecordingAndTheNextIdrFrameBeginsAnother) {
+    Make(Sync());
+    PutLateAudio();
+    PutFrame(0, true);
+    PutFrame(1, false);
+    PutFrame(20, false);
+    PutFrame(25, true);
+    EXPECT_THAT(module_.Units(), ElementsAre("M0", "v0", "M1", "v1", "m1", "m20", "v20", "M25", "v25"));
+    EXPECT_EQ(recorder_->LastTimecode(), (Timecode{10, 0, 1, 0, false}));
+}
+
+TEST_F(RecorderTest, HalfASecondIsNoGap) {
+    Make(Sync());
+    PutLateAudio();
+    PutFrame(0, true);
+    PutFrame(12, false);
+    EXPECT_THAT(module_.Units(), ElementsAre("M0", "v0", "M12", "v12"));
+}
+
+TEST_F(RecorderTest, TheLengthEndsTheRunWithTheFirstFrameBeyondIt) {
+    Recorder::Settings settings = Sync();
+    settings.length = 2 * 3600;
+    Make(settings);
+    PutLateAudio();
+    PutFrame(0, true);
+    PutFrame(1, false);
+    EXPECT_FALSE(recorder_->Finishing());
+    EXPECT_FALSE(recorder_->Done());
+    PutFrame(2, true);
+    EXPECT_THAT(module_.Units(), ElementsAre("M0", "v0", "M1", "v1", "m2", "v2"));
+    EXPECT_TRUE(recorder_->Finishing());
+    EXPECT_TRUE(recorder_->Done());
+    EXPECT_EQ(recorder_->Elapsed(), 2 * 3600);
+}
+
+TEST_F(RecorderTest, AFinishTakesEffectWithTheNextFrame) {
+    Make(Sync());
+    PutLateAudio();
+    PutFrame(0, true);
+    recorder_->Finish();
+    EXPECT_FALSE(recorder_->Done());
+    PutFrame(1, false);
+    EXPECT_TRUE(recorder_->Done());
+}
+
+TEST_F(RecorderTest, InModeOnNothingComesBeforeTheHostIsOnlineWithTheFirstIdrFrame) {
+    Make(On());
+    recorder_->Put(MakeAudio(0));
+    PutFrame(0, false);
+    recorder_->Put(MakeSourceUnit(Medium::kKlv, 0, {0xAA}));
+    recorder_->Put(MakeAudio(1024));
+    PutFrame(1, true);
+    recorder_->Put(MakeAudio(2048));
+    EXPECT_THAT(module_.Units(), ElementsAre("online", "M1", "v1"));
+    recorder_->Put(MakeAudio(3072));
+    PutFrame(2, false);
+    EXPECT_THAT(module_.Units(), ElementsAre("online", "M1", "v1", "a2", "a3"));
+}
+
+TEST_F(RecorderTest, InModeOnTheRunEndsWithAWholeChunk) {
+    Make(On());
+    PutLateAudio();
+    PutFrame(0, true);
+    PutFrame(1, false);
+    recorder_->Finish();
+    std::int64_t frame = 2;
+    for (; !recorder_->Done(); ++frame) {
+        ASSERT_LT(frame, 100);
+        PutFrame(frame, false);
+    }
+    EXPECT_EQ(frame, 8);
+    PutFrame(frame, false);
+    EXPECT_EQ(module_.Units().back(), "v7");
+}
+
+}  // namespace
+}  // namespace receiver
