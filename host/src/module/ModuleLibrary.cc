@@ -21,7 +21,9 @@ ReceiverError Unusable(const std::string& file, const std::string& reason) {
 }  // namespace
 
 ModuleLibrary::ModuleLibrary(const std::string& file) {
-    library_ = dlopen(file.c_str(), RTLD_NOW | RTLD_LOCAL);
+    // In memory to the end of the process: a module leaves globals behind in libraries of its own, and a
+    // writer that hangs on a disk may outlive every stop.
+    library_ = dlopen(file.c_str(), RTLD_NOW | RTLD_LOCAL | RTLD_NODELETE);
     if (library_ == nullptr) {
         throw Unusable(file, dlerror());
     }

@@ -6,7 +6,7 @@
 
 namespace receiver {
 
-/// The module's shared library, in memory for as long as this object lives.
+/// The module's shared library, in memory from now to the end of the process.
 class ModuleLibrary {
  public:
     /// Loads `file` and fetches the module object. Throws `ReceiverError` with `kModule` when there is no
