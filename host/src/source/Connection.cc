@@ -1,6 +1,8 @@
 #include "source/Connection.h"
 
 #include <algorithm>
+#include <cmath>
+#include <cstdlib>
 #include <utility>
 
 #include "source/Summary.h"
@@ -20,6 +22,14 @@ constexpr std::size_t kLongestWait = 4000;
 constexpr std::uint64_t kWithoutStart = 300;
 /// How far behind the expected time audio may stand, and reordered pictures.
 constexpr std::int64_t kBack = 90000;
+
+/// The length of the audio frame in a packet of `size` bytes, in ticks.
+std::int64_t AudioDuration(const AVStream& stream, int size) {
+    const int samples = av_get_audio_frame_duration2(stream.codecpar, size);
+    return samples > 0 && stream.codecpar->sample_rate > 0
+               ? av_rescale(samples, kTicks.den, stream.codecpar->sample_rate)
+               : av_rescale(kAudioFrame, kTicks.den, kAudioRate);
+}
 
 }  // namespace
 
@@ -68,6 +78,36 @@ void Connection::LookAhead() {
             input_->Alive();
         }
         ahead_.push_back(std::move(packet));
+    }
+    if (!input_->Rtp()) {
+        return;
+    }
+    for (const auto& packet : ahead_) {
+        // The libraries infer these, wrongly.
+        packet->dts = AV_NOPTS_VALUE;
+    }
+    const AVStream& video = *video_.stream;
+    if (const double spacing = PictureSpacing(video, ahead_); spacing > 0) {
+        MendStamps(video, std::llround(spacing / av_q2d(video.time_base)));
+    }
+    if (audio_) {
+        const AVStream& audio = *audio_->stream;
+        MendStamps(audio, av_rescale_q(AudioDuration(audio, 0), kTicks, audio.time_base));
+    }
+}
+
+void Connection::MendStamps(const AVStream& stream, std::int64_t step) {
+    const AVPacket* next = nullptr;
+    for (auto packet = ahead_.rbegin(); packet != ahead_.rend(); ++packet) {
+        if ((*packet)->stream_index != stream.index ||
+            (next == nullptr && (*packet)->pts == AV_NOPTS_VALUE)) {
+            continue;
+        }
+        if (next != nullptr &&
+            ((*packet)->pts == AV_NOPTS_VALUE || std::abs(next->pts - (*packet)->pts - step) > step / 2)) {
+            (*packet)->pts = next->pts - step;
+        }
+        next = packet->get();
     }
 }
 
@@ -307,7 +347,8 @@ void Connection::HandleVideo(AVPacket& packet) {
 }
 
 void Connection::HandleAudio(AVPacket& packet) {
-    const std::int64_t usual = av_rescale(kAudioFrame, 90000, kAudioRate);
+    // Of several frames behind one stamp each further one begins where the one before ends.
+    const std::int64_t usual = AudioDuration(*audio_->stream, packet.size);
     const auto stamp = StampOf(*audio_, packet);
     packet.pts = stamp ? TimeOf(*audio_, *stamp, usual, kBack) : audio_->expected;
     packet.dts = AV_NOPTS_VALUE;

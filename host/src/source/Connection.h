@@ -63,6 +63,9 @@ class Connection {
 
     void Choose();
     void LookAhead();
+    /// RTP's clocks are brought together when the first reports of the sender come, and libraries lose or
+    /// infer the stamps of the first pictures: brings the stamps before a leap in line with those behind it.
+    void MendStamps(const AVStream& stream, std::int64_t step);
     void DecideVideo(const SourceOptions& options, const SourceDescription* before);
     void DecideAudio();
     void ReadTimecodeTag();

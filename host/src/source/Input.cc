@@ -1,6 +1,8 @@
 #include "source/Input.h"
 
+#include <array>
 #include <cerrno>
+#include <cstdio>
 #include <utility>
 
 #include "common/ReceiverError.h"
@@ -37,10 +39,17 @@ void SetOptions(const std::string& url, libav::Options& options) {
     }
 }
 
+/// "5 s", "0.2 s"
+std::string Seconds(double seconds) {
+    std::array<char, 32> text{};
+    std::snprintf(text.data(), text.size(), "%.6g s", seconds);
+    return text.data();
+}
+
 /// Adds what the libraries said, which often tells more than their error number.
 std::string Reason(int result) {
     const std::string text = libav::ErrorText(result);
-    const std::string said = libav::LastError();
+    const std::string said = ShownUrl(libav::LastError());
     return said.empty() ? text : text + " (" + said + ")";
 }
 
@@ -50,16 +59,16 @@ Input::Input(const std::string& url, double timeout, std::shared_ptr<Interrupt> 
     : url_(url), timeout_(timeout), interrupt_(std::move(interrupt)), stop_(stop) {
     Open();
     stop_ = nullptr;
-    const std::string scheme = SchemeOf(url_);
     const bool seekable = format_->pb != nullptr && (format_->pb->seekable & AVIO_SEEKABLE_NORMAL) != 0;
     const std::string format = format_->iformat->name;
     recorded_ = (seekable && format != "sdp") ||
                 (format == "hls" && format_->duration != AV_NOPTS_VALUE && format_->duration > 0);
+    rtp_ = format == "sdp" || format == "rtsp" || format == "rtp";
     Alive();
 }
 
 int Input::OnWait(void* input) {
-    const Input& self = *static_cast<const Input*>(input);
+    Input& self = *static_cast<Input*>(input);
     return self.interrupt_->Stopped() || self.Expired() || (self.stop_ != nullptr && self.stop_()) ? 1 : 0;
 }
 
@@ -71,8 +80,11 @@ void Input::Expect(double seconds) {
                     .count();
 }
 
-bool Input::Expired() const {
-    return std::chrono::steady_clock::now().time_since_epoch().count() > deadline_;
+bool Input::Expired() {
+    if (std::chrono::steady_clock::now().time_since_epoch().count() > deadline_) {
+        timedOut_ = true;
+    }
+    return timedOut_;
 }
 
 void Input::Open() {
@@ -105,16 +117,16 @@ void Input::Open() {
     }
 }
 
-void Input::FailOpening(int result) const {
+void Input::FailOpening(int result) {
     if (interrupt_->Stopped() || (stop_ != nullptr && stop_())) {
         throw Stopped();
     }
     const std::string shown = "'" + ShownUrl(url_) + "'";
-    const std::string said = libav::LastError();
+    const std::string said = ShownUrl(libav::LastError());
     std::string sentence;
     if (Expired() || result == AVERROR(ETIMEDOUT)) {
-        sentence = "nothing came from " + shown + " within " + std::to_string(static_cast<int>(timeout_)) +
-                   " s: check that it sends, and that no firewall stands between";
+        sentence = "nothing came from " + shown + " within " + Seconds(timeout_) +
+                   ": check that it sends, and that no firewall stands between";
     } else if (result == AVERROR(ENOENT)) {
         sentence = "there is no file " + shown;
     } else if (result == AVERROR(EACCES)) {
@@ -138,10 +150,13 @@ void Input::FailOpening(int result) const {
         sentence =
             shown +
             " begins with a scheme that is not known: udp, srt, rtsp, http and https are, and .sdp files";
-    } else if (said.find("resolve") != std::string::npos) {
+    } else if (said.find("resolve") != std::string::npos || said.find("getaddrinfo") != std::string::npos) {
         sentence = "there is no host with the name in " + shown + ": " + said;
-    } else if (SchemeOf(url_) == "srt" && url_.find("passphrase=") != std::string::npos) {
-        sentence = shown + " does not accept the connection; the passphrase may be wrong: " + Reason(result);
+    } else if (SchemeOf(url_) == "srt" && result == AVERROR(EIO)) {
+        // All that the library tells of a call that is not taken.
+        sentence = shown +
+                   " does not accept the call: nothing listens there, or the passphrase is not the one that "
+                   "it expects";
     } else {
         sentence = shown + " cannot be opened: " + Reason(result);
     }
@@ -157,11 +172,12 @@ bool Input::Read(AVPacket& packet) {
     if (result >= 0) {
         return true;
     }
-    if (result == AVERROR_EOF) {
-        return false;
-    }
     if (Expired()) {
-        throw SourceLost("no video came for " + std::to_string(static_cast<int>(timeout_)) + " s");
+        throw SourceLost("no video came for " + Seconds(timeout_));
+    }
+    // A connection that the other side closes may look like this.
+    if (result == AVERROR_EOF || (result == AVERROR(EIO) && !recorded_)) {
+        return false;
     }
     throw SourceLost(Reason(result));
 }

@@ -32,21 +32,24 @@ class Input {
     Input(const std::string& url, double timeout, std::shared_ptr<Interrupt> interrupt, bool (*stop)());
 
     AVFormatContext& Format() { return *format_; }
-    /// The next packet. False at the end. Throws `SourceLost`, also when the time without `Alive` is over,
-    /// and `Stopped`.
+    /// The next packet. False at the end, also when the other side closed the connection. Throws
+    /// `SourceLost`, also when the time without `Alive` is over, and `Stopped`.
     bool Read(AVPacket& packet);
     /// What the source is opened for has come; starts the time-out anew.
     void Alive() { Expect(timeout_); }
     /// A file, here or on a server, that is paced when it is read; else the source sets the pace.
     bool Recorded() const { return recorded_; }
+    /// Packets come by RTP, which stamps pictures with the time when they are shown and nothing else.
+    bool Rtp() const { return rtp_; }
 
  private:
+    /// Asked by the libraries while they wait. Not 0 ends the wait.
     static int OnWait(void* input);
     void Expect(double seconds);
-    bool Expired() const;
+    bool Expired();
     void Open();
-    /// What `result` of opening or of reading means.
-    [[noreturn]] void FailOpening(int result) const;
+    /// Throws what `result` of opening means.
+    [[noreturn]] void FailOpening(int result);
 
     const std::string url_;
     const double timeout_;
@@ -55,7 +58,10 @@ class Input {
     bool (*stop_)();
     /// When the present wait is over, on the steady clock. The libraries may ask on threads of their own.
     std::atomic<std::chrono::steady_clock::rep> deadline_{0};
+    /// A wait was over. The libraries may give out what they still hold before they tell.
+    std::atomic<bool> timedOut_{false};
     bool recorded_ = false;
+    bool rtp_ = false;
     libav::Owner<AVFormatContext> format_;
 };
 

@@ -57,7 +57,7 @@ bool InputProducer::Produce(Batch& batch) {
                 lastPicture_ = Clock::now();
             }
             if (!more && !recorded_) {
-                Lose("the sender has ended");
+                Lose("the connection has ended");
                 more = options_.reconnect;
             }
         }

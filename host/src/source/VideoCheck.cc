@@ -47,8 +47,23 @@ bool Reordered(const AVStream& stream, const std::vector<Stamps>& stamps) {
     return delay && *delay > 0 && stream.codecpar->video_delay > 0;
 }
 
-/// The middle one of the distances between pictures in seconds, 0 when there are none.
-double Spacing(const AVStream& stream, const std::vector<Stamps>& stamps) {
+/// The mean distance between pictures in seconds. There must be two.
+double MeanSpacing(const AVStream& stream, const std::vector<Stamps>& stamps) {
+    const auto [first, last] = std::minmax_element(
+        stamps.begin(), stamps.end(), [](const Stamps& a, const Stamps& b) { return a.shown < b.shown; });
+    return static_cast<double>(last->shown - first->shown) * av_q2d(stream.time_base) /
+           static_cast<double>(stamps.size() - 1);
+}
+
+/// Stamps in milliseconds move a distance by up to one.
+bool Fits(AVRational rate, double spacing) {
+    return spacing <= 0 || std::abs(av_q2d(av_inv_q(rate)) - spacing) < 0.0015;
+}
+
+}  // namespace
+
+double PictureSpacing(const AVStream& stream, const std::deque<libav::Owner<AVPacket>>& packets) {
+    const std::vector<Stamps> stamps = StampsOf(stream, packets);
     std::vector<std::int64_t> shown;
     std::transform(stamps.begin(), stamps.end(), std::back_inserter(shown),
                    [](const Stamps& stamp) { return stamp.shown; });
@@ -65,13 +80,6 @@ double Spacing(const AVStream& stream, const std::vector<Stamps>& stamps) {
     return static_cast<double>(steps[steps.size() / 2]) * av_q2d(stream.time_base);
 }
 
-/// Stamps in milliseconds move a distance by up to one.
-bool Fits(AVRational rate, double spacing) {
-    return spacing <= 0 || std::abs(av_q2d(av_inv_q(rate)) - spacing) < 0.0015;
-}
-
-}  // namespace
-
 VideoFindings CheckVideo(AVFormatContext& format, AVStream& stream,
                          const std::deque<libav::Owner<AVPacket>>& packets, const FrameRate* expected) {
     VideoFindings findings;
@@ -87,7 +95,7 @@ VideoFindings CheckVideo(AVFormatContext& format, AVStream& stream,
         }
         pictureRate = parser.FrameRate();
     }
-    const double spacing = Spacing(stream, stamps) * (findings.fields ? 2 : 1);
+    const double spacing = PictureSpacing(stream, packets) * (findings.fields ? 2 : 1);
     if (expected != nullptr &&
         Fits({static_cast<int>(expected->numerator), static_cast<int>(expected->denominator)}, spacing)) {
         findings.rate = *expected;
@@ -106,7 +114,12 @@ VideoFindings CheckVideo(AVFormatContext& format, AVStream& stream,
         }
     }
     if (findings.toldRate.num == 0 && spacing > 0) {
-        findings.toldRate = av_d2q(1 / spacing, 100000);
+        // Nobody tells; what the pictures show is good for the nearest rate only.
+        const double mean = MeanSpacing(stream, stamps) * (findings.fields ? 2 : 1);
+        findings.toldRate = av_d2q(1 / mean, 100000);
+        if (!findings.rate) {
+            findings.rate = NearestFrameRate(findings.toldRate.num, findings.toldRate.den);
+        }
     }
     return findings;
 }

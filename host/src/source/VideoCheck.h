@@ -26,6 +26,9 @@ struct VideoFindings {
 VideoFindings CheckVideo(AVFormatContext& format, AVStream& stream,
                          const std::deque<libav::Owner<AVPacket>>& packets, const FrameRate* expected);
 
+/// The middle one of the distances between pictures in seconds, 0 when there are none.
+double PictureSpacing(const AVStream& stream, const std::deque<libav::Owner<AVPacket>>& packets);
+
 /// Why such video cannot be recorded untouched, as the beginning of a sentence: "the video is hevc, not
 /// H.264". Empty when it can.
 std::string WhyNotPassed(const AVCodecParameters& parameters, const VideoFindings& findings);

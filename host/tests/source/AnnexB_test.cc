@@ -1,0 +1,101 @@
+#include "source/AnnexB.h"
+
+#include <gtest/gtest.h>
+
+namespace receiver {
+namespace {
+
+using Bytes = std::vector<unsigned char>;
+
+std::string Text(const Bytes& bytes) {
+    return {reinterpret_cast<const char*>(bytes.data()), bytes.size()};
+}
+
+// NAL units, each behind its start code. Of the parameter sets only the numbers matter: the first bit 1 is
+// number 0, the bits 010 are number 1.
+const Bytes kDelimiter{0, 0, 0, 1, 0x09, 0x10};
+const Bytes kSequence{0, 0, 0, 1, 0x67, 66, 0, 30, 0x80, 0x11};
+const Bytes kOtherSequence{0, 0, 0, 1, 0x67, 66, 0, 31, 0x80, 0x22};
+const Bytes kPicture{0, 0, 0, 1, 0x68, 0x80, 0x33};
+const Bytes kSecondPicture{0, 0, 0, 1, 0x68, 0x40, 0x44};
+const Bytes kSei{0, 0, 1, 0x06, 0x05, 0x01, 0xFF, 0x80};
+const Bytes kIdr{0, 0, 1, 0x65, 0x88, 0x84};
+const Bytes kSlice{0, 0, 1, 0x41, 0x9A, 0x24};
+
+Bytes operator+(Bytes a, const Bytes& b) {
+    a.insert(a.end(), b.begin(), b.end());
+    return a;
+}
+
+std::optional<std::string> Completed(const Bytes& known, const Bytes& unit) {
+    ParameterSets sets;
+    sets.Learn(NalUnits(known));
+    return sets.Complete(unit, NalUnits(unit));
+}
+
+TEST(NalUnits, AreFoundBehindStartCodesOfThreeAndFourBytes) {
+    const Bytes stream = kDelimiter + kSei + kIdr;
+    const auto units = NalUnits(stream);
+    ASSERT_EQ(units.size(), 3u);
+    EXPECT_EQ(units[0].type, 9u);
+    EXPECT_EQ(units[0].begin, 0u);
+    EXPECT_EQ(units[0].end, 6u);
+    EXPECT_EQ(Bytes(units[0].bytes.begin(), units[0].bytes.end()), (Bytes{0x09, 0x10}));
+    EXPECT_EQ(units[1].type, 6u);
+    EXPECT_EQ(units[1].begin, 6u);
+    EXPECT_EQ(units[2].type, 5u);
+    EXPECT_EQ(units[2].end, stream.size());
+}
+
+TEST(NalUnits, ZeroBytesBehindAUnitDoNotBelongToIt) {
+    const Bytes stream = kPicture + Bytes{0, 0, 0} + kIdr;
+    const auto units = NalUnits(stream);
+    ASSERT_EQ(units.size(), 2u);
+    EXPECT_EQ(Bytes(units[0].bytes.begin(), units[0].bytes.end()), (Bytes{0x68, 0x80, 0x33}));
+    EXPECT_EQ(units[0].end, kPicture.size());
+}
+
+TEST(NalUnits, NothingIsFoundInBytesWithoutStartCode) {
+    EXPECT_TRUE(NalUnits(Bytes{}).empty());
+    EXPECT_TRUE(NalUnits(Bytes{0, 0, 1}).empty());
+    EXPECT_TRUE(NalUnits(Bytes{1, 2, 3, 4}).empty());
+}
+
+TEST(ParameterSets, AnIdrFrameThatHasBothStaysAsItIs) {
+    EXPECT_EQ(Completed(kSequence + kPicture, kDelimiter + kSequence + kPicture + kIdr), std::nullopt);
+}
+
+TEST(ParameterSets, OtherFramesStayAsTheyAre) {
+    EXPECT_EQ(Completed(kSequence + kPicture, kDelimiter + kSlice), std::nullopt);
+}
+
+TEST(ParameterSets, BothGoBehindTheDelimiterAndBeforeEverythingElse) {
+    EXPECT_EQ(Completed(kSequence + kPicture, kDelimiter + kSei + kIdr),
+              Text(kDelimiter + kSequence + kPicture + kSei + kIdr));
+}
+
+TEST(ParameterSets, WithoutADelimiterBothComeFirst) {
+    EXPECT_EQ(Completed(kSequence + kPicture, kSei + kIdr), Text(kSequence + kPicture + kSei + kIdr));
+}
+
+TEST(ParameterSets, OnlyTheMissingKindIsAdded) {
+    EXPECT_EQ(Completed(kSequence + kPicture, kSequence + kIdr), Text(kSequence + kPicture + kIdr));
+    EXPECT_EQ(Completed(kSequence + kPicture, kDelimiter + kPicture + kIdr),
+              Text(kDelimiter + kSequence + kPicture + kIdr));
+}
+
+TEST(ParameterSets, EveryPictureParameterSetIsAdded) {
+    EXPECT_EQ(Completed(kSequence + kSecondPicture + kPicture, kIdr),
+              Text(kSequence + kPicture + kSecondPicture + kIdr));
+}
+
+TEST(ParameterSets, TheLastOneOfANumberCounts) {
+    EXPECT_EQ(Completed(kSequence + kPicture + kOtherSequence, kIdr), Text(kOtherSequence + kPicture + kIdr));
+}
+
+TEST(ParameterSets, NothingIsAddedWhereNothingIsKnown) {
+    EXPECT_EQ(Completed({}, kIdr), std::nullopt);
+}
+
+}  // namespace
+}  // namespace receiver
