@@ -160,6 +160,18 @@ const Place kPlaces[] = {
      },
      {"create 1 normal", "1 Initialize", "1 Uninitialize", "1 gone", "create 2 normal", "2 Initialize",
       "2 Open", "2 Uninitialize", "2 gone"}},
+    {"SpaceForAChunk",
+     [](FakePlatform& platform, FakeMuxers&, std::function<bool()> hang) {
+         platform.Set([&](FakePlatform::Hooks& hooks) {
+             const auto asked = std::make_shared<std::atomic<int>>(0);
+             hooks.availableSpace = [hang, asked](const std::string&, std::uint64_t& bytes) {
+                 bytes = 1000 * kMinFreeSpace;
+                 return ++*asked == 1 || hang() ? 0 : EIO;
+             };
+         });
+     },
+     {"create 1 normal", "1 Initialize", "1 Uninitialize", "1 gone", "create 2 normal", "2 Initialize",
+      "2 Open", "2 Uninitialize", "2 gone"}},
     {"Write",
      [](FakePlatform&, FakeMuxers& muxers, std::function<bool()> hang) {
          muxers.SetHooks(
@@ -167,6 +179,12 @@ const Place kPlaces[] = {
      },
      {"create 1 normal", "1 Initialize", "1 Uninitialize", "1 gone", "create 2 normal", "2 Initialize",
       "2 Open", "2 Write 0", "2 Uninitialize", "2 gone"}},
+    {"CloseAtARotation",
+     [](FakePlatform&, FakeMuxers& muxers, std::function<bool()> hang) {
+         muxers.SetHooks([&](FakeMuxers::Hooks& hooks) { hooks.close = hang; });
+     },
+     {"create 1 normal", "1 Initialize", "1 Uninitialize", "1 gone", "create 2 normal", "2 Initialize",
+      "2 Open", "2 Write 0", "2 WriteTmcd", "2 Close", "2 Uninitialize", "2 gone"}},
     {"Close",
      [](FakePlatform&, FakeMuxers& muxers, std::function<bool()> hang) {
          muxers.SetHooks([&](FakeMuxers::Hooks& hooks) { hooks.close = hang; });
@@ -215,7 +233,10 @@ TEST_P(FileOutputHangPlaceTest, AThreadThatWasGivenUpReachesNobodyHoweverLateItR
     ASSERT_TRUE(output->Initialize(ownController.get(), ownBuffer.get(), "normal"));
     output->Start(settings);
     Push(0, true);
-    if (place.name != std::string("Close")) {
+    if (place.name == std::string("CloseAtARotation")) {
+        Push(1, true);
+        gate->reached.get_future().wait();
+    } else if (place.name != std::string("Close")) {
         gate->reached.get_future().wait();
         Push(1, true);
     }
