@@ -1,6 +1,5 @@
 #pragma once
 
-#include <sched.h>
 #include <sys/mount.h>
 
 #include <cstdint>
@@ -9,6 +8,7 @@
 #include <string>
 
 #include "support/FakePlatform.h"
+#include "support/PrivateMounts.h"
 #include "support/TempDir.h"
 
 /// A file system of a given size: a tmpfs of its own. Where the test may not mount one, it is a directory
@@ -19,9 +19,7 @@ class SmallFileSystem {
     SmallFileSystem(const TempDir& dir, std::uint64_t bytes, FakePlatform& platform)
         : path_(dir.Path() / "small"), modulePath_(dir.ModulePath() + "\\small"), bytes_(bytes) {
         std::filesystem::create_directory(path_);
-        // In a mount namespace of this thread and those that it starts, so that nothing is left behind.
-        mounted_ = unshare(CLONE_NEWNS) == 0 &&
-                   mount("none", "/", nullptr, MS_REC | MS_PRIVATE, nullptr) == 0 &&
+        mounted_ = UsePrivateMounts() &&
                    mount("tmpfs", path_.c_str(), "tmpfs", 0, ("size=" + std::to_string(bytes)).c_str()) == 0;
         if (!mounted_) {
             std::cout << "no file system can be mounted here; its free space is made up" << std::endl;
