@@ -123,6 +123,16 @@ TEST_F(Mp4FragmentMuxerTest, TheFirstMoovTellsTheLengthUpToThereAndTheLastOneThe
     EXPECT_EQ(last.size, first.size);
 }
 
+TEST_F(Mp4FragmentMuxerTest, TheFirstMoovKnowsTheSizeOfTheTimecodeSampleThatComesLast) {
+    // The fragment of the timecode sample is on disk before `moov` is written again, and leaves this to it.
+    open();
+    write(kPlainChunk, 32);
+    EXPECT_EQ(Field(file(), "moov/mvex/trex:3", 4, 4), 3U);
+    EXPECT_EQ(Field(file(), "moov/mvex/trex:3", 16, 4), 4U);
+    close();
+    EXPECT_EQ(Field(file(), "moov/mvex/trex:3", 16, 4), 4U);
+}
+
 TEST_F(Mp4FragmentMuxerTest, EveryFurther32ChunksAreAFragmentNumberedFrom1) {
     open();
     write(kPlainChunk, 100);

@@ -13,8 +13,6 @@ namespace clipfileModule {
 
 namespace {
 
-constexpr std::uint32_t kTimecodeSize = 4;
-
 std::uint32_t reverseBytes(std::uint32_t value) {
     return value << 24 | (value & 0xFF00U) << 8 | (value >> 8 & 0xFF00U) | value >> 24;
 }

@@ -1,10 +1,12 @@
 // What stands in a file: its profile, its tracks, edits and times.
 
+#include <cstddef>
 #include <iterator>
 #include <limits>
 
 #include "common/Log.h"
 #include "mp4/FourCc.h"
+#include "mp4/FrameNumber.h"
 #include "mp4/Mp4File.h"
 #include "mp4/MuxerRoutine.h"
 
@@ -176,7 +178,12 @@ MbxStatus Mp4File::createTimcdTrack() {
 
     std::uint32_t trackId = 0;
     MUXER_STEP(routine, MbxGetNextTrackId(session, &trackId));
-    const MbxTrackParams params = trackParams(trackId, m_info.video_track_timescale);
+    MbxTrackParams params = trackParams(trackId, m_info.video_track_timescale);
+    // The one sample comes when the file is closed, and its fragment leaves the size to `trex`. A file that
+    // is cut off before its `moov` is written again has to tell it too: readers refuse a whole file for a
+    // sample of no size.
+    static constexpr std::size_t kSize = 2;
+    params.fragmentDefaults[kSize] = kTimecodeSize;
     MUXER_STEP(routine, MbxAddTimecodeTrack(session, &params, &track));
 
     MbxTimecodeEntryParams timecode = {};
