@@ -16,16 +16,22 @@ if(CLIPFILE_TEST_PCH)
 endif()
 
 # clipfile_add_test(NAME SOURCES x_test.cc ... [LIBRARIES ...] [TIMEOUT seconds] [ENVIRONMENT A=b ...] [SERIAL]
-#                   [FILTER pattern])
+#                   [FILTER pattern] [UNSANITIZED])
 #
 # Registers the sources, builds the program NAME from them and enters each of its cases with ctest. A *_test.cc
 # that no call names fails the configure step (clipfile_check_tests_registered). SERIAL is for measurements of a
 # whole process (memory, open files); everything else runs in parallel. Of a FILTER, in the form of --gtest_filter, only
-# the cases that it matches are entered.
+# the cases that it matches are entered. UNSANITIZED leaves the program out of builds with sanitizers: what it watches
+# is another process, or memory that a sanitizer changes.
 function(clipfile_add_test name)
-    cmake_parse_arguments(ARG "SERIAL" "TIMEOUT;FILTER" "SOURCES;LIBRARIES;ENVIRONMENT" ${ARGN})
+    cmake_parse_arguments(ARG "SERIAL;UNSANITIZED" "TIMEOUT;FILTER" "SOURCES;LIBRARIES;ENVIRONMENT" ${ARGN})
     if(ARG_UNPARSED_ARGUMENTS OR NOT ARG_SOURCES)
         message(FATAL_ERROR "clipfile_add_test(${name}): SOURCES are missing or '${ARG_UNPARSED_ARGUMENTS}' is not understood.")
+    endif()
+    list(TRANSFORM ARG_SOURCES PREPEND "${CMAKE_CURRENT_SOURCE_DIR}/" OUTPUT_VARIABLE paths)
+    set_property(GLOBAL APPEND PROPERTY CLIPFILE_REGISTERED_TESTS ${paths})
+    if(ARG_UNSANITIZED AND CLIPFILE_SANITIZE)
+        return()
     endif()
     if(NOT ARG_TIMEOUT)
         set(ARG_TIMEOUT 60)
@@ -55,9 +61,6 @@ function(clipfile_add_test name)
         set(filter TEST_FILTER "${ARG_FILTER}")
     endif()
     gtest_discover_tests(${name} ${filter} TEST_PREFIX "${name}." DISCOVERY_TIMEOUT 120 PROPERTIES ${properties})
-
-    list(TRANSFORM ARG_SOURCES PREPEND "${CMAKE_CURRENT_SOURCE_DIR}/")
-    set_property(GLOBAL APPEND PROPERTY CLIPFILE_REGISTERED_TESTS ${ARG_SOURCES})
 endfunction()
 
 function(clipfile_check_tests_registered)

@@ -9,7 +9,6 @@
 #include <memory>
 #include <ostream>
 #include <string>
-#include <tuple>
 
 #include "LogCapture.h"
 #include "Logger.h"
@@ -35,17 +34,24 @@ using ::testing::Not;
 using ::testing::Pair;
 using ::testing::StartsWith;
 
-/// How the write that hung ends at last, and what it wrote to.
-using Late = std::tuple<const char*, int>;
+struct Hang {
+    const char* fileType;
+    /// How the write that hung ends at last; 0 for success.
+    int error;
+};
 
-class ForcedEnd : public ::testing::TestWithParam<Late> {
+void PrintTo(const Hang& hang, std::ostream* out) {
+    *out << hang.fileType << ", error " << hang.error;
+}
+
+class ForcedEnd : public ::testing::TestWithParam<Hang> {
  protected:
     static constexpr const char* kName = "09_59_50_00.MP4";
 
     /// A host that records from the start, as long as it is online.
     static std::unique_ptr<FakeHost> makeHost(const std::filesystem::path& output) {
         auto host = std::make_unique<FakeHost>();
-        host->texts = {{"-outputPath", output.string()}, {"-fileType", std::get<0>(GetParam())}};
+        host->texts = {{"-outputPath", output.string()}, {"-fileType", GetParam().fileType}};
         host->numbers["-encodedFPS"] = 25000;
         return host;
     }
@@ -82,7 +88,7 @@ TEST_P(ForcedEnd, TheHostEndsInTimeAndUnloadsAndNothingIsTouchedWhenTheDiskAnswe
         for (; n < 300; ++n) {
             pushFrame(push, n);
         }
-        ASSERT_TRUE(waitForPrefix(log_, "OP: FILE CREATE."));
+        ASSERT_TRUE(waitForPrefix(log_, "ST: out_filename = "));
         disk_.Hang();
         // A fragment is 256 pictures, so either kind of file comes to write.
         for (; !disk_.IsHanging() && n < 600; ++n) {
@@ -108,9 +114,9 @@ TEST_P(ForcedEnd, TheHostEndsInTimeAndUnloadsAndNothingIsTouchedWhenTheDiskAnswe
     host.reset();
     library.reset();
     log_.Clear();
-    disk_.Answer(std::get<1>(GetParam()));
+    disk_.Answer(GetParam().error);
     EXPECT_TRUE(waitUntil([&] { return threadCount() == threads; }));
-    if (std::get<1>(GetParam()) == 0) {
+    if (GetParam().error == 0) {
         EXPECT_THAT(log_.Texts(), IsEmpty());
     } else {
         // What the muxer finds goes to the log, and nowhere else.
@@ -122,7 +128,7 @@ TEST_P(ForcedEnd, TheHostEndsInTimeAndUnloadsAndNothingIsTouchedWhenTheDiskAnswe
     EXPECT_EQ(std::string(left.begin() + 4, left.begin() + 8), "ftyp");
     const std::string text(left.begin(), left.end());
     EXPECT_EQ(text.find("mfra"), std::string::npos);
-    if (std::get<0>(GetParam()) == std::string("normal")) {
+    if (GetParam().fileType == std::string("normal")) {
         EXPECT_EQ(text.find("moov"), std::string::npos);
         for (std::uint64_t n = 0; n < 8; ++n) {
             EXPECT_NE(text.find(stream_units::Mark('V', n)), std::string::npos) << n;
@@ -141,7 +147,7 @@ TEST_P(ForcedEnd, TheHostEndsInTimeAndUnloadsAndNothingIsTouchedWhenTheDiskAnswe
         for (std::uint64_t n = 0; n < 100; ++n) {
             pushFrame(push, n);
         }
-        ASSERT_TRUE(waitForPrefix(log_, "OP: FILE CREATE."));
+        ASSERT_TRUE(waitForPrefix(log_, "ST: out_filename = "));
         EXPECT_TRUE(again.Module().Uninitialize());
     }
     EXPECT_THAT(next->Statuses(), Not(Contains(Pair(7, ::testing::_))));
@@ -154,11 +160,11 @@ TEST_P(ForcedEnd, TheHostEndsInTimeAndUnloadsAndNothingIsTouchedWhenTheDiskAnswe
 }
 
 INSTANTIATE_TEST_SUITE_P(Files, ForcedEnd,
-                         ::testing::Combine(::testing::Values("normal", "fragment"),
-                                            ::testing::Values(0, EIO)),
+                         ::testing::Values(Hang{"normal", 0}, Hang{"normal", EIO}, Hang{"fragment", 0},
+                                           Hang{"fragment", EIO}),
                          [](const auto& tested) {
-                             return std::string(std::get<0>(tested.param)) +
-                                    (std::get<1>(tested.param) == 0 ? "WriteSucceeds" : "WriteFails");
+                             return std::string(tested.param.fileType) +
+                                    (tested.param.error == 0 ? "WriteSucceeds" : "WriteFails");
                          });
 
 }  // namespace

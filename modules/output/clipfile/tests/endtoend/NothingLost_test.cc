@@ -151,14 +151,11 @@ class NothingLost : public ::testing::TestWithParam<Recording> {
         }
         return sums;
     }
-    std::vector<RecordedFile> files() const {
+    std::vector<RecordedFile> files() {
+        names_ = RecordedNames(log_);
         std::vector<RecordedFile> files;
-        static constexpr std::string_view kCreated = "OP: FILE CREATE. (";
-        for (const std::string& line : operatorLines(log_)) {
-            if (line.starts_with(kCreated)) {
-                names_.push_back(line.substr(kCreated.size(), line.size() - kCreated.size() - 1));
-                files.emplace_back(FindRecording(directory_.Path(), names_.back()));
-            }
+        for (const std::string& name : names_) {
+            files.emplace_back(FindRecording(directory_.Path(), name));
         }
         return files;
     }
@@ -169,13 +166,6 @@ class NothingLost : public ::testing::TestWithParam<Recording> {
             ASSERT_EQ(file.BytesOf(sample), expected(number)) << "track " << track << ", unit " << number;
             ++number;
         }
-    }
-    std::string nameOf(std::uint64_t picture) const {
-        const stream_units::Timecode timecode = stream_.TimecodeOf(picture);
-        char name[32];
-        std::snprintf(name, sizeof name, "%02u_%02u_%02u_%02u.MP4", timecode.hours, timecode.minutes,
-                      timecode.seconds, timecode.frames);
-        return name;
     }
 
     LogCapture log_{LOG_PRIORITY_TRACE};
@@ -188,7 +178,7 @@ class NothingLost : public ::testing::TestWithParam<Recording> {
     std::unique_ptr<PacedPush> pace_;
     const NumberedStream stream_{GetParam().rate};
     bool recFlag_ = false;
-    mutable std::vector<std::string> names_;
+    std::vector<std::string> names_;
 };
 
 TEST_P(NothingLost, TheFilesTogetherHoldEachUnitFromTheFirstIdrPictureToTheEndOfTheLastChunkOnce) {
@@ -214,7 +204,7 @@ TEST_P(NothingLost, TheFilesTogetherHoldEachUnitFromTheFirstIdrPictureToTheEndOf
     for (std::size_t i = 0; i < recorded.size(); ++i) {
         SCOPED_TRACE(names_[i]);
         const RecordedFile& file = recorded[i];
-        EXPECT_EQ(names_[i], nameOf(nextPicture));
+        EXPECT_EQ(names_[i], stream_.FileName(nextPicture));
         const std::uint64_t begin = nextPicture;
         ASSERT_NO_FATAL_FAILURE(follow(file, kRecordedVideo, nextPicture,
                                        [&](std::uint64_t n) { return stream_.VideoSample(n); }));

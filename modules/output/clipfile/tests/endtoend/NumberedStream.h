@@ -1,9 +1,10 @@
 #pragma once
 
-#include <algorithm>
 #include <cstddef>
 #include <cstdint>
+#include <cstdio>
 #include <memory>
+#include <string>
 #include <vector>
 
 #include "support/StreamUnits.h"
@@ -17,7 +18,9 @@ class NumberedStream {
     /// An IDR picture with its parameter sets every so many pictures.
     static constexpr std::uint64_t kGroupOfPictures = 15;
 
-    explicit NumberedStream(stream_units::FrameRate rate) : clock{rate} {}
+    /// `scale` times the size of small pictures: 400 bytes at the most, and 3000 for an IDR picture.
+    explicit NumberedStream(stream_units::FrameRate rate, std::size_t scale = 1)
+        : clock{rate}, scale_(scale) {}
 
     const stream_units::StreamClock clock;
 
@@ -68,32 +71,48 @@ class NumberedStream {
     /// The timecode of frame `n`: 09:59:50:00 at frame 0, counted up by hand, with the numbers that
     /// drop-frame leaves out at 29.97 (SMPTE ST 12-1).
     stream_units::Timecode TimecodeOf(std::uint64_t n) const {
-        const bool dropFrame = clock.rate.key == stream_units::kRate2997.key;
-        const unsigned perSecond = static_cast<unsigned>((clock.rate.timescale + 999) / 1000);
-        stream_units::Timecode timecode{9, 59, 50, 0, dropFrame};
-        for (; n > 0; --n) {
-            if (++timecode.frames < perSecond) {
-                continue;
-            }
-            timecode.frames = 0;
-            if (++timecode.seconds < 60) {
-                continue;
-            }
-            timecode.seconds = 0;
-            if (++timecode.minutes == 60) {
-                timecode.minutes = 0;
-                ++timecode.hours;
-            }
-            if (dropFrame && timecode.minutes % 10 != 0) {
-                timecode.frames = 2;
-            }
+        if (n < counted_) {
+            counted_ = 0;
+            timecode_ = kFirstTimecode;
         }
-        return timecode;
+        timecode_.dropFrame = clock.rate.key == stream_units::kRate2997.key;
+        for (; counted_ < n; ++counted_) {
+            countUp();
+        }
+        return timecode_;
+    }
+    /// The name of a file that begins with frame `n`.
+    std::string FileName(std::uint64_t n) const {
+        const stream_units::Timecode timecode = TimecodeOf(n);
+        char name[32];
+        std::snprintf(name, sizeof name, "%02u_%02u_%02u_%02u.MP4", timecode.hours, timecode.minutes,
+                      timecode.seconds, timecode.frames);
+        return name;
     }
 
  private:
+    static constexpr stream_units::Timecode kFirstTimecode{9, 59, 50, 0, false};
+
+    void countUp() const {
+        const auto perSecond = static_cast<unsigned>((clock.rate.timescale + 999) / 1000);
+        if (++timecode_.frames < perSecond) {
+            return;
+        }
+        timecode_.frames = 0;
+        if (++timecode_.seconds < 60) {
+            return;
+        }
+        timecode_.seconds = 0;
+        if (++timecode_.minutes == 60) {
+            timecode_.minutes = 0;
+            ++timecode_.hours;
+        }
+        if (timecode_.dropFrame && timecode_.minutes % 10 != 0) {
+            timecode_.frames = 2;
+        }
+    }
     /// Behind the slice's header: no zeros, so that nothing in it looks like a start code.
-    static Bytes picture(std::uint64_t n) { return filler(n, IsIdr(n) ? 3000 : 400); }
+    Bytes picture(std::uint64_t n) const { return filler(n, scale_ * (IsIdr(n) ? 3000 : 400)); }
     static Bytes audioPayload(std::uint64_t n) {
         Bytes payload = stream_units::AudioPayload(n);
         stream_units::Append(payload, filler(n + 1, 300));
@@ -111,4 +130,9 @@ class NumberedStream {
         }
         return bytes;
     }
+
+    const std::size_t scale_;
+    // How far the timecode is counted.
+    mutable std::uint64_t counted_ = 0;
+    mutable stream_units::Timecode timecode_ = kFirstTimecode;
 };

@@ -6,8 +6,11 @@
 #include <iterator>
 #include <stdexcept>
 #include <string>
+#include <string_view>
+#include <utility>
 #include <vector>
 
+#include "LogCapture.h"
 #include "boxlib/support/IsoReader.h"
 
 /// Numbers of the tracks in a recording.
@@ -19,6 +22,18 @@ inline std::vector<std::uint8_t> ReadWholeFile(const std::filesystem::path& path
         throw std::runtime_error("cannot read " + path.string());
     }
     return {std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>()};
+}
+
+/// Names of the files that were opened, in order, from the lines of the log.
+inline std::vector<std::string> RecordedNames(const LogCapture& log) {
+    static constexpr std::string_view kOpened = "ST: out_filename = \"";
+    std::vector<std::string> names;
+    for (const std::string& line : log.Texts()) {
+        if (line.starts_with(kOpened)) {
+            names.push_back(line.substr(kOpened.size(), line.size() - kOpened.size() - 1));
+        }
+    }
+    return names;
 }
 
 /// The only file of that name under `root`.

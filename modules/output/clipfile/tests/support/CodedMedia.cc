@@ -8,47 +8,13 @@
 #include <fstream>
 #include <iterator>
 
-#include "support/StreamUnits.h"
+#include "support/ElementaryStreams.h"
 
 namespace {
-
-using stream_units::Bytes;
 
 std::string textOf(const std::filesystem::path& path) {
     std::ifstream in(path, std::ios::binary);
     return {std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>()};
-}
-
-Bytes bytesOf(const std::filesystem::path& path) {
-    const std::string text = textOf(path);
-    return Bytes(text.begin(), text.end());
-}
-
-/// Access units of a byte stream in which each begins with a delimiter behind a 4-byte start code.
-std::vector<std::shared_ptr<StreamData>> splitVideo(const Bytes& bytes) {
-    static constexpr unsigned char kDelimiter[] = {0, 0, 0, 1, 9};
-    std::vector<std::shared_ptr<StreamData>> units;
-    auto begin = bytes.begin();
-    while (begin != bytes.end()) {
-        const auto end = std::search(begin + 5, bytes.end(), std::begin(kDelimiter), std::end(kDelimiter));
-        units.push_back(stream_units::MakeUnit(Bytes(begin, end), 0, 0));
-        begin = end;
-    }
-    return units;
-}
-
-/// Frames with their ADTS headers (ISO/IEC 14496-3 1.A.2.2.1).
-std::vector<std::shared_ptr<StreamData>> splitAudio(const Bytes& bytes) {
-    std::vector<std::shared_ptr<StreamData>> units;
-    for (std::size_t at = 0; at + 7 <= bytes.size();) {
-        const std::size_t length = static_cast<std::size_t>(bytes[at + 3] & 3) << 11 |
-                                   static_cast<std::size_t>(bytes[at + 4]) << 3 | bytes[at + 5] >> 5;
-        const auto begin = bytes.begin() + static_cast<std::ptrdiff_t>(at);
-        units.push_back(
-            stream_units::MakeUnit(Bytes(begin, begin + static_cast<std::ptrdiff_t>(length)), 0, 0));
-        at += length;
-    }
-    return units;
 }
 
 }  // namespace
@@ -78,8 +44,8 @@ CodedMedia MakeCodedMedia(const TempDir& directory, std::uint32_t timescale, std
 
     CodedMedia media;
     nal_access::StreamAnalyzer analyzer;
-    auto videoUnits = splitVideo(bytesOf(video));
-    auto audioUnits = splitAudio(bytesOf(audio));
+    auto videoUnits = elementary_streams::ReadAccessUnits(video);
+    auto audioUnits = elementary_streams::ReadAudioFrames(audio);
     EXPECT_TRUE(!videoUnits.empty() && analyzer.IsAccessUnitStart(videoUnits.front(), media.sps, media.pps));
     analyzer.ConvertVideo(videoUnits, media.video);
     analyzer.ConvertAudio(audioUnits, media.audio);

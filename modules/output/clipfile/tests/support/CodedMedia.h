@@ -21,7 +21,8 @@ inline constexpr std::uint32_t kCodedWidth = 320;
 inline constexpr std::uint32_t kCodedHeight = 180;
 
 /// `pictures` pictures of H.264 without reordering, an IDR picture each 16, at `timescale / duration` a
-/// second, and at least `audioFrames` frames of AAC LC, 48 kHz, stereo.
+/// second, and at least `audioFrames` frames of AAC LC, 48 kHz, stereo. Leaves
+/// them in `directory` as "coded.h264" and "coded.aac".
 CodedMedia MakeCodedMedia(const TempDir& directory, std::uint32_t timescale, std::uint32_t duration,
                           std::size_t pictures, std::size_t audioFrames);
 

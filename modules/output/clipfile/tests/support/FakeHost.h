@@ -19,6 +19,8 @@ class FakeHost : public QxModuleHostInterface {
     /// Status and cause of one `SetStatus`.
     using Status = std::pair<int, int>;
 
+    virtual ~FakeHost() = default;
+
     // Set before the module runs.
     std::map<std::string, std::string> texts;
     std::map<std::string, int> numbers;
