@@ -1,11 +1,15 @@
 // By itself, so that a program of tests can have a system of its own.
 
+#include <new>
+
 #include "platform/posix/PosixPlatform.h"
 
 namespace clipfileModule {
 
 const PlatformInterface& GetPlatform() {
-    static const PlatformInterface& platform = *new PosixPlatform;
+    // In memory of the library, so that a host which unloads it gets all of it back.
+    alignas(PosixPlatform) static unsigned char memory[sizeof(PosixPlatform)];
+    static const PlatformInterface& platform = *new (memory) PosixPlatform;
     return platform;
 }
 
