@@ -16,8 +16,6 @@
 namespace endtoend {
 namespace {
 
-using nlohmann::literals::operator"" _json_pointer;
-
 using ::testing::HasSubstr;
 using ::testing::SizeIs;
 

@@ -13,7 +13,6 @@
 namespace endtoend {
 namespace {
 
-using ::testing::HasSubstr;
 using ::testing::SizeIs;
 
 struct Case {
