@@ -19,9 +19,9 @@ class Timeline {
  public:
     /// How far a stamp may stand ahead of what its medium has reached and still be a gap. What lies further
     /// is a jump of the clock.
-    static constexpr std::int64_t kLongestGap = 10 * 90000;
+    static constexpr std::int64_t kLongestGap = std::int64_t{10} * 90000;
     /// How long the offset from before a jump stays in use.
-    static constexpr std::int64_t kOverlap = 5 * 90000;
+    static constexpr std::int64_t kOverlap = std::int64_t{5} * 90000;
 
     bool Anchored() const { return offset_.has_value(); }
     /// Makes `stamp` stand at `time`.
@@ -36,8 +36,8 @@ class Timeline {
     /// evenly; `elapsed` is how much longer than that nothing has come (0 where the wall clock does not
     /// count); `back` is how far behind `expected` a stamp of this medium may stand. A line must be anchored.
     Place TimeOf(std::int64_t stamp, std::int64_t expected, std::int64_t elapsed, std::int64_t back);
-    /// Where `stamp` stands by the offset that brings it nearest to `expected`, for media that tell nothing of
-    /// jumps. A line must be anchored.
+    /// Where `stamp` stands by the offset that brings it nearest to `expected`, for media that tell nothing
+    /// of jumps. A line must be anchored.
     std::int64_t Nearest(std::int64_t stamp, std::int64_t expected) const;
 
  private:
