@@ -185,7 +185,11 @@ TEST_F(MistakesTest, AWrongPassphrase) {
     const std::string address = "srt://127.0.0.1:" + std::to_string(ports.First());
     const auto sender = SendTransportStream(material, address + "?mode=listener&passphrase=the-right-one");
     ASSERT_TRUE(WaitUntilBound(ports.First())) << sender->AllText();
-    ExpectRefused({"--input", address + "?passphrase=the-wrong-one"}, kSourceUnavailable, "passphrase");
+    const Outcome outcome = RunReceiver({"--input", address + "?passphrase=the-wrong-one"});
+    EXPECT_EQ(outcome.code, kSourceUnavailable);
+    EXPECT_THAT(LastLine(outcome.errors), AllOf(StartsWith("receiver: "), HasSubstr("passphrase")));
+    // It is a secret all the same.
+    EXPECT_EQ(outcome.errors.find("the-wrong-one"), std::string::npos) << outcome.errors;
 }
 
 TEST_F(MistakesTest, APortOnWhichNothingArrives) {

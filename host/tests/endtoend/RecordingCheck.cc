@@ -120,7 +120,7 @@ Range CheckRecording(const std::filesystem::path& recording, const Sent& sent, c
     checkMetadata(recorded, sent, expected, range);
     range.timecode =
         receiver::TimecodeOf(receiver::FrameNumberOf(expected.timecode, expected.rate.timecodeFrames) +
-                                 static_cast<std::int64_t>(expected.joined ? 0 : range.first),
+                                 static_cast<std::int64_t>(range.first),
                              expected.rate.timecodeFrames, expected.timecode.dropFrame);
     EXPECT_EQ(recording.filename(), FileNameOf(range.timecode));
     checkFfprobe(recording, expected, range);

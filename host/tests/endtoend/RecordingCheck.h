@@ -27,9 +27,6 @@ struct Expected {
     bool fragmented = false;
     /// Of the first picture that was sent, and whether the recording counts by the drop-frame rule.
     receiver::Timecode timecode;
-    /// The timecode is that of the first picture which was recorded: the receiver joined a stream that was on
-    /// its way.
-    bool joined = false;
     /// KLV packets are compared too.
     bool klv = false;
     /// The audio is the source's own.
