@@ -27,7 +27,7 @@ void Host::GetParameter(std::string key, int& value, int defaultValue) {
 
 void Host::GetParameter(std::string key, std::string& value, std::string defaultValue) {
     const auto found = parameters_.texts.find(key);
-    value = found != parameters_.texts.end() ? found->second : std::move(defaultValue);
+    value = found != parameters_.texts.end() ? found->second : defaultValue;
 }
 
 int Host::SendTransmissionStatus(const std::map<std::string, std::string>& status) {
