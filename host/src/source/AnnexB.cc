@@ -5,8 +5,6 @@
 namespace receiver {
 namespace {
 
-constexpr std::size_t kStartCode = 3;
-
 /// The unsigned Exp-Golomb number (ITU-T H.264 9.1) at the beginning of `bytes`. Numbers of parameter sets
 /// are below 256, too short for an emulation prevention byte.
 std::optional<std::uint32_t> FirstNumber(std::span<const unsigned char> bytes) {

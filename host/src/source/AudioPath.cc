@@ -40,7 +40,7 @@ bool IsRecordedConfig(const std::uint8_t* config, int size) {
 /// Samples that the time of a frame may differ from the count and still be jitter.
 constexpr std::int64_t kJitter = 1024;
 /// Samples of silence that fill a gap here; a longer one begins anew.
-constexpr std::int64_t kLongestFill = 10 * kAudioRate;
+constexpr std::int64_t kLongestFill = std::int64_t{10} * kAudioRate;
 
 }  // namespace
 

@@ -11,11 +11,11 @@ namespace {
 
 /// How far audio may lag behind the pictures before silence stands in for it, in ticks of 90000. More than
 /// multiplexers make of it, less than the recorder's caches hold.
-constexpr std::int64_t kLongestLag = 3 * 90000;
+constexpr std::int64_t kLongestLag = std::int64_t{3} * 90000;
 /// Units that may wait for a picture.
 constexpr std::size_t kLongestHold = 2000;
 /// Losses are told not more often than this, in ticks.
-constexpr std::int64_t kReportEvery = 10 * 90000;
+constexpr std::int64_t kReportEvery = std::int64_t{10} * 90000;
 
 constexpr std::int64_t ToAudio(std::int64_t ticks) {
     return ticks * 8 / 15;

@@ -29,6 +29,8 @@ VideoConverter::VideoConverter(const AVCodecParameters& parameters, const VideoE
                  "read the parameters of the video");
     decoder_->pkt_timebase = {1, 90000};
     decoder_->thread_count = 0;
+    // Threads that take whole frames would hold several of them back.
+    decoder_->thread_type = FF_THREAD_SLICE;
     libav::Check(avcodec_open2(decoder_.get(), decoder, nullptr), "open the decoder of the video");
 }
 
