@@ -12,7 +12,6 @@
 namespace receiver {
 namespace {
 
-using ::testing::AllOf;
 using ::testing::HasSubstr;
 using ::testing::Not;
 
