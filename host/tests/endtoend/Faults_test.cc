@@ -57,10 +57,10 @@ TEST_F(FaultsTest, ASourceThatVanishesAndReturnsGoesOnInANewFile) {
     const FreePorts ports;
     const std::string port = std::to_string(ports.First());
     MaterialOptions options;
-    options.seconds = 3;
+    options.seconds = 4;
     const Sent sent(MakeMaterial(folder, options));
     const auto receiver =
-        Start({"--input", "udp://127.0.0.1:" + port, "--timeout", "1", "--timecode", "10:00:00:00"});
+        Start({"--input", "udp://127.0.0.1:" + port, "--timeout", "2", "--timecode", "10:00:00:00"});
     ASSERT_TRUE(WaitUntilBound(ports.First())) << receiver->AllText();
     const std::string address = "udp://127.0.0.1:" + port + "?pkt_size=1316";
     ASSERT_EQ(SendTransportStream(sent.file, address)->Wait(), 0);
@@ -88,7 +88,7 @@ TEST_F(FaultsTest, WithoutReconnectionALostSourceEndsTheRun) {
     MaterialOptions options;
     options.seconds = 2;
     const auto material = MakeMaterial(folder, options);
-    const auto receiver = Start({"--input", "udp://127.0.0.1:" + port, "--timeout", "0.5", "--no-reconnect"});
+    const auto receiver = Start({"--input", "udp://127.0.0.1:" + port, "--timeout", "2", "--no-reconnect"});
     ASSERT_TRUE(WaitUntilBound(ports.First())) << receiver->AllText();
     const auto sender = SendTransportStream(material, "udp://127.0.0.1:" + port + "?pkt_size=1316");
     EXPECT_EQ(receiver->Wait(), 3) << receiver->AllText();
