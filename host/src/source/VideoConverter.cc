@@ -28,9 +28,9 @@ VideoConverter::VideoConverter(const AVCodecParameters& parameters, const VideoE
     libav::Check(avcodec_parameters_to_context(decoder_.get(), &parameters),
                  "read the parameters of the video");
     decoder_->pkt_timebase = {1, 90000};
-    decoder_->thread_count = 0;
-    // Threads that take whole frames would hold several of them back.
-    decoder_->thread_type = FF_THREAD_SLICE;
+    // Threads that take whole frames would hold several of them back, and encoding, which has its own, costs
+    // more.
+    decoder_->thread_count = 1;
     libav::Check(avcodec_open2(decoder_.get(), decoder, nullptr), "open the decoder of the video");
 }
 

@@ -8,6 +8,13 @@
 #include <fstream>
 #include <iterator>
 
+/// libsrt takes locks of its own in orders that the thread sanitizer calls dangerous. Nothing of ours is in
+/// them.
+extern "C" const char* __tsan_default_suppressions();
+extern "C" const char* __tsan_default_suppressions() {
+    return "deadlock:libsrt-gnutls.so\n";
+}
+
 namespace receiver {
 
 std::size_t Notices::CountOf(const std::string& text) const {
