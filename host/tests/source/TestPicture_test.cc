@@ -56,7 +56,8 @@ TEST_P(TestPictureRate, GivesFramesAtTheirTimesAndIdrFramesAtTheirCadence) {
         EXPECT_EQ(header[1], 0xF1);
         EXPECT_EQ(header[2], 0x4C);
         EXPECT_EQ(header[3] & 0xFCU, 0x80U);
-        const std::size_t length = (header[3] & 3U) << 11 | header[4] << 3U | header[5] >> 5U;
+        const std::size_t length =
+            (header[3] & 3U) << 11 | static_cast<unsigned int>(header[4]) << 3 | header[5] >> 5U;
         EXPECT_EQ(length, audio[n].size);
     }
     // Media go together.
