@@ -15,7 +15,7 @@
 namespace endtoend {
 
 /// How long a test waits for what a healthy program does at once. Only a failing test ever waits so long.
-inline constexpr std::chrono::seconds kPatience{40};
+inline constexpr std::chrono::seconds kPatience{100};
 
 /// A program at work: with its output captured as it comes, and killed with the object at the latest.
 class Process {
