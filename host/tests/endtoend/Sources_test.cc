@@ -1,4 +1,5 @@
-// Every way into the receiver, with ffmpeg as the sender and programs of others as judges.
+// Every way into the receiver, with ffmpeg, or GStreamer for RTSP, as the sender and programs of others as
+// judges.
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -14,7 +15,7 @@ namespace {
 using ::testing::EndsWith;
 using ::testing::HasSubstr;
 
-enum class Road { kUdp, kRtp, kSrtListener, kSrtCaller, kFile };
+enum class Road { kUdp, kRtp, kSrtListener, kSrtCaller, kHttp, kRtsp, kFile };
 
 struct Case {
     const char* name;
@@ -71,6 +72,19 @@ class SourcesTest : public ReceiverFixture, public ::testing::WithParamInterface
                 sender = SendTransportStream(material, "srt://127.0.0.1:" + port + "?mode=listener");
                 EXPECT_TRUE(WaitUntilBound(ports.First())) << sender->AllText();
                 add({"--input", "srt://127.0.0.1:" + port, "--seconds", kSeconds});
+                receiver = Start(options);
+                break;
+            case Road::kHttp: {
+                const std::string url = "http://127.0.0.1:" + port + "/live.ts";
+                sender = ServeHttp(material, url);
+                EXPECT_TRUE(WaitUntilListening(ports.First())) << sender->AllText();
+                add({"--input", url, "--seconds", kSeconds});
+                receiver = Start(options);
+                break;
+            }
+            case Road::kRtsp:
+                sender = ServeRtsp(material, ports.First());
+                add({"--input", "rtsp://127.0.0.1:" + port + "/live", "--seconds", kSeconds});
                 receiver = Start(options);
                 break;
             case Road::kFile:
@@ -133,6 +147,8 @@ INSTANTIATE_TEST_SUITE_P(
         Case{"RtpFragment25", Road::kRtp, "25", "25", true, "23:59:59:20", false, "mp4"},
         Case{"SrtListenerNormal50", Road::kSrtListener, "50", "50", false, "00:00:00:00", false, "ts"},
         Case{"SrtCallerFragment25WithKlv", Road::kSrtCaller, "25", "25", true, "01:02:03:04", true, "ts"},
+        Case{"HttpNormal25WithKlv", Road::kHttp, "25", "25", false, "19:59:59:24", true, "ts"},
+        Case{"RtspFragment25", Road::kRtsp, "25", "25", true, "05:00:00:00", false, "mp4"},
         Case{"FileNormal2997", Road::kFile, "29.97", "30000/1001", false, "10:00:58;28", false, "mp4"},
         Case{"FileFragment50WithKlv", Road::kFile, "50", "50", true, "12:34:56:49", true, "ts"},
         Case{"FileFragment5994", Road::kFile, "59.94", "60000/1001", true, "00:09:59;59", false, "mkv"}),

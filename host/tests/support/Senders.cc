@@ -28,7 +28,62 @@ std::vector<std::string> rtpCommand(const std::filesystem::path& material, const
             "-map",   "0:a", "-c",    "copy",     "-f",  "rtp", address(2)};
 }
 
+/// Waits until one of `tables` (of /proc/net) has a line with `text`.
+bool waitForSocket(const std::vector<const char*>& tables, const std::string& text) {
+    const auto deadline = std::chrono::steady_clock::now() + kPatience;
+    while (std::chrono::steady_clock::now() < deadline) {
+        for (const char* const table : tables) {
+            if (textOf(table).find(text) != std::string::npos) {
+                return true;
+            }
+        }
+        std::this_thread::sleep_for(std::chrono::milliseconds(5));
+    }
+    return false;
+}
+
+std::string hexadecimal(std::uint16_t port) {
+    std::array<char, 8> name{};
+    std::snprintf(name.data(), name.size(), ":%04X ", port);
+    return name.data();
+}
+
+/// What GStreamer's RTSP server is told to do: the media as they are, parameter sets with every IDR frame.
+constexpr const char* kRtspServer = R"(
+import gi, sys
+gi.require_version('Gst', '1.0')
+gi.require_version('GstRtspServer', '1.0')
+from gi.repository import GLib, Gst, GstRtspServer
+Gst.init(None)
+server = GstRtspServer.RTSPServer()
+server.set_address('127.0.0.1')
+server.set_service(sys.argv[2])
+factory = GstRtspServer.RTSPMediaFactory()
+factory.set_launch('( filesrc location=%s ! qtdemux name=demux '
+                   'demux.video_0 ! queue ! rtph264pay name=pay0 pt=96 config-interval=-1 '
+                   'demux.audio_0 ! queue ! rtpmp4gpay name=pay1 pt=97 )' % sys.argv[1])
+server.get_mount_points().add_factory('/live', factory)
+server.attach(None)
+GLib.MainLoop().run()
+)";
+
 }  // namespace
+
+std::unique_ptr<Process> ServeHttp(const std::filesystem::path& material, const std::string& url) {
+    return std::make_unique<Process>(std::vector<std::string>{"ffmpeg", "-v", "error", "-nostdin", "-re",
+                                                              "-i", material.string(), "-map", "0", "-c",
+                                                              "copy", "-f", "mpegts", "-listen", "1", url});
+}
+
+std::unique_ptr<Process> ServeRtsp(const std::filesystem::path& material, std::uint16_t port) {
+    // The bindings belong to the system's own Python, which need not be the first of the path.
+    auto server = std::make_unique<Process>(std::vector<std::string>{
+        "/usr/bin/python3", "-c", kRtspServer, material.string(), std::to_string(port)});
+    if (!WaitUntilListening(port)) {
+        throw std::runtime_error("the RTSP server: " + server->AllText());
+    }
+    return server;
+}
 
 std::unique_ptr<Process> SendTransportStream(const std::filesystem::path& material, const std::string& url) {
     return std::make_unique<Process>(std::vector<std::string>{"ffmpeg", "-v", "error", "-nostdin", "-re",
@@ -52,18 +107,13 @@ void WriteSessionDescription(const std::filesystem::path& material, const FreePo
     }
 }
 
+bool WaitUntilListening(std::uint16_t port) {
+    // Local address, no remote one, and the state LISTEN.
+    return waitForSocket({"/proc/net/tcp"}, hexadecimal(port) + "00000000:0000 0A");
+}
+
 bool WaitUntilBound(std::uint16_t port) {
-    std::array<char, 8> name{};
-    std::snprintf(name.data(), name.size(), ":%04X ", port);
-    const auto deadline = std::chrono::steady_clock::now() + kPatience;
-    while (std::chrono::steady_clock::now() < deadline) {
-        if (textOf("/proc/net/udp").find(name.data()) != std::string::npos ||
-            textOf("/proc/net/udp6").find(name.data()) != std::string::npos) {
-            return true;
-        }
-        std::this_thread::sleep_for(std::chrono::milliseconds(5));
-    }
-    return false;
+    return waitForSocket({"/proc/net/udp", "/proc/net/udp6"}, hexadecimal(port));
 }
 
 }  // namespace endtoend

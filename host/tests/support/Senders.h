@@ -13,6 +13,14 @@ namespace endtoend {
 /// ffmpeg, sending `material` at its own speed, as a transport stream to `url` (UDP, SRT).
 std::unique_ptr<Process> SendTransportStream(const std::filesystem::path& material, const std::string& url);
 
+/// ffmpeg as a web server that gives `material` to the first who asks for `url`, at the material's own speed.
+std::unique_ptr<Process> ServeHttp(const std::filesystem::path& material, const std::string& url);
+
+/// GStreamer's RTSP server, giving the movie file `material` to everybody who asks for
+/// rtsp://127.0.0.1:`port`/live. Returns when it listens. Throws std::runtime_error with its words when it
+/// does not.
+std::unique_ptr<Process> ServeRtsp(const std::filesystem::path& material, std::uint16_t port);
+
 /// ffmpeg, sending the video to the first of `ports` and the audio to the third.
 std::unique_ptr<Process> SendRtp(const std::filesystem::path& material, const FreePorts& ports);
 
@@ -20,6 +28,9 @@ std::unique_ptr<Process> SendRtp(const std::filesystem::path& material, const Fr
 /// with ffmpeg's words when that fails.
 void WriteSessionDescription(const std::filesystem::path& material, const FreePorts& ports,
                              const std::filesystem::path& description);
+
+/// Waits until a program listens at that TCP port of an IPv4 address. False when none does.
+bool WaitUntilListening(std::uint16_t port);
 
 /// Waits until a program has bound that UDP port, so that nothing sent from now on is lost. False when none
 /// does.
