@@ -32,12 +32,12 @@ class NetworkSource : public SourceTest {
         return opened.get();
     }
 
-    /// Video of 37 pictures and audio, and the video as another program reads it.
-    void MakeMaterial() {
-        Ffmpeg(
-            "-f lavfi -i testsrc2=size=128x96:rate=25:duration=1.48 "
-            "-f lavfi -i sine=frequency=500:sample_rate=48000:duration=1.48" +
-            string(kPlainH264) + kPlainAac + "a.ts");
+    /// Video, of 37 pictures when nothing else is asked for, and audio; and the video as another program
+    /// reads it.
+    void MakeMaterial(const string& seconds = "1.48") {
+        Ffmpeg("-f lavfi -i testsrc2=size=128x96:rate=25:duration=" + seconds +
+               " -f lavfi -i sine=frequency=500:sample_rate=48000:duration=" + seconds + kPlainH264 +
+               kPlainAac + "a.ts");
         Ffmpeg("-i a.ts -map 0:v -c copy -f data video.bin");
         video_ = FileBytes(Path("video.bin"));
     }
@@ -89,7 +89,8 @@ TEST_F(NetworkSource, TransportStreamOverUdpComesWhole) {
 }
 
 TEST_F(NetworkSource, SrtWithPassphraseComesWhole) {
-    MakeMaterial();
+    // A sender that ends takes along what it has not delivered by then.
+    MakeMaterial("4");
     const string url = "srt://127.0.0.1:" + Port() + "?passphrase=0123456789";
     const auto source = OpenAndSend(Live(url + "&mode=listener"), ports_.First(),
                                     [&] { return endtoend::SendTransportStream(Path("a.ts"), url); });
