@@ -61,7 +61,8 @@ void QueuedSource::Run() {
         failure = std::current_exception();
     }
     const std::lock_guard lock(mutex_);
-    failure_ = failure;
+    // The reader alone has it from now on.
+    failure_ = std::move(failure);
     ended_ = true;
     changed_.notify_all();
 }
