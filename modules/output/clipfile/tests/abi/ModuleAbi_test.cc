@@ -246,7 +246,7 @@ TEST_F(ModuleAbi, ParametersAreAskedForInOrderWithTheirDefaults) {
         host.Questions(),
         ElementsAre("-filePrefix=Unknown-Model", "-outputPath=none", "-userName=operator", "-password=a b;c",
                     "-fileType=normal", "-naluType=normal", "-outputMode=on", "-encodedHeight=720",
-                    "-encodedWidth=1280", "-encodedFPS=29970", "-encodedBPS=60000"));
+                    "-encodedWidth=1280", "-encodedFPS=29970", "-encodedBPS=60000", "-recordRules=kept"));
 }
 
 TEST_F(ModuleAbi, ParametersOfTheHostArrive) {

@@ -185,7 +185,34 @@ TEST_F(ControllerTest, StartParametersAreAskedForInTheirOrder) {
     EXPECT_EQ(host_.AskedParameters(),
               (std::vector<std::string>{"-filePrefix", "-outputPath", "-userName", "-password", "-fileType",
                                         "-naluType", "-outputMode", "-encodedHeight", "-encodedWidth",
-                                        "-encodedFPS", "-encodedBPS"}));
+                                        "-encodedFPS", "-encodedBPS", "-recordRules"}));
+}
+
+TEST_F(ControllerTest, RecordRulesAreKeptUnlessExactAreAskedFor) {
+    registry_.Set("MP4OutputPath", "a");
+    ASSERT_TRUE(Initialize());
+    EXPECT_EQ(peer_.Settings().recordRules, RecordRules::kKept);
+    Uninitialize();
+    host_.texts["-recordRules"] = "exact";
+    ASSERT_TRUE(Initialize());
+    EXPECT_EQ(peer_.Settings().recordRules, RecordRules::kExact);
+    EXPECT_TRUE(log_.Contains(LOG_PRIORITY_TRACE, "clipfileModule::Controller::Initialize",
+                              "recordRules = exact."));
+    Uninitialize();
+    host_.texts["-recordRules"] = "kept";
+    ASSERT_TRUE(Initialize());
+    EXPECT_EQ(peer_.Settings().recordRules, RecordRules::kKept);
+    EXPECT_FALSE(log_.Find("unknown record rules \"kept\", \"kept\" is used."));
+}
+
+TEST_F(ControllerTest, UnknownRecordRulesAreSaidAndCountAsKept) {
+    registry_.Set("MP4OutputPath", "a");
+    host_.texts["-recordRules"] = "Exact";
+    ASSERT_TRUE(Initialize());
+    EXPECT_EQ(peer_.Settings().recordRules, RecordRules::kKept);
+    const auto line = log_.Find("unknown record rules \"Exact\", \"kept\" is used.");
+    ASSERT_TRUE(line);
+    EXPECT_EQ(line->priority, LOG_PRIORITY_WARNING);
 }
 
 TEST_F(ControllerTest, InitializeLogsItsWay) {

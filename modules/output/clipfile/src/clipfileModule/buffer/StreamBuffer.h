@@ -52,6 +52,11 @@ class StreamBuffer final : public QxModuleStreamInterface,
     void Stop() EXCLUDES(controlMutex);
     /// Sets where the record ends; -1 leaves it open.
     void SetStopTimestamp(std::int64_t stop) { stopTimestamp = stop; }
+    /// With exact rules: the first instant, in 90 kHz ticks, that does not belong to the record any more; -1
+    /// while that is open. The controller sets it before the metadata unit that carries the command reaches
+    /// the buffer, so that no chunk can be cut across it, however late the stop itself is carried out.
+    void SetEndTimestamp(std::int64_t end) { endTimestamp = end; }
+    std::int64_t GetEndTimestamp() const { return endTimestamp; }
 
     // QxModuleStreamInterface. A push waits while the queue of its medium is full.
     void PushReserved(const std::shared_ptr<StreamData>& unit) override;
@@ -158,6 +163,7 @@ class StreamBuffer final : public QxModuleStreamInterface,
 
     std::atomic<std::int64_t> startTimestamp;
     std::atomic<std::int64_t> stopTimestamp;
+    std::atomic<std::int64_t> endTimestamp = -1;
     /// Set with the first chunk of the object's life, and never cleared.
     std::atomic<bool> chunkProduced = false;
     /// 0 unknown, 1 the timecode stands still, 2 it runs. Decided once in the object's life.

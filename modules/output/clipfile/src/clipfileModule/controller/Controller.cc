@@ -31,8 +31,12 @@ const std::string kParameterHeight = "-encodedHeight";
 const std::string kParameterWidth = "-encodedWidth";
 const std::string kParameterFramerate = "-encodedFPS";
 const std::string kParameterBitrate = "-encodedBPS";
+const std::string kParameterRecordRules = "-recordRules";
 
 constexpr const char* kNoOutputPath = "none";
+
+constexpr const char* kRecordRulesKept = "kept";
+constexpr const char* kRecordRulesExact = "exact";
 
 std::string readText(QxModuleHostInterface& host, const std::string& key, const std::string& defaultValue) {
     std::string value;
@@ -44,6 +48,18 @@ std::uint32_t readNumber(QxModuleHostInterface& host, const std::string& key, st
     int value = 0;
     host.GetParameter(key, value, static_cast<int>(defaultValue));
     return static_cast<std::uint32_t>(value);
+}
+
+/// Anything but the two names counts as "kept", which is what a host gets that never heard of the parameter.
+RecordRules readRecordRules(QxModuleHostInterface& host) {
+    const std::string rules = readText(host, kParameterRecordRules, kRecordRulesKept);
+    if (rules == kRecordRulesExact) {
+        return RecordRules::kExact;
+    }
+    if (rules != kRecordRulesKept) {
+        CLIPFILE_LOG(LOG_PRIORITY_WARNING, "unknown record rules \"%s\", \"kept\" is used.", rules.c_str());
+    }
+    return RecordRules::kKept;
 }
 
 }  // namespace
@@ -77,6 +93,9 @@ bool Controller::Initialize(QxModuleHostInterface* moduleHost) {
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "fileType   = %s.", now.fileType.c_str());
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "naluType   = %s.", now.naluType.c_str());
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "outputMode = %s.", now.outputMode.c_str());
+    if (now.recordRules == RecordRules::kExact) {
+        CLIPFILE_LOG(LOG_PRIORITY_TRACE, "recordRules = exact.");
+    }
 
     eventHandlers = {
         {kChangeInStreamInfo, [this](std::shared_ptr<Event> event) { OnChangeInStreamInfo(event); }},
@@ -148,6 +167,7 @@ bool Controller::getStartParameters() {
     const std::uint32_t width = readNumber(*host, kParameterWidth, defaultWidth);
     const std::uint32_t framerate = readNumber(*host, kParameterFramerate, defaultFramerate);
     const std::uint32_t bitrate = readNumber(*host, kParameterBitrate, defaultBitrate);
+    const RecordRules recordRules = readRecordRules(*host);
 
     MutexLock lock(settingsMutex);
     settings.filePrefix = filePrefix;
@@ -163,6 +183,7 @@ bool Controller::getStartParameters() {
     settings.fileType = fileType;
     settings.naluType = naluType;
     settings.outputMode = outputMode;
+    settings.recordRules = recordRules;
     settings.streamStart = 0;
     settings.bitrate = bitrate;
     settings.framerate = framerate;

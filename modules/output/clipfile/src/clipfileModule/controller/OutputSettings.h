@@ -7,6 +7,14 @@
 
 namespace clipfileModule {
 
+/// The rules by which a recording is made. Both are told, difference by difference, in docs/compatibility.md.
+enum class RecordRules {
+    /// As hosts have always known them: the default.
+    kKept,
+    /// Exact to the frame, where the kept ones lose material or step. Asked for by the host.
+    kExact,
+};
+
 /// Everything that a recording needs to know. `Controller` holds the master copy; each recording works on its
 /// own.
 struct OutputSettings {
@@ -23,6 +31,7 @@ struct OutputSettings {
     std::string naluType;
     /// Where record commands come from: "on" or "sync".
     std::string outputMode;
+    RecordRules recordRules = RecordRules::kKept;
     std::uint64_t streamStart = 0;
     std::uint32_t bitrate = 0;
     /// Frames per 1000 seconds.
