@@ -3,12 +3,19 @@
 find_package(GTest REQUIRED)
 include(GoogleTest)
 
+# What sanitizers look at is optimised as far as their manuals advise. Optimising the tests as well would take longer than
+# running them.
+set(_test_optimisation)
+if(CLIPFILE_SANITIZE)
+    set(_test_optimisation -O0)
+endif()
+
 if(CLIPFILE_TEST_PCH)
     add_library(clipfile_test_pch OBJECT "${CMAKE_CURRENT_LIST_DIR}/test_pch.cc")
     target_link_libraries(clipfile_test_pch PRIVATE clipfile_common GTest::gmock)
     # As CMake compiles programs: headers precompiled for a library would be refused.
     set_target_properties(clipfile_test_pch PROPERTIES POSITION_INDEPENDENT_CODE OFF)
-    target_compile_options(clipfile_test_pch PRIVATE -fPIE)
+    target_compile_options(clipfile_test_pch PRIVATE -fPIE ${_test_optimisation})
     target_precompile_headers(clipfile_test_pch PRIVATE
         <gmock/gmock.h> <gtest/gtest.h>
         <algorithm> <array> <atomic> <condition_variable> <cstdint> <cstdio> <cstring> <deque>
@@ -48,7 +55,7 @@ function(clipfile_add_test name)
     target_link_libraries(${name} PRIVATE clipfile_common ${ARG_LIBRARIES} GTest::gmock_main)
     # GCC 12, when it optimises, sees writes past the end wherever vectors and strings are put together in one expression,
     # as tests like to do.
-    target_compile_options(${name} PRIVATE
+    target_compile_options(${name} PRIVATE ${_test_optimisation}
         "$<$<AND:$<CXX_COMPILER_ID:GNU>,$<VERSION_LESS:$<CXX_COMPILER_VERSION>,13>>:-Wno-array-bounds;-Wno-stringop-overflow;-Wno-stringop-overread>")
     if(CLIPFILE_TEST_PCH)
         target_precompile_headers(${name} REUSE_FROM clipfile_test_pch)
