@@ -6,7 +6,7 @@ MbxStatus MbxShiftFragmentOffsets(MbxContext* context, const MbxOptions* options
                                   uint32_t fragment, uint32_t track, uint32_t chunk, int64_t delta) {
     if (MbxAnyNull(context, options, movie)) return MBX_ERR_INVALID_ARG;
     const MbxStatus status = MbxApplyOffsetDelta(context, 1, track, fragment, chunk, delta, &movie->tracks);
-    // Offsets that count from `moof` may lie behind it.
+    // Contract: offset-overflow-forgiven. Offsets that count from `moof` may lie behind it.
     return status == MBX_ERR_OVERFLOW && options->base_offset_mode != 0 ? MBX_OK : status;
 }
 
@@ -22,6 +22,7 @@ MbxStatus MbxSetFragmentBase(MbxContext* context, MbxMovie* movie, uint32_t frag
 
 namespace {
 
+// Contract: late-track-defaults. A `moov` that is written already says otherwise.
 // Takes the defaults that nobody gave from the first segment with samples. A track without samples gets the
 // same as one whose samples say nothing, and learns later.
 void deriveDefaults(MbxTrack* track) {

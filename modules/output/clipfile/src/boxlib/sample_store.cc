@@ -174,6 +174,7 @@ MbxStatus addIndexEntry(MbxContext* context, const MbxMovie* movie, uint32_t tra
 
 }  // namespace
 
+// Contract: sample-of-no-track. Bad state, where other operations do not find the track.
 MbxStatus MbxAddSample(MbxContext* context, MbxSession* session, uint32_t trackIndex,
                        const MbxSampleInfo* sample, uint32_t startsFragmentIndexEntry) {
     if (context == nullptr || session == nullptr || sample == nullptr) return MBX_ERR_INVALID_ARG;

@@ -69,7 +69,7 @@ class BlockingQueue {
             queue.pop();
         }
         queue = std::move(kept);
-        // Several producers may wait, and the flush made room for all of them.
+        // Contract: flush-wakes-all. Several producers may wait, and there is room for all of them.
         notFull.notify_all();
     }
 

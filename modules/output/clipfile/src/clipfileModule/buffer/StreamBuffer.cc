@@ -18,6 +18,7 @@ namespace {
 /// Units between a push and the cache. A push waits while they stand full.
 constexpr std::uint64_t kQueueCapacity = 20;
 
+// Contract: block-with-a-byte-in-front. A packet begins with its label (SMPTE ST 336).
 /// A packet in the key, length, value form of SMPTE ST 336: one byte 01, universal label, BER length 43, and
 /// the items E000, 8500, 8509 and 8512 ("WGS-84"), each with a 2-byte tag and a 2-byte length.
 constexpr unsigned char kMetaBlock[64] = {
@@ -57,6 +58,7 @@ void StreamBuffer::Start(const OutputSettings& recordSettings) {
     settings = recordSettings;
     auto output = std::make_shared<FileOutput>();
     if (!output->Initialize(controller, this, settings.fileType)) {
+        // Contract: muxer-failure-goes-on. Status 7 has been set already.
         CLIPFILE_LOG(LOG_PRIORITY_WARNING, "mp4File initialize failed.");
     }
     {
@@ -77,6 +79,7 @@ void StreamBuffer::Start(const OutputSettings& recordSettings) {
         MutexLock lock(analyzerMutex);
         fileTimecode.clear();
     }
+    // Contract: sps-line-at-each-start. The sets come with the IDR frame.
     streamInfo.MakeInputStreamInfo(settings);
 
     std::vector<std::shared_ptr<StreamQueue>> started(kMediumCount);
@@ -115,6 +118,7 @@ void StreamBuffer::Stop() {
         changeState(std::make_shared<StopCacheState>(this));
         stopped.swap(queues);
     }
+    // Contract: leftovers-dropped. Units in queues and caches are not written.
     for (std::shared_ptr<StreamQueue>& queue : stopped) {
         if (queue != nullptr) {
             queue->Stop();
@@ -122,6 +126,7 @@ void StreamBuffer::Stop() {
         }
     }
     Cancel();
+    // Contract: restart-forgets-the-stop. A stop that was commanded is lost.
     startTimestamp = 0;
     stopTimestamp = -1;
     std::shared_ptr<FileOutput> output;
@@ -193,11 +198,12 @@ void StreamBuffer::updateTimecodeStatus(const std::shared_ptr<StreamData>& unit)
     std::shared_ptr<nal_access::SampleData> sample;
     bool flag = false;
     analyzer.ConvertTmcd(unit, sample, flag, 0, 0);
+    // Contract: timecode-status-for-life. The first two timecodes decide, also for what a restart records.
     if (tcStatus != 0 || sample == nullptr) {
         return;
     }
     if (lastTimecode != nullptr) {
-        // A sample is compared in the length that both have.
+        // Contract: timecode-common-length. Compared in the length that both have.
         const std::uint64_t size = std::min(sample->GetDataSize(), lastTimecode->GetDataSize());
         const bool still = std::memcmp(sample->GetData(), lastTimecode->GetData(), size) == 0;
         tcStatus = still ? 1 : 2;
@@ -209,6 +215,7 @@ void StreamBuffer::updateTimecodeStatus(const std::shared_ptr<StreamData>& unit)
 void StreamBuffer::changeState(const std::shared_ptr<CacheState>& next) {
     CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: CHANGE STATE %s -> %s.", state->GetName().c_str(),
                        next->GetName().c_str());
+    // Contract: enter-before-leave. The old state is still in place.
     next->OnEnter();
     const std::shared_ptr<CacheState> old = state;
     state = next;
@@ -216,12 +223,13 @@ void StreamBuffer::changeState(const std::shared_ptr<CacheState>& next) {
     old->OnExit();
 }
 
+// Contract: media-word-unused. The last argument.
 void StreamBuffer::addToCache(const std::shared_ptr<StreamData>& unit, UnitList StreamBuffer::*cache,
                               const char* /*mediaType*/) {
     {
         MutexLock lock(bufferMutex);
         UnitList& units = this->*cache;
-        // The cache is in order, so a unit that is late goes to its place, behind those of its own time.
+        // Contract: sorted-insertion. The cache is in order; a late unit goes behind those of its own time.
         units.insert(std::upper_bound(units.begin(), units.end(), unit, byRtpTimestamp), unit);
     }
     bufferCondition.notify_one();
@@ -232,6 +240,7 @@ void StreamBuffer::SetVideoSequenceHeader(const nal_access::NalUnit& sps, const 
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
     const double frameMilliSec = static_cast<double>(streamInfo.audio_sample_duration) /
                                  static_cast<double>(streamInfo.audio_track_timescale) * 1000;
+    // Contract: half-an-audio-frame-is-10-ms. Cut twice: 21.3 to 21, and 10.5 to 10.
     const std::uint64_t half = static_cast<std::uint64_t>(frameMilliSec) >> 1;
 
     MutexLock lock(bufferMutex);
@@ -242,6 +251,7 @@ void StreamBuffer::SetVideoSequenceHeader(const nal_access::NalUnit& sps, const 
     settings.sps = sps;
     settings.pps = pps;
     fileOutput->Start(settings);
+    // Contract: idr-frame-unsorted. The cache is empty here.
     videoBuffer.push_back(unit);
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
@@ -258,7 +268,7 @@ void StreamBuffer::removeBefore(UnitList& cache, std::uint64_t limit) {
                            static_cast<unsigned long long>((*it)->timestamp),
                            static_cast<unsigned long long>((*it)->rtp_timestamp));
     }
-    // The unit where the walk stopped stays, also when it is the last one and lies below the limit.
+    // Contract: last-unit-stays. The unit where the walk stopped, also when it lies below the limit.
     cache.erase(cache.begin(), end);
 }
 
@@ -269,7 +279,7 @@ void StreamBuffer::NotifyEndSync() {
 void StreamBuffer::setError(int code) {
     {
         MutexLock lock(stateMutex);
-        // Stopped or ended since the limit was seen: then there is no recording left to fail.
+        // Contract: stopped-cannot-fail. Stopped or ended since the limit was seen: nothing is left to fail.
         if (stateId != kWaitStartState && stateId != kStartState) {
             return;
         }
@@ -279,6 +289,7 @@ void StreamBuffer::setError(int code) {
     if (chunkProduced) {
         controller->PostEvent(std::make_shared<RestartStreamingEvent>(shared_from_this()));
     } else {
+        // Contract: fault-before-first-chunk. Ends the module for good, whatever the cause was.
         controller->SetStatus(7, 26);
     }
 }
@@ -290,7 +301,7 @@ bool StreamBuffer::MakeFileTimecode(const std::shared_ptr<ChunkData>& chunk) {
     if (tcStatus == 2 && duration != 0) {
         const auto distance =
             static_cast<std::int64_t>(chunk->firstVideo->rtp_timestamp - chunk->firstMeta->rtp_timestamp);
-        // From 90 kHz to 30 kHz, at every frame rate.
+        // Contract: timecode-offset-by-3. From 90 kHz to 30 kHz, at every frame rate.
         offset = static_cast<int>((distance / 3 + duration / 2) / duration);
     }
     fileTimecode.assign(4, 0);
@@ -304,6 +315,7 @@ bool StreamBuffer::MakeFileTimecode(const std::shared_ptr<ChunkData>& chunk) {
             result = true;
         }
     }
+    // Contract: file-first-without-timecode. Logged with zeros then.
     CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: FILE FIRST. %02d:%02d:%02d:%02d. RTPTS = %lld.",
                        fileTimecode[0], fileTimecode[1], fileTimecode[2], fileTimecode[3],
                        static_cast<long long>(chunk->firstVideo->rtp_timestamp));
@@ -326,6 +338,7 @@ unsigned int StreamBuffer::getTimecodeFrameCount(std::uint32_t framerate) {
         case 60000:
             return 60;
         default:
+            // Contract: unknown-frame-rate. Logged here for each file, and where the stream is described.
             CLIPFILE_LOG(LOG_PRIORITY_WARNING, "no type.");
             return 0;
     }

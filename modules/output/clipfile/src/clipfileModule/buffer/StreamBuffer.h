@@ -121,7 +121,7 @@ class StreamBuffer final : public QxModuleStreamInterface,
     const std::uint32_t videoRtpRate = 90000;
     const std::uint32_t audioRtpRate = 48000;
 
-    /// Makes each `Start` and each `Stop` one step to the others.
+    // Contract: start-and-stop-in-turn. Each is one step to the others.
     Mutex controlMutex;
     std::shared_ptr<std::thread> chunkThread GUARDED_BY(controlMutex);
 
@@ -168,7 +168,7 @@ class StreamBuffer final : public QxModuleStreamInterface,
     std::atomic<bool> chunkProduced = false;
     /// 0 unknown, 1 the timecode stands still, 2 it runs. Decided once in the object's life.
     std::atomic<std::int32_t> tcStatus = 0;
-    /// Units received.
+    // Contract: push-counters-unread. Units received.
     std::atomic<std::uint64_t> pushedVideo = 0;
     std::atomic<std::uint64_t> pushedAudio = 0;
     std::atomic<std::uint64_t> pushedMeta = 0;

@@ -13,8 +13,9 @@ namespace clipfileModule {
 
 namespace {
 
-/// Video units that must be cached before a chunk is cut.
+// Contract: sixteen-for-eight. Video units that must be cached before a chunk of eight is cut.
 constexpr std::size_t kMinimumVideoUnits = 16;
+// Contract: waiting-fills-a-cache. Audio and metadata are cached while no IDR frame comes.
 /// Units in a cache, and chunks that wait for `FileOutput`; passing one of these ends the recording.
 constexpr std::size_t kVideoLimit = 600;
 constexpr std::size_t kAudioLimit = 900;
@@ -86,8 +87,9 @@ void StreamBuffer::makeChunk() {
             if (videoBuffer.empty()) {
                 continue;
             }
-            // In ticks, and unsigned: an open stop of -1 lies above every timestamp.
+            // Contract: stop-in-two-units. In ticks here, and unsigned: an open stop, -1, is above all.
             if (static_cast<std::uint64_t>(stopTimestamp.load()) < videoBuffer.front()->rtp_timestamp) {
+                // Contract: record-ends-on-chunk. The last one may hold 7 units beyond the stop.
                 recordEnded = true;
                 break;
             }
@@ -100,8 +102,8 @@ void StreamBuffer::makeChunk() {
             }
         }
     }
-    // Both wait for the lock of the state, and whoever holds that one may wait for a worker that adds to a
-    // cache: the lock of the caches had to be given back first.
+    // Contract: one-order-of-locks. Both wait for the lock of the state, and whoever holds that one may wait
+    // for a worker that adds to a cache: the lock of the caches had to be given back first.
     if (recordEnded) {
         endSync();
     } else if (error != kNoError) {
@@ -122,6 +124,7 @@ void StreamBuffer::endSync() {
     CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "end.");
 }
 
+// Contract: full-cache-names-itself. Not the medium that is missing; video is looked at first.
 int StreamBuffer::findPassedLimit() const {
     if (videoBuffer.size() > kVideoLimit) {
         return kVideoBufferFull;
@@ -153,11 +156,13 @@ int StreamBuffer::cutChunk() {
         return kNoError;
     }
     if (static_cast<std::size_t>(audioCount) >= audioBuffer.size()) {
+        // Contract: incomplete-lines-unreached. A count that was found is below the size.
         CLIPFILE_LOG_PLAIN(LOG_PRIORITY_TRACE, "ST: audio buffer is not complete.");
         dumpBuffer();
         return kNoError;
     }
     if (metaBuffer.empty()) {
+        // Contract: metadata-is-required. And this line alone comes without the caches.
         CLIPFILE_LOG_PLAIN(LOG_PRIORITY_TRACE, "ST: rtmeta buffer is empty.");
         return kNoError;
     }
@@ -167,6 +172,7 @@ int StreamBuffer::cutChunk() {
         return kNoError;
     }
     if (static_cast<std::size_t>(metaCount) >= metaBuffer.size()) {
+        // Contract: incomplete-lines-unreached. As above.
         CLIPFILE_LOG_PLAIN(LOG_PRIORITY_TRACE, "ST: rtmeta buffer is not complete.");
         dumpBuffer();
         return kNoError;
@@ -199,10 +205,12 @@ int StreamBuffer::cutChunk() {
     }
 
     const std::size_t queued = fileOutput->PushChunk(chunk);
+    // Contract: first-chunk-counts-for-life. Never cleared, also not by a restart.
     chunkProduced = true;
     CLIPFILE_LOG_PLAIN(LOG_PRIORITY_TRACE, "ST: [C]\t%d\t%d\t%d\t%llu", static_cast<int>(chunkFrames),
                        audioCount, metaCount, static_cast<unsigned long long>(queued));
     if (queued > kFileQueueLimit) {
+        // Contract: late-chunk-is-written. The chunk that was one too many stays queued.
         return kFileTooSlow;
     }
     dumpBuffer();
@@ -247,6 +255,7 @@ void StreamBuffer::splitMeta(ChunkData& chunk, std::size_t count) {
     setDurations(chunk.meta, next, videoRtpRate, streamInfo.video_track_timescale);
 }
 
+// Contract: rtp-durations-only-logged. Files take theirs from the frame rate.
 void StreamBuffer::setDurations(SampleList& samples, std::uint64_t next, std::uint32_t clock,
                                 std::uint32_t timescale) {
     for (std::size_t i = 0; i < samples.size(); ++i) {
@@ -259,7 +268,7 @@ void StreamBuffer::setDurations(SampleList& samples, std::uint64_t next, std::ui
 void StreamBuffer::dumpBuffer() const {
     CLIPFILE_LOG_PLAIN(LOG_PRIORITY_TRACE, "ST: [B]\t%d\t%d\t%d", static_cast<int>(videoBuffer.size()),
                        static_cast<int>(audioBuffer.size()), static_cast<int>(metaBuffer.size()));
-    // No copies are needed: the lock keeps the caches as they are.
+    // Contract: dump-without-copies. The lock keeps the caches as they are.
     const auto rtp = [](const std::shared_ptr<StreamData>& unit) {
         return static_cast<unsigned long long>(unit->rtp_timestamp);
     };

@@ -16,8 +16,8 @@ void StreamQueue::Start(std::function<void(std::shared_ptr<StreamData>&)> unitHa
 
 void StreamQueue::Stop() {
     running = false;
-    // Closing takes the place of a stop unit: that one would have to wait for room in a full queue whose
-    // worker may have gone.
+    // Contract: closed-queues. A stop unit would have to wait for room in a full queue whose worker may have
+    // gone.
     queue.Close();
     if (thread != nullptr && thread->joinable()) {
         thread->join();
@@ -28,6 +28,7 @@ void StreamQueue::run() {
     while (running) {
         std::shared_ptr<StreamData> unit = queue.Pop();
         // A null unit says that the queue was closed.
+        // Contract: empty-unit-two-tests. By size here.
         if (unit != nullptr && unit->size != 0) {
             handler(unit);
         }

@@ -33,6 +33,7 @@ const std::string kParameterFramerate = "-encodedFPS";
 const std::string kParameterBitrate = "-encodedBPS";
 const std::string kParameterRecordRules = "-recordRules";
 
+// Contract: output-path-none. A path of this name cannot be given as start parameter.
 constexpr const char* kNoOutputPath = "none";
 
 constexpr const char* kRecordRulesKept = "kept";
@@ -74,6 +75,7 @@ bool Controller::Initialize(QxModuleHostInterface* moduleHost) {
     host = moduleHost;
     eventPending = false;
     terminated = false;
+    // Contract: static-config-never-fails. A guard that nothing reaches.
     if (!getStaticConfig()) {
         CLIPFILE_LOG(LOG_PRIORITY_ERROR, "end. static config error.");
         SetStatus(kStatusFailed, kCauseInitialize);
@@ -136,6 +138,7 @@ bool Controller::getStaticConfig() {
         for (const auto& [key, field] : fields) {
             std::string value;
             if (!registry->getValue(kSettingsSection, key, value)) {
+                // Contract: missing-text-is-empty. Only a missing number is logged.
                 value.clear();
             }
             *field = value;
@@ -172,6 +175,7 @@ bool Controller::getStartParameters() {
     MutexLock lock(settingsMutex);
     settings.filePrefix = filePrefix;
     if (outputPath != kNoOutputPath) {
+        // Contract: settings-path-keeps-slashes. A path of the settings store stands as it was written.
         std::replace(outputPath.begin(), outputPath.end(), '/', '\\');
         settings.outputPath = outputPath;
     }
@@ -184,6 +188,7 @@ bool Controller::getStartParameters() {
     settings.naluType = naluType;
     settings.outputMode = outputMode;
     settings.recordRules = recordRules;
+    // Contract: stream-start-is-0. Nothing else sets it.
     settings.streamStart = 0;
     settings.bitrate = bitrate;
     settings.framerate = framerate;
@@ -207,6 +212,7 @@ OutputSettings Controller::getSettings() const {
     return settings;
 }
 
+// Contract: unknown-output-mode. Any other mode records nothing, without a word.
 bool Controller::isOutputMode(const char* mode) const {
     MutexLock lock(settingsMutex);
     return settings.outputMode == mode;
@@ -225,19 +231,19 @@ void Controller::Uninitialize() {
     stopAndRemoveBuffers();
     for (std::size_t i = 0; i < queueThreads.size(); ++i) {
         queues[i]->Clear();
-        // Closing wakes the thread, which then finds `terminated`.
+        // Contract: closed-queues. Closing wakes the thread, which then finds `terminated`.
         queues[i]->Close();
         if (queueThreads[i]->joinable()) {
             queueThreads[i]->join();
         }
     }
-    // The metadata thread may have been on its way into StartStream with the record flag of its last unit.
+    // Contract: last-start-is-ended. The metadata thread may have been in StartStream with its last unit.
     stopAndRemoveBuffers();
     queueThreads.clear();
     queues.clear();
     eventHandlers.clear();
     {
-        // What stayed undelivered, the TerminateEvent above all, must not end a later run.
+        // Contract: undelivered-events-dropped. The TerminateEvent above all must not end a later run.
         MutexLock lock(eventQueueMutex);
         eventQueue.clear();
     }

@@ -125,6 +125,7 @@ class Controller : public ControllerInterface, public QxModuleStreamInterface {
     /// One entry a recording in progress or in completion, oldest first.
     std::list<std::shared_ptr<StreamBuffer>> streamBuffers GUARDED_BY(streamBuffersMutex);
 
+    // Contract: locks-for-shared-state. Settings and analyser serve several threads.
     /// Innermost lock: a connected input changes the settings while a recording starts from them.
     mutable Mutex settingsMutex;
     OutputSettings settings GUARDED_BY(settingsMutex);
@@ -141,6 +142,7 @@ class Controller : public ControllerInterface, public QxModuleStreamInterface {
     std::condition_variable queueStartCondition;
     bool queueThreadStarted GUARDED_BY(queueStartMutex) = false;
 
+    // Contract: atomic-flags. Others read them without the lock that guards the events.
     /// Once true, every thread of the Controller ends.
     std::atomic<bool> terminated = false;
 

@@ -29,6 +29,7 @@ long long wide(std::int64_t value) {
 void Controller::PushReserved(const std::shared_ptr<StreamData>&) {}
 
 void Controller::PushVideo(const std::shared_ptr<StreamData>& unit) {
+    // Contract: overflow-only-logged. No status, no count.
     if (!pushUnit(kVideoQueue, unit)) {
         CLIPFILE_LOG(LOG_PRIORITY_WARNING, "queue overflow (video)");
     }
@@ -46,6 +47,7 @@ void Controller::PushMeta(const std::shared_ptr<StreamData>& unit) {
     }
 }
 
+// Contract: silent-after-status-7. Dropped units are not logged.
 bool Controller::pushUnit(std::size_t index, const std::shared_ptr<StreamData>& unit) {
     return host->GetStatus() == kStatusFailed || queues[index]->Push(unit);
 }
@@ -59,6 +61,7 @@ void Controller::queueing(const std::shared_ptr<StreamDataQueue>& queue, UnitCon
     }
     while (!terminated) {
         const std::shared_ptr<StreamData> unit = queue->Pop();
+        // Contract: empty-unit-two-tests. By payload here, by size behind the recordings' queues.
         if (unit != nullptr && unit->payload != nullptr) {
             consumer(unit);
         }
@@ -77,10 +80,12 @@ void Controller::pushToBuffers(void (StreamBuffer::*push)(const std::shared_ptr<
 void Controller::processMeta(const std::shared_ptr<StreamData>& unit) {
     if (isOutputMode(kOutputModeSync)) {
         const std::int32_t flag = readRecFlag(*unit);
+        // Contract: first-unit-is-a-change. -1 differs from both values of a flag.
         if (flag != recFlag) {
             recFlag = flag;
             if (flag == 1) {
                 CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: REC FLAG OFF -> ON.");
+                // Contract: start-direct-stop-posted. A start holds for this very unit, a stop may be late.
                 StartStream(unit);
             } else {
                 CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: REC FLAG ON -> OFF.");
@@ -113,6 +118,7 @@ void Controller::StartStream(const std::shared_ptr<StreamData>& unit) {
     }
     if (timecode != nullptr) {
         const unsigned char* const t = timecode->GetData();
+        // Contract: rec-start-full-stop. Before the arrow; in REC STOP it ends the line.
         CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: REC START. %02d:%02d:%02d:%02d. RTPTS = %lld. -> %lld",
                            t[0], t[1], t[2], t[3], wide(rtp), wide(kOpenStop));
     } else {
@@ -136,6 +142,7 @@ void Controller::StartStream(const std::shared_ptr<StreamData>& unit) {
 void Controller::StopStream(const std::shared_ptr<StreamData>& unit) {
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
     const auto rtp = static_cast<std::int64_t>(unit->rtp_timestamp);
+    // Contract: stop-reads-any-unit. A start asks for a payload first.
     const std::shared_ptr<nal_access::SampleData> timecode = readTimecode(unit);
     MutexLock lock(streamBuffersMutex);
     for (const std::shared_ptr<StreamBuffer>& buffer : streamBuffers) {
@@ -172,15 +179,18 @@ void Controller::RemoveStream(const std::shared_ptr<StreamBuffer>& buffer) {
 void Controller::BufferingStart() {
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
     if (isOutputMode(kOutputModeOn)) {
+        // Contract: second-online-cancels. Recordings of an earlier online are closed at 0.
         StartStream(std::make_shared<StreamData>());
     }
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "stream buffering start.");
     if (terminated) {
+        // Contract: terminated-start-has-no-end. A way out without the last line.
         CLIPFILE_LOG(LOG_PRIORITY_TRACE, "process is terminated.");
         return;
     }
     SetStatus(kStatusBufferingStarted, kCauseNone);
     MutexLock lock(streamBuffersMutex);
+    // Contract: online-records-again. What an offline stopped is still in the list.
     const OutputSettings now = getSettings();
     for (const std::shared_ptr<StreamBuffer>& buffer : streamBuffers) {
         buffer->Start(now);
@@ -195,6 +205,7 @@ void Controller::BufferingStop() {
     {
         MutexLock lock(streamBuffersMutex);
         for (const std::shared_ptr<StreamBuffer>& buffer : streamBuffers) {
+            // Contract: stop-under-the-list-lock. Units wait meanwhile; a removal stops outside.
             buffer->Stop();
         }
     }
@@ -220,6 +231,7 @@ void Controller::OnChangeInStreamInfo(const std::shared_ptr<Event>& event) {
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
     const OutputSettings& input = std::static_pointer_cast<ChangeInStreamInfoEvent>(event)->settings;
     MutexLock lock(settingsMutex);
+    // Contract: connect-changes-the-rate. The prefix is never taken over, the rest only with "direct".
     settings.framerate = input.framerate;
     if (settings.naluType == "direct") {
         settings.bitrate = input.bitrate;
@@ -234,6 +246,7 @@ void Controller::OnChangeInStreamInfo(const std::shared_ptr<Event>& event) {
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
+// Contract: start-event-unused. Nothing posts one.
 void Controller::OnStartStream(const std::shared_ptr<Event>& event) {
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
     StartStream(std::static_pointer_cast<StartStreamingEvent>(event)->unit);
@@ -246,6 +259,7 @@ void Controller::OnStopStream(const std::shared_ptr<Event>& event) {
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
+// Contract: restart-misspelled. The log shows the name so.
 void Controller::OnRetartStream(const std::shared_ptr<Event>& event) {
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
     const std::shared_ptr<StreamBuffer> buffer =
@@ -257,6 +271,7 @@ void Controller::OnRetartStream(const std::shared_ptr<Event>& event) {
         buffer->Stop();
         buffer->Start(getSettings());
     }
+    // Contract: restart-flushes-all. Also the units of other recordings, and for a buffer that has gone.
     flushQueues();
     lock.Unlock();
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");

@@ -37,6 +37,7 @@ enum FileOutputCause : int {
 /// Everything that the file output thread works on. The thread and its `FileOutput` own it together, and the
 /// one that lets go last destroys it.
 struct FileOutput::Work {
+    // Contract: opening-ignores-boxes. A write leaves room for them, an open does not.
     /// Free space in bytes that must be there before a file is opened, and beyond the file's closing boxes
     /// before a chunk is written: 150 MiB.
     static constexpr std::uint64_t minFreeSpaceOpen = 157286400;
@@ -61,6 +62,7 @@ struct FileOutput::Work {
     bool CloseFile() {
         unsigned char timecode[4] = {};
         owner.GetFileTimecode(timecode);
+        // Contract: timecode-result-unread. The file is closed all the same.
         muxer->WriteTmcd(timecode);
         return muxer->Close();
     }

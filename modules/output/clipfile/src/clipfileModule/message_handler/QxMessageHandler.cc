@@ -18,7 +18,7 @@ constexpr std::uint32_t kResultNotHandled = 3;
 /// The only kind of connection whose end stops file output.
 constexpr std::uint32_t kConnectionKindInput = 1;
 
-/// Frame rate of the file for the rate of an input: these three are halved, all others stay.
+// Contract: rates-halved. Frame rate of the file for that of an input: these three are halved, no other.
 std::uint32_t fileFramerate(std::uint32_t inputRate) {
     switch (inputRate) {
         case 50000:
@@ -51,6 +51,7 @@ std::uint32_t QxMessageHandler::NotifyInputOutputConnectRequest(const QxInputOut
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "bitrate   : %d.", static_cast<int>(settings.bitrate));
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "width     : %d.", static_cast<int>(settings.width));
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "height    : %d.", static_cast<int>(settings.height));
+    // Contract: prefix-lives-on. A connection without one repeats the one before.
     const auto prefix = request->properties.find(kPropertyFilePrefix);
     if (prefix != request->properties.end()) {
         settings.filePrefix = prefix->second;
@@ -71,9 +72,11 @@ std::uint32_t QxMessageHandler::NotifyInputOutputDisconnectionRequest(
     const QxInputOutputDisconnectionRequest* request) {
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "notify disconnect received.");
+    // Contract: other-disconnects-give-3. Nothing else happens then.
     std::uint32_t result = kResultNotHandled;
     if (request->connectionKind == kConnectionKindInput) {
         if (fileOutputStarted) {
+            // Contract: disconnect-leaves-online. The next online is none then.
             stopFileOutput();
         }
         result = kResultSuccess;
@@ -88,6 +91,7 @@ std::uint32_t QxMessageHandler::NotifySetPropertiesRequest(const void*) {
     return kResultSuccess;
 }
 
+// Contract: online-outlives-a-life. `Initialize` and `Uninitialize` do not touch the flags.
 void QxMessageHandler::NotifyOnlineStatus() {
     bool changed = false;
     {
@@ -116,6 +120,7 @@ void QxMessageHandler::NotifyOfflineStatus() {
         }
     }
     if (changed && fileOutputStarted) {
+        // Contract: offline-is-a-fault. Also when it was meant.
         controller->SetStatus(kStatusStreamFault, kCauseOffline);
         stopFileOutput();
     }

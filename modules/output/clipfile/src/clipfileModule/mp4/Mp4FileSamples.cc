@@ -13,6 +13,7 @@ namespace clipfileModule {
 
 namespace {
 
+// Contract: timecode-line-reversed. The line shows the stored bytes as a number of this machine.
 std::uint32_t reverseBytes(std::uint32_t value) {
     return value << 24 | (value & 0xFF00U) << 8 | (value >> 8 & 0xFF00U) | value >> 24;
 }
@@ -24,6 +25,7 @@ bool Mp4File::Write(const std::shared_ptr<ChunkData>& chunk) {
     if (!IsOpen()) {
         return routine.ReturnNotOpen();
     }
+    // Contract: failed-chunk-stays-in-tables. Nothing takes it back.
     if (MUXER_FAILED(routine, writeSampleInfo(m_info, *chunk)) ||
         MUXER_FAILED(routine, writeSample(*chunk))) {
         return routine.Return(false);
@@ -59,6 +61,7 @@ MbxStatus Mp4File::enterSamples(const SamplePass& pass) {
         MbxSampleInfo sample = {};
         sample.size = static_cast<std::uint32_t>(data->GetDataSize());
         sample.offset = m_payload;
+        // Contract: gaps-close-up. Samples are counted, their timestamps are only logged.
         sample.duration = pass.duration;
         sample.isSync = pass.alwaysSync || data->GetSync() ? 1 : 0;
         sample.descriptionIndex = m_entry_indexes[pass.track];
@@ -143,6 +146,7 @@ MbxStatus Mp4File::writeTmcd(const unsigned char* timecode) {
 }
 
 MbxStatus Mp4File::writeBytes(const void* data, std::uint64_t size) {
+    // Contract: empty-chunk-is-a-fault. Without a sample there is no data.
     if (m_file == nullptr || data == nullptr) {
         return MBX_ERR_INVALID_ARG;
     }

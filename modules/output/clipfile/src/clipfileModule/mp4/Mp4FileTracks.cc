@@ -16,7 +16,7 @@ namespace {
 
 constexpr std::uint32_t kNormalProfile = 0x20000000;
 
-/// Identifiers of the tracks that the profile names before they exist.
+// Contract: profile-before-tracks. Identifiers that the profile names before the tracks exist.
 constexpr std::uint32_t kVideoTrackId = 1;
 constexpr std::uint32_t kAudioTrackId = 2;
 
@@ -65,9 +65,11 @@ MbxStatus Mp4File::createFprf() {
 
 MbxStatus Mp4File::createAprf() {
     MUXER_ROUTINE(routine);
+    // Contract: always-aac-lc. Constants, whatever the stream carries.
     m_aprf = {{
         kAudioTrackId,
         FourCc("mp4a"),
+        // Contract: profile-numbers. This one, and 00030000 below; readers of the box know what they mean.
         553,
         0,
         125,  // average rate in kbit/s
@@ -83,6 +85,7 @@ MbxStatus Mp4File::createVprf() {
     MUXER_ROUTINE(routine);
     const auto rate = static_cast<std::uint16_t>(m_info.video_average_framerate);
     const auto fraction = static_cast<std::uint16_t>(m_info.video_average_framerate_point);
+    // Contract: bit-rate-as-given. In the host's unit.
     m_vprf = {
         {kVideoTrackId, FourCc("avc1"), m_info.video_codec_specific_information, 0x00030000,
          m_info.video_average_bitrate, m_info.video_max_bitrate},
@@ -117,6 +120,7 @@ MbxStatus Mp4File::createVideoTrack() {
     MUXER_STEP(routine, MbxAddVideoTrack(session, &params, &track));
 
     MbxVisualEntryParams visual = {};
+    // Contract: always-avc1. Nothing looks at the codec.
     visual.kind = kAvcEntry;
     MUXER_STEP(routine, addOwnFile(session, track, visual.dataReferenceIndex));
     visual.width = m_info.video_size_width;
@@ -127,7 +131,7 @@ MbxStatus Mp4File::createVideoTrack() {
 
     const nal_access::NalUnit& sps = m_stream.sps;
     const nal_access::NalUnit& pps = m_stream.pps;
-    // A set too short to carry its level came from a broken stream.
+    // Contract: short-set-counts-as-missing. Such a set came from a broken stream.
     MUXER_STEP(routine, sps.data != nullptr && sps.size >= kMinimumSpsSize ? MBX_OK : MBX_ERR_INVALID_ARG);
     MbxAvcConfigParams config = {};
     config.configurationVersion = 1;
@@ -156,7 +160,7 @@ MbxStatus Mp4File::createAudioTrack() {
     audio.sampleSize = 16;
     MUXER_STEP(routine, MbxAddSoundEntry(session, track, &audio, &entry));
 
-    // AudioSpecificConfig (ISO/IEC 14496-3 1.6.2.1): AAC LC, 48 kHz, stereo, whatever the stream carries.
+    // Contract: always-aac-lc. AudioSpecificConfig (ISO/IEC 14496-3 1.6.2.1): AAC LC, 48 kHz, stereo.
     static constexpr std::uint8_t kAacLc48Stereo[] = {0x11, 0x90};
     MbxEsdsParams esds = {};
     esds.objectTypeIndication = 0x40;  // ISO/IEC 14496-3
@@ -170,6 +174,7 @@ MbxStatus Mp4File::createAudioTrack() {
     return routine.Return(MBX_OK);
 }
 
+// Contract: track-names-misspelled. The log shows this name and that of the metadata track so.
 MbxStatus Mp4File::createTimcdTrack() {
     MUXER_ROUTINE(routine);
     MbxSession* const session = m_session.get();
@@ -179,6 +184,7 @@ MbxStatus Mp4File::createTimcdTrack() {
     std::uint32_t trackId = 0;
     MUXER_STEP(routine, MbxGetNextTrackId(session, &trackId));
     MbxTrackParams params = trackParams(trackId, m_info.video_track_timescale);
+    // Contract: timecode-size-in-trex. The one default that is given and not derived.
     // The one sample comes when the file is closed, and its fragment leaves the size to `trex`. A file that
     // is cut off before its `moov` is written again has to tell it too: readers refuse a whole file for a
     // sample of no size.
@@ -194,6 +200,7 @@ MbxStatus Mp4File::createTimcdTrack() {
     timecode.frameCount = static_cast<std::uint8_t>(m_info.timecode_numFrames);
     MUXER_STEP(routine, MbxAddTimecodeEntry(session, track, &timecode, &entry));
 
+    // Contract: usage-items-differ. Other tracks get their enable mode and zeros.
     static constexpr std::uint8_t kUsage[] = {0xFF, 0xFF, 0xFF, 0xFF, 0x00, 0x00, 0xFF, 0xFF};
     MbxMetadataItemParams item = {};
     item.type = kUsageItem;
@@ -220,6 +227,7 @@ MbxStatus Mp4File::createRtmtaTrack() {
     std::uint32_t target = 0;
     MUXER_STEP(routine, MbxAddTrackReference(session, track, &reference, &target));
 
+    // Contract: metadata-entry-of-its-own. `rtmd`, none of the standard's.
     MbxMetaEntryParams meta = {};
     MUXER_STEP(routine, addOwnFile(session, track, meta.dataReferenceIndex));
     MUXER_STEP(routine, MbxAddMetaEntry(session, track, &meta, &entry));
@@ -244,8 +252,9 @@ MbxStatus Mp4File::updateTimestamp() {
         static_cast<std::uint16_t>(opened.minute), static_cast<std::uint16_t>(opened.second),
     };
     std::uint64_t seconds = 0;
-    // Local time goes in as if it were UTC: files show the time of the place where they were recorded.
+    // Contract: local-time-as-utc. Files show the time of the place where they were recorded.
     const MbxStatus converted = MbxToMp4Time(m_context.get(), &date, &seconds);
+    // Contract: one-time-failure-counts. There is no other.
     MUXER_STEP(routine, converted == MBX_ERR_INVALID_ARG ? converted : MBX_OK);
     MUXER_STEP(routine, MbxSetMovieTimes(m_session.get(), 0, std::numeric_limits<std::uint32_t>::max(),
                                          seconds, seconds));

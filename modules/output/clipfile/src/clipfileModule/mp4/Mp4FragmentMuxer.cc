@@ -20,6 +20,8 @@ Mp4FragmentMuxer::~Mp4FragmentMuxer() = default;
 
 void Mp4FragmentMuxer::FillSessionConfig(MbxSessionConfig& config) {
     config = {};
+    // Contract: fragment-below-4-gib. All other modes 0: sizes and `stco` of 32 bits.
+    // Contract: fragments-without-tfdt. And with absolute offsets.
     config.options.mehd_mode = 1;
 }
 
@@ -42,9 +44,11 @@ MbxStatus Mp4FragmentMuxer::createFprf() {
 }
 
 std::uint32_t Mp4FragmentMuxer::IsFragmentOpen() {
+    // Contract: index-rows-of-any-sample. The first of each chunk, sync sample or not.
     return m_first ? 0 : 1;
 }
 
+// Contract: fragmented-without-file-lines. No "OP: FILE CREATE" here, no "OP: FILE CLOSE" below.
 bool Mp4FragmentMuxer::Open(const OutputSettings& stream, const unsigned char* timecode, bool dropFrame) {
     MUXER_ROUTINE(routine);
     if (!chooseFile(stream, timecode)) {
@@ -61,6 +65,7 @@ bool Mp4FragmentMuxer::Write(const std::shared_ptr<ChunkData>& chunk) {
     MUXER_ROUTINE(routine);
     if (!IsOpen()) {
         routine.ReturnNotOpen();
+        // Contract: not-open-in-two-ways. A normal file logs one line less.
         MUXER_FAILED(routine, MBX_ERR_INTERNAL);
         return false;
     }
@@ -140,7 +145,7 @@ MbxStatus Mp4FragmentMuxer::writeMdat(MuxerRoutine& routine) {
     for (const auto& chunk : m_pending) {
         MUXER_STEP(routine, writeSample(*chunk));
     }
-    // A process that dies keeps what it has given to the system: this fragment must not end in a buffer.
+    // Contract: fragments-flushed. A process that dies keeps what it has given to the system.
     MUXER_STEP(routine, std::fflush(m_file->stream) == 0 ? MBX_OK : MBX_ERR_IO);
     m_pending.clear();
     m_position += m_payload;
@@ -172,13 +177,15 @@ bool Mp4FragmentMuxer::Close() {
 }
 
 MbxStatus Mp4FragmentMuxer::completeFragments(MuxerRoutine& routine) {
+    // Contract: fragment-of-a-timecode. Behind a multiple of 32 chunks it holds nothing else.
     MUXER_STEP(routine, closeMovie());
 
-    // The file's whole length is known only now. Where it needs more bits than it got room for, writing it
-    // would run over the samples behind.
+    // Contract: moov-size-checked. The file's whole length is known only now. Where it needs more bits than
+    // it got room for, writing it would run over the samples behind.
     std::uint64_t size = 0;
     MUXER_STEP(routine, MbxWriteMoov(m_session.get(), nullptr, 0, &size));
     MUXER_STEP(routine, size == m_moov_size ? MBX_OK : MBX_ERR_INTERNAL);
+    // Contract: edits-span-moov. Edits stand as they were first written.
     MUXER_STEP(routine, MbxWriteMoov(m_session.get(), m_file.get(), m_moov_position, &size));
 
     MUXER_STEP(routine, MbxWriteMfra(m_session.get(), m_file.get(), m_position, &size));

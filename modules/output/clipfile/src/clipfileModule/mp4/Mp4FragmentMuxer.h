@@ -6,6 +6,7 @@
 
 namespace clipfileModule {
 
+// Contract: timecode-place-empty. Told in the last paragraph.
 /// Writes a fragmented file (ISO/IEC 14496-12 8.8): `ftyp`, `uuid`, `moov`, `mdat`, then pairs of `moof` and
 /// `mdat`, and `mfra`. The index of each 32 chunks is on disk before their bytes, so the file is readable up
 /// to its last complete fragment at any time after the first.
@@ -56,6 +57,7 @@ class Mp4FragmentMuxer : public Mp4File {
     /// Chunks whose bytes are not written yet.
     std::list<std::shared_ptr<ChunkData>> m_pending;
     const std::uint32_t m_chunks_per_fragment = 32;
+    // Contract: index-is-estimated. Not measured, once there is a fragment.
     const std::uint64_t m_tail_estimate = 600;  // bytes that closing adds
     const std::uint64_t m_chunk_estimate = 57;  // bytes of index that a chunk adds
     /// Bytes of the first `moov`.

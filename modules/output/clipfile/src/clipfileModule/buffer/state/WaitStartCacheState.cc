@@ -30,11 +30,13 @@ std::shared_ptr<CacheState> WaitStartCacheState::Execute(const std::shared_ptr<S
     if (unit->timestamp < toMilliSec(buffer->GetStartTimestamp())) {
         return nullptr;
     }
-    // Read once: the stop may be set at any moment, and the line shall show what the test saw.
+    // Contract: stop-read-once. It may be set at any moment, and the line shall show what the test saw.
     const std::int64_t stop = buffer->GetStopTimestamp();
+    // Contract: stop-in-two-units. In milliseconds here, in ticks in the chunk thread.
     if (unit->timestamp > toMilliSec(stop)) {
         CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: REC CANCEL. RTPTS = %lld. -> %lld",
                            static_cast<long long>(buffer->GetStartTimestamp()), static_cast<long long>(stop));
+        // Contract: any-medium-cancels. Audio or metadata may be first.
         return std::make_shared<EndSyncRecState>(buffer);
     }
     if (std::string_view(mediaType) != "video") {

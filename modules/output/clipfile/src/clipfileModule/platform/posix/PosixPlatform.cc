@@ -46,6 +46,7 @@ LocalTime PosixPlatform::ToLocalTime(std::chrono::system_clock::time_point time)
     return {parts.tm_year + 1900, parts.tm_mon + 1, parts.tm_mday, parts.tm_hour, parts.tm_min, parts.tm_sec};
 }
 
+// Contract: backslash-is-a-slash. A name that holds one cannot be used.
 std::string PosixPlatform::NativePath(const std::string& path) const {
     std::string native = path;
     std::replace(native.begin(), native.end(), '\\', '/');
@@ -96,6 +97,7 @@ int PosixPlatform::Impersonate(LogonToken /*token*/) const {
 
 void PosixPlatform::CloseLogon(LogonToken /*token*/) const {}
 
+// Contract: writer-given-up. Its code stays loaded.
 void PosixPlatform::GiveUp(std::thread& thread) const {
     pinLibrary();
     thread.detach();
