@@ -41,7 +41,7 @@ QxMessageHandler::~QxMessageHandler() {
 }
 
 std::uint32_t QxMessageHandler::NotifyInputOutputConnectRequest(const QxInputOutputConnectRequest* request) {
-    if (!isRunning()) {
+    if (!mayCall("NotifyInputOutputConnectRequest")) {
         return kResultNotHandled;
     }
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
@@ -64,7 +64,7 @@ std::uint32_t QxMessageHandler::NotifyInputOutputConnectRequest(const QxInputOut
 }
 
 std::uint32_t QxMessageHandler::NotifyModuleConnectionRequestReply(const void*) {
-    if (!isRunning()) {
+    if (!mayCall("NotifyModuleConnectionRequestReply")) {
         return kResultNotHandled;
     }
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
@@ -75,7 +75,7 @@ std::uint32_t QxMessageHandler::NotifyModuleConnectionRequestReply(const void*) 
 
 std::uint32_t QxMessageHandler::NotifyInputOutputDisconnectionRequest(
     const QxInputOutputDisconnectionRequest* request) {
-    if (!isRunning()) {
+    if (!mayCall("NotifyInputOutputDisconnectionRequest")) {
         return kResultNotHandled;
     }
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
@@ -92,7 +92,7 @@ std::uint32_t QxMessageHandler::NotifyInputOutputDisconnectionRequest(
 }
 
 std::uint32_t QxMessageHandler::NotifySetPropertiesRequest(const void*) {
-    if (!isRunning()) {
+    if (!mayCall("NotifySetPropertiesRequest")) {
         return kResultNotHandled;
     }
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
@@ -101,7 +101,7 @@ std::uint32_t QxMessageHandler::NotifySetPropertiesRequest(const void*) {
 }
 
 void QxMessageHandler::NotifyOnlineStatus() {
-    if (!isRunning()) {
+    if (!mayCall("NotifyOnlineStatus")) {
         return;
     }
     bool changed = false;
@@ -120,7 +120,7 @@ void QxMessageHandler::NotifyOnlineStatus() {
 }
 
 void QxMessageHandler::NotifyOfflineStatus() {
-    if (!isRunning()) {
+    if (!mayCall("NotifyOfflineStatus")) {
         return;
     }
     bool changed = false;
@@ -157,11 +157,11 @@ void QxMessageHandler::stopFileOutput() {
     fileOutputStarted = false;
 }
 
-bool QxMessageHandler::isRunning() const {
+bool QxMessageHandler::mayCall(const char* notification) const {
     if (controller->IsRunning()) {
         return true;
     }
-    CLIPFILE_LOG(LOG_PRIORITY_WARNING, "notification is called without initialize.");
+    CLIPFILE_LOG(LOG_PRIORITY_WARNING, "%s is called without initialize.", notification);
     return false;
 }
 

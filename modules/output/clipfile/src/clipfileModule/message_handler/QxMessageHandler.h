@@ -40,8 +40,8 @@ class QxMessageHandler : public QxModuleNotifyInterface {
  private:
     void startFileOutput();
     void stopFileOutput();
-    /// False, with a log line, where the host may not call.
-    bool isRunning() const;
+    /// False, with a log line, outside a life of the module.
+    bool mayCall(const char* notification) const;
 
     ControllerInterface* controller;
     /// Only prefix, bit rate, frame rate and picture size are ever filled. The prefix lives on from one
