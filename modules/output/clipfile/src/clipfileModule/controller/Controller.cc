@@ -75,6 +75,7 @@ bool Controller::Initialize(QxModuleHostInterface* moduleHost) {
     }
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
     recFlag = -1;
+    strayUnitNoted = false;
     host = moduleHost;
     eventPending = false;
     terminated = false;
@@ -132,7 +133,6 @@ bool Controller::Initialize(QxModuleHostInterface* moduleHost) {
         startQueueThread(i, consumers[i]);
         CLIPFILE_LOG(LOG_PRIORITY_TRACE, "count = %d.", static_cast<int>(i));
     }
-    strayUnitNoted = false;
     intake = channel.get();
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
     return true;
