@@ -195,6 +195,9 @@ void FileOutputRecorder::OnStop(const void* output) {
     if (writer != nullptr) {
         writer->Stop();
     }
+    if (hook) {
+        hook();
+    }
 }
 
 std::size_t FileOutputRecorder::OnChunk(const void* output, const std::shared_ptr<ChunkData>& chunk) {

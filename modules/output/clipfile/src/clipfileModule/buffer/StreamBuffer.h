@@ -60,6 +60,9 @@ class StreamBuffer final : public QxModuleStreamInterface,
     /// `std::system_error` then: units are dropped from now on, and the next `Stop`, `Start` or the
     /// destruction on another thread does what is left.
     void Stop() EXCLUDES(controlMutex);
+    /// Sets where the record starts: units before it do not belong to it. Has an effect until the recording
+    /// has met its first IDR frame.
+    void SetStartTimestamp(std::int64_t start) { startTimestamp = start; }
     /// Sets where the record ends; -1 leaves it open.
     void SetStopTimestamp(std::int64_t stop) { stopTimestamp = stop; }
     /// With exact rules: the first instant, in 90 kHz ticks, that does not belong to the record any more; -1
