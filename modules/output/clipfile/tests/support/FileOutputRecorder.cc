@@ -189,6 +189,9 @@ void FileOutputRecorder::OnStop(const void* output) {
         hook = stopHook_;
         changed_.notify_all();
     }
+    if (hook) {
+        hook();
+    }
     if (writer != nullptr) {
         writer->Stop();
     }
