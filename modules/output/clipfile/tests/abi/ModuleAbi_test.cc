@@ -205,6 +205,7 @@ TEST_F(ModuleAbi, WholeOrderRunsAgainAfterUnloadAndReload) {
     EXPECT_FALSE(LoadedModule::IsLoaded());
     const LoadedModule again;
     ASSERT_NE(again.Get(), nullptr);
+    again.StartLog();
     RunWholeOrder(*again.Get(), false);
 }
 
@@ -234,6 +235,7 @@ TEST_F(ModuleAbi, LibraryCanBeUnloadedAndLoadedAfterAFailedInitialize) {
     EXPECT_FALSE(LoadedModule::IsLoaded());
     const LoadedModule again;
     ASSERT_NE(again.Get(), nullptr);
+    again.StartLog();
     RunWholeOrder(*again.Get(), false);
 }
 

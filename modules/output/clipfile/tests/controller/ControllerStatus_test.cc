@@ -15,6 +15,7 @@
 #include "buffer/StreamBuffer.h"
 #include "controller/Controller.h"
 #include "message_handler/QxMessageHandler.h"
+#include "support/ControllerPeer.h"
 #include "support/FakeHost.h"
 #include "support/FakeRegistry.h"
 #include "support/FileOutputRecorder.h"
@@ -49,6 +50,7 @@ class ControllerStatusTest : public testing::Test {
  protected:
     ControllerStatusTest() { registry_.Set("MP4OutputPath", "a"); }
     void SetUp() override {
+        host_.numbers["-encodedFPS"] = 25000;
         ASSERT_TRUE(controller_.Initialize(&host_));
         ASSERT_TRUE(settleEventLoop(controller_, host_, log_));
         handler_.NotifyOnlineStatus();
@@ -63,6 +65,21 @@ class ControllerStatusTest : public testing::Test {
         ASSERT_TRUE(outputs_.WaitFor(
             [](const auto& outputs) { return !outputs.empty() && outputs.back().calls.back() == "Start"; }));
     }
+    /// Pushes frames, one after the other, until `condition` holds.
+    template <typename Condition>
+    void PushUntil(Condition condition) {
+        ASSERT_TRUE(waitUntil([&] {
+            controller_.PushMeta(clock_.Meta(frame_));
+            for (; audio_ < clock_.AudioBefore(frame_ + 1); ++audio_) {
+                controller_.PushAudio(clock_.Audio(audio_));
+            }
+            controller_.PushVideo(
+                clock_.Video(frame_, frame_ % 10 == 0 ? stream_units::kIdr : stream_units::kPicture));
+            ++frame_;
+            return waitUntil([&] { return peer_.Queue(0).Size() + peer_.Queue(1).Size() == 0; }) &&
+                   condition();
+        }));
+    }
     Statuses Since(std::size_t first) const {
         const Statuses all = host_.Statuses();
         return {all.begin() + static_cast<std::ptrdiff_t>(first), all.end()};
@@ -73,7 +90,11 @@ class ControllerStatusTest : public testing::Test {
     FileOutputRecorder outputs_;
     CallingHost host_;
     Controller controller_;
+    ControllerPeer peer_{controller_};
     QxMessageHandler handler_{&controller_};
+    const stream_units::StreamClock clock_{};
+    std::uint64_t frame_ = 0;
+    std::uint64_t audio_ = 0;
 };
 
 TEST_F(ControllerStatusTest, NothingFollowsA7ThatComesWhileTheHostIsAskedForItsStatus) {
@@ -166,6 +187,30 @@ TEST_F(ControllerStatusTest, AHostMayDisconnectFromInsideAStatusThatADisconnectS
     };
     EXPECT_EQ(handler_.NotifyInputOutputDisconnectionRequest(&request), 0U);
     EXPECT_EQ(host_.Statuses(), (Statuses{{4, 0}, {3, 0}, {7, 27}}));
+}
+
+TEST_F(ControllerStatusTest, AHostThatGoesOfflineFromInsideAFaultOfTheStreamCanComeBack) {
+    std::atomic<int> thrown = 0;
+    outputs_.SetQueueSize(49);
+    host_.inSetStatus = [&](FakeHost::Status status) {
+        if (status == FakeHost::Status{6, 22}) {
+            try {
+                handler_.NotifyOfflineStatus();
+            } catch (const std::system_error&) {
+                ++thrown;
+            }
+        }
+    };
+    PushUntil([&] { return thrown == 1; });
+    ASSERT_TRUE(host_.WaitForStatus({3, 0}));
+    EXPECT_EQ(host_.Statuses(), (Statuses{{4, 0}, {6, 22}, {6, 26}, {3, 0}}));
+    outputs_.SetQueueSize(0);
+    handler_.NotifyOnlineStatus();
+    PushUntil([&] {
+        const auto outputs = outputs_.Outputs();
+        return outputs.size() > 1 && outputs[1].chunkCount > 0;
+    });
+    EXPECT_EQ(Since(4), (Statuses{{4, 0}}));
 }
 
 TEST_F(ControllerStatusTest, ARecordingThatCannotBeJoinedKeepsNoneOfTheOthersRunning) {
