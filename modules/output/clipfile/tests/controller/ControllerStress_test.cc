@@ -23,7 +23,6 @@
 #include <vector>
 
 #include "LogSink.h"
-#include "common/SchedulePoint.h"
 #include "controller/Controller.h"
 #include "controller/Status.h"
 #include "message_handler/QxMessageHandler.h"
@@ -86,14 +85,18 @@ class LossWatch : public LogSinkInterface {
     std::vector<std::uint64_t> atStart_;
 };
 
-/// A host whose answers take time, during which others may come to it. Notes what must not happen: a status
+/// A host whose answers may take time, during which others come to it. Notes what must not happen: a status
 /// behind a 7.
 class WatchedHost : public FakeHost {
  public:
-    explicit WatchedHost(LossWatch& losses) : losses_(losses) {}
+    WatchedHost(LossWatch& losses, std::uint64_t seed)
+        : losses_(losses), random_(static_cast<std::uint32_t>(seed)) {}
     int GetStatus() override {
         const int status = FakeHost::GetStatus();
-        SchedulePoint();
+        // Slow to answer whom it notifies, and not those who push.
+        if (std::this_thread::get_id() == notifier_) {
+            std::this_thread::sleep_for(std::chrono::microseconds(random_() % 5000));
+        }
         return status;
     }
     void SetStatus(int status, int cause) override {
@@ -101,7 +104,6 @@ class WatchedHost : public FakeHost {
             ++late_;
         }
         FakeHost::SetStatus(status, cause);
-        SchedulePoint();
         if (status == kStatusFailed) {
             // The module drops from now on what is pushed, without a line.
             losses_.Lose();
@@ -114,6 +116,9 @@ class WatchedHost : public FakeHost {
 
  private:
     LossWatch& losses_;
+    const std::thread::id notifier_ = std::this_thread::get_id();
+    /// Used by the notifying thread alone.
+    std::minstd_rand random_;
     std::atomic<bool> failed_ = false;
     std::atomic<int> late_ = 0;
 };
@@ -235,7 +240,7 @@ class Stress {
 
     /// One life of the module, from `Initialize` to `Uninitialize`.
     void Live(steady_clock::time_point end) {
-        WatchedHost host(*losses_);
+        WatchedHost host(*losses_, seed_ + lives_);
         host.texts["-outputMode"] = pick(2) == 0 ? "on" : "sync";
         host.texts["-naluType"] = pick(2) == 0 ? "normal" : "direct";
         const bool exact = pick(3) == 0;
