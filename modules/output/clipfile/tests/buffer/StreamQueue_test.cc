@@ -178,7 +178,8 @@ TEST(StreamQueue, FinishFirstHandlesTheUnitsThatWait) {
     ASSERT_TRUE(queue.queue.Push(makeUnit(1)));
     ASSERT_TRUE(queue.queue.Push(makeUnit(2)));
     std::thread finisher([&] { queue.Finish(); });
-    ASSERT_TRUE(waitUntil([&] { return !queue.queue.Push(makeUnit(3)); }));
+    // Units of size 0 are not handled.
+    ASSERT_TRUE(waitUntil([&] { return !queue.queue.Push(std::make_shared<StreamData>()); }));
     handler.Release();
     finisher.join();
     EXPECT_EQ(handler.Entered(), (std::vector<std::uint64_t>{0, 1, 2}));
