@@ -1,6 +1,7 @@
 #include "buffer/StreamBuffer.h"
 
 #include <algorithm>
+#include <cmath>
 #include <cstring>
 #include <iterator>
 #include <utility>
@@ -9,6 +10,7 @@
 #include "buffer/state/ErrorCacheState.h"
 #include "buffer/state/StopCacheState.h"
 #include "buffer/state/WaitStartCacheState.h"
+#include "common/JoinThread.h"
 #include "common/Log.h"
 
 namespace clipfileModule {
@@ -46,7 +48,12 @@ StreamBuffer::StreamBuffer(ControllerInterface* owner, std::int64_t start, std::
       startTimestamp(start),
       stopTimestamp(stop) {}
 
-StreamBuffer::~StreamBuffer() = default;
+StreamBuffer::~StreamBuffer() {
+    MutexLock control(controlMutex);
+    if (stopPending) {
+        finishStop();
+    }
+}
 
 void StreamBuffer::Start(const OutputSettings& recordSettings) {
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
@@ -54,6 +61,9 @@ void StreamBuffer::Start(const OutputSettings& recordSettings) {
     if (stateId != kStopState) {
         CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
         return;
+    }
+    if (stopPending) {
+        finishStop();
     }
     settings = recordSettings;
     auto output = std::make_shared<FileOutput>();
@@ -67,6 +77,7 @@ void StreamBuffer::Start(const OutputSettings& recordSettings) {
         videoBuffer.clear();
         audioBuffer.clear();
         metaBuffer.clear();
+        firstPicture.reset();
         metaBlock.assign(std::begin(kMetaBlock), std::end(kMetaBlock));
         chunkedVideo = 0;
         chunkedAudio = 0;
@@ -89,7 +100,7 @@ void StreamBuffer::Start(const OutputSettings& recordSettings) {
     {
         MutexLock lock(stateMutex);
         queues = started;
-        changeState(std::make_shared<WaitStartCacheState>(this));
+        changeState(std::make_shared<WaitStartCacheState>(this, settings.recordRules));
     }
     UnitList StreamBuffer::*const caches[] = {&StreamBuffer::videoBuffer, &StreamBuffer::audioBuffer,
                                               &StreamBuffer::metaBuffer};
@@ -111,35 +122,55 @@ void StreamBuffer::Stop() {
         // A push may wait here for room in a queue. Its worker runs until it is stopped below, and nothing
         // that the worker waits for waits for this lock, so the push gets its room and the lock comes free.
         MutexLock lock(stateMutex);
-        if (stateId == kStopState) {
+        if (stateId == kStopState && !stopPending) {
             CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
             return;
         }
-        changeState(std::make_shared<StopCacheState>(this));
-        stopped.swap(queues);
+        if (stateId != kStopState) {
+            // A record that found its end has nothing more to cut.
+            restPending = isExact() && (stateId == kStartState || stateId == kErrorState);
+            stopPending = true;
+            changeState(std::make_shared<StopCacheState>(this));
+            stopped.swap(queues);
+        }
     }
     // Contract: leftovers-dropped. Units in queues and caches are not written.
     for (std::shared_ptr<StreamQueue>& queue : stopped) {
         if (queue != nullptr) {
-            queue->Stop();
+            if (restPending) {
+                queue->Finish();
+            } else {
+                queue->Stop();
+            }
             queue.reset();
         }
     }
+    finishStop();
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
+}
+
+void StreamBuffer::finishStop() {
     Cancel();
-    // Contract: restart-forgets-the-stop. A stop that was commanded is lost.
-    startTimestamp = 0;
-    stopTimestamp = -1;
     std::shared_ptr<FileOutput> output;
     {
         MutexLock lock(bufferMutex);
-        output.swap(fileOutput);
+        if (restPending) {
+            cutRest();
+            restPending = false;
+        }
+        output = fileOutput;
     }
+    startTimestamp = 0;
+    stopTimestamp = -1;
+    endTimestamp = -1;
     if (output != nullptr) {
+        // It throws on its own thread, and must outlive that thread.
         output->Stop();
         output->Uninitialize();
-        output.reset();
+        MutexLock lock(bufferMutex);
+        fileOutput.reset();
     }
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
+    stopPending = false;
 }
 
 void StreamBuffer::Cancel() {
@@ -153,7 +184,7 @@ void StreamBuffer::Cancel() {
                 MutexLock lock(bufferMutex);
                 bufferCondition.notify_one();
             }
-            chunkThread->join();
+            JoinThread(*chunkThread);
             CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end join...");
         }
         chunkThread.reset();
@@ -244,15 +275,21 @@ void StreamBuffer::SetVideoSequenceHeader(const nal_access::NalUnit& sps, const 
     const std::uint64_t half = static_cast<std::uint64_t>(frameMilliSec) >> 1;
 
     MutexLock lock(bufferMutex);
-    const std::uint64_t limit = unit->timestamp == 0 ? 0 : unit->timestamp - half;
-    removeBefore(videoBuffer, limit);
-    removeBefore(audioBuffer, limit);
-    removeBefore(metaBuffer, limit);
+    if (!isExact()) {
+        const std::uint64_t limit = unit->timestamp == 0 ? 0 : unit->timestamp - half;
+        removeBefore(videoBuffer, limit);
+        removeBefore(audioBuffer, limit);
+        removeBefore(metaBuffer, limit);
+    }
     settings.sps = sps;
     settings.pps = pps;
     fileOutput->Start(settings);
     // Contract: idr-frame-unsorted. The cache is empty here.
     videoBuffer.push_back(unit);
+    firstPicture = unit;
+    if (isExact()) {
+        startInStep();
+    }
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
@@ -286,11 +323,14 @@ void StreamBuffer::setError(int code) {
         changeState(std::make_shared<ErrorCacheState>(this));
     }
     controller->SetStatus(6, code);
-    if (chunkProduced) {
-        controller->PostEvent(std::make_shared<RestartStreamingEvent>(shared_from_this()));
-    } else {
-        // Contract: fault-before-first-chunk. Ends the module for good, whatever the cause was.
+    if (!chunkProduced) {
         controller->SetStatus(7, 26);
+        return;
+    }
+    MutexLock lock(stateMutex);
+    // The host may have stopped it inside its status. What is stopped must not begin again.
+    if (stateId == kErrorState) {
+        controller->PostEvent(std::make_shared<RestartStreamingEvent>(shared_from_this()));
     }
 }
 
@@ -301,8 +341,12 @@ bool StreamBuffer::MakeFileTimecode(const std::shared_ptr<ChunkData>& chunk) {
     if (tcStatus == 2 && duration != 0) {
         const auto distance =
             static_cast<std::int64_t>(chunk->firstVideo->rtp_timestamp - chunk->firstMeta->rtp_timestamp);
-        // Contract: timecode-offset-by-3. From 90 kHz to 30 kHz, at every frame rate.
-        offset = static_cast<int>((distance / 3 + duration / 2) / duration);
+        if (isExact()) {
+            offset = framesIn(distance);
+        } else {
+            // From 90 kHz to 30 kHz, at every frame rate.
+            offset = static_cast<int>((distance / 3 + duration / 2) / duration);
+        }
     }
     fileTimecode.assign(4, 0);
     bool result = false;
@@ -320,6 +364,11 @@ bool StreamBuffer::MakeFileTimecode(const std::shared_ptr<ChunkData>& chunk) {
                        fileTimecode[0], fileTimecode[1], fileTimecode[2], fileTimecode[3],
                        static_cast<long long>(chunk->firstVideo->rtp_timestamp));
     return result;
+}
+
+int StreamBuffer::framesIn(std::int64_t distance) const {
+    const double ticks = static_cast<double>(distance) * streamInfo.video_track_timescale / videoRtpRate;
+    return static_cast<int>(std::llround(ticks / streamInfo.video_sample_duration));
 }
 
 unsigned int StreamBuffer::getTimecodeFrameCount(std::uint32_t framerate) {

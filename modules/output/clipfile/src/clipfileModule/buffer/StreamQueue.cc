@@ -19,6 +19,15 @@ void StreamQueue::Stop() {
     // Contract: closed-queues. A stop unit would have to wait for room in a full queue whose worker may have
     // gone.
     queue.Close();
+    join();
+}
+
+void StreamQueue::Finish() {
+    queue.Finish();
+    join();
+}
+
+void StreamQueue::join() {
     if (thread != nullptr && thread->joinable()) {
         thread->join();
     }
@@ -27,9 +36,11 @@ void StreamQueue::Stop() {
 void StreamQueue::run() {
     while (running) {
         std::shared_ptr<StreamData> unit = queue.Pop();
-        // A null unit says that the queue was closed.
-        // Contract: empty-unit-two-tests. By size here.
-        if (unit != nullptr && unit->size != 0) {
+        if (unit == nullptr) {
+            // The queue was closed, or finished and is empty.
+            break;
+        }
+        if (unit->size != 0) {
             handler(unit);
         }
     }

@@ -70,15 +70,25 @@ Controller::Controller() = default;
 Controller::~Controller() = default;
 
 bool Controller::Initialize(QxModuleHostInterface* moduleHost) {
+    if (IsRunning()) {
+        CLIPFILE_LOG(LOG_PRIORITY_WARNING, "initialize is called twice.");
+        return true;
+    }
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
     recFlag = -1;
+    strayUnitNoted = false;
     host = moduleHost;
     eventPending = false;
     terminated = false;
-    // Contract: static-config-never-fails. A guard that nothing reaches.
+    const auto channel = std::make_shared<StatusChannel>(moduleHost);
+    {
+        MutexLock lock(statusMutex);
+        statusChannel = channel;
+    }
     if (!getStaticConfig()) {
         CLIPFILE_LOG(LOG_PRIORITY_ERROR, "end. static config error.");
         SetStatus(kStatusFailed, kCauseInitialize);
+        endStatusChannel();
         return false;
     }
     {
@@ -88,9 +98,12 @@ bool Controller::Initialize(QxModuleHostInterface* moduleHost) {
     if (!getStartParameters()) {
         CLIPFILE_LOG(LOG_PRIORITY_ERROR, "end. file output path is none.");
         SetStatus(kStatusFailed, kCauseInitialize);
+        endStatusChannel();
         return false;
     }
     const OutputSettings now = getSettings();
+    isExact = now.recordRules == RecordRules::kExact;
+    isSync = isOutputMode(kOutputModeSync);
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "file output path = %s.", now.outputPath.c_str());
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "fileType   = %s.", now.fileType.c_str());
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "naluType   = %s.", now.naluType.c_str());
@@ -113,14 +126,15 @@ bool Controller::Initialize(QxModuleHostInterface* moduleHost) {
     queueThreads.resize(kQueueCount);
     queues.resize(kQueueCount);
     const UnitConsumer consumers[kQueueCount] = {
-        [this](const std::shared_ptr<StreamData>& unit) { pushToBuffers(&StreamBuffer::PushVideo, unit); },
-        [this](const std::shared_ptr<StreamData>& unit) { pushToBuffers(&StreamBuffer::PushAudio, unit); },
+        [this](const std::shared_ptr<StreamData>& unit) { pushToBuffers(Medium::kVideo, unit); },
+        [this](const std::shared_ptr<StreamData>& unit) { pushToBuffers(Medium::kAudio, unit); },
         [this](const std::shared_ptr<StreamData>& unit) { processMeta(unit); },
     };
     for (std::size_t i = 0; i < kQueueCount; ++i) {
         startQueueThread(i, consumers[i]);
         CLIPFILE_LOG(LOG_PRIORITY_TRACE, "count = %d.", static_cast<int>(i));
     }
+    intake = channel.get();
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
     return true;
 }
@@ -201,6 +215,12 @@ void Controller::startQueueThread(std::size_t index, const UnitConsumer& consume
     MutexLock lock(queueStartMutex);
     queueThreadStarted = false;
     queues[index] = std::make_shared<StreamDataQueue>(queueCapacity, dropWhenFull);
+    if (isExact) {
+        queues[index]->SetFlushPredicate([this, index](const std::shared_ptr<StreamData>& unit) {
+            noteFlushed(static_cast<Medium>(index), unit);
+            return true;
+        });
+    }
     queueThreads[index] = std::make_shared<std::thread>(&Controller::queueing, this, queues[index], consumer);
     while (!queueThreadStarted) {
         lock.Wait(queueStartCondition);
@@ -219,6 +239,10 @@ bool Controller::isOutputMode(const char* mode) const {
 }
 
 void Controller::Uninitialize() {
+    if (intake.exchange(nullptr) == nullptr) {
+        CLIPFILE_LOG(LOG_PRIORITY_WARNING, "uninitialize is called without initialize.");
+        return;
+    }
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
     terminated = true;
     if (eventThread->joinable()) {
@@ -239,6 +263,11 @@ void Controller::Uninitialize() {
     }
     // Contract: last-start-is-ended. The metadata thread may have been in StartStream with its last unit.
     stopAndRemoveBuffers();
+    {
+        MutexLock lock(streamBuffersMutex);
+        forgetPreRoll();
+        preRoll = PreRoll();
+    }
     queueThreads.clear();
     queues.clear();
     eventHandlers.clear();
@@ -247,11 +276,15 @@ void Controller::Uninitialize() {
         MutexLock lock(eventQueueMutex);
         eventQueue.clear();
     }
-    host = nullptr;
+    endStatusChannel();
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
 void Controller::Execute() {
+    if (!IsRunning()) {
+        CLIPFILE_LOG(LOG_PRIORITY_WARNING, "execute is called without initialize.");
+        return;
+    }
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
     PostEvent(std::make_shared<TransferStatusNotifyEvent>(
         std::map<std::string, std::string>{{kFileOutputStatusKey, kFileOutputStatusStandby}}));
@@ -259,9 +292,24 @@ void Controller::Execute() {
 }
 
 void Controller::SetStatus(int status, int cause) {
-    if (host->GetStatus() != kStatusFailed) {
-        host->SetStatus(status, cause);
+    if (const std::shared_ptr<StatusChannel> channel = getStatusChannel(); channel != nullptr) {
+        channel->Set(status, cause);
     }
+}
+
+std::shared_ptr<StatusChannel> Controller::getStatusChannel() const {
+    MutexLock lock(statusMutex);
+    return statusChannel;
+}
+
+void Controller::endStatusChannel() {
+    std::shared_ptr<StatusChannel> ended;
+    {
+        MutexLock lock(statusMutex);
+        ended.swap(statusChannel);
+    }
+    ended->Close();
+    host = nullptr;
 }
 
 }  // namespace clipfileModule

@@ -24,6 +24,7 @@ void Controller::SendEvent(std::shared_ptr<Event> event) {
 void Controller::enqueueEvent(std::shared_ptr<Event> event, bool atHead) {
     {
         MutexLock lock(eventQueueMutex);
+        event->order = ++commandOrder;
         if (atHead) {
             eventQueue.push_front(std::move(event));
         } else {

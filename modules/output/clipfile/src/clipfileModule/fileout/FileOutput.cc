@@ -5,6 +5,7 @@
 #include <mutex>
 #include <utility>
 
+#include "common/JoinThread.h"
 #include "common/Log.h"
 #include "controller/Event.h"
 #include "controller/Status.h"
@@ -83,9 +84,7 @@ void FileOutput::Stop() {
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "wait thread start...");
     std::unique_lock lock(*work->threadLock, std::chrono::steady_clock::now() + stopWaitMilliSec);
     if (lock.owns_lock()) {
-        if (thread->joinable()) {
-            thread->join();
-        }
+        JoinThread(*thread);
         lock.unlock();
     } else {
         work->owner.Cut(kOwnerCallWait);
@@ -168,7 +167,7 @@ void FileOutput::outputThread(Work& work) {
 
 bool FileOutput::outputFile(Work& work, std::deque<std::shared_ptr<ChunkData>>& deque) {
     bool limitReached = false;
-    // Contract: box-size-of-the-old-file. Holds for the first chunk behind a rotation too.
+    std::uint64_t excess = 0;
     std::uint64_t boxSize = 0;
     while (!deque.empty()) {
         const std::shared_ptr<ChunkData> chunk = std::move(deque.front());
@@ -183,6 +182,7 @@ bool FileOutput::outputFile(Work& work, std::deque<std::shared_ptr<ChunkData>>& 
             const std::uint64_t limit = work.muxer->MinutesToDuration(work.settings.maxFileSize);
             const std::uint64_t written = work.muxer->GetDuration();
             limitReached = written >= limit;
+            excess = limitReached ? written - limit : 0;
             CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "file size. %llu\t%llu\t%llu\t%llu.",
                          static_cast<unsigned long long>(limit), static_cast<unsigned long long>(written),
                          static_cast<unsigned long long>(size), static_cast<unsigned long long>(boxSize));
@@ -190,17 +190,20 @@ bool FileOutput::outputFile(Work& work, std::deque<std::shared_ptr<ChunkData>>& 
             return true;
         }
         if (limitReached) {
-            // Contract: rotation-at-cadence. A file ends only where audio and video are in step.
-            if (work.lastChunk != nullptr && work.lastChunk->sync) {
+            // A file ends only where audio and video are in step.
+            if (work.lastChunk == nullptr || !work.lastChunk->sync) {
+                CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "mp4 file over. no a/v sync. %d",
+                             static_cast<int>(work.writtenVideoSamples));
+            } else if (waitsForIdrFrame(work, *chunk, excess)) {
+                CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "mp4 file over. no idr frame. %d",
+                             static_cast<int>(work.writtenVideoSamples));
+            } else {
                 CLIPFILE_LOG(LOG_PRIORITY_TRACE, "mp4 file over %lld min.",
                              static_cast<long long>(work.settings.maxFileSize));
                 CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: FILE ROTATION.");
                 if (!newFile(work, chunk)) {
                     return true;
                 }
-            } else {
-                CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "mp4 file over. no a/v sync. %d",
-                             static_cast<int>(work.writtenVideoSamples));
             }
         }
 
@@ -239,6 +242,14 @@ bool FileOutput::outputFile(Work& work, std::deque<std::shared_ptr<ChunkData>>& 
         work.lastChunk = chunk;
     }
     return false;
+}
+
+bool FileOutput::waitsForIdrFrame(const Work& work, const ChunkData& chunk, std::uint64_t excess) {
+    // Pictures in front of the first IDR frame could not be decoded in the file that begins here. A stream
+    // whose IDR frames never meet the cadence must not make one endless file, though.
+    return work.settings.recordRules == RecordRules::kExact &&
+           (chunk.video.empty() || !chunk.video.front()->GetSync()) &&
+           excess < work.muxer->MinutesToDuration(Work::idrWaitMinutes);
 }
 
 void FileOutput::notifyTransferStatus(Work& work, const std::string& value) {

@@ -45,6 +45,9 @@ struct FileOutput::Work {
     /// Added in the size log line, in bytes: 200 MiB.
     static constexpr std::uint64_t fileSizeMargin = 209715200;
 
+    /// How far beyond its length a file waits for an IDR frame, in minutes.
+    static constexpr std::uint64_t idrWaitMinutes = 2;
+
     Work(ControllerInterface* controller, StreamBufferInterface* streamBuffer, const std::string& fileType)
         : owner(controller, streamBuffer), type(fileType) {}
     Work(const Work&) = delete;

@@ -41,6 +41,9 @@ QxMessageHandler::~QxMessageHandler() {
 }
 
 std::uint32_t QxMessageHandler::NotifyInputOutputConnectRequest(const QxInputOutputConnectRequest* request) {
+    if (!mayCall("NotifyInputOutputConnectRequest")) {
+        return kResultNotHandled;
+    }
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "notify input output connect request received.");
     settings.framerate = fileFramerate(request->framerate);
@@ -62,6 +65,9 @@ std::uint32_t QxMessageHandler::NotifyInputOutputConnectRequest(const QxInputOut
 }
 
 std::uint32_t QxMessageHandler::NotifyModuleConnectionRequestReply(const void*) {
+    if (!mayCall("NotifyModuleConnectionRequestReply")) {
+        return kResultNotHandled;
+    }
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "notify module connection request reply.");
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end. result = %d.", static_cast<int>(kResultSuccess));
@@ -70,6 +76,9 @@ std::uint32_t QxMessageHandler::NotifyModuleConnectionRequestReply(const void*) 
 
 std::uint32_t QxMessageHandler::NotifyInputOutputDisconnectionRequest(
     const QxInputOutputDisconnectionRequest* request) {
+    if (!mayCall("NotifyInputOutputDisconnectionRequest")) {
+        return kResultNotHandled;
+    }
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "notify disconnect received.");
     // Contract: other-disconnects-give-3. Nothing else happens then.
@@ -86,6 +95,9 @@ std::uint32_t QxMessageHandler::NotifyInputOutputDisconnectionRequest(
 }
 
 std::uint32_t QxMessageHandler::NotifySetPropertiesRequest(const void*) {
+    if (!mayCall("NotifySetPropertiesRequest")) {
+        return kResultNotHandled;
+    }
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end. result = %d.", static_cast<int>(kResultSuccess));
     return kResultSuccess;
@@ -93,6 +105,9 @@ std::uint32_t QxMessageHandler::NotifySetPropertiesRequest(const void*) {
 
 // Contract: online-outlives-a-life. `Initialize` and `Uninitialize` do not touch the flags.
 void QxMessageHandler::NotifyOnlineStatus() {
+    if (!mayCall("NotifyOnlineStatus")) {
+        return;
+    }
     bool changed = false;
     {
         boost::upgrade_lock<boost::shared_mutex> lock(onlineMutex);
@@ -109,6 +124,9 @@ void QxMessageHandler::NotifyOnlineStatus() {
 }
 
 void QxMessageHandler::NotifyOfflineStatus() {
+    if (!mayCall("NotifyOfflineStatus")) {
+        return;
+    }
     bool changed = false;
     {
         boost::upgrade_lock<boost::shared_mutex> lock(onlineMutex);
@@ -134,8 +152,22 @@ void QxMessageHandler::startFileOutput() {
 
 void QxMessageHandler::stopFileOutput() {
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "stop file output.");
-    controller->BufferingStop();
+    try {
+        controller->BufferingStop();
+    } catch (...) {
+        // Every recording has been stopped all the same, and the next start must find that so.
+        fileOutputStarted = false;
+        throw;
+    }
     fileOutputStarted = false;
+}
+
+bool QxMessageHandler::mayCall(const char* notification) const {
+    if (controller->IsRunning()) {
+        return true;
+    }
+    CLIPFILE_LOG(LOG_PRIORITY_WARNING, "%s is called without initialize.", notification);
+    return false;
 }
 
 }  // namespace clipfileModule
