@@ -6,6 +6,7 @@
 #include <fstream>
 #include <limits>
 
+#include "common/Credentials.h"
 #include "common/ReceiverError.h"
 #include "options/OptionText.h"
 
@@ -289,10 +290,15 @@ std::optional<Options> ParseOptions(int argc, const char* const* argv, std::stri
     return options;
 }
 
-void HidePassword(int argc, char** argv) {
+void HideCredentials(int argc, char** argv) {
     constexpr std::string_view kName = "--password";
     for (int i = 1; i < argc; ++i) {
         const std::string_view argument = argv[i];
+        if (argument.find("://") != std::string_view::npos) {
+            for (const TextSpan& span : CredentialsIn(argument)) {
+                std::memset(argv[i] + span.begin, 'x', span.end - span.begin);
+            }
+        }
         if (argument == kName && i + 1 < argc) {
             std::memset(argv[i + 1], 'x', std::strlen(argv[i + 1]));
         } else if (argument.starts_with(kName) && argument.substr(kName.size()).starts_with('=')) {
