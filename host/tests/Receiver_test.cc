@@ -254,6 +254,13 @@ TEST_F(ReceiverTest, AMissingOutputFolderIsMadeWithANotice) {
     EXPECT_THAT(display_.closed, ElementsAre(HasSubstr(folder_ + "/new/20")));
 }
 
+TEST_F(ReceiverTest, BackslashesOfTheOutputFolderAreSlashes) {
+    options_.output = folder_ + "\\new\\";
+    EXPECT_EQ(Record(60), ExitCode::kSuccess);
+    EXPECT_THAT(display_.notices, Contains("made the output folder " + folder_ + "/new"));
+    EXPECT_THAT(display_.closed, ElementsAre(HasSubstr(folder_ + "/new/20")));
+}
+
 TEST_F(ReceiverTest, AFolderMayBeCalledNone) {
     std::filesystem::current_path(folder_);
     options_.output = "none";

@@ -116,10 +116,6 @@ void CheckTogether(const CLI::App& app, const Options& options) {
     if (options.timecode && options.timecode->dropFrame && !options.dropFrame) {
         throw Wrong("--timecode with ';' asks for drop frame and --no-drop-frame forbids it.");
     }
-    if (options.output && options.output->find('\\') != std::string::npos) {
-        throw Wrong(
-            "--output must not contain a backslash: the module takes it for the separator of folders.");
-    }
     if (options.prefix && options.prefix->find_first_of("/\\") != std::string::npos) {
         throw Wrong("--prefix is the name of one folder and must contain neither / nor \\.");
     }

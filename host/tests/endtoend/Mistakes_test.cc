@@ -215,6 +215,18 @@ TEST_F(MistakesTest, ACredentialOfAShareThatIsRefused) {
     EXPECT_THAT(Log(), HasSubstr("open, sesame"));
 }
 
+// The module reads the store too, and to it both kinds of slashes are one.
+TEST_F(MistakesTest, BackslashesInTheOutputFolderOfTheSettingsStore) {
+    const auto place = folder.Path() / "from the store";
+    std::ofstream(folder.Path() / "settings.ini")
+        << "[Qx/Other/MP4FileOut]\nMP4OutputPath = " << folder.Path().string() << "\\from the store\\\n";
+    const Outcome outcome = RunProgram(
+        {RECEIVER_PROGRAM, "--module", CLIPFILE_MODULE, "--size", "320x180", "--seconds", "2"}, environment);
+    EXPECT_EQ(outcome.code, 0) << outcome.errors;
+    EXPECT_THAT(outcome.errors, HasSubstr("made the output folder " + place.string() + "\n"));
+    EXPECT_EQ(RecordingsIn(place).size(), 1U);
+}
+
 TEST_F(MistakesTest, APortOnWhichNothingArrives) {
     const FreePorts ports;
     const std::string address = "udp://127.0.0.1:" + std::to_string(ports.First());
