@@ -116,6 +116,14 @@ TEST_F(ReceiverTest, FragmentedFilesAreListedWithTheirTimecodeToo) {
     EXPECT_THAT(display_.closed, ElementsAre(HasSubstr("/CAM1/10_00_00_00.MP4")));
 }
 
+// Of a fragment for each 256 frames.
+TEST_F(ReceiverTest, TheLengthOfAFragmentedFileIsThatOfAllItsFrames) {
+    options_.fileType = "fragment";
+    EXPECT_EQ(Record(304), ExitCode::kSuccess);
+    EXPECT_THAT(Frames(), ElementsAre(304));
+    EXPECT_NEAR(display_.summary.files.front().seconds, 12.16, 0.0005);
+}
+
 TEST_F(ReceiverTest, InModeOnTheRunIsOneRecording) {
     options_.mode = OutputMode::kOn;
     options_.seconds = 1;
