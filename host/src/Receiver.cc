@@ -168,6 +168,7 @@ class Running final : public SourceListenerInterface {
     void TakeKey(char key, Recorder& recorder);
     void StartRecording();
     void StopRecording();
+    void TellLateStops(const Recorder& recorder);
     void TakeStatuses(bool ending);
     void TakeModuleEvents();
     void FileClosed(const std::string& path);
@@ -192,6 +193,7 @@ class Running final : public SourceListenerInterface {
     std::vector<WrittenFile> files_;
     std::string openFile_;
     std::uint64_t faults_ = 0;
+    std::uint64_t lateStops_ = 0;
     ModuleStatus told_;
     bool sourceOver_ = false;
     std::optional<Clock::time_point> finishSince_;
@@ -244,6 +246,7 @@ ExitCode Running::Record(const SourceOpener& open) {
                                 " not in the file, which grows by 8 frames at a time");
             }
         }
+        TellLateStops(recorder);
         TakeStatuses(false);
         session.End();
     }
@@ -276,6 +279,7 @@ void Running::Loop(SourceInterface& source, Recorder& recorder) {
         if (result == SourceInterface::Result::kIdle && source.Counts().away) {
             recorder.Interrupt();
         }
+        TellLateStops(recorder);
         TakeCommands(recorder);
         if (recorder.Finishing()) {
             finishSince_ = finishSince_.value_or(Clock::now());
@@ -341,6 +345,17 @@ void Running::StopRecording() {
         return;
     }
     plan_.Stop();
+}
+
+void Running::TellLateStops(const Recorder& recorder) {
+    // A module that has failed takes no commands, and its status tells that.
+    if (recorder.LateStops() == lateStops_ || host_->Failed()) {
+        return;
+    }
+    lateStops_ = recorder.LateStops();
+    display_.Notice(
+        "the module has not carried out a stop command within 1 s: the recording may hold more than was "
+        "commanded, and its file is closed late");
 }
 
 void Running::TakeStatuses(bool ending) {
@@ -436,7 +451,7 @@ Summary Running::Summarise(const SourceInterface& source) const {
     summary.lost = Lost(source);
     if (host_->Failed()) {
         summary.exitCode = ExitCode::kRecordingFailed;
-    } else if (summary.lost != 0 || faults_ != 0 || source.Counts().reconnections != 0) {
+    } else if (summary.lost != 0 || faults_ != 0 || lateStops_ != 0 || source.Counts().reconnections != 0) {
         summary.exitCode = ExitCode::kLost;
     }
     return summary;

@@ -231,6 +231,12 @@ TEST_F(ReceiverTest, AFaultOfTheStreamMakesTheRunALoss) {
     EXPECT_THAT(display_.statuses, Contains(ModuleStatus{6, 22}));
 }
 
+TEST_F(ReceiverTest, AStopThatTheModuleDoesNotCarryOutIsToldAndMakesTheRunALoss) {
+    options_.seconds = 1;
+    EXPECT_EQ(RecordWith("hang"), ExitCode::kLost);
+    EXPECT_THAT(display_.notices, Contains(HasSubstr("has not carried out a stop command within 1 s")));
+}
+
 TEST_F(ReceiverTest, WhatTheSourceLostIsALoss) {
     for (SourceCounts counts : {SourceCounts{2, 0, 0}, SourceCounts{0, 3, 0}, SourceCounts{0, 0, 1}}) {
         auto source = std::make_unique<FakeSource>(60);
