@@ -28,7 +28,7 @@ using Clock = std::chrono::steady_clock;
 
 constexpr std::chrono::milliseconds kDisplayInterval{250};
 constexpr std::chrono::seconds kFreeSpaceInterval{1};
-/// The end of a recording needs two chunks more of the stream; when that has dried up, nobody waits for it.
+/// The run ends with the frame behind the last one; when the stream has dried up, nobody waits for it.
 constexpr std::chrono::seconds kFinishPatience{2};
 constexpr const char* kDefaultOutput = "recordings";
 /// What the module takes for an output path that is not set.
@@ -98,7 +98,8 @@ StartParameters ParametersOf(const Options& options, const std::string& output,
     parameters.texts = {{"-outputPath", output},
                         {"-fileType", options.fileType},
                         {"-naluType", options.naluType},
-                        {"-outputMode", options.mode == OutputMode::kOn ? "on" : "sync"}};
+                        {"-outputMode", options.mode == OutputMode::kOn ? "on" : "sync"},
+                        {"-recordRules", "exact"}};
     const auto add = [&](const char* key, const std::optional<std::string>& value) {
         if (value) {
             parameters.texts[key] = *value;
@@ -195,7 +196,6 @@ class Running final : public SourceListenerInterface {
     std::uint64_t faults_ = 0;
     std::uint64_t lateStops_ = 0;
     ModuleStatus told_;
-    bool sourceOver_ = false;
     std::optional<Clock::time_point> finishSince_;
     Clock::time_point shown_{};
     Clock::time_point spaceRead_{};
@@ -239,12 +239,7 @@ ExitCode Running::Record(const SourceOpener& open) {
             failure = error;
         }
         if (!host.Failed()) {
-            const std::uint64_t left = recorder.Close(sourceOver_ || failure);
-            if (left != 0) {
-                display_.Notice("the stream ended while it was recorded: its last " + std::to_string(left) +
-                                (left == 1 ? " frame is" : " frames are") +
-                                " not in the file, which grows by 8 frames at a time");
-            }
+            recorder.Close();
         }
         TellLateStops(recorder);
         TakeStatuses(false);
@@ -269,7 +264,6 @@ void Running::Loop(SourceInterface& source, Recorder& recorder) {
         SourceUnit unit;
         const SourceInterface::Result result = source.Read(unit);
         if (result == SourceInterface::Result::kEnd || result == SourceInterface::Result::kStopped) {
-            sourceOver_ = true;
             return;
         }
         if (result == SourceInterface::Result::kUnit) {
@@ -354,8 +348,8 @@ void Running::TellLateStops(const Recorder& recorder) {
     }
     lateStops_ = recorder.LateStops();
     display_.Notice(
-        "the module has not carried out a stop command within 1 s: the recording may hold more than was "
-        "commanded, and its file is closed late");
+        "the module has not carried out a stop command within 1 s: the recording ends on its frame, but its "
+        "file is closed late");
 }
 
 void Running::TakeStatuses(bool ending) {
