@@ -78,6 +78,8 @@ TEST_F(ReceiverTest, RecordsWhatTheLengthAsksFor) {
     options_.seconds = 2;
     EXPECT_EQ(Record(150), ExitCode::kSuccess);
     EXPECT_THAT(Frames(), ElementsAre(50));
+    // Of the pictures: 94 audio frames are 5.3 ms more.
+    EXPECT_NEAR(display_.summary.files.front().seconds, 2, 0.0005);
     EXPECT_THAT(Starts(), ElementsAre("10:00:00:00"));
     EXPECT_EQ(display_.opened, display_.closed);
     EXPECT_THAT(display_.opened, ElementsAre(HasSubstr("/Unknown-Model/10_00_00_00.MP4")));
