@@ -33,16 +33,17 @@ std::vector<std::string> Files(ModuleLog& log) {
     return files;
 }
 
-TEST(ModuleLog, ANormalFileIsToldWithItsFolderAndClosedByItsOwnLine) {
+// The line of its end comes before the file is complete.
+TEST(ModuleLog, ANormalFileIsToldWithItsFolderAndClosedByTheEndOfItsWriter) {
     ModuleLog log;
     Trace("output path = \"/srv/rec\\20261121\\CAM (1)\".");
     Trace("ST: out_filename = \"10_20_30_12.MP4\"");
     Operator("OP: FILE CREATE. (10_20_30_12.MP4)");
     EXPECT_THAT(Files(log), ElementsAre("opened /srv/rec/20261121/CAM (1)/10_20_30_12.MP4"));
     Operator("OP: FILE CLOSE. (10_20_30_12.MP4)");
-    EXPECT_THAT(Files(log), ElementsAre("closed /srv/rec/20261121/CAM (1)/10_20_30_12.MP4"));
-    Trace("start. event_id = 6.");
     EXPECT_THAT(Files(log), IsEmpty());
+    Trace("start. event_id = 6.");
+    EXPECT_THAT(Files(log), ElementsAre("closed /srv/rec/20261121/CAM (1)/10_20_30_12.MP4"));
 }
 
 // No line of its own tells of the end of a fragmented file.
@@ -108,6 +109,28 @@ TEST(ModuleLog, ErrorsAndRestartsAreEvents) {
     EXPECT_EQ(events[0].kind, Kind::kError);
     EXPECT_EQ(events[0].text, "mp4 file open error.");
     EXPECT_EQ(events[1].kind, Kind::kRecordRestarted);
+}
+
+/// What is told of a line at the priority of errors.
+std::string Told(ModuleLog& log, const char* line) {
+    Logger::Put(LOG_PRIORITY_ERROR, "a.cc", "f", 1, "%s", line);
+    const std::vector<ModuleEvent> events = log.TakeEvents();
+    return events.size() == 1 ? events.front().text : std::to_string(events.size()) + " events";
+}
+
+TEST(ModuleLog, ARefusedLogonIsToldWithoutUserAndPassword) {
+    ModuleLog log;
+    Trace("file output path = \\\\server\\rec, old.");
+    EXPECT_EQ(Told(log, "LogonUser call failed. 0, 52e, \\\\server\\rec, old, user, pass"),
+              "LogonUser call failed. 0, 52e, \\\\server\\rec, old");
+    EXPECT_EQ(Told(log, "LogonUser call failed. 0, 52e, \\\\server\\rec, old, DOMAIN\\a, b, c\nd, e\n"),
+              "LogonUser call failed. 0, 52e, \\\\server\\rec, old");
+}
+
+TEST(ModuleLog, ARefusedLogonAtAnUnknownPathIsToldWithItsNumberAlone) {
+    ModuleLog log;
+    EXPECT_EQ(Told(log, "LogonUser call failed. 0, 52e, \\\\server\\rec, user, pass"),
+              "LogonUser call failed. 0, 52e");
 }
 
 TEST(ModuleLog, OtherLinesAreNoEvents) {

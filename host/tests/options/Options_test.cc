@@ -102,6 +102,7 @@ TEST(Options, EachOneReachesItsPlace) {
 }
 
 TEST(Options, EachErrorNamesItsOptionInOneSentence) {
+    const std::string longName(256, 'p');
     const struct {
         std::vector<const char*> arguments;
         const char* part;
@@ -137,8 +138,8 @@ TEST(Options, EachErrorNamesItsOptionInOneSentence) {
         {{"--log-priority", "14"}, "--log-priority"},
         {{"--password-file", "/no/such/file"}, "--password-file /no/such/file"},
         {{"--password", "p", "--password-file", "f"}, "--password-file"},
-        {{"--output", "a\\b"}, "backslash"},
         {{"--prefix", "a/b"}, "--prefix"},
+        {{"--prefix", longName.c_str()}, "255 bytes"},
     };
     for (const auto& one : cases) {
         EXPECT_THAT(Refusal(one.arguments), HasSubstr(one.part)) << one.arguments[0];
@@ -187,14 +188,15 @@ TEST(Options, APasswordComesFromTheFirstLineOfItsFile) {
     unlink(file.c_str());
 }
 
-TEST(Options, APasswordOnTheCommandLineIsOverwritten) {
+TEST(Options, CredentialsOnTheCommandLineAreOverwritten) {
     std::string program = "receiver", name = "--password", value = "secret", joined = "--password=hidden",
-                file = "--password-file=keep";
-    char* arguments[] = {program.data(), name.data(), value.data(), joined.data(), file.data()};
-    HidePassword(5, arguments);
+                file = "--password-file=keep", url = "srt://u:p@host?passphrase=abc&mode=caller";
+    char* arguments[] = {program.data(), name.data(), value.data(), joined.data(), file.data(), url.data()};
+    HideCredentials(6, arguments);
     EXPECT_EQ(value, "xxxxxx");
     EXPECT_EQ(joined, "--password=xxxxxx");
     EXPECT_EQ(file, "--password-file=keep");
+    EXPECT_EQ(url, "srt://xxx@host?passphrase=xxx&mode=caller");
 }
 
 TEST(IsLive, FilesAndTheTestPictureWait) {
