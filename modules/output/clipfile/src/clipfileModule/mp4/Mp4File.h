@@ -145,7 +145,8 @@ class Mp4File : public Mp4Muxer {
     MbxStatus beginMdat(MuxerRoutine& routine);
     MbxStatus completeFile(MuxerRoutine& routine);
 
-    MbxStatus enterSamples(const SamplePass& pass);
+    /// A part of `routine`, under whose name each sample is logged.
+    MbxStatus enterSamples(const MuxerRoutine& routine, const SamplePass& pass);
     MbxStatus writeTmcd(const unsigned char* timecode);
     MbxStatus writeBytes(const void* data, std::uint64_t size);
 };

@@ -35,24 +35,24 @@ MbxStatus Mp4File::writeSampleInfo(const InputStreamInfo& info, const ChunkData&
     MUXER_ROUTINE(routine);
     if (!chunk.meta.empty()) {
         CLIPFILE_LOG(LOG_PRIORITY_SAMPLE, "write rtmeta ----------.");
-        MUXER_STEP(routine,
-                   enterSamples({chunk.meta, kMetaTrack, info.video_sample_duration, true, m_meta_count}));
+        MUXER_STEP(routine, enterSamples(routine, {chunk.meta, kMetaTrack, info.video_sample_duration, true,
+                                                   m_meta_count}));
     }
     if (!chunk.audio.empty()) {
         CLIPFILE_LOG(LOG_PRIORITY_SAMPLE, "write audio  ----------.");
-        MUXER_STEP(routine,
-                   enterSamples({chunk.audio, kAudioTrack, info.audio_sample_duration, true, m_audio_count}));
+        MUXER_STEP(routine, enterSamples(routine, {chunk.audio, kAudioTrack, info.audio_sample_duration, true,
+                                                   m_audio_count}));
     }
     if (!chunk.video.empty()) {
         CLIPFILE_LOG(LOG_PRIORITY_SAMPLE, "write video  ----------.");
-        MUXER_STEP(routine, enterSamples({chunk.video, kVideoTrack, info.video_sample_duration, false,
-                                          m_video_count}));
+        MUXER_STEP(routine, enterSamples(routine, {chunk.video, kVideoTrack, info.video_sample_duration,
+                                                   false, m_video_count}));
     }
     m_video_duration += chunk.video.size() * info.video_sample_duration;
     return routine.Return(MBX_OK);
 }
 
-MbxStatus Mp4File::enterSamples(const SamplePass& pass) {
+MbxStatus Mp4File::enterSamples(const MuxerRoutine& routine, const SamplePass& pass) {
     std::uint32_t randomAccess = IsFragmentOpen();
     const std::uint32_t track = m_track_ids[pass.track];
     for (const auto& data : pass.samples) {
@@ -69,12 +69,13 @@ MbxStatus Mp4File::enterSamples(const SamplePass& pass) {
         randomAccess = 0;
         m_payload += sample.size;
         ++pass.counter;
-        CLIPFILE_LOG(LOG_PRIORITY_SAMPLE, "%d\t%d\t%llu\t%llu\t%llu\t%d\t%d.", static_cast<int>(pass.counter),
-                     static_cast<int>(sample.isSync),
-                     static_cast<unsigned long long>(pass.counter * pass.duration),
-                     static_cast<unsigned long long>(data->GetRtpTimestamp()),
-                     static_cast<unsigned long long>(data->GetTimestamp()), static_cast<int>(sample.size),
-                     static_cast<int>(sample.duration));
+        const unsigned long long end = pass.counter * pass.duration;
+        Logger::Put(LOG_PRIORITY_SAMPLE, __FILE__, routine.Function(), __LINE__,
+                    "%d\t%d\t%llu\t%llu\t%llu\t%d\t%d.", static_cast<int>(pass.counter),
+                    static_cast<int>(sample.isSync), end,
+                    static_cast<unsigned long long>(data->GetRtpTimestamp()),
+                    static_cast<unsigned long long>(data->GetTimestamp()), static_cast<int>(sample.size),
+                    static_cast<int>(sample.duration));
     }
     return MbxEndChunk(m_session.get(), track);
 }
