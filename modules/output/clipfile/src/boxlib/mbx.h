@@ -189,6 +189,12 @@ MbxStatus MbxAddSample(MbxSession* session, uint32_t track, const MbxSampleInfo*
 // Closes the track's open chunk. MBX_ERR_BAD_STATE for a track that has none open.
 MbxStatus MbxEndChunk(MbxSession* session, uint32_t track);
 
+// Sets which defaults the `tfhd` of each of the track's fragments carries even where they equal those of
+// `trex`: description index, duration, size, flags, a word each as in MbxTrackParams::defaultsForced. For a
+// track that has no sample yet when `moov` is written: that `trex` knows no defaults, and who reads the file
+// before `moov` is written again needs them from elsewhere. MBX_ERR_INVALID_ARG for a word above 1.
+MbxStatus MbxForceDefaults(MbxSession* session, uint32_t track, const uint32_t forced[4]);
+
 // Adds `delta` to chunk offsets of what `moov` reports: of one track or with 0 of all, of one chunk or with 0
 // of all. MBX_ERR_OVERFLOW when an offset wrapped, after all are shifted; MBX_ERR_NOT_FOUND for a missing
 // chunk.
