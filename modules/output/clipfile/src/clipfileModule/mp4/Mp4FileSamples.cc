@@ -132,15 +132,18 @@ MbxStatus Mp4File::writeTmcd(const unsigned char* timecode) {
 
     const bool dropFrame = (m_info.tmcd_m_data_type_it & 1U) != 0;
     const std::uint32_t value = FrameNumber(timecode, m_info.timecode_numFrames, dropFrame);
-    const std::uint8_t stored[kTimecodeSize] = {
-        static_cast<std::uint8_t>(value >> 24), static_cast<std::uint8_t>(value >> 16),
-        static_cast<std::uint8_t>(value >> 8), static_cast<std::uint8_t>(value)};
-    MUXER_STEP(routine, writeBytes(stored, sizeof stored));
+    MUXER_STEP(routine,
+               storeTimecode({static_cast<std::uint8_t>(value >> 24), static_cast<std::uint8_t>(value >> 16),
+                              static_cast<std::uint8_t>(value >> 8), static_cast<std::uint8_t>(value)}));
     CLIPFILE_LOG_PLAIN(LOG_PRIORITY_TRACE, "ST: write tmcd  : %02d:%02d:%02d:%02d:%s", timecode[0],
                        timecode[1], timecode[2], timecode[3], dropFrame ? "DF" : "NDF");
     CLIPFILE_LOG_PLAIN(LOG_PRIORITY_TRACE, "ST: write tmcd  : %lX(%d)",
                        static_cast<unsigned long>(reverseBytes(value)), static_cast<int>(value));
     return routine.Return(MBX_OK);
+}
+
+MbxStatus Mp4File::storeTimecode(const std::array<std::uint8_t, kTimecodeSize>& bytes) {
+    return writeBytes(bytes.data(), bytes.size());
 }
 
 MbxStatus Mp4File::writeBytes(const void* data, std::uint64_t size) {
