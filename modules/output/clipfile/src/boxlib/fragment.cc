@@ -22,18 +22,15 @@ MbxStatus MbxSetFragmentBase(MbxContext* context, MbxMovie* movie, uint32_t frag
 
 namespace {
 
-// Contract: late-track-defaults. A `moov` that is written already says otherwise.
-// Takes the defaults that nobody gave from the first segment with samples. A track without samples gets the
-// same as one whose samples say nothing, and learns later.
+// Takes the defaults that nobody gave from the segment that has just been sealed, which is the first one with
+// samples: one before it would have given them. A track without samples gets the same as one whose samples
+// say nothing, and learns later.
 void deriveDefaults(MbxTrack* track) {
     if (track->defaultsDone != 0) return;
     MbxSampleDefaults derived = {1, 0, 0, MBX_SAMPLE_NON_SYNC};
-    for (const MbxSampleSegment* segment = track->segments.first; segment != nullptr;
-         segment = segment->next) {
-        if (segment->sizes.count == 0) continue;
-        derived = MbxSegmentDefaults(segment, derived);
+    if (track->sealedSegment->sizes.count != 0) {
+        derived = MbxSegmentDefaults(track->sealedSegment, derived);
         track->defaultsDone = 1;
-        break;
     }
     const auto isGiven = [&](MbxSampleDefault which) { return (track->defaultsMask >> which & 1) != 0; };
     if (!isGiven(MBX_DEFAULT_DESCRIPTION)) track->defaults.descriptionIndex = derived.descriptionIndex;

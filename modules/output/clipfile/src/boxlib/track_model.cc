@@ -212,14 +212,15 @@ MbxStatus MbxCreateTrack(MbxContext* context, MbxMovie* movie, const MbxHandlerR
     if (handler == nullptr) return MBX_ERR_INTERNAL;
 
     const MbxTrackParams& params = request->params;
-    if (handler->timescale == Timescale::kParameter && params.timescale == 0) return MBX_ERR_INVALID_ARG;
-    if (params.language > 0x7FFF) return MBX_ERR_INVALID_ARG;
+    if (params.timescale == 0 || params.language > 0x7FFF) return MBX_ERR_INVALID_ARG;
     if (!isOrdinaryTrackId(params.trackId) || isTrackIdInUse(movie, params.trackId))
         return MBX_ERR_INVALID_ARG;
     const uint32_t enableMode =
         handler->enableMode == kNoFixedMode ? params.enable_mode : handler->enableMode;
     uint32_t flags = 0;
     MBX_TRY(MbxEnableModeFlags(enableMode, &flags));
+    // It would have no segment for the fragments before it, and count its own from the wrong number.
+    if (movie->fragmentCount != 0) return MBX_ERR_BAD_STATE;
 
     MBX_TRY(MbxMakeListItem(
         context, &movie->tracks,

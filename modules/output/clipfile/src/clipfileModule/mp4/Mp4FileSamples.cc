@@ -37,24 +37,24 @@ MbxStatus Mp4File::writeSampleInfo(const InputStreamInfo& info, const ChunkData&
     MUXER_ROUTINE(routine);
     if (!chunk.meta.empty()) {
         CLIPFILE_LOG(LOG_PRIORITY_SAMPLE, "write rtmeta ----------.");
-        MUXER_STEP(routine,
-                   enterSamples({chunk.meta, kMetaTrack, info.video_sample_duration, true, m_meta_count}));
+        MUXER_STEP(routine, enterSamples(routine, {chunk.meta, kMetaTrack, info.video_sample_duration, true,
+                                                   m_meta_count}));
     }
     if (!chunk.audio.empty()) {
         CLIPFILE_LOG(LOG_PRIORITY_SAMPLE, "write audio  ----------.");
-        MUXER_STEP(routine,
-                   enterSamples({chunk.audio, kAudioTrack, info.audio_sample_duration, true, m_audio_count}));
+        MUXER_STEP(routine, enterSamples(routine, {chunk.audio, kAudioTrack, info.audio_sample_duration, true,
+                                                   m_audio_count}));
     }
     if (!chunk.video.empty()) {
         CLIPFILE_LOG(LOG_PRIORITY_SAMPLE, "write video  ----------.");
-        MUXER_STEP(routine, enterSamples({chunk.video, kVideoTrack, info.video_sample_duration, false,
-                                          m_video_count}));
+        MUXER_STEP(routine, enterSamples(routine, {chunk.video, kVideoTrack, info.video_sample_duration,
+                                                   false, m_video_count}));
     }
     m_video_duration += chunk.video.size() * info.video_sample_duration;
     return routine.Return(MBX_OK);
 }
 
-MbxStatus Mp4File::enterSamples(const SamplePass& pass) {
+MbxStatus Mp4File::enterSamples(const MuxerRoutine& routine, const SamplePass& pass) {
     std::uint32_t randomAccess = IsFragmentOpen();
     const std::uint32_t track = m_track_ids[pass.track];
     for (const auto& data : pass.samples) {
@@ -72,12 +72,13 @@ MbxStatus Mp4File::enterSamples(const SamplePass& pass) {
         randomAccess = 0;
         m_payload += sample.size;
         ++pass.counter;
-        CLIPFILE_LOG(LOG_PRIORITY_SAMPLE, "%d\t%d\t%llu\t%llu\t%llu\t%d\t%d.", static_cast<int>(pass.counter),
-                     static_cast<int>(sample.isSync),
-                     static_cast<unsigned long long>(pass.counter * pass.duration),
-                     static_cast<unsigned long long>(data->GetRtpTimestamp()),
-                     static_cast<unsigned long long>(data->GetTimestamp()), static_cast<int>(sample.size),
-                     static_cast<int>(sample.duration));
+        const unsigned long long end = pass.counter * pass.duration;
+        Logger::Put(LOG_PRIORITY_SAMPLE, __FILE__, routine.Function(), __LINE__,
+                    "%d\t%d\t%llu\t%llu\t%llu\t%d\t%d.", static_cast<int>(pass.counter),
+                    static_cast<int>(sample.isSync), end,
+                    static_cast<unsigned long long>(data->GetRtpTimestamp()),
+                    static_cast<unsigned long long>(data->GetTimestamp()), static_cast<int>(sample.size),
+                    static_cast<int>(sample.duration));
     }
     return MbxEndChunk(m_session.get(), track);
 }
@@ -134,15 +135,18 @@ MbxStatus Mp4File::writeTmcd(const unsigned char* timecode) {
 
     const bool dropFrame = (m_info.tmcd_m_data_type_it & 1U) != 0;
     const std::uint32_t value = FrameNumber(timecode, m_info.timecode_numFrames, dropFrame);
-    const std::uint8_t stored[kTimecodeSize] = {
-        static_cast<std::uint8_t>(value >> 24), static_cast<std::uint8_t>(value >> 16),
-        static_cast<std::uint8_t>(value >> 8), static_cast<std::uint8_t>(value)};
-    MUXER_STEP(routine, writeBytes(stored, sizeof stored));
+    MUXER_STEP(routine,
+               storeTimecode({static_cast<std::uint8_t>(value >> 24), static_cast<std::uint8_t>(value >> 16),
+                              static_cast<std::uint8_t>(value >> 8), static_cast<std::uint8_t>(value)}));
     CLIPFILE_LOG_PLAIN(LOG_PRIORITY_TRACE, "ST: write tmcd  : %02d:%02d:%02d:%02d:%s", timecode[0],
                        timecode[1], timecode[2], timecode[3], dropFrame ? "DF" : "NDF");
     CLIPFILE_LOG_PLAIN(LOG_PRIORITY_TRACE, "ST: write tmcd  : %lX(%d)",
                        static_cast<unsigned long>(reverseBytes(value)), static_cast<int>(value));
     return routine.Return(MBX_OK);
+}
+
+MbxStatus Mp4File::storeTimecode(const std::array<std::uint8_t, kTimecodeSize>& bytes) {
+    return writeBytes(bytes.data(), bytes.size());
 }
 
 MbxStatus Mp4File::writeBytes(const void* data, std::uint64_t size) {

@@ -29,15 +29,6 @@ constexpr std::uint32_t kAvcEntry = 2;
 constexpr std::uint64_t kMinimumSpsSize = 4;
 constexpr std::uint32_t kUsageItem = 10;
 
-MbxTrackParams trackParams(std::uint32_t trackId, std::uint32_t timescale) {
-    MbxTrackParams params = {};
-    params.trackId = trackId;
-    params.timescale = timescale;
-    params.language = kEnglish;
-    params.enable_mode = 1;
-    return params;
-}
-
 /// A reference to this very file.
 MbxStatus addOwnFile(MbxSession* session, std::uint32_t track, std::uint32_t& index) {
     return MbxAddDataReference(session, track, "", 0, &index);
@@ -106,6 +97,16 @@ MbxStatus Mp4File::createMoov() {
     MUXER_STEP(routine, createTimcdTrack());
     MUXER_STEP(routine, createRtmtaTrack());
     return routine.Return(MBX_OK);
+}
+
+MbxTrackParams Mp4File::trackParams(std::uint32_t trackId, std::uint32_t timescale) const {
+    MbxTrackParams params = {};
+    params.noEditList = hasEdits() ? 0 : 1;
+    params.trackId = trackId;
+    params.timescale = timescale;
+    params.language = kEnglish;
+    params.enable_mode = 1;
+    return params;
 }
 
 MbxStatus Mp4File::createVideoTrack() {
@@ -184,12 +185,13 @@ MbxStatus Mp4File::createTimcdTrack() {
     std::uint32_t trackId = 0;
     MUXER_STEP(routine, MbxGetNextTrackId(session, &trackId));
     MbxTrackParams params = trackParams(trackId, m_info.video_track_timescale);
-    // Contract: timecode-size-in-trex. The one default that is given and not derived.
-    // The one sample comes when the file is closed, and its fragment leaves the size to `trex`. A file that
-    // is cut off before its `moov` is written again has to tell it too: readers refuse a whole file for a
-    // sample of no size.
-    static constexpr std::size_t kSize = 2;
-    params.fragmentDefaults[kSize] = kTimecodeSize;
+    if (!isExact()) {
+        // Contract: the one sample comes when the file is closed, and its fragment leaves the size to `trex`.
+        // A file that is cut off before its `moov` is written again has to tell it too: readers refuse a
+        // whole file for a sample of no size. With exact rules the fragment tells it itself.
+        static constexpr std::size_t kSize = 2;
+        params.fragmentDefaults[kSize] = kTimecodeSize;
+    }
     MUXER_STEP(routine, MbxAddTimecodeTrack(session, &params, &track));
 
     MbxTimecodeEntryParams timecode = {};
