@@ -23,8 +23,9 @@ MbxStatus MbxSetFragmentBase(MbxContext* context, MbxMovie* movie, uint32_t frag
 namespace {
 
 // Takes the defaults that nobody gave from the segment that has just been sealed, which is the first one with
-// samples: one before it would have given them. A track without samples gets the same as one whose samples
-// say nothing, and learns later.
+// samples: one before it would have given them.
+// Contract: late-track-defaults. A track without samples gets the same as one whose samples say nothing, and
+// learns later: a `moov` that is written already says otherwise.
 void deriveDefaults(MbxTrack* track) {
     if (track->defaultsDone != 0) return;
     MbxSampleDefaults derived = {1, 0, 0, MBX_SAMPLE_NON_SYNC};

@@ -4,6 +4,7 @@
 
 namespace clipfileModule {
 
+// Contract: sixteen-for-eight. A late unit still finds its place.
 /// Video units that must be cached before a chunk is cut.
 inline constexpr std::size_t kMinimumVideoUnits = 16;
 

@@ -160,6 +160,7 @@ void StreamBuffer::finishStop() {
         }
         output = fileOutput;
     }
+    // Contract: restart-forgets-the-stop. A stop that was commanded is lost.
     startTimestamp = 0;
     stopTimestamp = -1;
     endTimestamp = -1;
@@ -324,6 +325,7 @@ void StreamBuffer::setError(int code) {
     }
     controller->SetStatus(6, code);
     if (!chunkProduced) {
+        // Contract: fault-before-first-chunk. Ends the module for good, whatever the cause was.
         controller->SetStatus(7, 26);
         return;
     }
@@ -344,7 +346,7 @@ bool StreamBuffer::MakeFileTimecode(const std::shared_ptr<ChunkData>& chunk) {
         if (isExact()) {
             offset = framesIn(distance);
         } else {
-            // From 90 kHz to 30 kHz, at every frame rate.
+            // Contract: timecode-offset-by-3. From 90 kHz to 30 kHz, at every frame rate.
             offset = static_cast<int>((distance / 3 + duration / 2) / duration);
         }
     }

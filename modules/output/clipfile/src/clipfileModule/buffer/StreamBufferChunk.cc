@@ -14,6 +14,7 @@ namespace clipfileModule {
 
 namespace {
 
+// Contract: waiting-fills-a-cache. Audio and metadata are cached while no IDR frame comes.
 /// Units in a cache, and chunks that wait for `FileOutput`; passing one of these ends the recording.
 constexpr std::size_t kVideoLimit = 600;
 constexpr std::size_t kAudioLimit = 900;
@@ -90,8 +91,8 @@ void StreamBuffer::makeChunk() {
             }
         }
     }
-    // Both wait for the lock of the state, and whoever holds that one may wait for a worker that adds to a
-    // cache: the lock of the caches had to be given back first.
+    // Contract: one-order-of-locks. Both wait for the lock of the state, and whoever holds that one may wait
+    // for a worker that adds to a cache: the lock of the caches had to be given back first.
     if (result == kRecordEnded) {
         endSync();
     } else if (result != kGoOn) {
@@ -104,8 +105,9 @@ PassResult StreamBuffer::makePass() {
     if (videoBuffer.empty()) {
         return kGoOn;
     }
-    // In ticks, and unsigned: an open stop of -1 lies above every timestamp.
+    // Contract: stop-in-two-units. In ticks here, and unsigned: an open stop, -1, is above all.
     if (static_cast<std::uint64_t>(stopTimestamp.load()) < videoBuffer.front()->rtp_timestamp) {
+        // Contract: record-ends-on-chunk. The last one may hold 7 units beyond the stop.
         return kRecordEnded;
     }
     if (videoBuffer.size() < kMinimumVideoUnits) {
@@ -127,6 +129,7 @@ void StreamBuffer::endSync() {
     CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "end.");
 }
 
+// Contract: full-cache-names-itself. Not the medium that is missing; video is looked at first.
 PassResult StreamBuffer::findPassedLimit() const {
     if (videoBuffer.size() > kVideoLimit) {
         return kVideoBufferFull;

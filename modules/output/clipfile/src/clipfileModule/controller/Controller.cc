@@ -85,6 +85,7 @@ bool Controller::Initialize(QxModuleHostInterface* moduleHost) {
         MutexLock lock(statusMutex);
         statusChannel = channel;
     }
+    // Contract: static-config-never-fails. A guard that nothing reaches.
     if (!getStaticConfig()) {
         CLIPFILE_LOG(LOG_PRIORITY_ERROR, "end. static config error.");
         SetStatus(kStatusFailed, kCauseInitialize);

@@ -24,6 +24,7 @@ long long wide(std::int64_t value) {
 void Controller::PushReserved(const std::shared_ptr<StreamData>&) {}
 
 void Controller::PushVideo(const std::shared_ptr<StreamData>& unit) {
+    // Contract: overflow-only-logged. No status, no count.
     if (!pushUnit(Medium::kVideo, unit)) {
         CLIPFILE_LOG(LOG_PRIORITY_WARNING, "queue overflow (video)");
     }
@@ -47,7 +48,8 @@ bool Controller::pushUnit(Medium medium, const std::shared_ptr<StreamData>& unit
         noteStrayUnit();
         return true;
     }
-    // Both are asked: the host's status may be older than the module's 7, and a host may hold a 7 of its own.
+    // Contract: silent-after-status-7. Dropped units are not logged. Both are asked: the host's status may be
+    // older than the module's 7, and a host may hold a 7 of its own.
     if (channel->IsFinal() || host->GetStatus() == kStatusFailed) {
         return true;
     }
@@ -108,6 +110,7 @@ void Controller::processMeta(const std::shared_ptr<StreamData>& unit) {
             if (flag == 1) {
                 CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: REC FLAG OFF -> ON.");
                 followCommand(*unit);
+                // Contract: start-direct-stop-posted. A start holds for this very unit, a stop may be late.
                 StartStream(unit);
             } else {
                 CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: REC FLAG ON -> OFF.");
@@ -231,6 +234,7 @@ void Controller::BufferingStart() {
     const StatusChannel::Hold hold(getStatusChannel());
     MutexLock lock(streamBuffersMutex);
     streamBuffers.remove_if([](const Recording& recording) { return recording.isOver; });
+    // Contract: online-records-again. What an offline stopped is still in the list.
     const OutputSettings now = getSettings();
     for (Recording& recording : streamBuffers) {
         recording.buffer->Start(now);
@@ -250,6 +254,7 @@ void Controller::BufferingStop() {
     {
         const StatusChannel::Hold hold(getStatusChannel());
         MutexLock lock(streamBuffersMutex);
+        // Contract: stop-under-the-list-lock. Units wait meanwhile; a removal stops outside.
         fault = stopBuffers();
     }
     flushQueues();

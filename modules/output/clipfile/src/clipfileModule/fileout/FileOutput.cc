@@ -168,6 +168,7 @@ void FileOutput::outputThread(Work& work) {
 bool FileOutput::outputFile(Work& work, std::deque<std::shared_ptr<ChunkData>>& deque) {
     bool limitReached = false;
     std::uint64_t excess = 0;
+    // Contract: box-size-of-the-old-file. Holds for the first chunk behind a rotation too.
     std::uint64_t boxSize = 0;
     while (!deque.empty()) {
         const std::shared_ptr<ChunkData> chunk = std::move(deque.front());
@@ -190,7 +191,7 @@ bool FileOutput::outputFile(Work& work, std::deque<std::shared_ptr<ChunkData>>& 
             return true;
         }
         if (limitReached) {
-            // A file ends only where audio and video are in step.
+            // Contract: rotation-at-cadence. A file ends only where audio and video are in step.
             if (work.lastChunk == nullptr || !work.lastChunk->sync) {
                 CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "mp4 file over. no a/v sync. %d",
                              static_cast<int>(work.writtenVideoSamples));

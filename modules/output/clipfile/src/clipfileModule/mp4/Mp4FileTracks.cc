@@ -186,9 +186,10 @@ MbxStatus Mp4File::createTimcdTrack() {
     MUXER_STEP(routine, MbxGetNextTrackId(session, &trackId));
     MbxTrackParams params = trackParams(trackId, m_info.video_track_timescale);
     if (!isExact()) {
-        // Contract: the one sample comes when the file is closed, and its fragment leaves the size to `trex`.
-        // A file that is cut off before its `moov` is written again has to tell it too: readers refuse a
-        // whole file for a sample of no size. With exact rules the fragment tells it itself.
+        // Contract: timecode-size-in-trex. The one sample comes when the file is closed, and its fragment
+        // leaves the size to `trex`. A file that is cut off before its `moov` is written again has to tell it
+        // too: readers refuse a whole file for a sample of no size. With exact rules the fragment tells it
+        // itself.
         static constexpr std::size_t kSize = 2;
         params.fragmentDefaults[kSize] = kTimecodeSize;
     }

@@ -47,6 +47,7 @@ MbxStatus Mp4FragmentMuxer::createFprf() {
 }
 
 std::uint32_t Mp4FragmentMuxer::IsFragmentOpen() {
+    // Contract: index-rows-of-any-sample. The first of each chunk, sync sample or not.
     return m_first && !m_flush ? 0 : 1;
 }
 
@@ -155,7 +156,8 @@ MbxStatus Mp4FragmentMuxer::writeMoofAndMdat(MuxerRoutine& routine) {
     MUXER_STEP(routine, MbxWriteMoof(session, m_file.get(), m_sequence, m_position, &moofSize));
     m_position += moofSize;
     if (!isExact()) {
-        // Contract: released before its samples are written, so that a second try finds empty tables.
+        // Contract: failed-flush-shifts-twice. Released before its samples are written, so that a second try
+        // finds empty tables.
         MUXER_STEP(routine, MbxReleaseFragment(session, m_sequence));
     }
     if (const MbxStatus status = writeMdat(routine); status != MBX_OK) {
@@ -180,7 +182,8 @@ MbxStatus Mp4FragmentMuxer::endFlush(MbxStatus status, std::uint64_t position) {
         m_position = position;
         return status;
     }
-    // Contract: the position stays where the failure left it, and the next try seals and shifts once more.
+    // Contract: failed-flush-shifts-twice. The position stays where the failure left it, and the next try
+    // seals and shifts once more.
     m_pending.splice(m_pending.begin(), m_flush->chunks);
     m_payload += m_flush->payload;
     m_flush.reset();

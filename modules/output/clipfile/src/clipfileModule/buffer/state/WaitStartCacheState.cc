@@ -38,9 +38,10 @@ bool WaitStartCacheState::isBeforeStart(const StreamData& unit, std::string_view
 
 std::optional<std::int64_t> WaitStartCacheState::stopPassedBy(const StreamData& unit,
                                                               std::string_view mediaType) const {
-    // Read once: the stop may be set at any moment, and the line shall show what the test saw.
+    // Contract: stop-read-once. It may be set at any moment, and the line shall show what the test saw.
     const std::int64_t stop = buffer->GetStopTimestamp();
     if (rules == RecordRules::kKept) {
+        // Contract: stop-in-two-units. In milliseconds here, in ticks in the chunk thread.
         return unit.timestamp > toMilliSec(stop) ? std::optional(stop) : std::nullopt;
     }
     const std::int64_t commandedEnd = buffer->GetEndTimestamp();
@@ -61,6 +62,7 @@ std::shared_ptr<CacheState> WaitStartCacheState::Execute(const std::shared_ptr<S
         CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: REC CANCEL. RTPTS = %lld. -> %lld",
                            static_cast<long long>(buffer->GetStartTimestamp()),
                            static_cast<long long>(*stop));
+        // Contract: any-medium-cancels. Audio or metadata may be first.
         return std::make_shared<EndSyncRecState>(buffer);
     }
     if (mediaType != kVideo) {
