@@ -2,14 +2,11 @@
 
 #include <sched.h>
 
-#include <algorithm>
 #include <atomic>
 #include <chrono>
 #include <cstdint>
-#include <cstdlib>
 #include <stdexcept>
 #include <string>
-#include <string_view>
 #include <thread>
 
 #include "LogCapture.h"
@@ -18,7 +15,6 @@
 #include "support/FakeHost.h"
 #include "support/LogLines.h"
 #include "support/TempDir.h"
-#include "support/WaitUntil.h"
 
 /// Keeps this thread and all that it starts on one processor, which another thread uses up, while it lives.
 class LoadedCore {
@@ -101,11 +97,9 @@ class LiveHost {
     }
     /// Pushes frames until lines that begin with `prefix` came `count` times.
     void PushUntilLine(const std::string& prefix, std::size_t count, bool recFlag) {
-        const auto deadline = std::chrono::steady_clock::now() + LogCapture::kDeadline;
+        const Deadline deadline;
         while (countPrefix(log, prefix) < count) {
-            if (std::chrono::steady_clock::now() > deadline) {
-                throw std::runtime_error("no line " + prefix);
-            }
+            deadline.Check();
             PushUntil(frame + 1, recFlag);
         }
     }
@@ -114,19 +108,20 @@ class LiveHost {
     void StarveOfMetadata() {
         static constexpr std::uint64_t kAhead = 30;
         const auto restarted = [this] { return countPrefix(log, "OP: REC RESTART.") > 0; };
-        std::uint64_t video = takenVideo_;
-        std::uint64_t audio = takenAudio_;
-        const std::uint64_t last = frame - 1;
-        if (!waitForPrefix(log, "ST: [V]\t" + std::to_string(stream.clock.VideoRtp(last)))) {
+        const Deadline deadline;
+        if (!waitForPrefix(log, "ST: [V]\t" + std::to_string(stream.clock.VideoRtp(frame - 1)))) {
             throw std::runtime_error("a picture was lost");
         }
         takenVideo_ = 0;
         takenAudio_ = 0;
-        for (video = 0, audio = 0; !restarted(); ++frame) {
-            video += 1;
+        std::uint64_t video = 0;
+        std::uint64_t audio = 0;
+        for (; !restarted(); ++frame) {
+            ++video;
             audio += pushAudio(frame);
             module_.Stream().PushVideo(stream.Video(frame));
             while (!restarted() && (video > takenVideo_ + kAhead || audio > takenAudio_ + kAhead)) {
+                deadline.Check();
                 std::this_thread::yield();
             }
         }
@@ -143,6 +138,19 @@ class LiveHost {
     bool HasLostUnits() const { return countPrefix(log, "queue overflow") > 0; }
 
  private:
+    class Deadline {
+     public:
+        void Check() const {
+            if (std::chrono::steady_clock::now() > end_) {
+                throw std::runtime_error("the module does not come to what it should do");
+            }
+        }
+
+     private:
+        const std::chrono::steady_clock::time_point end_ =
+            std::chrono::steady_clock::now() + LogCapture::kDeadline;
+    };
+
     void pushFrame(bool recFlag) {
         if (delivery_.videoFirst) {
             module_.Stream().PushVideo(stream.Video(frame));
