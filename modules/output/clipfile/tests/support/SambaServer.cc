@@ -124,26 +124,37 @@ void SambaServer::addUser() {
 }
 
 void SambaServer::Start() {
-    std::vector<std::string> command = {find("smbd"), "--foreground", "--no-process-group", "-s",
-                                        (directory_.Path() / "smb.conf").string()};
+    // Whatever ends this process closes the pipe, and that ends the server, also one that is frozen.
+    static const char* const kWithLifeline = "(read -r _ <&3; kill -KILL 0) & exec \"$0\" \"$@\"";
+    std::vector<std::string> command = {"/bin/sh",      "-c",
+                                        kWithLifeline,  find("smbd"),
+                                        "--foreground", "--no-process-group",
+                                        "-s",           (directory_.Path() / "smb.conf").string()};
     std::vector<char*> arguments;
     for (std::string& argument : command) {
         arguments.push_back(argument.data());
     }
     arguments.push_back(nullptr);
+    int ends[2] = {};
+    if (pipe2(ends, O_CLOEXEC) != 0) {
+        throw std::runtime_error("no pipe");
+    }
+    lifeline_ = ends[1];
     posix_spawnattr_t attributes;
     posix_spawnattr_init(&attributes);
     posix_spawnattr_setflags(&attributes, POSIX_SPAWN_SETPGROUP);
     posix_spawn_file_actions_t actions;
     posix_spawn_file_actions_init(&actions);
     posix_spawn_file_actions_addopen(&actions, STDIN_FILENO, "/dev/null", O_RDONLY, 0);
+    posix_spawn_file_actions_adddup2(&actions, ends[0], 3);
     const int error = posix_spawn(&id_, arguments[0], &actions, &attributes, arguments.data(), environ);
     posix_spawn_file_actions_destroy(&actions);
     posix_spawnattr_destroy(&attributes);
-    if (error != 0 ||
-        !waitUntil([this] { return takesConnections(port_) || waitpid(id_, nullptr, WNOHANG) != 0; }) ||
-        waitpid(id_, nullptr, WNOHANG) != 0) {
+    close(ends[0]);
+    const auto ended = [this] { return waitpid(id_, nullptr, WNOHANG) != 0; };
+    if (error != 0 || !waitUntil([&] { return takesConnections(port_) || ended(); }) || ended()) {
         id_ = 0;
+        close(lifeline_);
         throw std::runtime_error("smbd does not start");
     }
     // The connection that was tried has its own process for a moment.
@@ -155,8 +166,9 @@ void SambaServer::Start() {
 
 void SambaServer::Kill() {
     if (id_ > 0) {
-        signalAll(SIGKILL);
+        kill(-id_, SIGKILL);
         waitpid(id_, nullptr, 0);
+        close(lifeline_);
         id_ = 0;
     }
 }
@@ -170,22 +182,31 @@ void SambaServer::CutConnections() {
 }
 
 void SambaServer::Freeze() {
-    signalAll(SIGSTOP);
+    signalServer(SIGSTOP);
 }
 
 void SambaServer::Thaw() {
-    signalAll(SIGCONT);
+    signalServer(SIGCONT);
 }
 
-void SambaServer::signalAll(int number) const {
-    kill(-id_, number);
+void SambaServer::signalServer(int number) const {
+    kill(id_, number);
+    for (const pid_t child : children()) {
+        kill(child, number);
+    }
 }
 
 std::vector<pid_t> SambaServer::children() const {
-    std::ifstream file("/proc/" + std::to_string(id_) + "/task/" + std::to_string(id_) + "/children");
+    const std::string id = std::to_string(id_);
+    std::ifstream file("/proc/" + id + "/task/" + id + "/children");
     std::vector<pid_t> found;
     for (pid_t child = 0; file >> child;) {
-        found.push_back(child);
+        // Names of the server's own begin with that of the program.
+        std::string name;
+        std::ifstream("/proc/" + std::to_string(child) + "/comm") >> name;
+        if (name.rfind("smbd", 0) == 0) {
+            found.push_back(child);
+        }
     }
     return found;
 }

@@ -10,8 +10,8 @@
 #include "support/TempDir.h"
 
 /// Debian's smbd on a free port of the loopback interface, with settings, users and state in a directory of
-/// its own: nothing of the system's Samba is read or changed. It runs with the rights of the test. Its user
-/// is `kUser`, under any domain.
+/// its own: nothing of the system's Samba is read or changed. It runs with the rights of the test, and never
+/// longer. Its user is `kUser`, under any domain.
 class SambaServer {
  public:
     static constexpr const char* kUser = "recorder";
@@ -50,14 +50,16 @@ class SambaServer {
 
  private:
     void addUser();
-    void signalAll(int number) const;
+    void signalServer(int number) const;
     std::vector<pid_t> children() const;
 
     TempDir directory_;
     const std::filesystem::path folder_;
     int port_ = 0;
-    /// The server's process and process group.
+    /// The server's process. Its process group is that of all that belongs to it.
     pid_t id_ = 0;
+    /// Held open for as long as the server may run.
+    int lifeline_ = -1;
     /// Its helpers, which belong to no connection.
     std::vector<pid_t> helpers_;
 };
