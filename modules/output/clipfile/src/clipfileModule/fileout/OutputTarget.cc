@@ -9,6 +9,7 @@
 #include "fileout/FileOutput.h"
 #include "fileout/FileOutputWork.h"
 #include "mp4/Mp4MuxerFactory.h"
+#include "platform/SharePath.h"
 
 namespace clipfileModule {
 
@@ -125,18 +126,22 @@ bool FileOutput::createOutputDirectory(Work& work, const std::string& path) {
 LogonToken FileOutput::useNetDrive(Work& work) {
     const OutputSettings& settings = work.settings;
     // Contract: remote-by-two-backslashes. A mapped drive or a mount is local.
-    if (settings.outputPath.compare(0, 2, "\\\\") != 0) {
+    if (!IsSharePath(settings.outputPath)) {
         CLIPFILE_LOG(LOG_PRIORITY_TRACE, "is local drive.");
         return kNoLogon;
     }
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "is remote drive.");
-    if (settings.userName.empty()) {
-        return kNoLogon;
-    }
     LogonToken token = kNoLogon;
-    // Contract: path-as-domain. The whole output path stands in the domain's place.
-    const int logonError =
-        GetPlatform().Logon(settings.userName, settings.outputPath, settings.password, token);
+    std::string reason;
+    int logonError = GetPlatform().ShareSupport(reason);
+    if (logonError != 0) {
+        CLIPFILE_LOG(LOG_PRIORITY_WARNING, "no network shares: %s.", reason.c_str());
+    } else if (settings.userName.empty()) {
+        return kNoLogon;
+    } else {
+        // Contract: path-as-domain. The whole output path stands in the domain's place.
+        logonError = GetPlatform().Logon(settings.userName, settings.outputPath, settings.password, token);
+    }
     if (work.owner.IsCut()) {
         return token;
     }

@@ -151,7 +151,7 @@ bool Mp4File::createFilename(const std::array<unsigned char, 4>& timecode) {
 }
 
 MbxStatus Mp4File::createFile(MuxerRoutine& routine, bool dropFrame) {
-    const std::string path = GetPlatform().NativePath(m_stream.outputPath + "\\" + m_filename);
+    const std::string path = m_stream.outputPath + "\\" + m_filename;
     MbxFile* file = nullptr;
     MUXER_STEP(routine, GetFileAccess().open(path.c_str(), 0, &file));
     m_file.reset(file);
