@@ -69,18 +69,14 @@ TEST_P(StreamBufferSelfStop, OnTheChunkThreadThrowsAndLeavesTheRestToTheNext) {
 }
 
 TEST_P(StreamBufferSelfStop, OnTheWriterKeepsTheFileOutputUntilItHasStopped) {
-    std::atomic<bool> isWriter = true;
-    harness.recorder.SetStopHook([&] {
-        if (isWriter) {
-            throw std::system_error(std::make_error_code(std::errc::resource_deadlock_would_occur));
-        }
-    });
+    harness.recorder.SetStopHook(
+        [] { throw std::system_error(std::make_error_code(std::errc::resource_deadlock_would_occur)); });
     harness.Start();
     ASSERT_TRUE(harness.RunUntilChunks(1));
     EXPECT_THROW(harness.buffer->Stop(), std::system_error);
     // Each further stop of the writer itself fails as the first one did.
     EXPECT_THROW(harness.buffer->Stop(), std::system_error);
-    isWriter = false;
+    harness.recorder.SetStopHook({});
     finish();
     EXPECT_THAT(harness.recorder.At(0).calls,
                 ElementsAre("Initialize", "Start", "Stop", "Stop", "Stop", "Uninitialize"));
