@@ -209,6 +209,12 @@ TEST_F(StatusChannelTest, AThreadThatIsInsideTheHostWhenTheChannelClosesCallsItN
     EXPECT_EQ(host_.Statuses(), (Statuses{{6, 22}}));
 }
 
+TEST_F(StatusChannelTest, AHostThatIsLetGoOfWhileItIsAskedForItsStatusIsToldNothing) {
+    host_.inGetStatus = [&] { channel_->Close(); };
+    channel_->Set(6, 22);
+    EXPECT_TRUE(host_.Statuses().empty());
+}
+
 /// Many threads, a host that sets off statuses of its own and one that holds a lock across its calls.
 TEST_F(StatusChannelTest, LosesNothingAndEndsWithThe7UnderContention) {
     constexpr int kRounds = 300;

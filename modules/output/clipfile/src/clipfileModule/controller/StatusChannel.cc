@@ -51,12 +51,18 @@ bool StatusChannel::takeNext(Status& next) {
     return true;
 }
 
+bool StatusChannel::isClosed() {
+    MutexLock lock(mutex_);
+    return closed_;
+}
+
 void StatusChannel::deliver() {
     std::exception_ptr fault;
     Status next = {};
     while (takeNext(next)) {
         try {
-            if (host_->GetStatus() != kStatusFailed) {
+            // The host may take its time, and be let go of meanwhile.
+            if (host_->GetStatus() != kStatusFailed && !isClosed()) {
                 host_->SetStatus(next.status, next.cause);
             }
         } catch (...) {

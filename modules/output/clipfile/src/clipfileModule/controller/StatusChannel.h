@@ -59,6 +59,7 @@ class StatusChannel {
     /// True when the caller has to deliver now.
     bool becomeDeliverer() REQUIRES(mutex_);
     bool takeNext(Status& next) EXCLUDES(mutex_);
+    bool isClosed() EXCLUDES(mutex_);
     void deliver() EXCLUDES(mutex_);
     void holdBack() EXCLUDES(mutex_);
     void release() EXCLUDES(mutex_);
