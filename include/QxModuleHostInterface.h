@@ -10,9 +10,11 @@
 /// From inside `SetStatus` and `GetStatus` the host may push, query the module and connect an input, on any
 /// thread. It may go online, offline or disconnect from inside `SetStatus` too; when the status came from a
 /// thread of a recording, which cannot wait for its own end, the notification then throws `std::system_error`
-/// (`resource_deadlock_would_occur`) after everything was stopped. From inside `SendTransmissionStatus` the
-/// host may call all but `Uninitialize`. `Initialize` and `Uninitialize` from inside any of these operations
-/// are undefined.
+/// (`resource_deadlock_would_occur`) after all was stopped, or all but that recording started. A status that
+/// a notification sets finds this one half done: going offline inside the 4 of going online stops nothing,
+/// and going online inside the 6 or the 3 of going offline starts nothing. From inside
+/// `SendTransmissionStatus` the host may call all but `Uninitialize`. `Initialize` and `Uninitialize` from
+/// inside any of these operations are undefined.
 ///
 /// The module holds no lock of its event loop or of its statuses during a call of the host. A slow operation
 /// delays what it was called for, and a push by as long as `GetStatus` takes.

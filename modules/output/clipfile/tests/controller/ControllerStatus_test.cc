@@ -6,6 +6,8 @@
 #include <functional>
 #include <latch>
 #include <memory>
+#include <stdexcept>
+#include <string>
 #include <system_error>
 #include <thread>
 #include <utility>
@@ -230,6 +232,85 @@ TEST_F(ControllerStatusTest, ARecordingThatCannotBeJoinedKeepsNoneOfTheOthersRun
     handler_.NotifyOfflineStatus();
     EXPECT_EQ(Since(before), (Statuses{{4, 0}, {6, 26}, {3, 0}}));
 }
+
+TEST_F(ControllerStatusTest, WhatTheHostThrowsOfABufferingStopKeepsNothingRecording) {
+    host_.inSetStatus = [](FakeHost::Status status) {
+        if (status.first == 3) {
+            throw std::runtime_error("host");
+        }
+    };
+    log_.Clear();
+    EXPECT_THROW(handler_.NotifyOfflineStatus(), std::runtime_error);
+    EXPECT_EQ(log_.Count("OP: CHANGE STATE wait_state -> stop."), 1U);
+}
+
+/// A host that goes offline and online again from inside the status of a recording that failed.
+class ReturningHostTest : public ControllerStatusTest, public testing::WithParamInterface<const char*> {
+ protected:
+    void SetUp() override {
+        host_.texts["-recordRules"] = GetParam();
+        ControllerStatusTest::SetUp();
+    }
+    /// Lets the first recording fail before a host that returns from inside the status.
+    void FailAndReturn() {
+        outputs_.SetQueueSize(49);
+        host_.inSetStatus = [this](FakeHost::Status status) {
+            if (status == FakeHost::Status{6, 22}) {
+                outputs_.SetQueueSize(0);
+                Notify(&QxMessageHandler::NotifyOfflineStatus);
+                Notify(&QxMessageHandler::NotifyOnlineStatus);
+                returned_ = true;
+            }
+        };
+        PushUntil([&] { return returned_.load(); });
+        // What it set off follows when its call has ended.
+        ASSERT_TRUE(waitUntil([&] { return host_.Statuses().size() == 5; }));
+    }
+    void Notify(void (QxMessageHandler::*notification)()) {
+        try {
+            (handler_.*notification)();
+        } catch (const std::system_error&) {
+            ++thrown_;
+        }
+    }
+
+    std::atomic<bool> returned_ = false;
+    std::atomic<int> thrown_ = 0;
+};
+
+TEST_P(ReturningHostTest, GoesOnWithAllButTheRecordingWhoseThreadItIsOn) {
+    FailAndReturn();
+    EXPECT_EQ(thrown_, 2);
+    EXPECT_EQ(host_.Statuses(), (Statuses{{4, 0}, {6, 22}, {6, 26}, {3, 0}, {4, 0}}));
+    ASSERT_EQ(peer_.StreamBuffers().size(), 2U);
+    log_.Clear();
+    // The recording that the online made is stopped by the next offline.
+    handler_.NotifyOfflineStatus();
+    EXPECT_EQ(
+        log_.Count("OP: CHANGE STATE wait_state -> stop.") + log_.Count("OP: CHANGE STATE start -> stop."),
+        1U);
+    EXPECT_EQ(Since(5), (Statuses{{6, 26}, {3, 0}}));
+}
+
+INSTANTIATE_TEST_SUITE_P(Rules, ReturningHostTest, testing::Values("kept", "exact"),
+                         [](const auto& param) { return std::string(param.param); });
+
+class ExactReturningHostTest : public ReturningHostTest {};
+
+TEST_P(ExactReturningHostTest, MayComeBackFromInsideTheFaultOfARecordingThatDoesNotBeginAgain) {
+    const auto farBehind = stream_units::MetaUnit(0, 90ULL * 1000000, 1000000);
+    controller_.PostEvent(std::make_shared<StopStreamingEvent>(farBehind));
+    ASSERT_TRUE(log_.WaitForText("OP: REC STOP. RTPTS = 0 -> 90000000."));
+    FailAndReturn();
+    // Nothing has to be joined for the online: the recording is left to the event thread.
+    EXPECT_EQ(thrown_, 1);
+    ASSERT_TRUE(
+        outputs_.WaitFor([](const auto& outputs) { return outputs[0].calls.back() == "Uninitialize"; }));
+    EXPECT_EQ(peer_.StreamBuffers().size(), 1U);
+}
+
+INSTANTIATE_TEST_SUITE_P(Rules, ExactReturningHostTest, testing::Values("exact"),
+                         [](const auto& param) { return std::string(param.param); });
 
 }  // namespace
 }  // namespace clipfileModule

@@ -203,19 +203,28 @@ TEST_F(QxMessageHandlerTest, ASetPropertiesRequestIsOnlyLogged) {
     EXPECT_TRUE(TakeCalls().empty());
 }
 
-/// A controller that cannot stop a recording, or that runs no more.
+/// A controller that cannot start or stop a recording, or that runs no more.
 class TroubledController : public ControllerRecorder {
  public:
     bool throws = false;
     bool running = true;
 
+    void BufferingStart() override {
+        ControllerRecorder::BufferingStart();
+        throwIfTold();
+    }
     void BufferingStop() override {
         ControllerRecorder::BufferingStop();
+        throwIfTold();
+    }
+    bool IsRunning() const override { return running; }
+
+ private:
+    void throwIfTold() const {
         if (throws) {
             throw std::system_error(std::make_error_code(std::errc::resource_deadlock_would_occur));
         }
     }
-    bool IsRunning() const override { return running; }
 };
 
 class QxMessageHandlerTroubleTest : public testing::Test {
@@ -236,6 +245,14 @@ TEST_F(QxMessageHandlerTroubleTest, AStopThatThrowsLeavesTheHandlerReadyForTheNe
     handler_.NotifyOfflineStatus();
     EXPECT_EQ(controller_.Calls(), (Texts{"BufferingStart", "status 6 26", "BufferingStop", "BufferingStart",
                                           "status 6 26", "BufferingStop"}));
+}
+
+TEST_F(QxMessageHandlerTroubleTest, AStartThatThrowsIsStoppedByTheNextOffline) {
+    controller_.throws = true;
+    EXPECT_THROW(handler_.NotifyOnlineStatus(), std::system_error);
+    controller_.throws = false;
+    handler_.NotifyOfflineStatus();
+    EXPECT_EQ(controller_.Calls(), (Texts{"BufferingStart", "status 6 26", "BufferingStop"}));
 }
 
 TEST_F(QxMessageHandlerTroubleTest, ADisconnectThatThrowsLeavesTheOutputStopped) {

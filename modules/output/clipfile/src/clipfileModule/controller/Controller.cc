@@ -272,11 +272,14 @@ void Controller::Uninitialize() {
     queueThreads.clear();
     queues.clear();
     eventHandlers.clear();
+    // Contract: undelivered-events-dropped. The TerminateEvent above all must not end a later run. They go
+    // without the lock, since one may hold the last reference to a recording whose writer has a post to make.
+    std::deque<std::shared_ptr<Event>> undelivered;
     {
-        // Contract: undelivered-events-dropped. The TerminateEvent above all must not end a later run.
         MutexLock lock(eventQueueMutex);
-        eventQueue.clear();
+        undelivered.swap(eventQueue);
     }
+    undelivered.clear();
     endStatusChannel();
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }

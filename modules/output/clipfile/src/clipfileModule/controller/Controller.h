@@ -106,6 +106,8 @@ class Controller : public ControllerInterface, public QxModuleStreamInterface {
     void StopStream(const std::shared_ptr<StreamData>& unit, std::uint64_t order)
         EXCLUDES(streamBuffersMutex);
     void RemoveStream(const std::shared_ptr<StreamBuffer>& buffer) EXCLUDES(streamBuffersMutex);
+    void removeOverBuffers() REQUIRES(streamBuffersMutex);
+    std::exception_ptr startBuffers() REQUIRES(streamBuffersMutex);
     std::exception_ptr stopBuffers() REQUIRES(streamBuffersMutex);
     void stopAndRemoveBuffers() EXCLUDES(streamBuffersMutex);
     bool restart(const RestartStreamingEvent& event) EXCLUDES(streamBuffersMutex);

@@ -233,29 +233,63 @@ void Controller::BufferingStart() {
     SetStatus(kStatusBufferingStarted, kCauseNone);
     const StatusChannel::Hold hold(getStatusChannel());
     MutexLock lock(streamBuffersMutex);
-    streamBuffers.remove_if([](const Recording& recording) { return recording.isOver; });
+    removeOverBuffers();
     // Contract: online-records-again. What an offline stopped is still in the list.
+    if (const std::exception_ptr fault = startBuffers(); fault != nullptr) {
+        std::rethrow_exception(fault);
+    }
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
+}
+
+void Controller::removeOverBuffers() {
+    streamBuffers.remove_if([this](const Recording& recording) {
+        if (recording.isOver) {
+            // The event thread lets go of it: this one may be a thread of the recording, inside a status.
+            PostEvent(std::make_shared<RemoveStreamingEvent>(recording.buffer));
+        }
+        return recording.isOver;
+    });
+}
+
+/// Starts all that can be started also when one of them has still to be joined by its own thread. Returns
+/// what it threw first.
+std::exception_ptr Controller::startBuffers() {
     const OutputSettings now = getSettings();
+    std::exception_ptr fault;
     for (Recording& recording : streamBuffers) {
-        recording.buffer->Start(now);
+        try {
+            recording.buffer->Start(now);
+        } catch (const std::system_error&) {
+            if (fault == nullptr) {
+                fault = std::current_exception();
+            }
+            continue;
+        }
         if (recording.isStopped) {
             recording.isStopped = false;
             startBehindStream(recording);
         }
     }
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
+    return fault;
 }
 
 void Controller::BufferingStop() {
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "stream buffering stop.");
-    SetStatus(kStatusBufferingStopped, kCauseNone);
     std::exception_ptr fault;
+    try {
+        SetStatus(kStatusBufferingStopped, kCauseNone);
+    } catch (...) {
+        // What a host throws keeps nothing recording.
+        fault = std::current_exception();
+    }
     {
         const StatusChannel::Hold hold(getStatusChannel());
         MutexLock lock(streamBuffersMutex);
         // Contract: stop-under-the-list-lock. Units wait meanwhile; a removal stops outside.
-        fault = stopBuffers();
+        if (const std::exception_ptr stopFault = stopBuffers(); fault == nullptr) {
+            fault = stopFault;
+        }
     }
     flushQueues();
     {

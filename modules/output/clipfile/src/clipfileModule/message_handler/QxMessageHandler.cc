@@ -146,7 +146,13 @@ void QxMessageHandler::NotifyOfflineStatus() {
 
 void QxMessageHandler::startFileOutput() {
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start file output.");
-    controller->BufferingStart();
+    try {
+        controller->BufferingStart();
+    } catch (...) {
+        // What could be started runs, and the next offline must find that so.
+        fileOutputStarted = true;
+        throw;
+    }
     fileOutputStarted = true;
 }
 
