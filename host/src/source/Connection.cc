@@ -2,13 +2,14 @@
 
 #include <algorithm>
 #include <cmath>
-#include <cstdlib>
 #include <utility>
 
+#include "source/RtpStamps.h"
 #include "source/Summary.h"
 #include "source/VideoCheck.h"
 #include "source/VideoConverter.h"
 #include "source/VideoPass.h"
+#include "timing/Saturating.h"
 
 namespace receiver {
 namespace {
@@ -20,8 +21,14 @@ constexpr std::size_t kLookAhead = 25;
 constexpr std::size_t kLongestWait = 4000;
 /// Pictures without an IDR frame among them after which the operator is told.
 constexpr std::uint64_t kWithoutStart = 300;
-/// How far behind the expected time audio may stand, and reordered pictures.
-constexpr std::int64_t kBack = 90000;
+/// How far behind the expected time reordered pictures may stand.
+constexpr std::int64_t kBackReordered = 90000;
+/// And what comes in the order of time, whose stamps merely jitter: this, or three units.
+constexpr std::int64_t kBack = 13500;
+/// How long the sender's first report is waited for, which RTP's senders give every five seconds or so.
+constexpr std::chrono::seconds kReportPatience{6};
+/// The timecode of a file is counted on from its first picture to the first IDR frame no further than this.
+constexpr std::int64_t kLongestCount = std::int64_t{3600} * 90000;
 
 /// The length of the audio frame in a packet of `size` bytes, in ticks.
 std::int64_t AudioDuration(const AVStream& stream, int size) {
@@ -29,6 +36,11 @@ std::int64_t AudioDuration(const AVStream& stream, int size) {
     return samples > 0 && stream.codecpar->sample_rate > 0
                ? av_rescale(samples, kTicks.den, stream.codecpar->sample_rate)
                : av_rescale(kAudioFrame, kTicks.den, kAudioRate);
+}
+
+/// How far behind the expected time a unit of `usual` ticks may stand.
+std::int64_t Back(std::int64_t usual) {
+    return std::max(3 * usual, kBack);
 }
 
 }  // namespace
@@ -68,7 +80,11 @@ void Connection::Choose() {
 
 void Connection::LookAhead() {
     std::size_t pictures = 0;
-    while (pictures < kLookAhead && ahead_.size() < kLongestWait) {
+    const auto begun = Clock::now();
+    const auto waits = [&] {
+        return input_->Rtp() && audio_ && !Reported() && Clock::now() - begun < kReportPatience;
+    };
+    while ((pictures < kLookAhead || waits()) && ahead_.size() < kLongestWait) {
         libav::Owner<AVPacket> packet = libav::NewPacket();
         if (!input_->Read(*packet)) {
             break;
@@ -88,27 +104,22 @@ void Connection::LookAhead() {
     }
     const AVStream& video = *video_.stream;
     if (const double spacing = PictureSpacing(video, ahead_); spacing > 0) {
-        MendStamps(video, std::llround(spacing / av_q2d(video.time_base)));
+        MendStamps(video, std::llround(spacing / av_q2d(video.time_base)), ahead_);
     }
     if (audio_) {
         const AVStream& audio = *audio_->stream;
-        MendStamps(audio, av_rescale_q(AudioDuration(audio, 0), kTicks, audio.time_base));
+        MendStamps(audio, av_rescale_q(AudioDuration(audio, 0), kTicks, audio.time_base), ahead_);
     }
 }
 
-void Connection::MendStamps(const AVStream& stream, std::int64_t step) {
-    const AVPacket* next = nullptr;
-    for (auto packet = ahead_.rbegin(); packet != ahead_.rend(); ++packet) {
-        if ((*packet)->stream_index != stream.index ||
-            (next == nullptr && (*packet)->pts == AV_NOPTS_VALUE)) {
-            continue;
-        }
-        if (next != nullptr &&
-            ((*packet)->pts == AV_NOPTS_VALUE || std::abs(next->pts - (*packet)->pts - step) > step / 2)) {
-            (*packet)->pts = next->pts - step;
-        }
-        next = packet->get();
-    }
+bool Connection::Reported() const {
+    const auto reported = [this](const AVStream& stream) {
+        const auto last = std::find_if(ahead_.rbegin(), ahead_.rend(), [&stream](const auto& packet) {
+            return packet->stream_index == stream.index;
+        });
+        return last == ahead_.rend() || IsTied(**last);
+    };
+    return reported(*video_.stream) && reported(*audio_->stream);
 }
 
 void Connection::DecideVideo(const SourceOptions& options, const SourceDescription* before) {
@@ -327,36 +338,59 @@ void Connection::HandleVideo(AVPacket& packet) {
         if (audio_) {
             audio_->expected = begin_;
         }
-        if (tag_ && begin_ == 0) {
+        const std::int64_t passed = *stamp - *firstVideoStamp_;
+        if (tag_ && begin_ == 0 && passed >= 0 && passed < kLongestCount) {
             const FrameRate& rate = description_.frameRate;
             const std::int64_t first = FrameNumberOf(*tag_, rate.timecodeFrames);
-            assembler_->SetTimecode(
-                TimecodeOf(first + assembler_->Grid().FramesIn(*stamp - *firstVideoStamp_),
-                           rate.timecodeFrames, tag_->dropFrame));
+            assembler_->SetTimecode(TimecodeOf(first + assembler_->Grid().FramesIn(passed),
+                                               rate.timecodeFrames, tag_->dropFrame));
         }
     }
     packet.pts =
-        stamp ? TimeOf(video_, *stamp, period, passes_ ? std::max<std::int64_t>(3 * period, 13500) : kBack)
-              : video_.expected;
+        stamp ? TimeOf(video_, *stamp, period, passes_ ? Back(period) : kBackReordered) : video_.expected;
     packet.dts = AV_NOPTS_VALUE;
     video_.expected = packet.pts + period;
     videoPath_->Push(packet, ToPictures());
+    ReplayEarly();
+}
+
+void Connection::ReplayEarly() {
+    replaying_ = true;
     for (auto waiting = std::exchange(early_, {}); const auto& early : waiting) {
         Handle(*early);
     }
+    replaying_ = false;
 }
 
 void Connection::HandleAudio(AVPacket& packet) {
     // Of several frames behind one stamp each further one begins where the one before ends.
     const std::int64_t usual = AudioDuration(*audio_->stream, packet.size);
     const auto stamp = StampOf(*audio_, packet);
-    packet.pts = stamp ? TimeOf(*audio_, *stamp, usual, kBack) : audio_->expected;
+    packet.pts = stamp ? AudioTime(*stamp, usual) : audio_->expected;
     packet.dts = AV_NOPTS_VALUE;
     audio_->expected = packet.pts + usual;
     // Not the sound of this connection's pictures.
     if (packet.pts >= begin_) {
         audioPath_->Push(packet, ToAudio());
     }
+}
+
+std::int64_t Connection::AudioTime(std::int64_t stamp, std::int64_t usual) {
+    if (!audio_->joined) {
+        const std::int64_t time = line_.Nearest(stamp, begin_);
+        const bool near = Distance(time, begin_) <= static_cast<std::uint64_t>(Timeline::kLongestGap);
+        // The sound of pictures in front of the first IDR frame, however many these were. On another clock
+        // than that of the IDR frame it belongs to pictures before it as well.
+        if (replaying_ ? time < begin_ || !near : time < begin_ && near) {
+            return std::min(time, begin_ - usual);
+        }
+        audio_->joined = true;
+        // Audio may begin at any time of the pictures.
+        if (Distance(time, video_.expected) <= static_cast<std::uint64_t>(Timeline::kLongestGap)) {
+            audio_->expected = time;
+        }
+    }
+    return TimeOf(*audio_, stamp, usual, Back(usual));
 }
 
 void Connection::HandleKlv(const AVPacket& packet) {

@@ -59,13 +59,14 @@ class Connection {
         /// Where the next packet would stand if nothing is missing, and when the last one came.
         std::int64_t expected = 0;
         Clock::time_point arrived;
+        /// It has got to the beginning of the line.
+        bool joined = false;
     };
 
     void Choose();
     void LookAhead();
-    /// RTP's clocks are brought together when the first reports of the sender come, and libraries lose or
-    /// infer the stamps of the first pictures: brings the stamps before a leap in line with those behind it.
-    void MendStamps(const AVStream& stream, std::int64_t step);
+    /// True when each medium that came has been tied to the sender's clock.
+    bool Reported() const;
     void DecideVideo(const SourceOptions& options, const SourceDescription* before);
     void DecideAudio();
     void ReadTimecodeTag();
@@ -80,6 +81,8 @@ class Connection {
     std::optional<std::int64_t> StampOf(Stream& stream, const AVPacket& packet);
     std::int64_t Elapsed(Stream& stream, std::int64_t usual);
     std::int64_t TimeOf(Stream& stream, std::int64_t stamp, std::int64_t usual, std::int64_t back);
+    std::int64_t AudioTime(std::int64_t stamp, std::int64_t usual);
+    void ReplayEarly();
     PictureSink ToPictures();
     AudioSink ToAudio();
 
@@ -107,6 +110,8 @@ class Connection {
     std::optional<Timecode> tag_;
     std::uint64_t damaged_ = 0;
     std::uint64_t withoutStart_ = 0;
+    /// Packets are handled that came before the first IDR frame.
+    bool replaying_ = false;
     bool passes_ = true;
 };
 

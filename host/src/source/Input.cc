@@ -46,6 +46,18 @@ std::string Seconds(double seconds) {
     return text.data();
 }
 
+/// Stamps that no clock shows are none: so far from the ends of 64 bits, in the stream's time base and in
+/// ticks of 90000, stamps can be told apart and scaled without a thought.
+void ForgetWildStamps(AVPacket& packet, AVRational base) {
+    constexpr std::int64_t kFurthest = std::int64_t{1} << 60;
+    for (std::int64_t* const stamp : {&packet.pts, &packet.dts}) {
+        const auto wild = [](std::int64_t value) { return value < -kFurthest || value > kFurthest; };
+        if (wild(*stamp) || wild(av_rescale_q(*stamp, base, {1, 90000}))) {
+            *stamp = AV_NOPTS_VALUE;
+        }
+    }
+}
+
 /// Adds what the libraries said, which often tells more than their error number.
 std::string Reason(int result) {
     const std::string text = libav::ErrorText(result);
@@ -170,6 +182,7 @@ bool Input::Read(AVPacket& packet) {
         throw Stopped();
     }
     if (result >= 0) {
+        ForgetWildStamps(packet, format_->streams[packet.stream_index]->time_base);
         return true;
     }
     if (Expired()) {

@@ -390,6 +390,14 @@ TEST_F(FileSource, AClockThatBeginsAgainIsContinued) {
     EXPECT_EQ(notices_.CountOf("the source's clock jumped by"), 1u);
 }
 
+TEST_F(FileSource, AClockThatLeapsToTheEndOf64BitsIsContinued) {
+    Ffmpeg(string(kPicture) + kPlainH264 + "a.ts");
+    for (const string leap : {"9000000000000000000", "1000000000000000000"}) {
+        Ffmpeg("-i a.ts -c copy -bsf:v 'setts=ts=if(gte(N\\,12)\\,PTS+" + leap + "\\,PTS)' a.nut");
+        ExpectFrames(Of(Medium::kVideo, ReadFile("a.nut")), 25, 3600);
+    }
+}
+
 TEST_F(FileSource, KlvComesByteForByteAtItsTimes) {
     Ffmpeg(string(kPicture) + kTone + kPlainH264 + kPlainAac + "plain.ts");
     endtoend::AddKlvStream(Path("plain.ts"), Path("a.ts"), 5);

@@ -1,5 +1,11 @@
 #include "support/Senders.h"
 
+#include <arpa/inet.h>
+#include <netinet/in.h>
+#include <poll.h>
+#include <sys/socket.h>
+#include <unistd.h>
+
 #include <array>
 #include <chrono>
 #include <cstdio>
@@ -114,6 +120,20 @@ bool WaitUntilListening(std::uint16_t port) {
 
 bool WaitUntilBound(std::uint16_t port) {
     return waitForSocket({"/proc/net/udp", "/proc/net/udp6"}, hexadecimal(port));
+}
+
+bool WaitForPacket(std::uint16_t port) {
+    const int file = socket(AF_INET, SOCK_DGRAM | SOCK_CLOEXEC, 0);
+    sockaddr_in address{};
+    address.sin_family = AF_INET;
+    address.sin_port = htons(port);
+    address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
+    pollfd wait{file, POLLIN, 0};
+    const auto patience = std::chrono::duration_cast<std::chrono::milliseconds>(kPatience);
+    const bool came = bind(file, reinterpret_cast<const sockaddr*>(&address), sizeof address) == 0 &&
+                      poll(&wait, 1, static_cast<int>(patience.count())) == 1;
+    close(file);
+    return came;
 }
 
 }  // namespace endtoend

@@ -36,4 +36,7 @@ bool WaitUntilListening(std::uint16_t port);
 /// does.
 bool WaitUntilBound(std::uint16_t port);
 
+/// Waits until a packet comes to that UDP port of this machine, which must be free. False when none does.
+bool WaitForPacket(std::uint16_t port);
+
 }  // namespace endtoend
