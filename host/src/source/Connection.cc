@@ -381,7 +381,8 @@ std::int64_t Connection::AudioTime(std::int64_t stamp, std::int64_t usual) {
         const bool near = Distance(time, begin_) <= static_cast<std::uint64_t>(Timeline::kLongestGap);
         // The sound of pictures in front of the first IDR frame, however many these were. On another clock
         // than that of the IDR frame it belongs to pictures before it as well.
-        if (replaying_ ? time < begin_ || !near : time < begin_ && near) {
+        const bool before = time < begin_ - usual / 2;
+        if (replaying_ ? before || !near : before && near) {
             return std::min(time, begin_ - usual);
         }
         audio_->joined = true;
