@@ -13,6 +13,7 @@
 #include "QxRegistry.h"
 #include "Recorder.h"
 #include "StreamRates.h"
+#include "common/NativePath.h"
 #include "module/Host.h"
 #include "module/ModuleLibrary.h"
 #include "module/ModuleLog.h"
@@ -30,6 +31,8 @@ constexpr std::chrono::seconds kFreeSpaceInterval{1};
 /// The end of a recording needs two chunks more of the stream; when that has dried up, nobody waits for it.
 constexpr std::chrono::seconds kFinishPatience{2};
 constexpr const char* kDefaultOutput = "recordings";
+/// What the module takes for an output path that is not set.
+constexpr const char* kFromStore = "none";
 
 /// A fault of the stream; the recording begins anew.
 constexpr int kStatusFault = 6;
@@ -48,21 +51,33 @@ std::string WithFullStop(std::string sentence) {
     return sentence.ends_with('.') ? sentence : sentence + ".";
 }
 
-/// Where files go. The module's rule, with an output of our own where it would refuse: start parameter, else
-/// settings store.
-std::string OutputOf(const Options& options) {
+/// Where files go.
+struct Output {
+    /// What the module is told: the folder, or that it is to take the one of the settings store.
+    std::string parameter;
     std::string folder;
-    if (options.output) {
-        folder = *options.output;
-    } else if (!QxRegistry::GetInstance()->getValue("Qx/Other/MP4FileOut", "MP4OutputPath", folder) ||
-               folder.empty()) {
-        folder = kDefaultOutput;
+};
+
+/// The module's rule, with an output of our own where it would refuse: start parameter, else settings store.
+Output OutputOf(const Options& options) {
+    std::string path;
+    const bool stored = !options.output &&
+                        QxRegistry::GetInstance()->getValue("Qx/Other/MP4FileOut", "MP4OutputPath", path) &&
+                        !path.empty();
+    if (!stored) {
+        path = options.output.value_or(kDefaultOutput);
     }
+    std::string folder = NativePath(path);
     while (folder.size() > 1 && folder.ends_with('/')) {
         folder.pop_back();
     }
-    // The module takes this word for "not set".
-    return folder == "none" ? "./none" : folder;
+    if (stored) {
+        return {kFromStore, folder};
+    }
+    if (folder == kFromStore) {
+        folder = "./" + folder;
+    }
+    return {folder, folder};
 }
 
 void SetUpLog(const Options& options, const std::string& output) {
@@ -81,7 +96,6 @@ StartParameters ParametersOf(const Options& options, const std::string& output,
                              const SourceDescription& description) {
     StartParameters parameters;
     parameters.texts = {{"-outputPath", output},
-
                         {"-fileType", options.fileType},
                         {"-naluType", options.naluType},
                         {"-outputMode", options.mode == OutputMode::kOn ? "on" : "sync"}};
@@ -154,6 +168,7 @@ class Running final : public SourceListenerInterface {
     void TakeKey(char key, Recorder& recorder);
     void StartRecording();
     void StopRecording();
+    void TellLateStops(const Recorder& recorder);
     void TakeStatuses(bool ending);
     void TakeModuleEvents();
     void FileClosed(const std::string& path);
@@ -178,6 +193,7 @@ class Running final : public SourceListenerInterface {
     std::vector<WrittenFile> files_;
     std::string openFile_;
     std::uint64_t faults_ = 0;
+    std::uint64_t lateStops_ = 0;
     ModuleStatus told_;
     bool sourceOver_ = false;
     std::optional<Clock::time_point> finishSince_;
@@ -188,7 +204,8 @@ class Running final : public SourceListenerInterface {
 
 ExitCode Running::Record(const SourceOpener& open) {
     const SettingsFile settings(options_.settings, options_.maxMinutes);
-    output_ = OutputOf(options_);
+    const Output output = OutputOf(options_);
+    output_ = output.folder;
     if (PrepareOutputFolder(output_)) {
         display_.Notice("made the output folder " + output_);
     }
@@ -207,7 +224,7 @@ ExitCode Running::Record(const SourceOpener& open) {
     CheckTimecode(options_, description.frameRate);
     const Recorder::Settings recorderSettings = RecorderSettings(options_, description.frameRate);
 
-    Host host(ParametersOf(options_, output_, description));
+    Host host(ParametersOf(options_, output.parameter, description));
     host_ = &host;
     std::optional<ReceiverError> failure;
     {
@@ -229,6 +246,7 @@ ExitCode Running::Record(const SourceOpener& open) {
                                 " not in the file, which grows by 8 frames at a time");
             }
         }
+        TellLateStops(recorder);
         TakeStatuses(false);
         session.End();
     }
@@ -261,6 +279,7 @@ void Running::Loop(SourceInterface& source, Recorder& recorder) {
         if (result == SourceInterface::Result::kIdle && source.Counts().away) {
             recorder.Interrupt();
         }
+        TellLateStops(recorder);
         TakeCommands(recorder);
         if (recorder.Finishing()) {
             finishSince_ = finishSince_.value_or(Clock::now());
@@ -326,6 +345,17 @@ void Running::StopRecording() {
         return;
     }
     plan_.Stop();
+}
+
+void Running::TellLateStops(const Recorder& recorder) {
+    // A module that has failed takes no commands, and its status tells that.
+    if (recorder.LateStops() == lateStops_ || host_->Failed()) {
+        return;
+    }
+    lateStops_ = recorder.LateStops();
+    display_.Notice(
+        "the module has not carried out a stop command within 1 s: the recording may hold more than was "
+        "commanded, and its file is closed late");
 }
 
 void Running::TakeStatuses(bool ending) {
@@ -421,7 +451,7 @@ Summary Running::Summarise(const SourceInterface& source) const {
     summary.lost = Lost(source);
     if (host_->Failed()) {
         summary.exitCode = ExitCode::kRecordingFailed;
-    } else if (summary.lost != 0 || faults_ != 0 || source.Counts().reconnections != 0) {
+    } else if (summary.lost != 0 || faults_ != 0 || lateStops_ != 0 || source.Counts().reconnections != 0) {
         summary.exitCode = ExitCode::kLost;
     }
     return summary;

@@ -15,9 +15,6 @@ namespace {
 constexpr std::uint64_t kChunkFrames = 8;
 constexpr std::int64_t kAudioFrame = 1024;
 
-/// The event thread of the module needs far less, unless the module has failed.
-constexpr std::chrono::milliseconds kStopPatience{1000};
-
 /// Where frames lie further apart than this, in ticks, something is missing. The module does not notice: it
 /// counts units, so its media would drift apart and the timecode of the file would be wrong behind the gap.
 constexpr std::int64_t kGap = kVideoClock / 2;
@@ -145,9 +142,13 @@ bool Recorder::PushSyncMeta(const SourceUnit& unit, const Timecode& timecode) {
         feed_.Settle();
     }
     if (before && !record) {
-        log_.WaitForStops(stops + 1, kStopPatience);
+        AwaitStop(stops + 1);
     }
     return true;
+}
+
+void Recorder::AwaitStop(int count) {
+    lateStops_ += log_.WaitForStops(count, kStopPatience) ? 0 : 1;
 }
 
 void Recorder::Interrupt() {
@@ -176,7 +177,7 @@ void Recorder::PushStop(std::int64_t time) {
     const int open = log_.OpenRecordings();
     const std::vector<unsigned char> meta = BuildMetadata(false, std::nullopt, {});
     feed_.PushMeta(time, meta);
-    log_.WaitForStops(stops + 1, kStopPatience);
+    AwaitStop(stops + 1);
     // The chunk thread looks for the end when a unit comes, and none does on its own.
     for (int i = 0; i < kNudges && log_.OpenRecordings() >= open; ++i) {
         feed_.PushMeta(time, meta);

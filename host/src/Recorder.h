@@ -1,5 +1,6 @@
 #pragma once
 
+#include <chrono>
 #include <cstdint>
 #include <optional>
 #include <vector>
@@ -30,6 +31,9 @@ namespace receiver {
 /// One thread at a time.
 class Recorder {
  public:
+    /// The event thread of the module needs far less, unless it hangs or the module has failed.
+    static constexpr std::chrono::milliseconds kStopPatience{1000};
+
     struct Settings {
         OutputMode mode = OutputMode::kSync;
         FrameRate frameRate;
@@ -66,6 +70,9 @@ class Recorder {
     /// itself has ended. Returns the number of frames that stay out of the recording: a chunk is 8 frames.
     std::uint64_t Close(bool over);
 
+    /// Stop commands that the module has not carried out within `kStopPatience`.
+    std::uint64_t LateStops() const { return lateStops_; }
+
     /// Of the last frame.
     const std::optional<Timecode>& LastTimecode() const { return timecode_; }
     /// The first frame with the record flag that the last one has.
@@ -88,6 +95,8 @@ class Recorder {
     /// The number of frames that are left over.
     std::uint64_t CutWholeChunks(bool record);
     void PushStop(std::int64_t time);
+    /// Until the module has carried out `count` stop commands.
+    void AwaitStop(int count);
     std::size_t KeptChunks() const;
 
     const Settings settings_;
@@ -109,6 +118,7 @@ class Recorder {
     bool commanded_ = false;
     /// Frames of the present recording.
     std::uint64_t recordedFrames_ = 0;
+    std::uint64_t lateStops_ = 0;
 };
 
 }  // namespace receiver

@@ -41,7 +41,7 @@ int main(int argc, char** argv) {
         std::cerr << "receiver: " << error.what() << '\n';
         return static_cast<int>(error.Code());
     }
-    receiver::HidePassword(argc, argv);
+    receiver::HideCredentials(argc, argv);
     receiver::Signals signals(receiver::Keyboard::RestoreTerminal);
     const std::unique_ptr<receiver::DisplayInterface> display = MakeDisplay(*options);
     return static_cast<int>(

@@ -116,6 +116,14 @@ TEST_F(ReceiverTest, FragmentedFilesAreListedWithTheirTimecodeToo) {
     EXPECT_THAT(display_.closed, ElementsAre(HasSubstr("/CAM1/10_00_00_00.MP4")));
 }
 
+// Of a fragment for each 256 frames.
+TEST_F(ReceiverTest, TheLengthOfAFragmentedFileIsThatOfAllItsFrames) {
+    options_.fileType = "fragment";
+    EXPECT_EQ(Record(304), ExitCode::kSuccess);
+    EXPECT_THAT(Frames(), ElementsAre(304));
+    EXPECT_NEAR(display_.summary.files.front().seconds, 12.16, 0.0005);
+}
+
 TEST_F(ReceiverTest, InModeOnTheRunIsOneRecording) {
     options_.mode = OutputMode::kOn;
     options_.seconds = 1;
@@ -223,6 +231,12 @@ TEST_F(ReceiverTest, AFaultOfTheStreamMakesTheRunALoss) {
     EXPECT_THAT(display_.statuses, Contains(ModuleStatus{6, 22}));
 }
 
+TEST_F(ReceiverTest, AStopThatTheModuleDoesNotCarryOutIsToldAndMakesTheRunALoss) {
+    options_.seconds = 1;
+    EXPECT_EQ(RecordWith("hang"), ExitCode::kLost);
+    EXPECT_THAT(display_.notices, Contains(HasSubstr("has not carried out a stop command within 1 s")));
+}
+
 TEST_F(ReceiverTest, WhatTheSourceLostIsALoss) {
     for (SourceCounts counts : {SourceCounts{2, 0, 0}, SourceCounts{0, 3, 0}, SourceCounts{0, 0, 1}}) {
         auto source = std::make_unique<FakeSource>(60);
@@ -249,6 +263,13 @@ TEST_F(ReceiverTest, AnOutputThatCannotBeUsedIsFoundBeforeAnythingElse) {
 
 TEST_F(ReceiverTest, AMissingOutputFolderIsMadeWithANotice) {
     options_.output = folder_ + "/new/";
+    EXPECT_EQ(Record(60), ExitCode::kSuccess);
+    EXPECT_THAT(display_.notices, Contains("made the output folder " + folder_ + "/new"));
+    EXPECT_THAT(display_.closed, ElementsAre(HasSubstr(folder_ + "/new/20")));
+}
+
+TEST_F(ReceiverTest, BackslashesOfTheOutputFolderAreSlashes) {
+    options_.output = folder_ + "\\new\\";
     EXPECT_EQ(Record(60), ExitCode::kSuccess);
     EXPECT_THAT(display_.notices, Contains("made the output folder " + folder_ + "/new"));
     EXPECT_THAT(display_.closed, ElementsAre(HasSubstr(folder_ + "/new/20")));

@@ -57,7 +57,7 @@ class ScriptedModule final : public QxModuleInterface,
         metas.emplace_back(unit->payload, unit->payload + unit->size);
         if (flag && !recording_) {
             Say("OP: REC START. 00:00:00:00. RTPTS = 0. -> -1");
-        } else if (!flag && recording_) {
+        } else if (!flag && recording_ && !deaf) {
             Logger::Put(LOG_PRIORITY_TRACE, "a.cc", "clipfileModule::Controller::OnStopStream", 1, "end.");
             Say("OP: REMOVE STREAM. RTPTS = 0 -> 1.");
         }
@@ -73,6 +73,8 @@ class ScriptedModule final : public QxModuleInterface,
     void NotifyOnlineStatus() override { calls.push_back("online"); }
     void NotifyOfflineStatus() override { calls.push_back("offline"); }
 
+    /// Carries out no stop.
+    bool deaf = false;
     /// "v3": the fourth frame; "M3" and "m3" its metadata with and without record flag; "a2" the third audio
     /// frame; "v-" and so on a mark.
     std::vector<std::string> calls;
@@ -210,6 +212,17 @@ TEST_F(RecorderTest, AGapEndsTheRecordingAndTheNextIdrFrameBeginsAnother) {
     PutFrame(25, true);
     EXPECT_THAT(module_.Units(), ElementsAre("M0", "v0", "M1", "v1", "m1", "m20", "v20", "M25", "v25"));
     EXPECT_EQ(recorder_->LastTimecode(), (Timecode{10, 0, 1, 0, false}));
+}
+
+TEST_F(RecorderTest, AStopThatTheModuleDoesNotCarryOutIsCounted) {
+    module_.deaf = true;
+    Make(Sync());
+    PutLateAudio();
+    PutFrame(0, true);
+    plan_.Stop();
+    EXPECT_EQ(recorder_->LateStops(), 0u);
+    PutFrame(1, false);
+    EXPECT_EQ(recorder_->LateStops(), 1u);
 }
 
 TEST_F(RecorderTest, HalfASecondIsNoGap) {

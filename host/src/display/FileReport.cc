@@ -69,20 +69,24 @@ void ReadFragments(AVFormatContext& context, const AVStream& video, RecordedFile
     const AVStream* const metadata =
         FindStream(context, [](const AVCodecParameters& codec) { return codec.codec_tag == kMetadataTag; });
     const std::unique_ptr<AVPacket, FreePacket> packet(av_packet_alloc());
-    std::int64_t end = 0;
+    std::int64_t begin = 0;
+    std::int64_t duration = 0;
     file.startTimecode.clear();
     bool first = true;
     while (packet && av_read_frame(&context, packet.get()) >= 0) {
         if (packet->stream_index == video.index) {
+            // The demuxer does not tell how long the last frame of all fragments lasts: as long as the one
+            // before it.
+            duration = packet->duration > 0 || file.frames == 0 ? packet->duration : packet->pts - begin;
+            begin = packet->pts;
             ++file.frames;
-            end = std::max(end, packet->pts + packet->duration);
         } else if (metadata != nullptr && packet->stream_index == metadata->index && first) {
             file.startTimecode = TimecodeOfMetadata(*packet);
             first = false;
         }
         av_packet_unref(packet.get());
     }
-    file.seconds = Seconds(end, video);
+    file.seconds = Seconds(begin + duration, video);
 }
 
 }  // namespace

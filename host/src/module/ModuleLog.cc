@@ -1,10 +1,11 @@
 #include "module/ModuleLog.h"
 
-#include <algorithm>
 #include <map>
 #include <optional>
 #include <thread>
 #include <utility>
+
+#include "common/NativePath.h"
 
 namespace receiver {
 namespace {
@@ -18,9 +19,25 @@ std::optional<std::string> PathBetween(std::string_view text, std::string_view p
     }
     text.remove_prefix(prefix.size());
     text.remove_suffix(suffix.size());
-    std::string path(text);
-    std::replace(path.begin(), path.end(), '\\', '/');
-    return path;
+    return NativePath(std::string(text));
+}
+
+constexpr std::string_view kOutputPath = "file output path = ";
+
+/// The line of a refused logon ends with path, user name and password, which may hold anything, commas and
+/// line breaks included. So what is shown of it ends with the path, which is known, or in front of it where
+/// it is another one.
+std::string_view WithoutLogon(std::string_view text, std::string_view outputPath) {
+    if (!text.starts_with("LogonUser call failed.")) {
+        return text;
+    }
+    std::size_t end = text.find(", ");
+    end = end == std::string_view::npos ? end : text.find(", ", end + 2);
+    if (end == std::string_view::npos) {
+        return text;
+    }
+    const bool known = !outputPath.empty() && text.substr(end + 2).starts_with(outputPath);
+    return text.substr(0, known ? end + 2 + outputPath.size() : end);
 }
 
 }  // namespace
@@ -33,7 +50,7 @@ class ModuleLog::Sink final : public LogSinkInterface {
                 OnOperatorLine(line.text);
                 break;
             case LOG_PRIORITY_ERROR:
-                Add({ModuleEvent::Kind::kError, std::string(line.text)});
+                OnError(line.text);
                 break;
             case LOG_PRIORITY_WARNING:
                 OnWarning(line.text);
@@ -62,9 +79,9 @@ class ModuleLog::Sink final : public LogSinkInterface {
         std::string file;
     };
 
-    void Add(ModuleEvent event) {
+    void OnError(std::string_view text) {
         const std::lock_guard lock(mutex);
-        events.push_back(std::move(event));
+        events.push_back({ModuleEvent::Kind::kError, std::string(WithoutLogon(text, outputPath_))});
     }
 
     void OnOperatorLine(std::string_view text) {
@@ -94,7 +111,12 @@ class ModuleLog::Sink final : public LogSinkInterface {
 
     /// The trace has a few lines for each unit, so most of them are passed over without the lock.
     void OnTrace(std::string_view text, const char* function) {
-        if (std::optional<std::string> folder = PathBetween(text, "output path = \"", "\".")) {
+        if (text.starts_with(kOutputPath) && text.ends_with('.')) {
+            const std::lock_guard lock(mutex);
+            outputPath_ = text.substr(kOutputPath.size());
+            // The full stop.
+            outputPath_.pop_back();
+        } else if (std::optional<std::string> folder = PathBetween(text, "output path = \"", "\".")) {
             const std::lock_guard lock(mutex);
             writers_[std::this_thread::get_id()].folder = std::move(*folder);
         } else if (const std::optional<std::string> name = PathBetween(text, "ST: out_filename = \"", "\"")) {
@@ -124,8 +146,10 @@ class ModuleLog::Sink final : public LogSinkInterface {
         }
     }
 
-    /// Guarded by mutex.
+    // Guarded by mutex:
     std::map<std::thread::id, Writer> writers_;
+    /// As the module writes it.
+    std::string outputPath_;
 };
 
 ModuleLog::ModuleLog() : sink_(std::make_shared<Sink>()) {

@@ -29,6 +29,7 @@ const char* const kHelpFooter =
     "  5  the module cannot be loaded or refuses to start\n"
     "  6  nothing can be written to the output folder\n"
     "  7  the module failed while it recorded\n"
-    "  8  the run ended as commanded, but something was lost on the way\n";
+    "  8  the run ended as commanded, but something was lost on the way, or the module took a\n"
+    "     stop command too late\n";
 
 }  // namespace receiver

@@ -6,6 +6,7 @@
 #include <fstream>
 #include <limits>
 
+#include "common/Credentials.h"
 #include "common/ReceiverError.h"
 #include "options/OptionText.h"
 
@@ -114,10 +115,6 @@ void CheckTogether(const CLI::App& app, const Options& options) {
     }
     if (options.timecode && options.timecode->dropFrame && !options.dropFrame) {
         throw Wrong("--timecode with ';' asks for drop frame and --no-drop-frame forbids it.");
-    }
-    if (options.output && options.output->find('\\') != std::string::npos) {
-        throw Wrong(
-            "--output must not contain a backslash: the module takes it for the separator of folders.");
     }
     if (options.prefix && options.prefix->find_first_of("/\\") != std::string::npos) {
         throw Wrong("--prefix is the name of one folder and must contain neither / nor \\.");
@@ -289,10 +286,15 @@ std::optional<Options> ParseOptions(int argc, const char* const* argv, std::stri
     return options;
 }
 
-void HidePassword(int argc, char** argv) {
+void HideCredentials(int argc, char** argv) {
     constexpr std::string_view kName = "--password";
     for (int i = 1; i < argc; ++i) {
         const std::string_view argument = argv[i];
+        if (argument.find("://") != std::string_view::npos) {
+            for (const TextSpan& span : CredentialsIn(argument)) {
+                std::memset(argv[i] + span.begin, 'x', span.end - span.begin);
+            }
+        }
         if (argument == kName && i + 1 < argc) {
             std::memset(argv[i + 1], 'x', std::strlen(argv[i + 1]));
         } else if (argument.starts_with(kName) && argument.substr(kName.size()).starts_with('=')) {

@@ -51,8 +51,8 @@ bool IsLive(const std::string& url);
 /// asked for (`--help`, `--version`).
 std::optional<Options> ParseOptions(int argc, const char* const* argv, std::string& text);
 
-/// Overwrites the value of `--password` in the arguments of the process, so that it no longer stands in the
-/// list of processes.
-void HidePassword(int argc, char** argv);
+/// Overwrites the value of `--password`, and the credentials in addresses, in the arguments of the process,
+/// so that they no longer stand in the list of processes.
+void HideCredentials(int argc, char** argv);
 
 }  // namespace receiver

@@ -4,6 +4,7 @@
 #include <cmath>
 #include <utility>
 
+#include "common/Credentials.h"
 #include "source/RtpStamps.h"
 #include "source/Summary.h"
 #include "source/VideoCheck.h"
@@ -60,8 +61,8 @@ void Connection::Choose() {
     AVFormatContext& format = input_->Format();
     const int video = av_find_best_stream(&format, AVMEDIA_TYPE_VIDEO, -1, -1, nullptr, 0);
     if (video < 0 || (format.streams[video]->disposition & AV_DISPOSITION_ATTACHED_PIC) != 0) {
-        throw ReceiverError(ExitCode::kSourceUnsuitable,
-                            "'" + ShownUrl(format.url) + "' carries no video: a recording needs one");
+        throw ReceiverError(ExitCode::kSourceUnsuitable, "'" + WithoutCredentials(format.url) +
+                                                             "' carries no video: a recording needs one");
     }
     const int audio = av_find_best_stream(&format, AVMEDIA_TYPE_AUDIO, -1, video, nullptr, 0);
     for (unsigned int index = 0; index < format.nb_streams; ++index) {
@@ -143,7 +144,7 @@ void Connection::DecideVideo(const SourceOptions& options, const SourceDescripti
     if (parameters.width <= 0 || parameters.height <= 0) {
         throw ReceiverError(
             ExitCode::kSourceUnsuitable,
-            "the video of '" + ShownUrl(format.url) +
+            "the video of '" + WithoutCredentials(format.url) +
                 "' cannot be read: no parameter sets came; set the encoder to send them with each "
                 "IDR frame");
     }

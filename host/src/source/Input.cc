@@ -5,8 +5,8 @@
 #include <cstdio>
 #include <utility>
 
+#include "common/Credentials.h"
 #include "common/ReceiverError.h"
-#include "source/Summary.h"
 
 namespace receiver {
 namespace {
@@ -61,7 +61,7 @@ void ForgetWildStamps(AVPacket& packet, AVRational base) {
 /// Adds what the libraries said, which often tells more than their error number.
 std::string Reason(int result) {
     const std::string text = libav::ErrorText(result);
-    const std::string said = ShownUrl(libav::LastError());
+    const std::string said = WithoutCredentials(libav::LastError());
     return said.empty() ? text : text + " (" + said + ")";
 }
 
@@ -133,8 +133,8 @@ void Input::FailOpening(int result) {
     if (interrupt_->Stopped() || (stop_ != nullptr && stop_())) {
         throw Stopped();
     }
-    const std::string shown = "'" + ShownUrl(url_) + "'";
-    const std::string said = ShownUrl(libav::LastError());
+    const std::string shown = "'" + WithoutCredentials(url_) + "'";
+    const std::string said = WithoutCredentials(libav::LastError());
     std::string sentence;
     if (Expired() || result == AVERROR(ETIMEDOUT)) {
         sentence = "nothing came from " + shown + " within " + Seconds(timeout_) +

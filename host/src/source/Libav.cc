@@ -16,9 +16,13 @@ void Collect(void* /*object*/, int level, const char* format, va_list arguments)
     if (level > AV_LOG_ERROR) {
         return;
     }
-    std::array<char, 512> text{};
-    std::vsnprintf(text.data(), text.size(), format, arguments);
-    std::string line = text.data();
+    va_list again;
+    va_copy(again, arguments);
+    const int length = std::vsnprintf(nullptr, 0, format, again);
+    va_end(again);
+    // Whole: what is cut out of the middle of an address could not be told from a host's name any more.
+    std::string line(length > 0 ? static_cast<std::size_t>(length) : 0, '\0');
+    std::vsnprintf(line.data(), line.size() + 1, format, arguments);
     while (!line.empty() && (line.back() == '\n' || line.back() == '\r' || line.back() == ' ')) {
         line.pop_back();
     }

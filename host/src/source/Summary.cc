@@ -2,7 +2,6 @@
 
 #include <array>
 #include <cstdio>
-#include <regex>
 
 namespace receiver {
 
@@ -22,12 +21,6 @@ VideoEncoding EncodingOf(const SourceOptions& options, const SourceDescription& 
     encoding.pictureGroup =
         options.pictureGroup != 0 ? options.pictureGroup : encoding.frameRate.timecodeFrames;
     return encoding;
-}
-
-std::string ShownUrl(const std::string& url) {
-    static const std::regex kUser("://[^/@]*@");
-    static const std::regex kPassphrase("(passphrase|password)=[^&]*");
-    return std::regex_replace(std::regex_replace(url, kUser, "://"), kPassphrase, "$1=...");
 }
 
 }  // namespace receiver

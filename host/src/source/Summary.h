@@ -16,7 +16,4 @@ inline constexpr const char* kRecordedAudioSummary = "AAC LC 48 kHz stereo";
 /// What `options` asks for, else what `source` has, picture group and bit rate as `options` tells.
 VideoEncoding EncodingOf(const SourceOptions& options, const SourceDescription& source);
 
-/// An address for messages: without user, password and SRT passphrase.
-std::string ShownUrl(const std::string& url);
-
 }  // namespace receiver

@@ -192,6 +192,41 @@ TEST_F(MistakesTest, AWrongPassphrase) {
     EXPECT_EQ(outcome.errors.find("the-wrong-one"), std::string::npos) << outcome.errors;
 }
 
+// The log of the module alone tells whose logon was refused, and with what password.
+TEST_F(MistakesTest, ACredentialOfAShareThatIsRefused) {
+    // Two slashes in front are a share to the module.
+    const std::string share = "/" + OutputFolder().string();
+    const auto passwordFile = folder.Path() / "password";
+    std::ofstream(passwordFile) << "open, sesame";
+    const std::vector<std::string> options = {
+        "--output", share,    "--user", "Ali, Baba\nand 40", "--password-file", passwordFile.string(),
+        "--size",   "320x180"};
+    for (const char* const form : {"--file-type=normal", "--json"}) {
+        auto all = options;
+        all.emplace_back(form);
+        const Outcome outcome = RunReceiver(all);
+        EXPECT_EQ(outcome.code, 7) << outcome.errors;
+        const std::string said = outcome.output + outcome.errors;
+        EXPECT_THAT(said, HasSubstr("LogonUser call failed. 0, "));
+        for (const char* const secret : {"Ali", "Baba", "and 40", "open", "sesame"}) {
+            EXPECT_EQ(said.find(secret), std::string::npos) << said;
+        }
+    }
+    EXPECT_THAT(Log(), HasSubstr("open, sesame"));
+}
+
+// The module reads the store too, and to it both kinds of slashes are one.
+TEST_F(MistakesTest, BackslashesInTheOutputFolderOfTheSettingsStore) {
+    const auto place = folder.Path() / "from the store";
+    std::ofstream(folder.Path() / "settings.ini")
+        << "[Qx/Other/MP4FileOut]\nMP4OutputPath = " << folder.Path().string() << "\\from the store\\\n";
+    const Outcome outcome = RunProgram(
+        {RECEIVER_PROGRAM, "--module", CLIPFILE_MODULE, "--size", "320x180", "--seconds", "2"}, environment);
+    EXPECT_EQ(outcome.code, 0) << outcome.errors;
+    EXPECT_THAT(outcome.errors, HasSubstr("made the output folder " + place.string() + "\n"));
+    EXPECT_EQ(RecordingsIn(place).size(), 1U);
+}
+
 TEST_F(MistakesTest, APortOnWhichNothingArrives) {
     const FreePorts ports;
     const std::string address = "udp://127.0.0.1:" + std::to_string(ports.First());

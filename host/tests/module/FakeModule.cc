@@ -1,6 +1,7 @@
 // A module that records nothing but the calls that it gets. The environment variable FAKE_MODULE makes it
 // misbehave: "none" gives no object, "refuse" fails its initialisation, "fail" sets status 7 with the first
-// video unit, "overflow" reports the first video unit as lost, "fault" sets status 6 with it.
+// video unit, "overflow" reports the first video unit as lost, "fault" sets status 6 with it, "hang" carries
+// out no command.
 
 #include <cstdlib>
 #include <string>

@@ -110,6 +110,28 @@ TEST(ModuleLog, ErrorsAndRestartsAreEvents) {
     EXPECT_EQ(events[1].kind, Kind::kRecordRestarted);
 }
 
+/// What is told of a line at the priority of errors.
+std::string Told(ModuleLog& log, const char* line) {
+    Logger::Put(LOG_PRIORITY_ERROR, "a.cc", "f", 1, "%s", line);
+    const std::vector<ModuleEvent> events = log.TakeEvents();
+    return events.size() == 1 ? events.front().text : std::to_string(events.size()) + " events";
+}
+
+TEST(ModuleLog, ARefusedLogonIsToldWithoutUserAndPassword) {
+    ModuleLog log;
+    Trace("file output path = \\\\server\\rec, old.");
+    EXPECT_EQ(Told(log, "LogonUser call failed. 0, 52e, \\\\server\\rec, old, user, pass"),
+              "LogonUser call failed. 0, 52e, \\\\server\\rec, old");
+    EXPECT_EQ(Told(log, "LogonUser call failed. 0, 52e, \\\\server\\rec, old, DOMAIN\\a, b, c\nd, e\n"),
+              "LogonUser call failed. 0, 52e, \\\\server\\rec, old");
+}
+
+TEST(ModuleLog, ARefusedLogonAtAnUnknownPathIsToldWithItsNumberAlone) {
+    ModuleLog log;
+    EXPECT_EQ(Told(log, "LogonUser call failed. 0, 52e, \\\\server\\rec, user, pass"),
+              "LogonUser call failed. 0, 52e");
+}
+
 TEST(ModuleLog, OtherLinesAreNoEvents) {
     ModuleLog log;
     Operator("OP: CHANGE STATE stop -> wait_state.");

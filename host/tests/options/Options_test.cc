@@ -137,7 +137,6 @@ TEST(Options, EachErrorNamesItsOptionInOneSentence) {
         {{"--log-priority", "14"}, "--log-priority"},
         {{"--password-file", "/no/such/file"}, "--password-file /no/such/file"},
         {{"--password", "p", "--password-file", "f"}, "--password-file"},
-        {{"--output", "a\\b"}, "backslash"},
         {{"--prefix", "a/b"}, "--prefix"},
     };
     for (const auto& one : cases) {
@@ -187,14 +186,15 @@ TEST(Options, APasswordComesFromTheFirstLineOfItsFile) {
     unlink(file.c_str());
 }
 
-TEST(Options, APasswordOnTheCommandLineIsOverwritten) {
+TEST(Options, CredentialsOnTheCommandLineAreOverwritten) {
     std::string program = "receiver", name = "--password", value = "secret", joined = "--password=hidden",
-                file = "--password-file=keep";
-    char* arguments[] = {program.data(), name.data(), value.data(), joined.data(), file.data()};
-    HidePassword(5, arguments);
+                file = "--password-file=keep", url = "srt://u:p@host?passphrase=abc&mode=caller";
+    char* arguments[] = {program.data(), name.data(), value.data(), joined.data(), file.data(), url.data()};
+    HideCredentials(6, arguments);
     EXPECT_EQ(value, "xxxxxx");
     EXPECT_EQ(joined, "--password=xxxxxx");
     EXPECT_EQ(file, "--password-file=keep");
+    EXPECT_EQ(url, "srt://xxx@host?passphrase=xxx&mode=caller");
 }
 
 TEST(IsLive, FilesAndTheTestPictureWait) {
