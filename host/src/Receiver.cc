@@ -196,6 +196,9 @@ class Running final : public SourceListenerInterface {
     std::uint64_t lateStops_ = 0;
     ModuleStatus told_;
     bool sourceOver_ = false;
+    /// What the present session with the module was told, and that the source has become another one.
+    SourceDescription recorded_;
+    bool changed_ = false;
     std::optional<Clock::time_point> finishSince_;
     Clock::time_point shown_{};
     Clock::time_point spaceRead_{};
@@ -219,16 +222,18 @@ ExitCode Running::Record(const SourceOpener& open) {
         display_.Finish({});
         return ExitCode::kSuccess;
     }
-    const SourceDescription& description = source->Description();
-    display_.Notice("source: " + description.summary);
-    CheckTimecode(options_, description.frameRate);
-    const Recorder::Settings recorderSettings = RecorderSettings(options_, description.frameRate);
+    display_.Notice("source: " + source->Description().summary);
+    CheckTimecode(options_, source->Description().frameRate);
+    Recorder::Settings recorderSettings = RecorderSettings(options_, source->Description().frameRate);
 
-    Host host(ParametersOf(options_, output.parameter, description));
-    host_ = &host;
+    std::unique_ptr<Host> host;
     std::optional<ReceiverError> failure;
-    {
-        ModuleSession session(library.Module(), host);
+    do {
+        recorded_ = source->Description();
+        recorderSettings.frameRate = recorded_.frameRate;
+        host = std::make_unique<Host>(ParametersOf(options_, output.parameter, recorded_));
+        host_ = host.get();
+        ModuleSession session(library.Module(), *host);
         if (options_.mode == OutputMode::kSync) {
             session.GoOnline();
         }
@@ -238,7 +243,7 @@ ExitCode Running::Record(const SourceOpener& open) {
         } catch (const ReceiverError& error) {
             failure = error;
         }
-        if (!host.Failed()) {
+        if (!host->Failed()) {
             const std::uint64_t left = recorder.Close(sourceOver_ || failure);
             if (left != 0) {
                 display_.Notice("the stream ended while it was recorded: its last " + std::to_string(left) +
@@ -249,9 +254,11 @@ ExitCode Running::Record(const SourceOpener& open) {
         TellLateStops(recorder);
         TakeStatuses(false);
         session.End();
-    }
-    TakeModuleEvents();
-    TakeStatuses(true);
+        TakeModuleEvents();
+        TakeStatuses(true);
+        recorderSettings.past = recorder.Past();
+        changed_ = changed_ && !recorder.Finishing();
+    } while (std::exchange(changed_, false) && !failure && !host->Failed());
 
     Summary summary = Summarise(*source);
     if (failure) {
@@ -278,6 +285,17 @@ void Running::Loop(SourceInterface& source, Recorder& recorder) {
         }
         if (result == SourceInterface::Result::kIdle && source.Counts().away) {
             recorder.Interrupt();
+        }
+        if (result == SourceInterface::Result::kChanged) {
+            recorder.Interrupt();
+            display_.Notice("source: " + source.Description().summary);
+            // The module learns rate and size when it starts, and never again.
+            const SourceDescription& now = source.Description();
+            changed_ = now.frameRate != recorded_.frameRate || now.width != recorded_.width ||
+                       now.height != recorded_.height;
+            if (changed_ || recorder.Finishing()) {
+                return;
+            }
         }
         TellLateStops(recorder);
         TakeCommands(recorder);
@@ -451,7 +469,8 @@ Summary Running::Summarise(const SourceInterface& source) const {
     summary.lost = Lost(source);
     if (host_->Failed()) {
         summary.exitCode = ExitCode::kRecordingFailed;
-    } else if (summary.lost != 0 || faults_ != 0 || lateStops_ != 0 || source.Counts().reconnections != 0) {
+    } else if (summary.lost != 0 || faults_ != 0 || lateStops_ != 0 || source.Counts().reconnections != 0 ||
+               source.Counts().changes != 0) {
         summary.exitCode = ExitCode::kLost;
     }
     return summary;

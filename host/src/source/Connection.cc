@@ -73,9 +73,17 @@ void Connection::Choose() {
             audio_ = Stream{stream, {}, 0, {}};
         } else if (stream->codecpar->codec_id == AV_CODEC_ID_SMPTE_KLV) {
             klv_.push_back({stream, {}, 0, {}});
-        } else {
+        } else if (audio >= 0 || stream->codecpar->codec_type != AVMEDIA_TYPE_AUDIO) {
             stream->discard = AVDISCARD_ALL;
         }
+    }
+}
+
+void Connection::CheckOther(const AVPacket& packet) {
+    const AVStream& stream = *input_->Format().streams[packet.stream_index];
+    if (!audio_ && stream.codecpar->codec_type == AVMEDIA_TYPE_AUDIO &&
+        avcodec_find_decoder(stream.codecpar->codec_id) != nullptr && input_->AskFor(stream.id)) {
+        throw FormatChanged("audio has begun");
     }
 }
 
@@ -173,11 +181,7 @@ void Connection::DecideVideo(const SourceOptions& options, const SourceDescripti
         notices_.push_back("video is converted: " + from + " to " + VideoSummary(codec, description_));
     }
     description_.summary = VideoSummary(codec, description_);
-    if (before != nullptr && (before->width != description_.width || before->height != description_.height ||
-                              before->frameRate != description_.frameRate)) {
-        throw SourceChanged("the source came back as " + description_.summary + " and was " +
-                            before->summary + ": start again to record it as it is now");
-    }
+    watch_.emplace(parameters.codec_id, description_.frameRate, passes_);
 }
 
 void Connection::DecideAudio() {
@@ -244,13 +248,19 @@ bool Connection::Pump() {
     if (packet_->stream_index == video_.stream->index) {
         input_->Alive();
     }
+    position_ = packet_->pos;
     Handle(*packet_);
     return true;
+}
+
+std::unique_ptr<Input> Connection::End(std::unique_ptr<Connection> connection) {
+    return std::move(connection->input_);
 }
 
 void Connection::Handle(AVPacket& packet) {
     const Stream* const stream = StreamOf(packet);
     if (stream == nullptr) {
+        CheckOther(packet);
         return;
     }
     if (stream == &video_) {
@@ -298,6 +308,13 @@ std::optional<std::int64_t> Connection::StampOf(Stream& stream, const AVPacket& 
     return stamp;
 }
 
+std::optional<std::int64_t> Connection::DelayOf(const AVPacket& packet) const {
+    if (input_->Rtp() || packet.pts == AV_NOPTS_VALUE || packet.dts == AV_NOPTS_VALUE) {
+        return std::nullopt;
+    }
+    return av_rescale_q(packet.pts - packet.dts, video_.stream->time_base, kTicks);
+}
+
 std::int64_t Connection::Elapsed(Stream& stream, std::int64_t usual) {
     const auto now = Clock::now();
     const auto since = std::exchange(stream.arrived, now);
@@ -323,6 +340,7 @@ void Connection::HandleVideo(AVPacket& packet) {
     if (stamp && !firstVideoStamp_) {
         firstVideoStamp_ = stamp;
     }
+    watch_->Look({packet.data, static_cast<std::size_t>(packet.size)}, stamp, DelayOf(packet));
     const std::int64_t period = assembler_->Grid().Period();
     if (!line_.Anchored()) {
         if (!stamp || !videoPath_->IsStart(packet)) {

@@ -9,6 +9,7 @@
 
 #include "common/ReceiverError.h"
 #include "source/AudioPath.h"
+#include "source/FormatWatch.h"
 #include "source/Input.h"
 #include "source/KlvPackets.h"
 #include "source/UnitAssembler.h"
@@ -17,19 +18,12 @@
 
 namespace receiver {
 
-/// The source came back as one that the present recording cannot go on with.
-class SourceChanged : public ReceiverError {
- public:
-    explicit SourceChanged(const std::string& sentence)
-        : ReceiverError(ExitCode::kSourceUnsuitable, sentence) {}
-};
-
 /// One opened input, from its packets to what an assembler takes.
 class Connection {
  public:
     /// Chooses streams, looks at the first second, and decides what passes and what is converted. `before`:
-    /// what the source was in an earlier connection, or null. Throws `ReceiverError` (`kSourceUnsuitable`)
-    /// when it cannot be recorded, `SourceLost` and `Stopped`.
+    /// what the source was in an earlier connection and may be again, or null. Throws `ReceiverError`
+    /// (`kSourceUnsuitable`) when it cannot be recorded, `SourceLost` and `Stopped`.
     Connection(std::unique_ptr<Input> input, const SourceOptions& options, const SourceDescription* before);
 
     const SourceDescription& Description() const { return description_; }
@@ -42,8 +36,12 @@ class Connection {
     /// `assembler` must outlive this.
     void Begin(UnitAssembler& assembler, std::int64_t begin);
     /// Passes one packet on. False at the end of the source, after everything was given out. Throws like
-    /// `Input`, and `ReceiverError` when the source changed to what cannot be recorded.
+    /// `Input`, and `FormatChanged`: then the connection is over, and its input may be asked anew.
     bool Pump();
+    /// Ends the connection, all but the input, and gives that away.
+    static std::unique_ptr<Input> End(std::unique_ptr<Connection> connection);
+    /// Byte at which the last packet stood in the input, -1 when not known.
+    std::int64_t Position() const { return position_; }
 
     /// Packets that could not be used, and were left out.
     std::uint64_t Damaged() const;
@@ -70,6 +68,8 @@ class Connection {
     void DecideVideo(const SourceOptions& options, const SourceDescription* before);
     void DecideAudio();
     void ReadTimecodeTag();
+    /// Throws `FormatChanged` when it is of audio that was not there before.
+    void CheckOther(const AVPacket& packet);
     bool NextPacket();
     void Handle(AVPacket& packet);
     void HandleVideo(AVPacket& packet);
@@ -79,6 +79,8 @@ class Connection {
     Stream* StreamOf(const AVPacket& packet);
     /// The packet's stamp, unwrapped, in ticks of 90000. Nothing when it has none.
     std::optional<std::int64_t> StampOf(Stream& stream, const AVPacket& packet);
+    /// How much later a picture is shown than decoded, where the source itself tells.
+    std::optional<std::int64_t> DelayOf(const AVPacket& packet) const;
     std::int64_t Elapsed(Stream& stream, std::int64_t usual);
     std::int64_t TimeOf(Stream& stream, std::int64_t stamp, std::int64_t usual, std::int64_t back);
     std::int64_t AudioTime(std::int64_t stamp, std::int64_t usual);
@@ -86,13 +88,14 @@ class Connection {
     PictureSink ToPictures();
     AudioSink ToAudio();
 
-    const std::unique_ptr<Input> input_;
+    std::unique_ptr<Input> input_;
     SourceDescription description_;
     std::vector<std::string> notices_;
     Stream video_;
     std::optional<Stream> audio_;
     std::deque<Stream> klv_;
     std::unique_ptr<VideoPathInterface> videoPath_;
+    std::optional<FormatWatch> watch_;
     std::unique_ptr<AudioPathInterface> audioPath_;
     KlvPackets klvPackets_;
     libav::Owner<AVPacket> packet_;
@@ -113,6 +116,7 @@ class Connection {
     /// Packets are handled that came before the first IDR frame.
     bool replaying_ = false;
     bool passes_ = true;
+    std::int64_t position_ = -1;
 };
 
 }  // namespace receiver

@@ -1,8 +1,10 @@
 #include "source/Input.h"
 
+#include <algorithm>
 #include <array>
 #include <cerrno>
 #include <cstdio>
+#include <string_view>
 #include <utility>
 
 #include "common/Credentials.h"
@@ -13,6 +15,8 @@ namespace {
 
 /// What finding out may take beyond the time-out: the libraries look at up to 7 seconds of a stream.
 constexpr double kAnalysis = 10;
+/// Bytes in front of a picture in which its program's tables stand: ten packets of a transport stream.
+constexpr std::int64_t kTables = 1880;
 
 std::string SchemeOf(const std::string& url) {
     const std::size_t end = url.find("://");
@@ -99,8 +103,8 @@ bool Input::Expired() {
     return timedOut_;
 }
 
-void Input::Open() {
-    AVFormatContext* format = avformat_alloc_context();
+AVFormatContext* Input::NewFormat() {
+    AVFormatContext* const format = avformat_alloc_context();
     if (format == nullptr) {
         throw std::bad_alloc();
     }
@@ -109,24 +113,68 @@ void Input::Open() {
     format->correct_ts_overflow = 0;
     // High bit rates: as many bytes as the time that is looked at may hold.
     format->probesize = std::int64_t{64} << 20;
+    return format;
+}
+
+void Input::Open() {
+    AVFormatContext* format = NewFormat();
     libav::Options options;
     SetOptions(url_, options);
     libav::ForgetErrors();
     Expect(timeout_);
     // Frees the context when it fails.
-    int result = avformat_open_input(&format, url_.c_str(), nullptr, options.Get());
+    const int result = avformat_open_input(&format, url_.c_str(), nullptr, options.Get());
     if (result < 0) {
         FailOpening(result);
     }
     format_.reset(format);
+    FindStreams();
+}
+
+void Input::FindStreams() {
     Expect(timeout_ + kAnalysis);
-    result = avformat_find_stream_info(format, nullptr);
+    const int result = avformat_find_stream_info(format_.get(), nullptr);
     if (result < 0) {
         FailOpening(result);
     }
     if (Expired() || interrupt_->Stopped() || (stop_ != nullptr && stop_())) {
         FailOpening(AVERROR_EXIT);
     }
+}
+
+bool Input::Renew(std::int64_t position) {
+    if (format_->pb != nullptr && std::string_view(format_->iformat->name) == "mpegts") {
+        CarryOn(position);
+    } else if (recorded_) {
+        return false;
+    } else {
+        format_.reset();
+        Open();
+    }
+    Alive();
+    return true;
+}
+
+void Input::CarryOn(std::int64_t position) {
+    const AVInputFormat* const kind = format_->iformat;
+    if (!connection_) {
+        connection_.reset(std::exchange(format_->pb, nullptr));
+    }
+    format_.reset();
+    if (position >= 0) {
+        // The tables stand right in front of the picture. A live source has only what is still in memory.
+        avio_seek(connection_.get(), std::max<std::int64_t>(0, position - kTables), SEEK_SET);
+    }
+    AVFormatContext* format = NewFormat();
+    format->pb = connection_.get();
+    libav::ForgetErrors();
+    Expect(timeout_);
+    const int result = avformat_open_input(&format, url_.c_str(), kind, nullptr);
+    if (result < 0) {
+        FailOpening(result);
+    }
+    format_.reset(format);
+    FindStreams();
 }
 
 void Input::FailOpening(int result) {

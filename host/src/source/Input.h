@@ -3,6 +3,7 @@
 #include <atomic>
 #include <chrono>
 #include <memory>
+#include <set>
 #include <stdexcept>
 #include <string>
 
@@ -32,6 +33,13 @@ class Input {
     Input(const std::string& url, double timeout, std::shared_ptr<Interrupt> interrupt, bool (*stop)());
 
     AVFormatContext& Format() { return *format_; }
+    /// Finds out anew what the source carries, from byte `position` of the connection on where that can still
+    /// be had (-1: where it is). Streams and packets of before are gone. False for a file that would begin
+    /// again with its first byte. Throws like the constructor, and `SourceLost`.
+    bool Renew(std::int64_t position);
+    /// True the first time that somebody asks for the stream with that number of the container, also after
+    /// `Renew`: what is still not understood then never will be.
+    bool AskFor(int stream) { return asked_.insert(stream).second; }
     /// The next packet. False at the end, also when the other side closed the connection. Throws
     /// `SourceLost`, also when the time without `Alive` is over, and `Stopped`.
     bool Read(AVPacket& packet);
@@ -43,11 +51,18 @@ class Input {
     bool Rtp() const { return rtp_; }
 
  private:
+    struct CloseConnection {
+        void operator()(AVIOContext* connection) const { avio_closep(&connection); }
+    };
+
     /// Asked by the libraries while they wait. Not 0 ends the wait.
     static int OnWait(void* input);
     void Expect(double seconds);
     bool Expired();
+    AVFormatContext* NewFormat();
     void Open();
+    void FindStreams();
+    void CarryOn(std::int64_t position);
     /// Throws what `result` of opening means.
     [[noreturn]] void FailOpening(int result);
 
@@ -60,8 +75,11 @@ class Input {
     std::atomic<std::chrono::steady_clock::rep> deadline_{0};
     /// A wait was over. The libraries may give out what they still hold before they tell.
     std::atomic<bool> timedOut_{false};
+    std::set<int> asked_;
     bool recorded_ = false;
     bool rtp_ = false;
+    /// Of a connection that has been taken over from an earlier context.
+    std::unique_ptr<AVIOContext, CloseConnection> connection_;
     libav::Owner<AVFormatContext> format_;
 };
 

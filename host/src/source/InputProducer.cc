@@ -25,6 +25,10 @@ std::unique_ptr<Connection> Connect(const SourceOptions& options, const std::sha
     }
 }
 
+std::int64_t Ticks(std::chrono::steady_clock::duration time) {
+    return std::chrono::duration_cast<std::chrono::microseconds>(time).count() * 9 / 100;
+}
+
 }  // namespace
 
 InputProducer::InputProducer(const SourceOptions& options, std::shared_ptr<Interrupt> interrupt,
@@ -61,6 +65,12 @@ bool InputProducer::Produce(Batch& batch) {
                 more = options_.reconnect;
             }
         }
+    } catch (const FormatChanged& change) {
+        try {
+            Change(change.what());
+        } catch (const Stopped&) {
+            more = false;
+        }
     } catch (const SourceLost& loss) {
         Lose(loss.what());
         if (!options_.reconnect || recorded_) {
@@ -95,10 +105,9 @@ void InputProducer::TryAgain() {
         throw Stopped();
     }
     attempts_ = std::min(attempts_ + 1, kPauses.size() - 1);
+    std::unique_ptr<Connection> connection;
     try {
-        connection_ = Connect(options_, interrupt_, nullptr, &description_);
-    } catch (const SourceChanged&) {
-        throw;
+        connection = Connect(options_, interrupt_, nullptr, &description_);
     } catch (const ReceiverError& error) {
         assembler_.AddNotice(std::string(error.what()) + "; trying again in " +
                              std::to_string(kPauses[attempts_]) + " s");
@@ -109,9 +118,62 @@ void InputProducer::TryAgain() {
     using std::chrono::duration_cast;
     const auto away = duration_cast<std::chrono::seconds>(connected_ - lost_).count();
     assembler_.AddNotice("the source is back after " + std::to_string(away) + " s");
-    // Time went on while the source was away.
-    const auto passed = duration_cast<std::chrono::microseconds>(connected_ - lastPicture_).count() * 9 / 100;
-    connection_->Begin(assembler_, std::max(assembler_.End(), assembler_.LastPicture() + passed));
+    GoOn(std::move(connection), Ticks(connected_ - lastPicture_), false);
+}
+
+void InputProducer::Change(const std::string& reason) {
+    assembler_.Finish();
+    ++changes_;
+    damagedBefore_ += connection_->Damaged();
+    const std::int64_t position = connection_->Position();
+    const std::int64_t passed = recorded_ ? 0 : Ticks(Clock::now() - lastPicture_);
+    std::unique_ptr<Input> input = Connection::End(std::move(connection_));
+    lost_ = Clock::now();
+    try {
+        if (!input->Renew(position)) {
+            throw ReceiverError(ExitCode::kSourceUnsuitable,
+                                reason + ": what follows in this file is left out");
+        }
+        auto connection = std::make_unique<Connection>(std::move(input), options_, nullptr);
+        assembler_.AddNotice(reason + ": the recording goes on in a new file");
+        GoOn(std::move(connection), passed, true);
+    } catch (const SourceLost& loss) {
+        EndWith(ReceiverError(ExitCode::kSourceUnavailable,
+                              reason + ", and the source was lost: " + loss.what()));
+    } catch (const ReceiverError& error) {
+        EndWith(error);
+    }
+}
+
+void InputProducer::EndWith(const ReceiverError& error) {
+    if (recorded_ || !options_.reconnect) {
+        end_ = error;
+        return;
+    }
+    assembler_.AddNotice(std::string(error.what()) + "; trying again in " +
+                         std::to_string(kPauses[attempts_]) + " s");
+}
+
+void InputProducer::GoOn(std::unique_ptr<Connection> connection, std::int64_t passed, bool changed) {
+    connection_ = std::move(connection);
+    // Time went on while the source was away. On the grid, so that picture and sound are moved alike.
+    const std::int64_t begin = assembler_.Grid().PlaceOf(assembler_.LastPicture() + passed);
+    const SourceDescription& now = connection_->Description();
+    const bool other = now.width != description_.width || now.height != description_.height ||
+                       now.frameRate != description_.frameRate;
+    if (other && !changed) {
+        assembler_.AddNotice("the source came back as " + now.summary + " and was " + description_.summary +
+                             ": the recording goes on in a new file");
+        ++changes_;
+    }
+    if (now.frameRate != description_.frameRate) {
+        assembler_.SetRate(now.frameRate, begin);
+    }
+    description_ = now;
+    if (other || changed) {
+        assembler_.AddChange(description_);
+    }
+    connection_->Begin(assembler_, begin);
 }
 
 void InputProducer::Publish() {
@@ -120,7 +182,7 @@ void InputProducer::Publish() {
 }
 
 SourceCounts InputProducer::Counts() const {
-    return {lostFrames_, damaged_, reconnections_, away_};
+    return {lostFrames_, damaged_, reconnections_, changes_, away_};
 }
 
 }  // namespace receiver

@@ -30,6 +30,11 @@ class InputProducer final : public ProducerInterface {
 
     void Lose(const std::string& reason);
     void TryAgain();
+    void Change(const std::string& reason);
+    /// Goes on with `connection`, `passed` ticks after the last picture. `changed`: as another source, even
+    /// if it looks the same.
+    void GoOn(std::unique_ptr<Connection> connection, std::int64_t passed, bool changed);
+    void EndWith(const ReceiverError& error);
     void Publish();
 
     const SourceOptions options_;
@@ -51,6 +56,7 @@ class InputProducer final : public ProducerInterface {
     std::atomic<std::uint64_t> lostFrames_{0};
     std::atomic<std::uint64_t> damaged_{0};
     std::atomic<std::uint64_t> reconnections_{0};
+    std::atomic<std::uint64_t> changes_{0};
     std::atomic<bool> away_{false};
 };
 

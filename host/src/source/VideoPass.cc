@@ -1,8 +1,9 @@
 #include "source/VideoPass.h"
 
+#include <algorithm>
 #include <cstring>
 
-#include "common/ReceiverError.h"
+#include "source/FormatWatch.h"
 
 namespace receiver {
 namespace {
@@ -49,18 +50,33 @@ bool VideoPass::IsStart(const AVPacket& packet) {
     return Contains(NalUnits(BytesOf(stream)), kNalIdr);
 }
 
-void VideoPass::CheckSize(const AVPacket& stream) {
+void VideoPass::CheckFormat(const AVPacket& stream) {
     const PictureParser::Picture picture = parser_->Parse(BytesOf(stream));
     if (picture.width != 0 && (picture.width != width_ || picture.height != height_)) {
-        throw ReceiverError(ExitCode::kSourceUnsuitable,
-                            "the picture changed from " + std::to_string(width_) + "x" +
-                                std::to_string(height_) + " to " + std::to_string(picture.width) + "x" +
-                                std::to_string(picture.height) +
-                                " while it was recorded: start again to record the new size");
+        throw FormatChanged("the picture changed from " + std::to_string(width_) + "x" +
+                            std::to_string(height_) + " to " + std::to_string(picture.width) + "x" +
+                            std::to_string(picture.height));
+    }
+    const AVRational rate = parser_->FrameRate();
+    if (rate_ && rate_->num > 0 && rate.num > 0 && av_cmp_q(*rate_, rate) != 0) {
+        // Whether it counts frames or fields, nobody knows.
+        throw FormatChanged(kRateChanged);
+    }
+    rate_ = rate;
+}
+
+void VideoPass::CheckParameters(const AVPacket& packet) const {
+    std::size_t size = 0;
+    const std::uint8_t* const told = av_packet_get_side_data(&packet, AV_PKT_DATA_NEW_EXTRADATA, &size);
+    const AVCodecParameters& known = *filter_->par_in;
+    if (told != nullptr && !std::equal(told, told + size, known.extradata,
+                                       known.extradata + std::max(0, known.extradata_size))) {
+        throw FormatChanged("the parameter sets of the video changed");
     }
 }
 
 void VideoPass::Push(const AVPacket& packet, const PictureSink& sink) {
+    CheckParameters(packet);
     const AVPacket& stream = Filter(packet);
     if (stream.size == 0) {
         ++damaged_;
@@ -73,7 +89,7 @@ void VideoPass::Push(const AVPacket& packet, const PictureSink& sink) {
     picture.keyFrame = Contains(units, kNalIdr);
     sets_.Learn(units);
     if (picture.keyFrame) {
-        CheckSize(stream);
+        CheckFormat(stream);
     }
     if (const auto completed = sets_.Complete(bytes, units)) {
         picture.size = completed->size();

@@ -23,7 +23,10 @@ class VideoPass final : public VideoPathInterface {
  private:
     /// The packet as byte stream.
     AVPacket& Filter(const AVPacket& packet);
-    void CheckSize(const AVPacket& stream);
+    /// Throws `FormatChanged`.
+    void CheckFormat(const AVPacket& stream);
+    /// Parameter sets out of band that are not those of the beginning. Throws `FormatChanged`.
+    void CheckParameters(const AVPacket& packet) const;
 
     libav::Owner<AVBSFContext> filter_;
     libav::Owner<AVPacket> packet_;
@@ -32,6 +35,8 @@ class VideoPass final : public VideoPathInterface {
     std::unique_ptr<TimecodeReader> timecodes_;
     std::uint32_t width_ = 0;
     std::uint32_t height_ = 0;
+    /// As the first IDR frame tells; 0/1 when it does not.
+    std::optional<AVRational> rate_;
     std::uint64_t damaged_ = 0;
 };
 
