@@ -28,7 +28,7 @@ using Clock = std::chrono::steady_clock;
 
 constexpr std::chrono::milliseconds kDisplayInterval{250};
 constexpr std::chrono::seconds kFreeSpaceInterval{1};
-/// The end of a recording needs two chunks more of the stream; when that has dried up, nobody waits for it.
+/// The run ends with the frame behind the last one; when the stream has dried up, nobody waits for it.
 constexpr std::chrono::seconds kFinishPatience{2};
 constexpr const char* kDefaultOutput = "recordings";
 /// What the module takes for an output path that is not set.
@@ -98,7 +98,8 @@ StartParameters ParametersOf(const Options& options, const std::string& output,
     parameters.texts = {{"-outputPath", output},
                         {"-fileType", options.fileType},
                         {"-naluType", options.naluType},
-                        {"-outputMode", options.mode == OutputMode::kOn ? "on" : "sync"}};
+                        {"-outputMode", options.mode == OutputMode::kOn ? "on" : "sync"},
+                        {"-recordRules", "exact"}};
     const auto add = [&](const char* key, const std::optional<std::string>& value) {
         if (value) {
             parameters.texts[key] = *value;
@@ -195,9 +196,7 @@ class Running final : public SourceListenerInterface {
     std::uint64_t faults_ = 0;
     std::uint64_t lateStops_ = 0;
     ModuleStatus told_;
-    bool sourceOver_ = false;
-    /// What the present session with the module was told, and that the source has become another one.
-    SourceDescription recorded_;
+    /// The source has become another one.
     bool changed_ = false;
     std::optional<Clock::time_point> finishSince_;
     Clock::time_point shown_{};
@@ -226,14 +225,17 @@ ExitCode Running::Record(const SourceOpener& open) {
     CheckTimecode(options_, source->Description().frameRate);
     Recorder::Settings recorderSettings = RecorderSettings(options_, source->Description().frameRate);
 
-    std::unique_ptr<Host> host;
+    // Each lives as long as the module, which may still hold one that a hanging disk has kept.
+    std::vector<std::unique_ptr<Host>> hosts;
     std::optional<ReceiverError> failure;
+    // One session for each of what the source is: the module learns rate and size when it starts.
     do {
-        recorded_ = source->Description();
-        recorderSettings.frameRate = recorded_.frameRate;
-        host = std::make_unique<Host>(ParametersOf(options_, output.parameter, recorded_));
-        host_ = host.get();
-        ModuleSession session(library.Module(), *host);
+        changed_ = false;
+        recorderSettings.frameRate = source->Description().frameRate;
+        hosts.push_back(
+            std::make_unique<Host>(ParametersOf(options_, output.parameter, source->Description())));
+        host_ = hosts.back().get();
+        ModuleSession session(library.Module(), *host_);
         if (options_.mode == OutputMode::kSync) {
             session.GoOnline();
         }
@@ -243,13 +245,8 @@ ExitCode Running::Record(const SourceOpener& open) {
         } catch (const ReceiverError& error) {
             failure = error;
         }
-        if (!host->Failed()) {
-            const std::uint64_t left = recorder.Close(sourceOver_ || failure);
-            if (left != 0) {
-                display_.Notice("the stream ended while it was recorded: its last " + std::to_string(left) +
-                                (left == 1 ? " frame is" : " frames are") +
-                                " not in the file, which grows by 8 frames at a time");
-            }
+        if (!host_->Failed()) {
+            recorder.Close();
         }
         TellLateStops(recorder);
         TakeStatuses(false);
@@ -257,8 +254,8 @@ ExitCode Running::Record(const SourceOpener& open) {
         TakeModuleEvents();
         TakeStatuses(true);
         recorderSettings.past = recorder.Past();
-        changed_ = changed_ && !recorder.Finishing();
-    } while (std::exchange(changed_, false) && !failure && !host->Failed());
+        plan_.Interrupt();
+    } while (changed_ && !host_->Failed());
 
     Summary summary = Summarise(*source);
     if (failure) {
@@ -276,7 +273,6 @@ void Running::Loop(SourceInterface& source, Recorder& recorder) {
         SourceUnit unit;
         const SourceInterface::Result result = source.Read(unit);
         if (result == SourceInterface::Result::kEnd || result == SourceInterface::Result::kStopped) {
-            sourceOver_ = true;
             return;
         }
         if (result == SourceInterface::Result::kUnit) {
@@ -287,15 +283,9 @@ void Running::Loop(SourceInterface& source, Recorder& recorder) {
             recorder.Interrupt();
         }
         if (result == SourceInterface::Result::kChanged) {
-            recorder.Interrupt();
             display_.Notice("source: " + source.Description().summary);
-            // The module learns rate and size when it starts, and never again.
-            const SourceDescription& now = source.Description();
-            changed_ = now.frameRate != recorded_.frameRate || now.width != recorded_.width ||
-                       now.height != recorded_.height;
-            if (changed_ || recorder.Finishing()) {
-                return;
-            }
+            changed_ = !recorder.Finishing();
+            return;
         }
         TellLateStops(recorder);
         TakeCommands(recorder);
@@ -372,8 +362,8 @@ void Running::TellLateStops(const Recorder& recorder) {
     }
     lateStops_ = recorder.LateStops();
     display_.Notice(
-        "the module has not carried out a stop command within 1 s: the recording may hold more than was "
-        "commanded, and its file is closed late");
+        "the module has not carried out a stop command within 1 s: the recording ends on its frame, but its "
+        "file is closed late");
 }
 
 void Running::TakeStatuses(bool ending) {

@@ -11,21 +11,14 @@
 namespace receiver {
 namespace {
 
-/// The module cuts its caches into chunks of so many frames, when twice as many are there.
-constexpr std::uint64_t kChunkFrames = 8;
-constexpr std::int64_t kAudioFrame = 1024;
-
 /// Where frames lie further apart than this, in ticks, something is missing. The module does not notice: it
 /// counts units, so its media would drift apart and the timecode of the file would be wrong behind the gap.
 constexpr std::int64_t kGap = kVideoClock / 2;
 
-/// An access unit delimiter (ISO/IEC 14496-10 7.3.2.4): a unit for the count that holds no picture.
-constexpr std::array<unsigned char, 6> kEmptyVideo{0x00, 0x00, 0x00, 0x01, 0x09, 0xF0};
+constexpr std::int64_t kAudioFrame = 1024;
 
-/// How often the chunk thread is nudged at the end, and how long it gets each time: it takes a look at its
-/// caches for each unit that comes, and cuts one chunk a look.
-constexpr int kNudges = 200;
-constexpr std::chrono::milliseconds kNudgePause{5};
+/// An access unit delimiter (ISO/IEC 14496-10 7.3.2.4): a unit that holds no picture.
+constexpr std::array<unsigned char, 6> kDelimiter{0x00, 0x00, 0x00, 0x01, 0x09, 0xF0};
 
 /// Half of the 48 chunks that may wait for the disk.
 constexpr std::size_t kChunksAhead = 24;
@@ -34,7 +27,8 @@ constexpr std::size_t kKeptChunks = 2;
 /// A fragment is written when it has so many chunks.
 constexpr std::size_t kFragmentChunks = 32;
 
-/// A disk is slow, not hung, as long as it needs less than this for the chunks of one wait.
+/// A disk is slow, not hung, as long as it needs less than this for the chunks that wait at the end. The
+/// module itself gives a writer 3.5 s to end.
 constexpr std::chrono::seconds kDiskPatience{30};
 
 std::int64_t Period(const FrameRate& rate) {
@@ -81,6 +75,7 @@ void Recorder::Put(SourceUnit unit) {
     while (const std::optional<SourceUnit> next = interleaver_.Take()) {
         Push(*next);
     }
+    CheckStops(std::chrono::milliseconds(0));
 }
 
 void Recorder::Finish() {
@@ -88,33 +83,31 @@ void Recorder::Finish() {
     plan_.Finish();
 }
 
-bool Recorder::Done() const {
-    if (!finishing_) {
-        return false;
-    }
-    // Going offline has no timestamp. The run ends with a whole chunk, so that none of it is lost.
-    return settings_.mode == OutputMode::kOn ? recordedFrames_ % kChunkFrames == 0
-                                             : log_.OpenRecordings() == 0;
-}
-
 std::int64_t Recorder::Elapsed() const {
     return firstFrame_ ? lastFrame_ - *firstFrame_ : 0;
 }
 
 void Recorder::Push(const SourceUnit& unit) {
+    if (done_) {
+        return;
+    }
     switch (unit.medium) {
         case Medium::kVideo:
             PushFrame(unit);
             break;
         case Medium::kAudio:
-            if (commanded_) {
-                feed_.PushAudio(unit.time, unit.data, unit.size);
-            }
-            lastAudio_ = unit.time;
+            PushAudio(unit);
             break;
         case Medium::kKlv:
             packets_.emplace_back(unit.data.get(), unit.data.get() + unit.size);
             break;
+    }
+}
+
+void Recorder::PushAudio(const SourceUnit& unit) {
+    lastAudio_ = unit;
+    if (settings_.mode == OutputMode::kSync || online_) {
+        feed_.PushAudio(unit.time, unit.data, unit.size);
     }
 }
 
@@ -132,28 +125,29 @@ void Recorder::PushFrame(const SourceUnit& unit) {
     const bool pushed =
         settings_.mode == OutputMode::kOn ? PushOnlineMeta(unit, *timecode_) : PushSyncMeta(unit, *timecode_);
     packets_.clear();
-    if (!pushed) {
-        return;
+    if (pushed) {
+        feed_.PushVideo(unit.time, unit.data, unit.size);
+        if (settings_.followDisk) {
+            feed_.WaitForDisk(KeptChunks() + kChunksAhead);
+        }
     }
-    feed_.PushVideo(unit.time, unit.data, unit.size);
-    if (settings_.followDisk) {
-        feed_.WaitForDisk(KeptChunks() + kChunksAhead);
-    }
+    done_ = finishing_;
 }
 
 bool Recorder::PushOnlineMeta(const SourceUnit& unit, const Timecode& timecode) {
-    if (!commanded_) {
-        if (!unit.keyFrame || finishing_) {
-            return false;
-        }
-        // Online with the first IDR frame and not before: what came earlier would only be trimmed.
-        commanded_ = true;
-        since_ = timecode;
-        session_.GoOnline();
-    } else if (Done()) {
+    if (finishing_ || (!online_ && !unit.keyFrame)) {
         return false;
     }
-    ++recordedFrames_;
+    if (!online_) {
+        // With the first IDR frame and not before: what waits for one is limited in the module. Only the
+        // audio that is nearest to the frame may begin before it.
+        online_ = true;
+        since_ = timecode;
+        session_.GoOnline();
+        if (lastAudio_) {
+            feed_.PushAudio(lastAudio_->time, lastAudio_->data, lastAudio_->size);
+        }
+    }
     feed_.PushMeta(unit.time, BuildMetadata(true, timecode, packets_));
     return true;
 }
@@ -163,62 +157,68 @@ bool Recorder::PushSyncMeta(const SourceUnit& unit, const Timecode& timecode) {
     const bool record = plan_.Next(Elapsed(), unit.keyFrame);
     if (record != before) {
         since_ = timecode;
-        recordedFrames_ = 0;
     }
-    recordedFrames_ += record ? 1 : 0;
-    commanded_ = commanded_ || record;
-    if (!commanded_) {
-        return false;
-    }
-    const int stops = log_.Stops();
-    if (record != before) {
-        feed_.Settle();
-    }
-    feed_.PushMeta(unit.time, BuildMetadata(record, timecode, packets_));
-    if (record && !before) {
-        feed_.Settle();
-    }
-    if (before && !record) {
-        AwaitStop(stops + 1);
-    }
+    PushFlag(unit.time, record, BuildMetadata(record, timecode, packets_));
     return true;
 }
 
-void Recorder::AwaitStop(int count) {
-    lateStops_ += log_.WaitForStops(count, kStopPatience) ? 0 : 1;
+void Recorder::PushFlag(std::int64_t time, bool record, const std::vector<unsigned char>& meta) {
+    // To the module a first unit without the flag is a stop, too.
+    if (flag_ != record && !record) {
+        ++stops_;
+        stopSince_ = stopSince_.value_or(Clock::now());
+    }
+    flag_ = record;
+    feed_.PushMeta(time, meta);
 }
 
-void Recorder::Interrupt() {
+void Recorder::CheckStops(std::chrono::milliseconds patience) {
+    if (!stopSince_) {
+        return;
+    }
+    if (log_.WaitForStops(stops_, patience)) {
+        stopSince_.reset();
+    } else if (Clock::now() - *stopSince_ >= kStopPatience) {
+        stopSince_.reset();
+        // From here on: the module may have missed it for good.
+        stops_ = log_.Stops();
+        ++lateStops_;
+    }
+}
+
+void Recorder::PushRest() {
     while (const std::optional<SourceUnit> next = interleaver_.TakeRest()) {
         Push(*next);
     }
+}
+
+void Recorder::Interrupt() {
+    PushRest();
+    const bool recording = plan_.Recording();
     EndBeforeGap();
+    if (recording && !plan_.Recording()) {
+        PushEndMarks();
+    }
+    CheckStops(std::chrono::milliseconds(0));
 }
 
 void Recorder::EndBeforeGap() {
-    if (settings_.mode != OutputMode::kSync || !plan_.Recording()) {
-        return;
+    if (settings_.mode == OutputMode::kSync && plan_.Recording()) {
+        plan_.Interrupt();
+        PushFlag(FrameTime(lastFrame_, 1), false, BuildMetadata(false, std::nullopt, {}));
     }
-    plan_.Interrupt();
-    if (log_.OpenRecordings() <= 0) {
-        return;
-    }
-    feed_.Settle();
-    const auto left = static_cast<std::int64_t>(CutWholeChunks(true));
-    // Between the last frame of the last whole chunk and the one behind it.
-    PushStop(FrameTime(lastFrame_, -left) + FrameTime(0, 1) / 2);
 }
 
-void Recorder::PushStop(std::int64_t time) {
-    const int stops = log_.Stops();
-    const int open = log_.OpenRecordings();
-    const std::vector<unsigned char> meta = BuildMetadata(false, std::nullopt, {});
-    feed_.PushMeta(time, meta);
-    AwaitStop(stops + 1);
-    // The chunk thread looks for the end when a unit comes, and none does on its own.
-    for (int i = 0; i < kNudges && log_.OpenRecordings() >= open; ++i) {
-        feed_.PushMeta(time, meta);
-        feed_.Frames().WaitForUncut(0, kNudgePause);
+void Recorder::PushEndMarks() {
+    const std::shared_ptr<unsigned char> delimiter(new unsigned char[kDelimiter.size()],
+                                                   std::default_delete<unsigned char[]>());
+    std::copy(kDelimiter.begin(), kDelimiter.end(), delimiter.get());
+    const std::int64_t end = FrameTime(lastFrame_, 1);
+    feed_.PushVideo(end, delimiter, kDelimiter.size());
+    if (lastAudio_) {
+        const std::int64_t behind =
+            std::max(lastAudio_->time + kAudioFrame, end * kAudioClock / kVideoClock + kAudioFrame);
+        feed_.PushAudio(behind, lastAudio_->data, lastAudio_->size);
     }
 }
 
@@ -237,58 +237,11 @@ std::int64_t Recorder::FrameTime(std::int64_t from, std::int64_t frames) const {
     return from + frames * kVideoClock * rate.denominator / rate.numerator;
 }
 
-void Recorder::PushPadding(bool record, std::size_t uncut) {
-    const std::shared_ptr<unsigned char> empty(new unsigned char[kEmptyVideo.size()],
-                                               std::default_delete<unsigned char[]>());
-    std::copy(kEmptyVideo.begin(), kEmptyVideo.end(), empty.get());
-    const std::vector<unsigned char> meta = BuildMetadata(record, std::nullopt, {});
-    std::int64_t frame = 0;
-    const auto pushMetaAndAudio = [&] {
-        const std::int64_t time = FrameTime(lastFrame_, ++frame);
-        feed_.PushMeta(time, meta);
-        // Audio a little ahead of the frames, so that it reaches beyond the end of the last chunk.
-        while (lastAudio_ * kVideoClock < (time + kVideoClock / 10) * kAudioClock) {
-            lastAudio_ += kAudioFrame;
-            feed_.PushAudio(lastAudio_, empty, kEmptyVideo.size());
-        }
-    };
-    // Enough for every whole chunk to be cut, too few to be cut themselves.
-    for (std::uint64_t i = 0; i < kChunkFrames; ++i) {
-        pushMetaAndAudio();
-        feed_.PushVideo(FrameTime(lastFrame_, frame), empty, kEmptyVideo.size());
-    }
-    for (int i = 0;
-         i < kNudges && log_.OpenRecordings() > 0 && !feed_.Frames().WaitForUncut(uncut, kNudgePause); ++i) {
-        pushMetaAndAudio();
-    }
-}
-
-std::uint64_t Recorder::Close(bool over) {
-    if (over) {
-        interleaver_.Finish();
-        while (const std::optional<SourceUnit> next = interleaver_.Take()) {
-            Push(*next);
-        }
-    }
-    if (log_.OpenRecordings() <= 0) {
-        return 0;
-    }
+void Recorder::Close() {
+    PushRest();
     feed_.Settle();
-    const bool recording = settings_.mode == OutputMode::kOn || plan_.Recording();
-    const std::uint64_t left = CutWholeChunks(false);
+    CheckStops(kStopPatience);
     feed_.Frames().WaitForChunks(KeptChunks(), kDiskPatience);
-    return recording ? left : 0;
-}
-
-std::uint64_t Recorder::CutWholeChunks(bool record) {
-    // Nothing is held where a recording still waits for its first frame.
-    if (feed_.Frames().UncutUnits() == 0) {
-        return 0;
-    }
-    const std::uint64_t left = recordedFrames_ % kChunkFrames;
-    PushPadding(record, kChunkFrames + left);
-    const std::size_t held = feed_.Frames().UncutUnits();
-    return std::max<std::uint64_t>(left, held > kChunkFrames ? held - kChunkFrames : 0);
 }
 
 std::size_t Recorder::KeptChunks() const {

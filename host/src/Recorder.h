@@ -17,16 +17,13 @@
 namespace receiver {
 
 /// Brings a source's units into the module: in one order of time, each frame behind its metadata unit with
-/// timecode, record flag and the source's own packets, and record commands so that no schedule of the
-/// module's threads moves them by a frame.
+/// timecode, record flag and the source's own packets.
 ///
-/// A record command travels in the metadata unit of its frame, which goes first. Before a recording begins
-/// and again before its first frame follows, the feed waits until the module has worked off everything: so no
-/// earlier audio gets into the recording, and its IDR frame cannot overtake the command on the way through
-/// the module's three queue threads, which would cost a whole group of pictures. A stop is waited for too:
-/// the module carries it out on another thread, and it ends whatever recording is open by then, so that a
-/// late one would end the next recording. For the same reason nothing is pushed before the first recording:
-/// the module takes a first unit without the flag for a stop.
+/// Relies on the module's exact record rules. A record command travels in the metadata unit of its frame, and
+/// no schedule of the module's threads moves it: a recording holds the frames from the first IDR frame with
+/// the flag to the last one that has it, with the audio that belongs to them, and what has been pushed when
+/// the session ends is written. So everything is pushed from the first frame on, also while nothing is
+/// recorded, for the audio in front of a recording to be there when it begins.
 ///
 /// One thread at a time.
 class Recorder {
@@ -65,21 +62,19 @@ class Recorder {
 
     void Put(SourceUnit unit);
 
-    /// The source is away: what waits for order is pushed, and a recording in mode sync ends with the last
-    /// whole chunk, so that its file is closed and holds nothing of what comes behind the gap. The next one
-    /// begins with the first IDR frame there. A repetition has no effect.
+    /// The source is away: what waits for order is pushed, and a recording in mode sync ends with its last
+    /// frame, so that its file is closed and holds nothing of what comes behind the gap. The next one begins
+    /// with the first IDR frame there. A repetition has no effect.
     void Interrupt();
 
-    /// The run is to end: nothing is recorded from the next frame on. More of the stream is needed until
-    /// `Done`, for the module to cut what came before.
+    /// The run is to end: nothing is recorded from the next frame on. That frame is needed until `Done`,
+    /// since it tells that the audio of the last one is complete.
     void Finish();
     bool Finishing() const { return finishing_; }
-    /// Everything up to the end is on its way to the disk.
-    bool Done() const;
-    /// Ends a stream of which nothing more comes: what waits for order is pushed, then units that are never
-    /// written, which let the module cut all whole chunks that it still holds. `over` says that the source
-    /// itself has ended. Returns the number of frames that stay out of the recording: a chunk is 8 frames.
-    std::uint64_t Close(bool over);
+    bool Done() const { return done_; }
+    /// Ends a stream of which nothing more comes: pushes what waits for order, and waits until everything has
+    /// left the module's first queues, which going offline empties, and until a slow disk has caught up.
+    void Close();
 
     /// Stop commands that the module has not carried out within `kStopPatience`.
     std::uint64_t LateStops() const { return lateStops_; }
@@ -93,22 +88,25 @@ class Recorder {
     std::int64_t Elapsed() const;
 
  private:
+    using Clock = std::chrono::steady_clock;
+
     void Push(const SourceUnit& unit);
+    void PushRest();
+    void PushAudio(const SourceUnit& unit);
     void PushFrame(const SourceUnit& unit);
     /// False when the frame does not go to the module.
     bool PushOnlineMeta(const SourceUnit& unit, const Timecode& timecode);
     bool PushSyncMeta(const SourceUnit& unit, const Timecode& timecode);
+    void PushFlag(std::int64_t time, bool record, const std::vector<unsigned char>& meta);
     void EndBeforeGap();
+    /// A picture and audio behind the end of a recording. They are never written: the module ends a recording
+    /// when each medium has reached its end, and while the source is away nothing else gets there.
+    void PushEndMarks();
+    /// Sees whether the module has carried out the stops so far, and waits for that within `patience`. The
+    /// recording ends on its frame all the same, but a module that carries out nothing closes no file.
+    void CheckStops(std::chrono::milliseconds patience);
     Timecode NextTimecode(const SourceUnit& unit);
     std::int64_t FrameTime(std::int64_t from, std::int64_t frames) const;
-    /// Until no more than `uncut` units are left, padding included. `record` is the record flag of the
-    /// padding.
-    void PushPadding(bool record, std::size_t uncut);
-    /// The number of frames that are left over.
-    std::uint64_t CutWholeChunks(bool record);
-    void PushStop(std::int64_t time);
-    /// Until the module has carried out `count` stop commands.
-    void AwaitStop(int count);
     std::size_t KeptChunks() const;
 
     const Settings settings_;
@@ -122,14 +120,18 @@ class Recorder {
     std::optional<Timecode> since_;
     std::optional<std::int64_t> firstFrame_;
     std::int64_t lastFrame_ = 0;
-    std::int64_t lastAudio_ = 0;
+    std::optional<SourceUnit> lastAudio_;
     /// KLV packets since the last frame.
     std::vector<std::vector<unsigned char>> packets_;
     bool finishing_ = false;
-    /// A recording was commanded: by going online, or by the first record flag.
-    bool commanded_ = false;
-    /// Frames of the present recording.
-    std::uint64_t recordedFrames_ = 0;
+    bool done_ = false;
+    /// In mode on: the module records.
+    bool online_ = false;
+    /// The record flag that was pushed last.
+    std::optional<bool> flag_;
+    /// Stop commands so far, and since when one waits to be carried out.
+    int stops_ = 0;
+    std::optional<Clock::time_point> stopSince_;
     std::uint64_t lateStops_ = 0;
 };
 

@@ -95,7 +95,10 @@ class ScriptedModule final : public QxModuleInterface,
     static void Say(const char* text) { Logger::Put(LOG_PRIORITY_OPERATOR, nullptr, nullptr, 0, "%s", text); }
     void Write(std::string name, const StreamData& unit, std::uint64_t duration) {
         const std::uint64_t origin = duration == 1024 ? 480000 : kOrigin;
-        name += unit.payload == nullptr ? "-" : std::to_string((unit.rtp_timestamp - origin) / duration);
+        const auto time = static_cast<std::int64_t>(unit.rtp_timestamp - origin);
+        name += unit.payload == nullptr ? "-"
+                : time < 0              ? std::to_string(time)
+                                        : std::to_string(static_cast<std::uint64_t>(time) / duration);
         calls.push_back(name);
     }
 
@@ -145,34 +148,14 @@ TEST_F(RecorderTest, EachFrameComesBehindItsMetadataAndAudioInItsPlace) {
     EXPECT_THAT(module_.Units(), ElementsAre("M0", "v0", "a1", "M1", "v1", "a2", "a3"));
 }
 
-// The flag must be carried out before the frame is pushed, and everything before it worked off before the
-// flag.
-TEST_F(RecorderTest, ABeginningIsFencedOffOnBothSides) {
+// The module keeps what went by lately, and needs the audio in front of a recording.
+TEST_F(RecorderTest, EverythingIsPushedAlsoWhileNothingIsRecorded) {
     Make(Sync());
-    PutLateAudio();
-    PutFrame(0, true);
-    EXPECT_THAT(module_.calls, ElementsAre("v-", "a-", "m-", "M0", "v-", "a-", "m-", "v0"));
-}
-
-// A stop that overtakes the first frame would cancel the recording.
-TEST_F(RecorderTest, AStopIsFencedOffFromWhatComesBefore) {
-    Make(Sync());
-    PutLateAudio();
-    PutFrame(0, true);
-    module_.calls.clear();
-    plan_.Stop();
-    PutFrame(1, false);
-    EXPECT_THAT(module_.calls, ElementsAre("v-", "a-", "m-", "m1", "v1"));
-}
-
-// The module takes a first unit without the flag for a stop, and may carry it out when the recording is open.
-TEST_F(RecorderTest, NothingIsPushedBeforeTheFirstRecording) {
-    Make(Sync());
-    recorder_->Put(MakeAudio(0));
+    recorder_->Put(MakeAudio(-100));
     PutLateAudio();
     PutFrame(0, false);
     PutFrame(1, true);
-    EXPECT_THAT(module_.Units(), ElementsAre("M1", "v1"));
+    EXPECT_THAT(module_.Units(), ElementsAre("a-100", "m0", "v0", "M1", "v1"));
     EXPECT_EQ(recorder_->Since(), (Timecode{10, 0, 0, 1, false}));
 }
 
@@ -210,19 +193,47 @@ TEST_F(RecorderTest, AGapEndsTheRecordingAndTheNextIdrFrameBeginsAnother) {
     PutFrame(1, false);
     PutFrame(20, false);
     PutFrame(25, true);
-    EXPECT_THAT(module_.Units(), ElementsAre("M0", "v0", "M1", "v1", "m1", "m20", "v20", "M25", "v25"));
+    // The first stop is that of the frame behind the last one.
+    EXPECT_THAT(module_.Units(), ElementsAre("M0", "v0", "M1", "v1", "m2", "m20", "v20", "M25", "v25"));
     EXPECT_EQ(recorder_->LastTimecode(), (Timecode{10, 0, 1, 0, false}));
 }
 
-TEST_F(RecorderTest, AStopThatTheModuleDoesNotCarryOutIsCounted) {
+TEST_F(RecorderTest, AStopThatTheModuleDoesNotCarryOutIsCountedAndHoldsNothingUp) {
     module_.deaf = true;
     Make(Sync());
     PutLateAudio();
     PutFrame(0, true);
     plan_.Stop();
-    EXPECT_EQ(recorder_->LateStops(), 0u);
     PutFrame(1, false);
+    EXPECT_EQ(recorder_->LateStops(), 0u);
+    PutFrame(2, false);
+    EXPECT_EQ(module_.Units().back(), "v2");
+    recorder_->Close();
     EXPECT_EQ(recorder_->LateStops(), 1u);
+}
+
+TEST_F(RecorderTest, AStopThatTheModuleCarriesOutIsNotLate) {
+    Make(Sync());
+    PutLateAudio();
+    PutFrame(0, true);
+    plan_.Stop();
+    PutFrame(1, false);
+    recorder_->Close();
+    EXPECT_EQ(recorder_->LateStops(), 0u);
+}
+
+// While the source is away nothing of its own reaches the end of the recording, which the module awaits.
+TEST_F(RecorderTest, ASourceThatIsAwayEndsTheRecordingBehindItsLastFrame) {
+    Make(Sync());
+    PutFrame(0, true);
+    PutFrame(1, false);
+    recorder_->Put(MakeAudio(0));
+    recorder_->Put(MakeAudio(1024));
+    recorder_->Interrupt();
+    // The pictures end at 80 ms; audio from 106.7 ms on lies behind that whatever its place was.
+    EXPECT_THAT(module_.Units(), ElementsAre("M0", "v0", "a0", "a1", "M1", "v1", "m2", "v2", "a4"));
+    recorder_->Interrupt();
+    EXPECT_EQ(module_.Units().size(), 9u);
 }
 
 TEST_F(RecorderTest, HalfASecondIsNoGap) {
@@ -259,7 +270,7 @@ TEST_F(RecorderTest, AFinishTakesEffectWithTheNextFrame) {
     EXPECT_TRUE(recorder_->Done());
 }
 
-TEST_F(RecorderTest, InModeOnNothingComesBeforeTheHostIsOnlineWithTheFirstIdrFrame) {
+TEST_F(RecorderTest, InModeOnTheHostIsOnlineWithTheFirstIdrFrameAndTheAudioInFrontOfIt) {
     Make(On());
     recorder_->Put(MakeAudio(0));
     PutFrame(0, false);
@@ -267,26 +278,31 @@ TEST_F(RecorderTest, InModeOnNothingComesBeforeTheHostIsOnlineWithTheFirstIdrFra
     recorder_->Put(MakeAudio(1024));
     PutFrame(1, true);
     recorder_->Put(MakeAudio(2048));
-    EXPECT_THAT(module_.Units(), ElementsAre("online", "M1", "v1"));
+    EXPECT_THAT(module_.Units(), ElementsAre("online", "a1", "M1", "v1"));
     recorder_->Put(MakeAudio(3072));
     PutFrame(2, false);
-    EXPECT_THAT(module_.Units(), ElementsAre("online", "M1", "v1", "a2", "a3"));
+    EXPECT_THAT(module_.Units(), ElementsAre("online", "a1", "M1", "v1", "a2", "a3"));
 }
 
-TEST_F(RecorderTest, InModeOnTheRunEndsWithAWholeChunk) {
+TEST_F(RecorderTest, InModeOnTheRunEndsWithTheLastFrameBeforeTheEnd) {
     Make(On());
     PutLateAudio();
     PutFrame(0, true);
     PutFrame(1, false);
     recorder_->Finish();
-    std::int64_t frame = 2;
-    for (; !recorder_->Done(); ++frame) {
-        ASSERT_LT(frame, 100);
-        PutFrame(frame, false);
-    }
-    EXPECT_EQ(frame, 8);
-    PutFrame(frame, false);
-    EXPECT_EQ(module_.Units().back(), "v7");
+    EXPECT_FALSE(recorder_->Done());
+    PutFrame(2, false);
+    EXPECT_TRUE(recorder_->Done());
+    PutFrame(3, true);
+    EXPECT_THAT(module_.Units(), ElementsAre("online", "M0", "v0", "M1", "v1"));
+}
+
+// What is still in there is lost when the host goes offline.
+TEST_F(RecorderTest, TheEndWaitsForTheQueuesOfTheModule) {
+    Make(Sync());
+    PutFrame(0, true);
+    recorder_->Close();
+    EXPECT_THAT(module_.calls, ElementsAre("M0", "v0", "v-", "a-", "m-"));
 }
 
 }  // namespace

@@ -127,8 +127,9 @@ RecordedFile ReadBack(const std::string& path) {
     const AVDictionaryEntry* const first =
         timecode != nullptr ? av_dict_get(timecode->metadata, "timecode", nullptr, 0) : nullptr;
     file.startTimecode = first != nullptr ? first->value : "";
-    if (context->duration > 0) {
-        file.seconds = static_cast<double>(context->duration) / AV_TIME_BASE;
+    if (context->duration > 0 && video->duration > 0) {
+        // The sound may end half an audio frame behind the pictures.
+        file.seconds = Seconds(video->duration, *video);
         file.frames = static_cast<std::uint64_t>(std::max<std::int64_t>(video->nb_frames, 0));
     } else {
         ReadFragments(*context, *video, file);

@@ -61,7 +61,7 @@ std::optional<SourceUnit> Interleaver::Take() {
     const std::int64_t time = CommonTime(first->front());
     const std::int64_t newest = std::max(latest_[kVideoIndex], latest_[kAudioIndex]);
     const bool complete = latest_[kVideoIndex] >= time && latest_[kAudioIndex] >= time;
-    if (!finished_ && !complete && newest - time <= kPatienceSeconds * kCommonClock) {
+    if (!complete && newest - time <= kPatienceSeconds * kCommonClock) {
         return std::nullopt;
     }
     return PopFront(*first);

@@ -23,10 +23,9 @@ class Interleaver {
     void Put(SourceUnit unit);
     /// The next unit, if nothing earlier is to be expected.
     std::optional<SourceUnit> Take();
-    /// The next unit, whatever is to be expected: the source was lost, and what follows lies behind a gap.
+    /// The next unit, whatever is to be expected: the source is over, or was lost and what follows lies
+    /// behind a gap.
     std::optional<SourceUnit> TakeRest();
-    /// Nothing more comes: everything that waits may be taken.
-    void Finish() { finished_ = true; }
 
  private:
     static constexpr std::size_t kMedia = 3;
@@ -39,7 +38,6 @@ class Interleaver {
     std::array<std::deque<SourceUnit>, kMedia> waiting_;
     /// The latest time that was put in, on the common clock. Media that others wait for: video and audio.
     std::array<std::int64_t, kMedia> latest_{-1, -1, -1};
-    bool finished_ = false;
 };
 
 }  // namespace receiver

@@ -87,9 +87,7 @@ class ModuleLog::Sink final : public LogSinkInterface {
     void OnOperatorLine(std::string_view text) {
         using Kind = ModuleEvent::Kind;
         const std::lock_guard lock(mutex);
-        if (text.starts_with("OP: FILE CLOSE.")) {
-            Close(writers_[std::this_thread::get_id()]);
-        } else if (text.starts_with("OP: REC START.")) {
+        if (text.starts_with("OP: REC START.")) {
             ++openRecordings;
             events.push_back({Kind::kRecordStarted, {}});
         } else if (text.starts_with("OP: REC STOP.")) {

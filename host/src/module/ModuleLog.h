@@ -42,9 +42,10 @@ struct ModuleEvent {
 };
 
 /// Follows the module through its log, which is its only word about files and about units that it had to
-/// drop. Only the trace tells of fragmented files and of folders: a writer's thread names the folder, then
-/// the file, and the file is closed when it says so, when the same thread names the next one, or when it
-/// posts the status of its end.
+/// drop. Only the trace tells of fragmented files, of folders and of what is complete: a writer's thread
+/// names the folder, then the file, and the file is closed when the same thread names the next one, or when
+/// it posts the status of its end. The operator's line about the end of a file comes before its last boxes
+/// are written.
 ///
 /// Lines arrive on the module's threads; the operations may be called from any thread.
 class ModuleLog {

@@ -30,8 +30,8 @@ class StreamFeed {
     void PushAudio(std::int64_t time, const std::shared_ptr<unsigned char>& data, std::size_t size);
     void PushMeta(std::int64_t time, const std::vector<unsigned char>& bytes);
 
-    /// Waits until the module has taken everything that was pushed out of its first queues. A record command
-    /// among it has then been carried out, but for a stop.
+    /// Waits until the module has taken everything that was pushed out of its first queues, which it empties
+    /// when the host goes offline.
     void Settle();
 
     /// For sources that can wait: waits a little when more than `chunks` wait for the disk, or when the

@@ -17,6 +17,9 @@ ReceiverError Wrong(const std::string& sentence) {
     return {ExitCode::kUsage, sentence};
 }
 
+/// Bytes in the name of a file or folder (NAME_MAX). The module ends the process over a longer one.
+constexpr std::size_t kLongestName = 255;
+
 /// Options as they stand on the command line, before anything is made of them.
 struct Texts {
     std::string frameRate;
@@ -118,6 +121,9 @@ void CheckTogether(const CLI::App& app, const Options& options) {
     }
     if (options.prefix && options.prefix->find_first_of("/\\") != std::string::npos) {
         throw Wrong("--prefix is the name of one folder and must contain neither / nor \\.");
+    }
+    if (options.prefix && options.prefix->size() > kLongestName) {
+        throw Wrong("--prefix is longer than the 255 bytes that the name of a folder may have.");
     }
 }
 

@@ -388,8 +388,8 @@ void Connection::HandleAudio(AVPacket& packet) {
     packet.pts = stamp ? AudioTime(*stamp, usual) : audio_->expected;
     packet.dts = AV_NOPTS_VALUE;
     audio_->expected = packet.pts + usual;
-    // Not the sound of this connection's pictures.
-    if (packet.pts >= begin_) {
+    // Sound that ends in front of this connection's pictures goes nowhere.
+    if (packet.pts >= begin_ - AudioDuration(*audio_->stream, 0) / 2) {
         audioPath_->Push(packet, ToAudio());
     }
 }

@@ -20,9 +20,9 @@ inline constexpr std::int64_t kAudioClock = 48000;
 struct SourceUnit {
     Medium medium = Medium::kVideo;
     /// When the unit is due, since the beginning of the source: 90000 ticks a second for video and KLV, 48000
-    /// for audio. Never negative, 64 bits wide without wraps, increasing within a medium, continuous over
-    /// whatever the source does to its own clock (wraps, a reconnection, where the time that has passed
-    /// counts).
+    /// for audio. Never negative but for a first audio frame, which may begin half its length before the
+    /// first picture; 64 bits wide without wraps, increasing within a medium, continuous over whatever the
+    /// source does to its own clock (wraps, a reconnection, where the time that has passed counts).
     std::int64_t time = 0;
     /// Video: one access unit as Annex B byte stream, with both parameter sets in front of each IDR frame.
     /// Audio: one AAC LC frame with its ADTS header, 1024 samples at 48 kHz, stereo. KLV: one packet as the

@@ -118,7 +118,7 @@ void UnitAssembler::AddAudio(const CodedAudio& audio) {
 }
 
 void UnitAssembler::PlaceAudio(const CodedAudio& audio) {
-    if (audio.time < 0) {
+    if (audio.time < AudioGrid::kEarliest) {
         return;
     }
     for (;;) {
@@ -178,8 +178,13 @@ void UnitAssembler::EmitKlv(const Klv& klv) {
 }
 
 void UnitAssembler::Finish() {
-    // A last frame or two of audio reach beyond the pictures.
-    Release(grid_.End());
+    // A last frame of audio may begin with the end of the pictures: they may all lie half a frame later.
+    const std::int64_t end = grid_.End();
+    Release(end);
+    // A picture whose audio is missing would not be recorded.
+    while (lastPicture_ >= 0 && audioGrid_.End() <= ToAudio(end)) {
+        EmitSilence(audioGrid_.Append());
+    }
 }
 
 void UnitAssembler::Report() {

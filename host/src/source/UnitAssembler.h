@@ -32,7 +32,8 @@ class UnitAssembler {
     /// Without a time the packet belongs to the last picture.
     void AddKlv(const std::string& packet, std::optional<std::int64_t> time);
     void AddNotice(const std::string& sentence) { batch_.emplace_back(sentence); }
-    /// The source is over: gives out what waits for a further picture.
+    /// The source is over: gives out what waits for a further picture, and silence where the audio ends
+    /// before the last one does.
     void Finish();
 
     /// What was made since the last call.

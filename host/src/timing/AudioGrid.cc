@@ -7,7 +7,7 @@ namespace {
 /// frame, so that a correction does not call for its opposite.
 constexpr std::int64_t kTolerance = AudioGrid::kFrame * 3 / 4;
 
-/// `samples`, not below -512, in frames, to the nearest.
+/// `samples`, not below `kEarliest`, in frames, to the nearest.
 constexpr std::int64_t Frames(std::int64_t samples) {
     return (samples + AudioGrid::kFrame / 2) / AudioGrid::kFrame;
 }
@@ -38,13 +38,13 @@ std::int64_t AudioGrid::Append() {
 }
 
 AudioGrid::Place AudioGrid::Next(std::int64_t time) {
-    if (!begun_ && time >= 0) {
+    if (!begun_ && time >= kEarliest) {
         begun_ = true;
-        next_ = time % kFrame;
+        next_ = time - Frames(time) * kFrame;
     }
     const std::int64_t end = End();
     const std::int64_t tolerance = rejoining_ ? kFrame / 2 : kTolerance;
-    if (time < 0 || time < end - tolerance) {
+    if (time < kEarliest || time < end - tolerance) {
         const bool passedOver = time >= 0 && time < passedUntil_;
         return {passedOver ? Action::kVideoMissing : Action::kOverlap, time};
     }

@@ -19,6 +19,9 @@ namespace receiver {
 class AudioGrid {
  public:
     static constexpr std::int64_t kFrame = 1024;
+    /// The nearest frame to the first picture, which stands at 0, begins half a frame before it at the
+    /// earliest.
+    static constexpr std::int64_t kEarliest = -kFrame / 2;
 
     /// Video is missing from `begin` on for `length` samples.
     void AddVideoGap(std::int64_t begin, std::int64_t length);
@@ -38,7 +41,7 @@ class AudioGrid {
         std::int64_t time = 0;
     };
     /// The place of the next frame, which the source stamps with `time`. The first frame stands where it is,
-    /// and silence leads up to it.
+    /// and silence leads up to it from the frame on that is nearest to 0.
     Place Next(std::int64_t time);
 
     /// The source begins anew: its next frame stands at the place nearest to its time.

@@ -28,31 +28,20 @@ std::ostream& operator<<(std::ostream& out, const Case& parameters) {
     return out << parameters.name;
 }
 
-class RecordRangesTest : public ReceiverFixture, public ::testing::WithParamInterface<Case> {
- protected:
-    /// The pictures of a record from `start` to `stop` seconds: it begins at the first IDR frame at or after
-    /// the start, in chunks of 8, the last of which begins at or before the stop.
-    Range RangeOf(double start, double stop, const receiver::FrameRate& rate) const {
-        const auto firstAt = [&](double seconds) {
-            std::size_t picture = 0;
-            while (static_cast<double>(picture) * static_cast<double>(rate.denominator) <
-                   seconds * static_cast<double>(rate.numerator)) {
-                ++picture;
-            }
-            return picture;
-        };
-        const auto group = static_cast<std::size_t>(GetParam().pictureGroup);
-        Range range;
-        range.first = (firstAt(start) + group - 1) / group * group;
-        const std::size_t stopPicture = firstAt(stop);
-        while (range.first + range.count <= stopPicture) {
-            range.count += 8;
-        }
-        return range;
+/// The first picture at or after `seconds`, of pictures with an IDR frame each `group`.
+std::size_t PictureAt(double seconds, const receiver::FrameRate& rate, int group = 1) {
+    std::size_t picture = 0;
+    while (static_cast<double>(picture) * static_cast<double>(rate.denominator) <
+           seconds * static_cast<double>(rate.numerator)) {
+        ++picture;
     }
-};
+    const auto step = static_cast<std::size_t>(group);
+    return (picture + step - 1) / step * step;
+}
 
-TEST_P(RecordRangesTest, EachFileBeginsAtTheFirstIdrFrameAndEndsWithTheChunkOfTheStop) {
+class RecordRangesTest : public ReceiverFixture, public ::testing::WithParamInterface<Case> {};
+
+TEST_P(RecordRangesTest, EachFileHoldsThePicturesFromTheFirstIdrFrameToTheStop) {
     MaterialOptions options;
     options.rate = GetParam().exactRate;
     options.pictureGroup = GetParam().pictureGroup;
@@ -82,19 +71,20 @@ TEST_P(RecordRangesTest, EachFileBeginsAtTheFirstIdrFrameAndEndsWithTheChunkOfTh
               [](const Range& one, const Range& other) { return one.first < other.first; });
     const double starts[] = {1, 4};
     for (std::size_t i = 0; i < 2; ++i) {
-        const Range commanded = RangeOf(starts[i], starts[i] + 1, expected.rate);
-        EXPECT_EQ(recorded[i].first, commanded.first);
-        EXPECT_EQ(recorded[i].count, commanded.count);
+        const std::size_t first = PictureAt(starts[i], expected.rate, GetParam().pictureGroup);
+        EXPECT_EQ(recorded[i].first, first);
+        EXPECT_EQ(recorded[i].count, PictureAt(starts[i] + 1, expected.rate) - first);
     }
 }
 
 // The second file of the drop-frame case begins behind the minute, where two numbers are left out.
-INSTANTIATE_TEST_SUITE_P(Rates, RecordRangesTest,
-                         ::testing::Values(Case{"Normal25", "25", "25", 10, "10:00:00:00", false},
-                                           Case{"Normal2997Drop", "29.97", "30000/1001", 12, "10:00:57;00",
-                                                false},
-                                           Case{"Fragment50", "50", "50", 7, "23:59:57:00", true}),
-                         ::testing::PrintToStringParamName());
+INSTANTIATE_TEST_SUITE_P(
+    Rates, RecordRangesTest,
+    ::testing::Values(Case{"Normal25", "25", "25", 10, "10:00:00:00", false},
+                      Case{"Normal2997Drop", "29.97", "30000/1001", 12, "10:00:57;00", false},
+                      Case{"Fragment50", "50", "50", 7, "23:59:57:00", true},
+                      Case{"Normal5994", "59.94", "60000/1001", 25, "10:00:00;00", false}),
+    ::testing::PrintToStringParamName());
 
 using RecordCommandsTest = ReceiverFixture;
 
@@ -119,7 +109,25 @@ TEST_F(RecordCommandsTest, ModeOnRecordsFromOnlineToOffline) {
     expected.timecode = *receiver::ParseTimecode("10:00:00:00");
     const Range range = CheckRecording(recordings.front(), sent, expected);
     EXPECT_EQ(range.first, 0U);
-    EXPECT_GE(range.count, 48U);
+    EXPECT_EQ(range.count, 75U);
+}
+
+TEST_F(RecordCommandsTest, AnInterruptEndsTheFileInStep) {
+    MaterialOptions options;
+    options.rate = "30000/1001";
+    options.seconds = 60;
+    options.size = "96x64";
+    const Sent sent(MakeMaterial(folder, options));
+    const auto receiver = Start({"--input", sent.file.string(), "--timecode", "10:00:00;00"});
+    ASSERT_TRUE(receiver->WaitForText(".MP4")) << receiver->AllText();
+    receiver->Signal(SIGINT);
+    ASSERT_EQ(receiver->Wait(), 0) << receiver->AllText();
+    ASSERT_THAT(Recordings(), SizeIs(1));
+    Expected expected;
+    expected.rate = *receiver::ParseFrameRate("29.97");
+    expected.timecode = *receiver::ParseTimecode("10:00:00;00");
+    const Range range = CheckRecording(Recordings().front(), sent, expected);
+    EXPECT_EQ(range.first, 0U);
 }
 
 TEST_F(RecordCommandsTest, SignalsStopAndStartARecord) {

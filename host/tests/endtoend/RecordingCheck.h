@@ -31,6 +31,8 @@ struct Expected {
     bool klv = false;
     /// The audio is the source's own.
     bool audioUntouched = true;
+    /// How far the times of units in the source's container are off, in seconds.
+    double stampSlack = 0.0015;
 };
 
 /// Where a recording lies in what was sent: its first picture with its timecode, and how many there are.

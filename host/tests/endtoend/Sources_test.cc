@@ -123,15 +123,19 @@ TEST_P(SourcesTest, IsRecordedByteForByte) {
     expected.timecode = *receiver::ParseTimecode(GetParam().timecode);
     expected.timecode.dropFrame = expected.rate.dropFrame;
     expected.klv = GetParam().klv;
+    if (GetParam().road == Road::kRtp) {
+        // ffmpeg's two senders begin each at 0, the one of the audio with the frame before the first picture.
+        expected.stampSlack += 1024.0 / 48000;
+    }
     const Range range = CheckRecording(recordings.front(), sent, expected);
     // The table at the end tells the same.
     EXPECT_THAT(outcome.output, HasSubstr(recordings.front().string()));
     EXPECT_THAT(outcome.output, HasSubstr("  " + receiver::ToString(range.timecode) + "  "));
     EXPECT_THAT(outcome.output, EndsWith(" " + std::to_string(range.count) + "\n"));
     if (GetParam().road == Road::kFile) {
-        // All of it, in whole chunks.
+        // All of it.
         EXPECT_EQ(range.first, 0U);
-        EXPECT_EQ(range.count, sent.media.video.size() / 8 * 8);
+        EXPECT_EQ(range.count, sent.media.video.size());
     } else {
         EXPECT_EQ(range.first, 0U);
         EXPECT_GE(static_cast<double>(range.count), 1.5 * expected.rate.timecodeFrames);

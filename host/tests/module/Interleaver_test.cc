@@ -96,13 +96,16 @@ TEST(Interleaver, AMediumThatHasFallenSilentHoldsUpTwoSecondsAtTheMost) {
     EXPECT_EQ(TakeAll(interleaver), " v0");
 }
 
-TEST(Interleaver, AtTheEndEverythingComes) {
+TEST(Interleaver, AtTheEndEverythingComesInItsOrder) {
     Interleaver interleaver;
-    PutVideo(interleaver, 0);
-    PutVideo(interleaver, 40);
-    PutAudio(interleaver, 60);
-    interleaver.Finish();
-    EXPECT_EQ(TakeAll(interleaver), " v0 v40 a60");
+    interleaver.Put(Unit(Medium::kAudio, 48));
+    interleaver.Put(Unit(Medium::kVideo, 0));
+    interleaver.Put(Unit(Medium::kVideo, 180));
+    std::string media;
+    while (const auto unit = interleaver.TakeRest()) {
+        media += unit->medium == Medium::kVideo ? 'v' : 'a';
+    }
+    EXPECT_EQ(media, "vav");
 }
 
 // 15 ticks of 90000 are 8 of 48000; in milliseconds all three units are at 0.

@@ -33,16 +33,17 @@ std::vector<std::string> Files(ModuleLog& log) {
     return files;
 }
 
-TEST(ModuleLog, ANormalFileIsToldWithItsFolderAndClosedByItsOwnLine) {
+// The line of its end comes before the file is complete.
+TEST(ModuleLog, ANormalFileIsToldWithItsFolderAndClosedByTheEndOfItsWriter) {
     ModuleLog log;
     Trace("output path = \"/srv/rec\\20261121\\CAM (1)\".");
     Trace("ST: out_filename = \"10_20_30_12.MP4\"");
     Operator("OP: FILE CREATE. (10_20_30_12.MP4)");
     EXPECT_THAT(Files(log), ElementsAre("opened /srv/rec/20261121/CAM (1)/10_20_30_12.MP4"));
     Operator("OP: FILE CLOSE. (10_20_30_12.MP4)");
-    EXPECT_THAT(Files(log), ElementsAre("closed /srv/rec/20261121/CAM (1)/10_20_30_12.MP4"));
-    Trace("start. event_id = 6.");
     EXPECT_THAT(Files(log), IsEmpty());
+    Trace("start. event_id = 6.");
+    EXPECT_THAT(Files(log), ElementsAre("closed /srv/rec/20261121/CAM (1)/10_20_30_12.MP4"));
 }
 
 // No line of its own tells of the end of a fragmented file.

@@ -102,6 +102,7 @@ TEST(Options, EachOneReachesItsPlace) {
 }
 
 TEST(Options, EachErrorNamesItsOptionInOneSentence) {
+    const std::string longName(256, 'p');
     const struct {
         std::vector<const char*> arguments;
         const char* part;
@@ -138,6 +139,7 @@ TEST(Options, EachErrorNamesItsOptionInOneSentence) {
         {{"--password-file", "/no/such/file"}, "--password-file /no/such/file"},
         {{"--password", "p", "--password-file", "f"}, "--password-file"},
         {{"--prefix", "a/b"}, "--prefix"},
+        {{"--prefix", longName.c_str()}, "255 bytes"},
     };
     for (const auto& one : cases) {
         EXPECT_THAT(Refusal(one.arguments), HasSubstr(one.part)) << one.arguments[0];

@@ -117,6 +117,26 @@ TEST_F(UnitAssemblerTest, TheGapBeforeANewConnectionIsNoLoss) {
     EXPECT_EQ(Made(), "a480256 v903600");
 }
 
+TEST_F(UnitAssemblerTest, AudioThatEndsBeforeTheLastPictureIsFilledUpToItsEnd) {
+    assembler_.Begin(true);
+    Audio(-512);
+    Picture(0);
+    Picture(3600);
+    EXPECT_EQ(Made(), "a-512 v0 v3600");
+    // The pictures end at sample 3840.
+    assembler_.Finish();
+    EXPECT_EQ(Made(), "s512 s1536 s2560 s3584");
+    assembler_.Finish();
+    EXPECT_EQ(Made(), "");
+}
+
+TEST_F(UnitAssemblerTest, NothingIsFilledUpWithoutAPicture) {
+    assembler_.Begin(true);
+    Audio(0);
+    assembler_.Finish();
+    EXPECT_EQ(Made(), "a0");
+}
+
 TEST_F(UnitAssemblerTest, KlvIsStampedWithItsTimeOrThatOfTheLastPicture) {
     assembler_.Begin(true);
     assembler_.AddKlv("early", 0);

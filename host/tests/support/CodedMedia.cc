@@ -139,11 +139,15 @@ CodedMedia ReadCodedMedia(const std::filesystem::path& file) {
     CodedMedia media;
     const Packet packet(av_packet_alloc());
     while (av_read_frame(input.get(), packet.get()) >= 0) {
-        const AVCodecParameters& codec = *input->streams[packet->stream_index]->codecpar;
+        const AVStream& stream = *input->streams[packet->stream_index];
+        const AVCodecParameters& codec = *stream.codecpar;
+        const double time = static_cast<double>(packet->pts) * av_q2d(stream.time_base);
         if (codec.codec_type == AVMEDIA_TYPE_VIDEO) {
+            media.videoTimes.push_back(time);
             const bool lengths = codec.extradata_size > 0 && codec.extradata[0] == 1;
             media.video.push_back(makePicture(bytesOf(*packet), lengths));
         } else if (codec.codec_type == AVMEDIA_TYPE_AUDIO) {
+            media.audioTimes.push_back(time);
             media.audio.push_back(withoutAdtsHeader(bytesOf(*packet)));
         } else if (packet->stream_index == dataStream) {
             media.data.push_back(bytesOf(*packet));

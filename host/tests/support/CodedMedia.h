@@ -25,6 +25,9 @@ struct CodedMedia {
     std::vector<Bytes> audio;
     /// Samples of the last data stream: KLV packets of a source, metadata units of a recording.
     std::vector<Bytes> data;
+    /// When pictures and AAC frames are presented, in seconds.
+    std::vector<double> videoTimes;
+    std::vector<double> audioTimes;
 };
 
 /// Throws std::runtime_error when the file cannot be opened.

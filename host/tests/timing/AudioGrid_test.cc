@@ -39,10 +39,19 @@ TEST(AudioGrid, AGapIsFilled) {
     EXPECT_EQ(grid.Next(3072 + 5), (Place{Action::kAccept, 3072}));
 }
 
-TEST(AudioGrid, FramesFromBeforeTheBeginningAreLeftOut) {
+// With the first frame at most half its length before or behind the first picture, sound and picture begin in
+// step.
+TEST(AudioGrid, FramesFromLongerBeforeTheBeginningThanHalfAFrameAreLeftOut) {
     AudioGrid grid;
-    EXPECT_EQ(grid.Next(-1).action, Action::kOverlap);
-    EXPECT_EQ(grid.Next(1023), (Place{Action::kAccept, 1023}));
+    EXPECT_EQ(grid.Next(-513).action, Action::kOverlap);
+    EXPECT_EQ(grid.Next(-512), (Place{Action::kAccept, -512}));
+    EXPECT_EQ(grid.Next(512), (Place{Action::kAccept, 512}));
+}
+
+TEST(AudioGrid, SilenceLeadsUpToAFirstFrameThatIsMoreThanHalfAFrameLate) {
+    AudioGrid grid;
+    EXPECT_EQ(grid.Next(513), (Place{Action::kFill, -511}));
+    EXPECT_EQ(grid.Next(513), (Place{Action::kAccept, 513}));
 }
 
 TEST(AudioGrid, AFrameThatOverlapsIsLeftOut) {
