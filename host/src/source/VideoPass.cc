@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cstring>
 
+#include "common/ReceiverError.h"
 #include "source/FormatWatch.h"
 
 namespace receiver {
@@ -10,6 +11,22 @@ namespace {
 
 std::span<const unsigned char> BytesOf(const AVPacket& packet) {
     return {packet.data, static_cast<std::size_t>(packet.size)};
+}
+
+/// A movie file tells the size of a parameter set in 16 bits (ISO/IEC 14496-15 5.3.3.1).
+constexpr std::size_t kLargestParameterSet = 65535;
+
+/// Throws `ReceiverError` (`kSourceUnsuitable`).
+void CheckParameterSets(const std::vector<NalUnit>& units) {
+    for (const NalUnit& unit : units) {
+        const bool isSet = unit.type == kNalSequenceParameterSet || unit.type == kNalPictureParameterSet;
+        if (isSet && unit.bytes.size() > kLargestParameterSet) {
+            throw ReceiverError(ExitCode::kSourceUnsuitable,
+                                "the video has a parameter set of " + std::to_string(unit.bytes.size()) +
+                                    " bytes, and a file holds none above 65535: set the encoder to parameter "
+                                    "sets without padding");
+        }
+    }
 }
 
 }  // namespace
@@ -26,7 +43,9 @@ VideoPass::VideoPass(const AVCodecParameters& parameters)
     libav::Check(av_bsf_init(filter_.get()), "read the parameter sets of the video");
     const AVCodecParameters& stream = *filter_->par_out;
     if (stream.extradata != nullptr) {
-        sets_.Learn(NalUnits({stream.extradata, static_cast<std::size_t>(stream.extradata_size)}));
+        const auto units = NalUnits({stream.extradata, static_cast<std::size_t>(stream.extradata_size)});
+        CheckParameterSets(units);
+        sets_.Learn(units);
     }
     parser_ = std::make_unique<PictureParser>(stream);
     timecodes_ = std::make_unique<TimecodeReader>(stream);
@@ -87,6 +106,7 @@ void VideoPass::Push(const AVPacket& packet, const PictureSink& sink) {
     CodedPicture picture;
     picture.time = packet.pts;
     picture.keyFrame = Contains(units, kNalIdr);
+    CheckParameterSets(units);
     sets_.Learn(units);
     if (picture.keyFrame) {
         CheckFormat(stream);

@@ -13,6 +13,7 @@ namespace receiver {
 /// already is so is not changed by a byte, and not copied.
 class VideoPass final : public VideoPathInterface {
  public:
+    /// Throws `ReceiverError` (`kSourceUnsuitable`) for parameter sets that no file can hold, as `Push` does.
     explicit VideoPass(const AVCodecParameters& parameters);
 
     bool IsStart(const AVPacket& packet) override;
