@@ -6,8 +6,10 @@
 #include <chrono>
 #include <exception>
 #include <filesystem>
+#include <memory>
 #include <optional>
 #include <utility>
+#include <vector>
 
 #include "OutputFolder.h"
 #include "QxRegistry.h"

@@ -147,7 +147,8 @@ void AddSourceOptions(CLI::App& app, Options& options, Texts& texts) {
         ->type_name("SECONDS")
         ->capture_default_str()
         ->group(group);
-    app.add_flag("--no-reconnect", texts.noReconnect, "End when the source is lost instead of trying again")
+    app.add_flag("--no-reconnect", texts.noReconnect,
+                 "End when the source is not there or is lost instead of waiting for it")
         ->group(group);
     app.add_flag("--transcode", options.source.transcode,
                  "Convert video that cannot be recorded as it is: reordered pictures, another codec or rate")
@@ -258,10 +259,6 @@ void AddProgramOptions(CLI::App& app, Options& options) {
 }
 
 }  // namespace
-
-bool IsLive(const std::string& url) {
-    return url.ends_with(".sdp") || (url.find("://") != std::string::npos && !url.starts_with("file://"));
-}
 
 std::optional<Options> ParseOptions(int argc, const char* const* argv, std::string& text) {
     Options options;

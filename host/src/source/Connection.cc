@@ -54,6 +54,7 @@ Connection::Connection(std::unique_ptr<Input> input, const SourceOptions& option
     DecideVideo(options, before);
     DecideAudio();
     ReadTimecodeTag();
+    connected_ = Clock::now();
     description_.summary += klv_.empty() ? "" : ", KLV";
 }
 
@@ -375,7 +376,13 @@ void Connection::HandleVideo(AVPacket& packet) {
 
 void Connection::ReplayEarly() {
     replaying_ = true;
-    for (auto waiting = std::exchange(early_, {}); const auto& early : waiting) {
+    auto waiting = std::exchange(early_, {});
+    // With its first sound a picture is complete, and what belongs to it has to be there by then.
+    std::stable_partition(waiting.begin(), waiting.end(), [this](const auto& early) {
+        const Stream* const stream = StreamOf(*early);
+        return stream != nullptr && (!audio_ || stream != &*audio_);
+    });
+    for (const auto& early : waiting) {
         Handle(*early);
     }
     replaying_ = false;

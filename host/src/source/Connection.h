@@ -21,6 +21,8 @@ namespace receiver {
 /// One opened input, from its packets to what an assembler takes.
 class Connection {
  public:
+    using Clock = std::chrono::steady_clock;
+
     /// Chooses streams, looks at the first second, and decides what passes and what is converted. `before`:
     /// what the source was in an earlier connection and may be again, or null. Throws `ReceiverError`
     /// (`kSourceUnsuitable`) when it cannot be recorded, `SourceLost` and `Stopped`.
@@ -40,6 +42,10 @@ class Connection {
     bool Pump();
     /// Ends the connection, all but the input, and gives that away.
     static std::unique_ptr<Input> End(std::unique_ptr<Connection> connection);
+    /// The wait for the source is over: what still comes was held by the libraries.
+    bool Flushing() const { return input_->TimedOut(); }
+    /// When the input answered.
+    Clock::time_point Opened() const { return input_->Rtp() ? connected_ : input_->Opened(); }
     /// Byte at which the last packet stood in the input, -1 when not known.
     std::int64_t Position() const { return position_; }
 
@@ -47,8 +53,6 @@ class Connection {
     std::uint64_t Damaged() const;
 
  private:
-    using Clock = std::chrono::steady_clock;
-
     /// A stream of the input that is used.
     struct Stream {
         const AVStream* stream = nullptr;
@@ -89,6 +93,7 @@ class Connection {
     AudioSink ToAudio();
 
     std::unique_ptr<Input> input_;
+    Clock::time_point connected_;
     SourceDescription description_;
     std::vector<std::string> notices_;
     Stream video_;

@@ -9,19 +9,17 @@
 
 #include "common/Credentials.h"
 #include "common/ReceiverError.h"
+#include "source/Address.h"
 
 namespace receiver {
 namespace {
 
 /// What finding out may take beyond the time-out: the libraries look at up to 7 seconds of a stream.
 constexpr double kAnalysis = 10;
+/// Packets that may come when a wait is over.
+constexpr int kLongestDrain = 100;
 /// Bytes in front of a picture in which its program's tables stand: ten packets of a transport stream.
 constexpr std::int64_t kTables = 1880;
-
-std::string SchemeOf(const std::string& url) {
-    const std::size_t end = url.find("://");
-    return end == std::string::npos ? "" : url.substr(0, end);
-}
 
 bool EndsWith(const std::string& text, const std::string& end) {
     return text.size() >= end.size() && text.compare(text.size() - end.size(), end.size(), end) == 0;
@@ -37,6 +35,8 @@ void SetOptions(const std::string& url, libav::Options& options) {
         options.Set("buffer_size", "4194304");
     } else if (scheme == "rtsp" || scheme == "rtsps") {
         options.Set("rtsp_flags", "prefer_tcp");
+    } else if (IsRtmpListener(url)) {
+        options.Set("listen", "1");
     } else if (EndsWith(url, ".sdp")) {
         options.Set("protocol_whitelist", "file,http,https,tcp,tls,udp,rtp,srtp,crypto,data");
         options.Set("buffer_size", "4194304");
@@ -62,6 +62,16 @@ void ForgetWildStamps(AVPacket& packet, AVRational base) {
     }
 }
 
+/// False for what no sender mends: an address that is written wrongly or cannot be had, and a refusal.
+bool MayPass(int result) {
+    constexpr std::array<int, 9> kFinal{AVERROR(ENOENT),          AVERROR(EACCES),
+                                        AVERROR(EISDIR),          AVERROR(EADDRINUSE),
+                                        AVERROR(EADDRNOTAVAIL),   AVERROR_HTTP_UNAUTHORIZED,
+                                        AVERROR_HTTP_FORBIDDEN,   AVERROR_PROTOCOL_NOT_FOUND,
+                                        AVERROR_DEMUXER_NOT_FOUND};
+    return std::find(kFinal.begin(), kFinal.end(), result) == kFinal.end();
+}
+
 /// Adds what the libraries said, which often tells more than their error number.
 std::string Reason(int result) {
     const std::string text = libav::ErrorText(result);
@@ -71,8 +81,9 @@ std::string Reason(int result) {
 
 }  // namespace
 
-Input::Input(const std::string& url, double timeout, std::shared_ptr<Interrupt> interrupt, bool (*stop)())
-    : url_(url), timeout_(timeout), interrupt_(std::move(interrupt)), stop_(stop) {
+Input::Input(const std::string& url, double timeout, double patience, std::shared_ptr<Interrupt> interrupt,
+             bool (*stop)())
+    : url_(url), timeout_(timeout), patience_(patience), interrupt_(std::move(interrupt)), stop_(stop) {
     Open();
     stop_ = nullptr;
     const bool seekable = format_->pb != nullptr && (format_->pb->seekable & AVIO_SEEKABLE_NORMAL) != 0;
@@ -121,18 +132,19 @@ void Input::Open() {
     libav::Options options;
     SetOptions(url_, options);
     libav::ForgetErrors();
-    Expect(timeout_);
+    Expect(patience_);
     // Frees the context when it fails.
     const int result = avformat_open_input(&format, url_.c_str(), nullptr, options.Get());
     if (result < 0) {
         FailOpening(result);
     }
     format_.reset(format);
+    opened_ = std::chrono::steady_clock::now();
     FindStreams();
 }
 
 void Input::FindStreams() {
-    Expect(timeout_ + kAnalysis);
+    Expect(patience_ + kAnalysis);
     const int result = avformat_find_stream_info(format_.get(), nullptr);
     if (result < 0) {
         FailOpening(result);
@@ -185,7 +197,7 @@ void Input::FailOpening(int result) {
     const std::string said = WithoutCredentials(libav::LastError());
     std::string sentence;
     if (Expired() || result == AVERROR(ETIMEDOUT)) {
-        sentence = "nothing came from " + shown + " within " + Seconds(timeout_) +
+        sentence = "nothing came from " + shown + " within " + Seconds(patience_) +
                    ": check that it sends, and that no firewall stands between";
     } else if (result == AVERROR(ENOENT)) {
         sentence = "there is no file " + shown;
@@ -207,9 +219,9 @@ void Input::FailOpening(int result) {
     } else if (result == AVERROR_INVALIDDATA) {
         sentence = shown + " carries nothing that is known as audio and video: " + Reason(result);
     } else if (result == AVERROR_PROTOCOL_NOT_FOUND || result == AVERROR_DEMUXER_NOT_FOUND) {
-        sentence =
-            shown +
-            " begins with a scheme that is not known: udp, srt, rtsp, http and https are, and .sdp files";
+        sentence = shown +
+                   " begins with a scheme that is not known: udp, srt, rtsp, rtmp, http and https are, and "
+                   ".sdp files";
     } else if (said.find("resolve") != std::string::npos || said.find("getaddrinfo") != std::string::npos) {
         sentence = "there is no host with the name in " + shown + ": " + said;
     } else if (SchemeOf(url_) == "srt" && result == AVERROR(EIO)) {
@@ -220,12 +232,17 @@ void Input::FailOpening(int result) {
     } else {
         sentence = shown + " cannot be opened: " + Reason(result);
     }
+    if (IsLive(url_) && MayPass(result)) {
+        throw SourceAbsent(sentence);
+    }
     throw ReceiverError(ExitCode::kSourceUnavailable, sentence);
 }
 
 bool Input::Read(AVPacket& packet) {
     libav::ForgetErrors();
-    const int result = Expired() ? AVERROR_EXIT : av_read_frame(format_.get(), &packet);
+    // What the libraries still hold when a wait is over comes out before they tell.
+    const bool over = Expired() && ++drained_ > kLongestDrain;
+    const int result = over ? AVERROR_EXIT : av_read_frame(format_.get(), &packet);
     if (interrupt_->Stopped() || (stop_ != nullptr && stop_())) {
         throw Stopped();
     }

@@ -7,6 +7,7 @@
 #include <stdexcept>
 #include <string>
 
+#include "common/ReceiverError.h"
 #include "source/Interrupt.h"
 #include "source/Libav.h"
 
@@ -18,6 +19,13 @@ class SourceLost : public std::runtime_error {
     using std::runtime_error::runtime_error;
 };
 
+/// A live source is not there, and may be later.
+class SourceAbsent : public ReceiverError {
+ public:
+    explicit SourceAbsent(const std::string& sentence)
+        : ReceiverError(ExitCode::kSourceUnavailable, sentence) {}
+};
+
 /// The wait for the source was ended from outside.
 class Stopped : public std::runtime_error {
  public:
@@ -27,10 +35,12 @@ class Stopped : public std::runtime_error {
 /// An opened address: what libavformat knows of it, and its packets.
 class Input {
  public:
-    /// Opens `url` and finds out what it carries. `timeout`: seconds that it may take to answer, and later
-    /// seconds that may pass between two calls of `Alive`. `stop` may be null; it is asked until this
-    /// returns. Throws `ReceiverError` (`kSourceUnavailable`), and `Stopped`.
-    Input(const std::string& url, double timeout, std::shared_ptr<Interrupt> interrupt, bool (*stop)());
+    /// Opens `url` and finds out what it carries. `patience`: seconds that it may take to answer. `timeout`:
+    /// seconds that may pass later between two calls of `Alive`. `stop` may be null; it is asked until this
+    /// returns. Throws `ReceiverError` (`kSourceUnavailable`), of it `SourceAbsent` where a later attempt may
+    /// succeed, and `Stopped`.
+    Input(const std::string& url, double timeout, double patience, std::shared_ptr<Interrupt> interrupt,
+          bool (*stop)());
 
     AVFormatContext& Format() { return *format_; }
     /// Finds out anew what the source carries, from byte `position` of the connection on where that can still
@@ -47,6 +57,10 @@ class Input {
     void Alive() { Expect(timeout_); }
     /// A file, here or on a server, that is paced when it is read; else the source sets the pace.
     bool Recorded() const { return recorded_; }
+    /// A wait was over: what `Read` still gives came before.
+    bool TimedOut() const { return timedOut_; }
+    /// When the address answered.
+    std::chrono::steady_clock::time_point Opened() const { return opened_; }
     /// Packets come by RTP, which stamps pictures with the time when they are shown and nothing else.
     bool Rtp() const { return rtp_; }
 
@@ -68,6 +82,7 @@ class Input {
 
     const std::string url_;
     const double timeout_;
+    const double patience_;
     const std::shared_ptr<Interrupt> interrupt_;
     /// Null once the source is open.
     bool (*stop_)();
@@ -75,6 +90,8 @@ class Input {
     std::atomic<std::chrono::steady_clock::rep> deadline_{0};
     /// A wait was over. The libraries may give out what they still hold before they tell.
     std::atomic<bool> timedOut_{false};
+    int drained_ = 0;
+    std::chrono::steady_clock::time_point opened_;
     std::set<int> asked_;
     bool recorded_ = false;
     bool rtp_ = false;

@@ -110,7 +110,7 @@ struct SourceOptions {
     double speed = 1.0;
     /// Converts video that cannot be recorded as it is.
     bool transcode = false;
-    /// Goes on trying when a network source is lost.
+    /// Goes on trying while a network source is not there yet, and when it is lost.
     bool reconnect = true;
     /// "test:" and conversions. A rate and a size that are not set are 25 and 1280x720 for "test:" and those
     /// of the source for a conversion.
@@ -125,9 +125,10 @@ struct SourceOptions {
     double timeout = 5.0;
 };
 
-/// Opens a source. Throws `ReceiverError` with `kSourceUnavailable` or `kSourceUnsuitable`. `listener` must
-/// live as long as the source. `stop` may be null; while the source is being opened, it is asked from time to
-/// time, and true ends the attempt with a null pointer.
+/// Opens a source. A live one that is not there yet is waited for, told once and then every minute, unless
+/// `reconnect` is off. Throws `ReceiverError` with `kSourceUnavailable` or `kSourceUnsuitable`. `listener`
+/// must live as long as the source. `stop` may be null; while the source is being opened, it is asked from
+/// time to time, and true ends the attempt with a null pointer.
 std::unique_ptr<SourceInterface> OpenSource(const SourceOptions& options, SourceListenerInterface& listener,
                                             bool (*stop)());
 
