@@ -6,6 +6,7 @@
 
 #include "common/Credentials.h"
 #include "source/RtpStamps.h"
+#include "source/StreamChoice.h"
 #include "source/Summary.h"
 #include "source/VideoCheck.h"
 #include "source/VideoConverter.h"
@@ -49,7 +50,7 @@ std::int64_t Back(std::int64_t usual) {
 Connection::Connection(std::unique_ptr<Input> input, const SourceOptions& options,
                        const SourceDescription* before)
     : input_(std::move(input)), packet_(libav::NewPacket()) {
-    Choose();
+    Choose(options);
     LookAhead();
     DecideVideo(options, before);
     DecideAudio();
@@ -58,14 +59,14 @@ Connection::Connection(std::unique_ptr<Input> input, const SourceOptions& option
     description_.summary += klv_.empty() ? "" : ", KLV";
 }
 
-void Connection::Choose() {
+void Connection::Choose(const SourceOptions& options) {
     AVFormatContext& format = input_->Format();
-    const int video = av_find_best_stream(&format, AVMEDIA_TYPE_VIDEO, -1, -1, nullptr, 0);
-    if (video < 0 || (format.streams[video]->disposition & AV_DISPOSITION_ATTACHED_PIC) != 0) {
-        throw ReceiverError(ExitCode::kSourceUnsuitable, "'" + WithoutCredentials(format.url) +
-                                                             "' carries no video: a recording needs one");
+    const StreamChoice choice = ChooseStreams(format, options);
+    if (!choice.notice.empty()) {
+        notices_.push_back(choice.notice);
     }
-    const int audio = av_find_best_stream(&format, AVMEDIA_TYPE_AUDIO, -1, video, nullptr, 0);
+    const int video = choice.video;
+    const int audio = choice.audio;
     for (unsigned int index = 0; index < format.nb_streams; ++index) {
         AVStream* const stream = format.streams[index];
         if (static_cast<int>(index) == video) {
@@ -165,6 +166,10 @@ void Connection::DecideVideo(const SourceOptions& options, const SourceDescripti
     passes_ = reason.empty() && (!converted || (encoding.frameRate == description_.frameRate &&
                                                 encoding.width == description_.width &&
                                                 encoding.height == description_.height));
+    if (findings.interlaced) {
+        notices_.emplace_back(passes_ ? "the video is interlaced and is recorded as such"
+                                      : "the video is interlaced and becomes progressive");
+    }
     if (passes_) {
         videoPath_ = std::make_unique<VideoPass>(parameters);
     } else {

@@ -65,7 +65,7 @@ class Connection {
         bool joined = false;
     };
 
-    void Choose();
+    void Choose(const SourceOptions& options);
     void LookAhead();
     /// True when each medium that came has been tied to the sender's clock.
     bool Reported() const;

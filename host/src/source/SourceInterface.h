@@ -121,6 +121,10 @@ struct SourceOptions {
     std::uint32_t bitrate = 8000;
     /// Frames from one IDR frame to the next; 0 is the number of frames in a second.
     std::uint32_t pictureGroup = 0;
+    /// Of several programs or streams: the program's number, and which of its videos and audios, from 1.
+    std::optional<std::uint32_t> program;
+    std::optional<std::uint32_t> video;
+    std::optional<std::uint32_t> audio;
     /// Seconds without a unit after which a network source counts as lost.
     double timeout = 5.0;
 };
