@@ -2,7 +2,7 @@
 
 add_library(clipfile_warnings INTERFACE)
 target_compile_options(clipfile_warnings INTERFACE
-    -Wall -Wextra -Wpedantic -Wconversion -Wshadow -Werror
+    -Wall -Wextra -Wpedantic -Wconversion -Wshadow $<$<BOOL:${CLIPFILE_WERROR}>:-Werror>
     # The locks are annotated; clang checks what the annotations say. Its -Wconversion takes in changes of sign, which
     # GCC's does not: one meaning of a flag for both.
     "$<$<CXX_COMPILER_ID:Clang>:-Wthread-safety;-Wno-sign-conversion>"
@@ -26,9 +26,15 @@ if(_flags)
 endif()
 target_link_options(clipfile_sanitizers INTERFACE ${_flags})
 
-# Log lines carry source paths; they are relative to the tree whatever folder it was built in.
+# Log lines carry source paths; they are relative to the tree whatever folder it was built in. A compiler cache makes
+# them relative to the build folder, and another clone finds its objects only where no option names the tree.
 add_library(clipfile_paths INTERFACE)
-target_compile_options(clipfile_paths INTERFACE "-fmacro-prefix-map=${PROJECT_SOURCE_DIR}/=")
+if(CLIPFILE_COMPILER_CACHE)
+    file(RELATIVE_PATH _root "${CMAKE_BINARY_DIR}" "${PROJECT_SOURCE_DIR}")
+    target_compile_options(clipfile_paths INTERFACE "-fmacro-prefix-map=${_root}=")
+else()
+    target_compile_options(clipfile_paths INTERFACE "-fmacro-prefix-map=${PROJECT_SOURCE_DIR}/=")
+endif()
 
 # Everything that a target of ours takes over: warnings, sanitizers, source paths, threads.
 add_library(clipfile_common INTERFACE)

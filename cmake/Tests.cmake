@@ -3,12 +3,19 @@
 find_package(GTest REQUIRED)
 include(GoogleTest)
 
+# What sanitizers look at is optimised as far as their manuals advise. Optimising the tests as well would take longer than
+# running them.
+set(_test_optimisation)
+if(CLIPFILE_SANITIZE)
+    set(_test_optimisation -O0)
+endif()
+
 if(CLIPFILE_TEST_PCH)
     add_library(clipfile_test_pch OBJECT "${CMAKE_CURRENT_LIST_DIR}/test_pch.cc")
     target_link_libraries(clipfile_test_pch PRIVATE clipfile_common GTest::gmock)
     # As CMake compiles programs: headers precompiled for a library would be refused.
     set_target_properties(clipfile_test_pch PROPERTIES POSITION_INDEPENDENT_CODE OFF)
-    target_compile_options(clipfile_test_pch PRIVATE -fPIE)
+    target_compile_options(clipfile_test_pch PRIVATE -fPIE ${_test_optimisation})
     target_precompile_headers(clipfile_test_pch PRIVATE
         <gmock/gmock.h> <gtest/gtest.h>
         <algorithm> <array> <atomic> <condition_variable> <cstdint> <cstdio> <cstring> <deque>
@@ -16,21 +23,25 @@ if(CLIPFILE_TEST_PCH)
 endif()
 
 # clipfile_add_test(NAME SOURCES x_test.cc ... [LIBRARIES ...] [TIMEOUT seconds] [ENVIRONMENT A=b ...] [SERIAL]
-#                   [FILTER pattern] [UNSANITIZED] [SINGLE_THREADED])
+#                   [FILTER pattern] [UNSANITIZED] [SINGLE_THREADED] [ONLY_IF variable])
 #
 # Registers the sources, builds the program NAME from them and enters each of its cases with ctest. A *_test.cc
 # that no call names fails the configure step (clipfile_check_tests_registered). SERIAL is for measurements of a
 # whole process (memory, open files); everything else runs in parallel. Of a FILTER, in the form of --gtest_filter, only
 # the cases that it matches are entered. UNSANITIZED leaves the program out of builds with sanitizers: what it watches
 # is another process, or memory that a sanitizer changes. SINGLE_THREADED leaves it out of builds with the thread
-# sanitizer, which would find nothing in it and takes minutes to build it.
+# sanitizer, which would find nothing in it and takes minutes to build it. ONLY_IF leaves it out where the variable is
+# false, since what it tests is not built there.
 function(clipfile_add_test name)
-    cmake_parse_arguments(ARG "SERIAL;UNSANITIZED;SINGLE_THREADED" "TIMEOUT;FILTER" "SOURCES;LIBRARIES;ENVIRONMENT" ${ARGN})
+    cmake_parse_arguments(ARG "SERIAL;UNSANITIZED;SINGLE_THREADED" "TIMEOUT;FILTER;ONLY_IF" "SOURCES;LIBRARIES;ENVIRONMENT" ${ARGN})
     if(ARG_UNPARSED_ARGUMENTS OR NOT ARG_SOURCES)
         message(FATAL_ERROR "clipfile_add_test(${name}): SOURCES are missing or '${ARG_UNPARSED_ARGUMENTS}' is not understood.")
     endif()
     list(TRANSFORM ARG_SOURCES PREPEND "${CMAKE_CURRENT_SOURCE_DIR}/" OUTPUT_VARIABLE paths)
     set_property(GLOBAL APPEND PROPERTY CLIPFILE_REGISTERED_TESTS ${paths})
+    if(ARG_ONLY_IF AND NOT ${ARG_ONLY_IF})
+        return()
+    endif()
     if(ARG_UNSANITIZED AND CLIPFILE_SANITIZE)
         return()
     endif()
@@ -48,7 +59,7 @@ function(clipfile_add_test name)
     target_link_libraries(${name} PRIVATE clipfile_common ${ARG_LIBRARIES} GTest::gmock_main)
     # GCC 12, when it optimises, sees writes past the end wherever vectors and strings are put together in one expression,
     # as tests like to do.
-    target_compile_options(${name} PRIVATE
+    target_compile_options(${name} PRIVATE ${_test_optimisation}
         "$<$<AND:$<CXX_COMPILER_ID:GNU>,$<VERSION_LESS:$<CXX_COMPILER_VERSION>,13>>:-Wno-array-bounds;-Wno-stringop-overflow;-Wno-stringop-overread>")
     if(CLIPFILE_TEST_PCH)
         target_precompile_headers(${name} REUSE_FROM clipfile_test_pch)

@@ -23,7 +23,12 @@ struct QxInputOutputDisconnectionRequest {
 };
 
 /// The host's control notifications. The order of the operations is an ABI. The host delivers them one at a
-/// time, from any of its threads; each runs on the calling thread. A result of 0 means success.
+/// time, from any of its threads, between a successful `QxModuleInterface::Initialize` and `Uninitialize`;
+/// each runs on the calling thread. A result of 0 means success, 3 that nothing was done.
+///
+/// Going offline and disconnecting wait for every recording to be written and closed. See
+/// `QxModuleInterface` for the locks that the host must not hold, and `QxModuleHostInterface` for calls from
+/// inside its operations.
 class QxModuleNotifyInterface {
  public:
     virtual std::uint32_t NotifyInputOutputConnectRequest(const QxInputOutputConnectRequest* request) = 0;

@@ -110,6 +110,8 @@ TEST_F(FaultsTest, WithoutReconnectionALostSourceEndsTheRun) {
 TEST_F(FaultsTest, TwoReceiversOnOneFolderKeepTheirFilesApart) {
     const auto options = Small({"--seconds", "3", "--timecode", "10:00:00:00"});
     const auto one = Start(options);
+    // Both look for a free name before they take it: the second one must not look in the same moment.
+    ASSERT_TRUE(one->WaitForText("writing ")) << one->AllText();
     const auto other = Start(options);
     EXPECT_EQ(one->Wait(), 0) << one->AllText();
     EXPECT_EQ(other->Wait(), 0) << other->AllText();

@@ -70,6 +70,7 @@ MbxStatus MbxBuildDec3(MbxContext* context, const MbxOptions* options, const Mbx
     return MbxMeasureBox(context, options, box, MbxWriteDec3Payload);
 }
 
+// Contract: one-substream. Whatever `num_ind_sub` says.
 // ETSI TS 102 366 F.6 EC3SpecificBox, of one independent substream
 MbxStatus MbxWriteDec3Payload(MbxContext* context, MbxFile* file, uint64_t position, const MbxDec3Box* box,
                               uint64_t* written, uint64_t* accumulated) {

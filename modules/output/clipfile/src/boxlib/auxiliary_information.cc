@@ -103,6 +103,7 @@ MbxStatus MbxWriteSaioPayload(MbxContext* context, const MbxScratch* scratch, Mb
     const auto fill = [&](uint8_t* data) {
         MbxRowBytes rows = {data};
         return visitOffsets(params.offsets, box->entryCount, [&](const MbxAuxOffset& entry) {
+            // Contract: low-offset-fails-late. Measuring counts it as 0.
             if (file != nullptr && entry.offset < params.base) return MBX_ERR_OVERFLOW;
             MbxAppend(&rows, relativeOffset(entry, params.base), width);  // unsigned int(32 or 64) offset
             return MBX_OK;

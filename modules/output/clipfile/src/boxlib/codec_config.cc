@@ -85,6 +85,7 @@ MbxStatus MbxWriteAvcCPayload(MbxContext* context, MbxFile* file, uint64_t posit
     const MbxAvcConfig& config = *box->config;
     uint32_t sequenceSets = 0;
     uint32_t pictureSets = 0;
+    // Contract: sets-counted-at-build. The 32nd was taken.
     MBX_TRY(MbxListCountUpTo(&config.sequenceSets, 31, &sequenceSets));
     MBX_TRY(MbxListCountUpTo(&config.pictureSets, UINT8_MAX, &pictureSets));
 
@@ -181,6 +182,7 @@ MbxStatus MbxFreeHvcC(MbxContext* context, MbxHvcCBox* box) {
 MbxStatus MbxWriteParameterSets(MbxContext* context, MbxFile* file, const MbxList<MbxParameterSet>* sets,
                                 uint64_t* accumulated) {
     for (const MbxParameterSet* set = sets->first; set != nullptr; set = set->next) {
+        // Contract: long-set-is-internal. Not an overflow, as too many sets are.
         if (set->bytes.size > UINT16_MAX) return MBX_ERR_INTERNAL;
         MbxBytes length;
         MbxBeginBytes(context, &length);

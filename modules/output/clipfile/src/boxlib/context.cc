@@ -38,6 +38,7 @@ MbxStatus MbxDestroyContext(MbxContext* context) {
     return MBX_OK;
 }
 
+// Contract: quota-unused. Nothing in the module sets one, or allocates in class 2.
 MbxStatus MbxSetQuota(MbxContext* context, uint32_t class_, uint64_t quota, uint32_t percent,
                       uint64_t minimum) {
     if (context == nullptr || class_ != 0 || percent > 100) return MBX_ERR_INVALID_ARG;
@@ -79,6 +80,7 @@ void* MbxAlloc(MbxContext* context, uint32_t class_, uint64_t size) {
 void MbxFree(MbxContext* context, void* pointer) {
     if (context == nullptr || pointer == nullptr) return;
     uint8_t* block = static_cast<uint8_t*>(pointer) - kHeaderSize;
+    // Contract: damaged-blocks-leak. Nothing fails.
     if (!isValidHeader(block)) return;
     const uint32_t class_ = block[3];
     const uint64_t total = MbxGet32(block + 4);

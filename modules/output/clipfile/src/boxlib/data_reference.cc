@@ -177,6 +177,15 @@ MbxStatus MbxFreeUrn(MbxContext* context, MbxDataEntryBox* box) {
 
 // ---- The records ----
 
+namespace {
+
+// A location without text, which to an `url ` is the same as none: the media is in this file.
+bool isTerminatorAlone(const MbxDataEntryParams& params) {
+    return params.location != nullptr && params.locationLength != 0 && *params.location == 0;
+}
+
+}  // namespace
+
 MbxStatus MbxAddDataEntry(MbxContext* context, MbxList<MbxDataEntry>* list, const MbxDataEntryParams* params,
                           uint32_t* index) {
     if (MbxAnyNull(context, list, params, index)) return MBX_ERR_INVALID_ARG;
@@ -185,6 +194,7 @@ MbxStatus MbxAddDataEntry(MbxContext* context, MbxList<MbxDataEntry>* list, cons
     const auto fill = [&](MbxDataEntry* entry) {
         entry->code = params->code;
         if (isUrn) MBX_TRY(MbxBufferAssignText(context, &entry->name, params->name, params->nameLength));
+        if (!isUrn && isTerminatorAlone(*params)) return MBX_OK;
         return MbxBufferAssign(context, 1, &entry->location, params->location, params->locationLength);
     };
     MBX_TRY(MbxMakeListItem(context, list, fill, MbxFreeDataEntry));

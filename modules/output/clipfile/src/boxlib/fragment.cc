@@ -6,7 +6,7 @@ MbxStatus MbxShiftFragmentOffsets(MbxContext* context, const MbxOptions* options
                                   uint32_t fragment, uint32_t track, uint32_t chunk, int64_t delta) {
     if (MbxAnyNull(context, options, movie)) return MBX_ERR_INVALID_ARG;
     const MbxStatus status = MbxApplyOffsetDelta(context, 1, track, fragment, chunk, delta, &movie->tracks);
-    // Offsets that count from `moof` may lie behind it.
+    // Contract: offset-overflow-forgiven. Offsets that count from `moof` may lie behind it.
     return status == MBX_ERR_OVERFLOW && options->base_offset_mode != 0 ? MBX_OK : status;
 }
 
@@ -22,17 +22,16 @@ MbxStatus MbxSetFragmentBase(MbxContext* context, MbxMovie* movie, uint32_t frag
 
 namespace {
 
-// Takes the defaults that nobody gave from the first segment with samples. A track without samples gets the
-// same as one whose samples say nothing, and learns later.
+// Takes the defaults that nobody gave from the segment that has just been sealed, which is the first one with
+// samples: one before it would have given them.
+// Contract: late-track-defaults. A track without samples gets the same as one whose samples say nothing, and
+// learns later: a `moov` that is written already says otherwise.
 void deriveDefaults(MbxTrack* track) {
     if (track->defaultsDone != 0) return;
     MbxSampleDefaults derived = {1, 0, 0, MBX_SAMPLE_NON_SYNC};
-    for (const MbxSampleSegment* segment = track->segments.first; segment != nullptr;
-         segment = segment->next) {
-        if (segment->sizes.count == 0) continue;
-        derived = MbxSegmentDefaults(segment, derived);
+    if (track->sealedSegment->sizes.count != 0) {
+        derived = MbxSegmentDefaults(track->sealedSegment, derived);
         track->defaultsDone = 1;
-        break;
     }
     const auto isGiven = [&](MbxSampleDefault which) { return (track->defaultsMask >> which & 1) != 0; };
     if (!isGiven(MBX_DEFAULT_DESCRIPTION)) track->defaults.descriptionIndex = derived.descriptionIndex;

@@ -98,7 +98,8 @@ MbxStatus MbxCreateMovie(MbxSession* session, uint32_t timescale);
 
 // Append a track with handler `vide`, `soun`, `tmcd` or `meta`; `track` receives its number.
 // MBX_ERR_INVALID_ARG for a timescale of 0, a language of 32768 or more, an identifier outside 1 to 639 and
-// 1024 to 63487 or in use, or an unknown `enable_mode` (read for video only).
+// 1024 to 63487 or in use, or an unknown `enable_mode` (read for video only). MBX_ERR_BAD_STATE after
+// MbxSealFirstFragment: fragments count alike in all tracks.
 MbxStatus MbxAddVideoTrack(MbxSession* session, const MbxTrackParams* params, uint32_t* track);
 MbxStatus MbxAddSoundTrack(MbxSession* session, const MbxTrackParams* params, uint32_t* track);
 MbxStatus MbxAddTimecodeTrack(MbxSession* session, const MbxTrackParams* params, uint32_t* track);
@@ -185,8 +186,14 @@ MbxStatus MbxSetSignedOffsets(MbxSession* session, uint32_t track, uint32_t sign
 MbxStatus MbxAddSample(MbxSession* session, uint32_t track, const MbxSampleInfo* sample,
                        uint32_t randomAccess);
 
-// Closes the track's open chunk. MBX_ERR_BAD_STATE for a track that does not exist or has none open.
+// Closes the track's open chunk. MBX_ERR_BAD_STATE for a track that has none open.
 MbxStatus MbxEndChunk(MbxSession* session, uint32_t track);
+
+// Sets which defaults the `tfhd` of each of the track's fragments carries even where they equal those of
+// `trex`: description index, duration, size, flags, a word each as in MbxTrackParams::defaultsForced. For a
+// track that has no sample yet when `moov` is written: that `trex` knows no defaults, and who reads the file
+// before `moov` is written again needs them from elsewhere. MBX_ERR_INVALID_ARG for a word above 1.
+MbxStatus MbxForceDefaults(MbxSession* session, uint32_t track, const uint32_t forced[4]);
 
 // Adds `delta` to chunk offsets of what `moov` reports: of one track or with 0 of all, of one chunk or with 0
 // of all. MBX_ERR_OVERFLOW when an offset wrapped, after all are shifted; MBX_ERR_NOT_FOUND for a missing

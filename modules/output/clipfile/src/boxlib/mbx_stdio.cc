@@ -73,6 +73,7 @@ void* stdioMemset(void*, void* pointer, int byte, uint64_t count) {
 
 }  // namespace
 
+// Contract: open-word-unused. The second argument.
 MbxStatus MbxOpenFile(const char* path, uint32_t, MbxFile** file) {
     if (path == nullptr || file == nullptr) return MBX_ERR_INVALID_ARG;
     auto* cell = static_cast<MbxFile*>(std::malloc(sizeof(MbxFile)));
@@ -120,6 +121,7 @@ MbxStatus MbxStdioRead(MbxFile* file, void* buffer, uint64_t size, uint64_t* cou
 MbxStatus MbxStdioWrite(MbxFile* file, const void* buffer, uint64_t size, uint64_t* count) {
     if (!isOpen(file) || buffer == nullptr || count == nullptr) return MBX_ERR_INVALID_ARG;
     *count = 0;
+    // Contract: one-write-below-2-gib. One call moves 2^31 - 1 bytes at the most.
     if (size > INT32_MAX) return MBX_ERR_IO;
     *count = std::fwrite(buffer, 1, size, file->stream);
     return *count == size ? MBX_OK : MBX_ERR_IO;

@@ -33,6 +33,7 @@ struct MbxSession;
 // measures.
 struct MbxFile;
 
+// Contract: callbacks-without-caller. `read`, `tell`, `size`, `strncmp`, `strncpy`, `memcmp`, `memmove`.
 // The host's half of the library: every file operation, allocation and memory primitive goes through this
 // table. Every entry but `user_data` must be set. The I/O entries return MBX_OK or a status.
 struct MbxCallbacks {

@@ -4,6 +4,7 @@
 
 // ---- moov ----
 
+// Contract: built-in-another-order. `pssh` before `USMT`, tracks before `mvhd`; files have it otherwise.
 MbxStatus MbxBuildMoov(MbxContext* context, const MbxOptions* options, const MbxMovie* movie,
                        MbxMoovBox* box) {
     if (MbxAnyNull(context, options, movie, box)) return MBX_ERR_INVALID_ARG;

@@ -123,6 +123,7 @@ MbxStatus MbxWriteLevaPayload(MbxContext* context, MbxFile* file, uint64_t posit
                               uint64_t* written, uint64_t* accumulated) {
     uint32_t levels = 0;
     MBX_TRY(MbxListCount(box->levels, &levels));
+    // Contract: leva-count-cut. Checked against 16 bits, written with 8.
     if (levels > UINT16_MAX) return MBX_ERR_OVERFLOW;
     MbxBytes bytes;
     MbxBeginBytes(context, &bytes);

@@ -179,6 +179,7 @@ bool shiftOffsets(uint64_t* offsets, uint32_t count, int64_t delta) {
     for (uint32_t i = 0; i < count; i++) {
         const uint64_t shifted = offsets[i] + addend;
         wrapped |= delta < 0 ? shifted > offsets[i] : shifted < offsets[i];
+        // Contract: shift-wraps-and-goes-on. Told at the end, with all offsets shifted.
         offsets[i] = shifted;
     }
     return wrapped != 0;

@@ -115,7 +115,7 @@ MbxStatus MbxAddAuxSize(MbxContext* context, MbxAuxSizeList* auxSizes, uint8_t s
 
 namespace {
 
-// The track by its number; one that does not exist is MBX_ERR_BAD_STATE to the operations on samples.
+// The track by its number; to one who adds a sample, one that does not exist is MBX_ERR_BAD_STATE.
 MbxStatus findTrack(const MbxSession* session, uint32_t index, MbxTrack** track) {
     if (session->movie == nullptr) return MBX_ERR_BAD_STATE;
     MBX_TRY(MbxListAt(session->movie->tracks.first, index, track));
@@ -174,6 +174,7 @@ MbxStatus addIndexEntry(MbxContext* context, const MbxMovie* movie, uint32_t tra
 
 }  // namespace
 
+// Contract: sample-of-no-track. Bad state, where other operations do not find the track.
 MbxStatus MbxAddSample(MbxContext* context, MbxSession* session, uint32_t trackIndex,
                        const MbxSampleInfo* sample, uint32_t startsFragmentIndexEntry) {
     if (context == nullptr || session == nullptr || sample == nullptr) return MBX_ERR_INVALID_ARG;
@@ -221,7 +222,7 @@ MbxStatus MbxAddSample(MbxContext* context, MbxSession* session, uint32_t trackI
 MbxStatus MbxEndChunk(MbxContext* context, MbxSession* session, uint32_t trackIndex) {
     if (context == nullptr || session == nullptr) return MBX_ERR_INVALID_ARG;
     MbxTrack* track = nullptr;
-    MBX_TRY(findTrack(session, trackIndex, &track));
+    MBX_TRY(MbxRequireTrack(session, trackIndex, &track));
     if (track->segments.last == nullptr) return MBX_ERR_BAD_STATE;
     return MbxCloseChunk(context, &track->segments.last->chunks);
 }

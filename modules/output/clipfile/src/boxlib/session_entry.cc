@@ -90,6 +90,7 @@ MbxStatus MbxAddAvcPps(MbxSession* session, uint32_t track, uint32_t entry, cons
     return MbxAddAvcPps(session->context, found, data, size);
 }
 
+// Contract: operations-for-others. The module records AVC alone.
 MbxStatus MbxSetHvcConfig(MbxSession* session, uint32_t track, uint32_t entry, const MbxHvcCValues* params) {
     MbxSampleEntry* found = nullptr;
     MBX_TRY(requireEntry(session, track, entry, &found));

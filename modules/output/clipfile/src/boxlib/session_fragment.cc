@@ -3,6 +3,17 @@
 #include "boxlib/fragment_index.h"
 #include "boxlib/session.h"
 
+MbxStatus MbxForceDefaults(MbxSession* session, uint32_t track, const uint32_t forced[4]) {
+    if (MbxAnyNull(session, forced)) return MBX_ERR_INVALID_ARG;
+    MbxTrack* found = nullptr;
+    MBX_TRY(MbxRequireTrack(session, track, &found));
+    for (uint32_t i = 0; i < 4; i++) {
+        if (forced[i] > 1) return MBX_ERR_INVALID_ARG;
+    }
+    for (uint32_t i = 0; i < 4; i++) found->defaultsForced[i] = forced[i];
+    return MBX_OK;
+}
+
 MbxStatus MbxShiftFragmentOffsets(MbxSession* session, uint32_t fragment, uint32_t track, uint32_t chunk,
                                   int64_t delta) {
     MBX_TRY(MbxRequireMovie(session));

@@ -91,6 +91,7 @@ MbxStatus MbxSetMovieTimes(MbxSession* session, uint32_t track, uint32_t selecto
                             modification);
 }
 
+// Contract: operations-for-others. The module reorders nothing.
 MbxStatus MbxSetSignedOffsets(MbxSession* session, uint32_t track, uint32_t signedOffsets) {
     MbxTrack* found = nullptr;
     MBX_TRY(MbxRequireTrack(session, track, &found));

@@ -85,6 +85,7 @@ MbxStatus MbxWriteStandaloneHeader(MbxContext* context, uint32_t form, MbxFile* 
                                    uint64_t* accumulated) {
     if (context == nullptr || payloadSize >= UINT64_MAX - 15) return MBX_ERR_INVALID_ARG;
     MbxOptions options = {};
+    // Contract: header-forms-renumbered. 1 and 2 change places.
     switch (form) {
         case 0:
             options.box_size_mode = 0;
@@ -174,6 +175,7 @@ MbxStatus MbxWriteZeros(MbxContext* context, MbxFile* file, uint64_t position, u
                                    nullptr);
         }
     }
+    // Contract: zeros-count-the-last-write. Not their sum, unlike when measuring.
     MbxFree(context, zeros);
     return status == MBX_OK ? MbxReportBytes(last, written, accumulated) : status;
 }

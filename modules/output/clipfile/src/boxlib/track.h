@@ -47,8 +47,9 @@ constexpr uint32_t MBX_USAGE_TYPE = 10;
 constexpr uint16_t MBX_LANGUAGE_UNDETERMINED = 0x55C4;
 
 // Appends a track to the movie; `trackIndex` receives the new number of tracks. MBX_ERR_INVALID_ARG for a
-// null argument, a timescale of 0 or a language of 32768 or more where the handler takes them, an identifier
-// outside the ordinary ranges or in use, or an unknown enable_mode. MBX_ERR_INTERNAL for an unknown handler.
+// null argument, a timescale of 0 or a language of 32768 or more (of handlers too that take neither), an
+// identifier outside the ordinary ranges or in use, or an unknown enable_mode. MBX_ERR_INTERNAL for an
+// unknown handler, MBX_ERR_BAD_STATE once the movie is sealed.
 MbxStatus MbxCreateTrack(MbxContext* context, MbxMovie* movie, const MbxHandlerRequest* request,
                          uint32_t* trackIndex);
 

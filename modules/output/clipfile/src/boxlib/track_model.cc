@@ -33,6 +33,7 @@ constexpr HandlerRow row(uint32_t handler, const char (&name)[size], uint32_t en
             timescale, hasSize, layer, volume,     hasUsageEntry};
 }
 
+// Contract: tracks-without-operation. `subt`, `odsm`, `BKDT`, `PKDT`, `GRAP`.
 constexpr HandlerRow kHandlers[] = {
     row(MbxCode("vide"), "Video Media Handler", kNoFixedMode, MbxCode("vmhd"), 20, Timescale::kParameter,
         true, 0, 0, true),
@@ -41,6 +42,7 @@ constexpr HandlerRow kHandlers[] = {
     row(MbxCode("subt"), "", 1, MbxCode("sthd"), 20, Timescale::kParameter, true, -1, 0, false),
     row(MbxCode("meta"), "Timed Metadata Media Handler", 16, MbxCode("nmhd"), 20, Timescale::kParameter,
         false, 0, 0, true),
+    // Contract: timecode-with-nmhd. Not `gmhd`.
     row(MbxCode("tmcd"), "Time Code Media Handler", 1, MbxCode("nmhd"), 20, Timescale::kParameter, false, 0,
         0, false),
     row(MbxCode("odsm"), "ObjectDescriptor Media Handler", 1, MbxCode("nmhd"), 0, Timescale::kMovie, false, 0,
@@ -52,6 +54,7 @@ constexpr HandlerRow kHandlers[] = {
         true),
 };
 
+// Contract: track-id-ranges. 1 to 639 and 1024 to 63487.
 bool isOrdinaryTrackId(uint32_t id) {
     return (id >= 1 && id <= MBX_TRACK_ID_LOW_END) ||
            (id >= MBX_TRACK_ID_HIGH_BEGIN && id <= MBX_TRACK_ID_HIGH_END);
@@ -144,6 +147,7 @@ MbxStatus fillTrack(MbxContext* context, const MbxMovie* movie, const HandlerRow
     track->auxEnabled = params.auxEnabled;
     track->trickEnabled = params.trickEnabled;
     fillFragmentDefaults(params, track);
+    // Contract: edts-without-edits. Written even with no edit in it.
     if (params.noEditList == 0) MBX_TRY(MbxNew(context, &track->editList));
     if (params.noUsageEntry == 0 && handler.hasUsageEntry) MBX_TRY(addUsageItem(context, track, enableMode));
     return MBX_OK;
@@ -177,6 +181,7 @@ MbxStatus rescaleSigned(int64_t value, uint64_t divisor, uint64_t multiplier, in
 
 }  // namespace
 
+// Contract: enable-modes. Seven numbers for three sets of flags.
 MbxStatus MbxEnableModeFlags(uint32_t enableMode, uint32_t* flags) {
     switch (enableMode) {
         case 0:
@@ -207,14 +212,15 @@ MbxStatus MbxCreateTrack(MbxContext* context, MbxMovie* movie, const MbxHandlerR
     if (handler == nullptr) return MBX_ERR_INTERNAL;
 
     const MbxTrackParams& params = request->params;
-    if (handler->timescale == Timescale::kParameter && params.timescale == 0) return MBX_ERR_INVALID_ARG;
-    if (params.language > 0x7FFF) return MBX_ERR_INVALID_ARG;
+    if (params.timescale == 0 || params.language > 0x7FFF) return MBX_ERR_INVALID_ARG;
     if (!isOrdinaryTrackId(params.trackId) || isTrackIdInUse(movie, params.trackId))
         return MBX_ERR_INVALID_ARG;
     const uint32_t enableMode =
         handler->enableMode == kNoFixedMode ? params.enable_mode : handler->enableMode;
     uint32_t flags = 0;
     MBX_TRY(MbxEnableModeFlags(enableMode, &flags));
+    // It would have no segment for the fragments before it, and count its own from the wrong number.
+    if (movie->fragmentCount != 0) return MBX_ERR_BAD_STATE;
 
     MBX_TRY(MbxMakeListItem(
         context, &movie->tracks,
@@ -288,9 +294,11 @@ MbxStatus MbxAddEdit(MbxContext* context, const MbxOptions* options, const MbxMo
     MBX_TRY(MbxRescale(media, mediaTimescale, movieTimescale, &duration));
     const MbxSampleSegment* segment = track->segments.first;
     if (fromZero == 0 && segment != nullptr && segment->earliestPresentation != MBX_NO_PRESENTATION) {
+        // Contract: edit-in-movie-time. The standard counts this field in media time.
         MBX_TRY(rescaleSigned(segment->earliestPresentation, mediaTimescale, movieTimescale, &mediaTime));
     }
     if (options->time_version_mode == 0 || options->time_version_mode == 2) {
+        // Contract: edit-test-is-wider. One wide value is enough here.
         if (duration > UINT32_MAX || mediaTime > INT32_MAX || mediaTime < INT32_MIN) return MBX_ERR_BAD_STATE;
     }
 

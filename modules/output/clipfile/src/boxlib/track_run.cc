@@ -60,6 +60,7 @@ MbxStatus computeDataOffset(const MbxOptions* options, uint64_t offset, uint64_t
     const uint64_t distance = offset >= base ? offset - base : base - offset;
     const uint64_t limit = offset >= base ? 0x7FFFFFFF : 0x80000000;
     if (options->base_offset_mode == 0 && distance > limit) return MBX_ERR_OVERFLOW;
+    // Contract: data-offset-cut. Silently, in the other modes.
     *dataOffset = static_cast<int32_t>(static_cast<uint32_t>(offset - base));
     return MBX_OK;
 }

@@ -63,6 +63,7 @@ MbxStatus writeItem(MbxContext* context, MbxFile* file, uint64_t position, bool 
     MBX_TRY(MbxShortTotalSize(context, item->data.size + 4, &size));
     // unsigned int(16) size, unsigned int(32) type
     MBX_TRY(MbxWriteShortHeader(context, file, position, size, item->type, nullptr, &count));
+    // Contract: mtdf-has-no-flag. The bit stays 0.
     const uint32_t flag = withFlag ? item->flag & 1U : 0;
     MbxBytes bytes;
     MbxBeginBytes(context, &bytes);

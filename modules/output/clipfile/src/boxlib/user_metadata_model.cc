@@ -46,6 +46,7 @@ MbxStatus MbxPutMetadataItem(MbxContext* context, MbxList<MbxMetadataItem>* list
         item->type = params->type;
         item->language = params->language;
         item->encoding = params->encoding;
+        // Contract: replacing-releases-first. Without memory the old data is gone.
         MBX_TRY(MbxBufferAssign(context, 0, &item->data, params->data, params->dataSize));
         item->flag = params->flag;
         return MBX_OK;
@@ -57,6 +58,7 @@ MbxStatus MbxPutMetadataItem(MbxContext* context, MbxList<MbxMetadataItem>* list
 MbxStatus MbxSetMetadataTrackTimes(MbxMetadataTrack* track, uint32_t selector, uint64_t creation,
                                    uint64_t modification) {
     if ((selector & MBX_TIME_METADATA_CREATION) != 0) {
+        // Contract: metadata-times-narrow. In every mode.
         if (creation > UINT32_MAX) return MBX_ERR_BAD_STATE;
         track->header.creationTime = creation;
     }

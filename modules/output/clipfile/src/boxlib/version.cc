@@ -23,12 +23,14 @@ MbxStatus chooseLoosely(const MbxOptions* options, bool any, bool refused, uint3
             *version = 1;
             return MBX_OK;
         default:
+            // Contract: unknown-time-mode. The other two choosers take it for mode 2.
             return MBX_ERR_INTERNAL;
     }
 }
 
 }  // namespace
 
+// Contract: loose-time-version. Refused only when all three are wide; one that is cut passes.
 MbxStatus MbxChooseTimeVersion(const MbxOptions* options, uint64_t creation, uint64_t modification,
                                uint64_t duration, uint32_t* version) {
     if (options == nullptr || version == nullptr) return MBX_ERR_INVALID_ARG;
@@ -36,6 +38,7 @@ MbxStatus MbxChooseTimeVersion(const MbxOptions* options, uint64_t creation, uin
                          isWide(creation) && isWide(modification) && isWide(duration), version);
 }
 
+// Contract: loose-edit-version. Refused only when durations and times are wide.
 MbxStatus MbxChooseEditVersion(const MbxOptions* options, const MbxEdit* first, uint32_t* version) {
     if (options == nullptr || version == nullptr) return MBX_ERR_INVALID_ARG;
     bool wideDuration = false;
@@ -50,6 +53,7 @@ MbxStatus MbxChooseEditVersion(const MbxOptions* options, const MbxEdit* first, 
 MbxStatus MbxChooseIndexVersion(const MbxOptions* options, uint64_t time, uint64_t offset,
                                 uint32_t* version) {
     if (options == nullptr || version == nullptr) return MBX_ERR_INVALID_ARG;
+    // Contract: tfra-version-1. Mode 0 is not "as mode 2" here.
     if (options->time_version_mode == 0) {
         *version = 1;
         return MBX_OK;

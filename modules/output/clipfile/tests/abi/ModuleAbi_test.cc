@@ -205,6 +205,7 @@ TEST_F(ModuleAbi, WholeOrderRunsAgainAfterUnloadAndReload) {
     EXPECT_FALSE(LoadedModule::IsLoaded());
     const LoadedModule again;
     ASSERT_NE(again.Get(), nullptr);
+    again.StartLog();
     RunWholeOrder(*again.Get(), false);
 }
 
@@ -234,6 +235,7 @@ TEST_F(ModuleAbi, LibraryCanBeUnloadedAndLoadedAfterAFailedInitialize) {
     EXPECT_FALSE(LoadedModule::IsLoaded());
     const LoadedModule again;
     ASSERT_NE(again.Get(), nullptr);
+    again.StartLog();
     RunWholeOrder(*again.Get(), false);
 }
 
@@ -380,6 +382,110 @@ TEST_F(ModuleAbi, FieldsOfAUnitArrive) {
     interfaces.stream->PushMeta(MakeMeta(8589938192, 1040, true));
     EXPECT_TRUE(WaitUntil(hasLogged("OP: REC FLAG OFF -> ON.")));
     EXPECT_TRUE(WaitUntil(hasLogged("OP: REC START. 10:11:12:13. RTPTS = 8589938192. -> -1")));
+    EXPECT_TRUE(module_->Uninitialize());
+}
+
+/// The lines of the log at priority 5 since `log`, by their text.
+int CountWarnings(const LogTail& log, const std::string& text) {
+    int count = 0;
+    const std::string all = log.Text();
+    for (std::size_t at = all.find(text); at != std::string::npos; at = all.find(text, at + 1)) {
+        const std::size_t begin = all.rfind('\n', at) + 1;
+        count += all.substr(begin, at - begin).find("] 5 ") != std::string::npos ? 1 : 0;
+    }
+    return count;
+}
+
+/// A host that calls everything before, after or between its lives, each breach one line.
+TEST_F(ModuleAbi, CallsOutsideALifeChangeNothingAndAreLoggedOnce) {
+    Interfaces interfaces;
+    interfaces.Get(*module_);
+    RecordingHost failing;
+    const auto breach = [&] {
+        const LogTail log;
+        const int threads = CountThreads();
+        EXPECT_TRUE(module_->Uninitialize());
+        EXPECT_TRUE(module_->Execute());
+        const auto unit = MakeMeta(0, 0, true);
+        for (int i = 0; i < 60; ++i) {
+            interfaces.stream->PushVideo(unit);
+            interfaces.stream->PushAudio(unit);
+            interfaces.stream->PushMeta(unit);
+        }
+        EXPECT_TRUE(IsReleased(unit));
+        QxInputOutputConnectRequest connect;
+        QxInputOutputDisconnectionRequest disconnect;
+        disconnect.connectionKind = 1;
+        EXPECT_EQ(interfaces.notify->NotifyInputOutputConnectRequest(&connect), 3U);
+        EXPECT_EQ(interfaces.notify->NotifyModuleConnectionRequestReply(nullptr), 3U);
+        EXPECT_EQ(interfaces.notify->NotifyInputOutputDisconnectionRequest(&disconnect), 3U);
+        EXPECT_EQ(interfaces.notify->NotifySetPropertiesRequest(nullptr), 3U);
+        interfaces.notify->NotifyOnlineStatus();
+        interfaces.notify->NotifyOfflineStatus();
+        EXPECT_EQ(CountThreads(), threads);
+        ASSERT_TRUE(
+            WaitUntil([&] { return CountWarnings(log, "NotifyOfflineStatus is called without") == 1; }));
+        EXPECT_EQ(CountWarnings(log, "uninitialize is called without initialize."), 1);
+        EXPECT_EQ(CountWarnings(log, "execute is called without initialize."), 1);
+        EXPECT_EQ(CountWarnings(log, "unit is pushed without initialize."), 1);
+        EXPECT_EQ(CountWarnings(log, "Request is called without initialize."), 3);
+        EXPECT_EQ(CountWarnings(log, "RequestReply is called without initialize."), 1);
+        EXPECT_EQ(CountWarnings(log, "NotifyOnlineStatus is called without initialize."), 1);
+        EXPECT_EQ(CountWarnings(log, " without initialize."), 9);
+    };
+    breach();
+    RunWholeOrder(*module_, false);
+    breach();
+    EXPECT_FALSE(module_->Initialize(&failing));
+    breach();
+    EXPECT_THAT(failing.Statuses(), ElementsAre(Pair(7, 2)));
+    RunWholeOrder(*module_, false);
+}
+
+TEST_F(ModuleAbi, ASecondInitializeLeavesTheRunningLifeAsItIs) {
+    const LogTail log;
+    RecordingHost host;
+    ConfigureIdle(host);
+    const int before = CountThreads();
+    ASSERT_TRUE(module_->Initialize(&host));
+    RecordingHost other;
+    EXPECT_TRUE(module_->Initialize(&other));
+    EXPECT_EQ(CountThreads(), before + kModuleThreads);
+    EXPECT_THAT(other.Questions(), IsEmpty());
+    Interfaces interfaces;
+    interfaces.Get(*module_);
+    interfaces.notify->NotifyOnlineStatus();
+    interfaces.notify->NotifyOfflineStatus();
+    EXPECT_THAT(host.Statuses(), ElementsAre(Pair(4, 0), Pair(6, 26), Pair(3, 0)));
+    EXPECT_THAT(other.Statuses(), IsEmpty());
+    EXPECT_TRUE(module_->Uninitialize());
+    EXPECT_TRUE(WaitUntil([&] { return CountThreads() == before; })) << CountThreads();
+    EXPECT_TRUE(WaitUntil([&] { return CountWarnings(log, "initialize is called twice.") == 1; }));
+}
+
+TEST_F(ModuleAbi, UnitsAreIgnoredBehindAStatus7OfTheModuleWhateverTheHostHolds) {
+    RecordingHost host;
+    host.texts["-outputPath"] = "/proc/no/such/folder";
+    host.texts["-outputMode"] = "on";
+    host.numbers["-encodedFPS"] = 25000;
+    ASSERT_TRUE(module_->Initialize(&host));
+    Interfaces interfaces;
+    interfaces.Get(*module_);
+    interfaces.notify->NotifyOnlineStatus();
+    // Nothing but audio: the cache passes its limit before a chunk was made, which is final.
+    std::uint64_t k = 0;
+    ASSERT_TRUE(WaitUntil([&] {
+        interfaces.stream->PushAudio(MakeAudio(k * 1024, k * 1024 / 48));
+        ++k;
+        return host.GetStatus() == 7;
+    }));
+    host.SetStatus(0, 0);
+    const auto unit = MakeVideo(0, 0);
+    interfaces.stream->PushVideo(unit);
+    interfaces.stream->PushMeta(unit);
+    EXPECT_TRUE(IsReleased(unit));
+    interfaces.notify->NotifyOfflineStatus();
+    EXPECT_THAT(host.Statuses(), ElementsAre(Pair(4, 0), Pair(6, 24), Pair(7, 26), Pair(0, 0)));
     EXPECT_TRUE(module_->Uninitialize());
 }
 

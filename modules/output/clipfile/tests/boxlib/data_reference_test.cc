@@ -128,6 +128,22 @@ TEST_F(DataReferenceTest, UrlWithAnEmptyLocationHasFlags1AndAPayloadOfFourBytes)
     EXPECT_BYTES(write(), Hex("0000001C 'dref' 00000000 00000001  0000000C 'url ' 00000001"));
 }
 
+TEST_F(DataReferenceTest, UrlWithALocationOfATerminatorAloneCountsAsEmpty) {
+    for (const uint64_t length : {1U, 2U}) {
+        const MbxDataEntryParams params = {MbxCode("url "), nullptr, 0, "\0x", length};
+        ASSERT_EQ(MbxAddDataEntry(context, &list, &params, &index), MBX_OK);
+    }
+    EXPECT_BYTES(write(), Hex("00000028 'dref' 00000000 00000002"
+                              "0000000C 'url ' 00000001"
+                              "0000000C 'url ' 00000001"));
+}
+
+TEST_F(DataReferenceTest, UrnWithALocationOfATerminatorAloneStoresIt) {
+    const MbxDataEntryParams params = {MbxCode("urn "), "n", 1, "", 1};
+    ASSERT_EQ(MbxAddDataEntry(context, &list, &params, &index), MBX_OK);
+    EXPECT_BYTES(write(), Hex("0000001F 'dref' 00000000 00000001  0000000F 'urn ' 00000000 'n' 00 00"));
+}
+
 TEST_F(DataReferenceTest, UrlWithALocationHasFlags0AndATerminator) {
     ASSERT_EQ(add(MbxCode("url "), nullptr, "a/b"), MBX_OK);
     EXPECT_BYTES(write(), Hex("00000020 'dref' 00000000 00000001  00000010 'url ' 00000000 'a/b' 00"));

@@ -118,6 +118,20 @@ TEST_F(FragmentTest, ATrackWithoutSamplesLearnsItsDefaultsLaterAndOnce) {
     EXPECT_EQ(defaultsOf(tracks[0]), (Words4{1, 6, 5, 0}));
 }
 
+TEST_F(FragmentTest, SealingLooksAtTheSegmentThatItSealsAlone) {
+    // A track can stay empty for a whole recording: what was sealed before must not be walked again.
+    addTrack();
+    ASSERT_EQ(sealFirst(), MBX_OK);
+    ASSERT_EQ(seal(), MBX_OK);
+    for (MbxSampleSegment* segment : {tracks[0].segments.first, tracks[0].sealedSegment}) {
+        segment->sizes.uniformSize = 77;
+        segment->sizes.count = 1;
+    }
+    addChunk(1, 0, sample(5, 6, 1));
+    ASSERT_EQ(seal(), MBX_OK);
+    EXPECT_EQ(defaultsOf(tracks[0]), (Words4{1, 6, 5, 0}));
+}
+
 TEST_F(FragmentTest, DefaultsGivenByTheCallerAreLeftAlone) {
     addTrack();
     tracks[0].defaults = {11, 12, 13, 14};

@@ -52,10 +52,15 @@ TEST_F(SampleStoreTest, NullArgumentsAreInvalid) {
     EXPECT_EQ(MbxEndChunk(context, nullptr, 1), MBX_ERR_INVALID_ARG);
 }
 
-TEST_F(SampleStoreTest, AMissingTrackOrMovieIsBadStateAndTrackZeroInvalid) {
+TEST_F(SampleStoreTest, AMissingTrackIsBadStateToASampleAndNotFoundToTheEndOfAChunk) {
     EXPECT_EQ(add(sample(), 2), MBX_ERR_BAD_STATE);
+    EXPECT_EQ(endChunk(2), MBX_ERR_NOT_FOUND);
+    EXPECT_EQ(track->segments.first, nullptr);
+}
+
+TEST_F(SampleStoreTest, AMissingMovieIsBadStateAndTrackZeroInvalid) {
     EXPECT_EQ(add(sample(), 0), MBX_ERR_INVALID_ARG);
-    EXPECT_EQ(endChunk(2), MBX_ERR_BAD_STATE);
+    EXPECT_EQ(endChunk(0), MBX_ERR_INVALID_ARG);
     session.movie = nullptr;
     EXPECT_EQ(add(sample()), MBX_ERR_BAD_STATE);
     EXPECT_EQ(endChunk(), MBX_ERR_BAD_STATE);

@@ -57,6 +57,8 @@ class SessionFragmentTest : public SessionTest {
 };
 
 TEST_F(SessionFragmentTest, EveryOperationRefusesANullSession) {
+    const uint32_t forced[4] = {};
+    EXPECT_EQ(MbxForceDefaults(nullptr, 1, forced), MBX_ERR_INVALID_ARG);
     EXPECT_EQ(MbxShiftFragmentOffsets(nullptr, 1, 0, 0, 1), MBX_ERR_INVALID_ARG);
     EXPECT_EQ(MbxSetFragmentBase(nullptr, 1, 0), MBX_ERR_INVALID_ARG);
     EXPECT_EQ(MbxSealFirstFragment(nullptr), MBX_ERR_INVALID_ARG);
@@ -67,6 +69,8 @@ TEST_F(SessionFragmentTest, EveryOperationRefusesANullSession) {
 }
 
 TEST_F(SessionFragmentTest, EveryOperationNeedsAMovieAndAResult) {
+    const uint32_t forced[4] = {};
+    EXPECT_EQ(MbxForceDefaults(session, 1, forced), MBX_ERR_BAD_STATE);
     EXPECT_EQ(MbxShiftFragmentOffsets(session, 1, 0, 0, 1), MBX_ERR_BAD_STATE);
     EXPECT_EQ(MbxSetFragmentBase(session, 1, 0), MBX_ERR_BAD_STATE);
     EXPECT_EQ(MbxSealFirstFragment(session), MBX_ERR_BAD_STATE);
@@ -101,6 +105,43 @@ TEST_F(SessionFragmentTest, AFragmentIsSealedPlacedWrittenReleasedAndIndexed) {
                                   "0000002B 'tfra' 01000000 00000007 00000000 00000001"
                                   "0000000000000064 0000000000000100 01 01 01"
                                   "00000010 'mfro' 00000000 00000043"));
+}
+
+TEST_F(SessionFragmentTest, ATrackThatBeginsAfterMoovStatesItsDefaultsWhereTheyAreForced) {
+    createTrack();
+    ASSERT_EQ(MbxSealFirstFragment(session), MBX_OK);
+    const uint32_t forced[4] = {1, 1, 1, 1};
+    ASSERT_EQ(MbxForceDefaults(session, 1, forced), MBX_OK);
+    addChunk(0x54, 0);
+    ASSERT_EQ(MbxSealFragment(session), MBX_OK);
+    ASSERT_EQ(MbxWriteMoof(session, &file, 1, 0, &size), MBX_OK);
+    EXPECT_BYTES(file.bytes, Hex("0000005C 'moof'"
+                                 "00000010 'mfhd' 00000000 00000001"
+                                 "00000044 'traf'"
+                                 "00000028 'tfhd'"
+                                 "00 00003B 00000007"  // flags: base, description, duration, size, flags
+                                 "0000000000000054"    // base_data_offset
+                                 "00000001"            // sample_description_index
+                                 "00000064"            // default_sample_duration
+                                 "00000010"            // default_sample_size
+                                 "00000000"            // default_sample_flags
+                                 "00000014 'trun' 00000001 00000001 00000000"));
+    const uint32_t none[4] = {};
+    ASSERT_EQ(MbxForceDefaults(session, 1, none), MBX_OK);
+    MemoryFile plain;
+    ASSERT_EQ(MbxWriteMoof(session, &plain, 1, 0, &size), MBX_OK);
+    EXPECT_EQ(size, 76U);
+}
+
+TEST_F(SessionFragmentTest, ForcedDefaultsAreWordsOf0And1OfATrackThatExists) {
+    createTrack();
+    const uint32_t forced[4] = {1, 1, 1, 2};
+    EXPECT_EQ(MbxForceDefaults(session, 1, forced), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(session->movie->tracks.first->defaultsForced[0], 0U);
+    const uint32_t one[4] = {0, 0, 1, 0};
+    EXPECT_EQ(MbxForceDefaults(session, 0, one), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxForceDefaults(session, 2, one), MBX_ERR_NOT_FOUND);
+    EXPECT_EQ(MbxForceDefaults(session, 1, nullptr), MBX_ERR_INVALID_ARG);
 }
 
 // What no documented mode is: some words are refused, the others are taken for the mode next to them.

@@ -1,5 +1,6 @@
 #include "boxlib/track.h"
 
+#include "boxlib/fragment.h"
 #include "registry.h"
 #include "track_fixture.h"
 
@@ -195,11 +196,29 @@ TEST_F(TrackTest, EnableModeIsReadForVideoAlone) {
     EXPECT_EQ(create(MbxCode("soun"), params), MBX_OK);
 }
 
+TEST_F(TrackTest, ATimescaleOfZeroIsRefusedForEveryHandler) {
+    const uint64_t before = host.allocations;
+    for (const HandlerCase& c : kHandlerCases) {
+        EXPECT_EQ(create(codeOf(c.handler), TrackParams(1, 0)), MBX_ERR_INVALID_ARG) << c.handler;
+    }
+    EXPECT_EQ(host.allocations, before);
+    EXPECT_EQ(movie->tracks.first, nullptr);
+}
+
+TEST_F(TrackTest, ATrackAfterTheFirstSealIsBadState) {
+    ASSERT_EQ(create(MbxCode("vide"), TrackParams(1, 1000)), MBX_OK);
+    ASSERT_EQ(MbxSealFirstFragment(context, movie), MBX_OK);
+    const uint64_t before = host.allocations;
+    EXPECT_EQ(create(MbxCode("soun"), TrackParams(2, 1000)), MBX_ERR_BAD_STATE);
+    EXPECT_EQ(create(MbxCode("soun"), TrackParams(1, 1000)), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(host.allocations, before);
+    EXPECT_EQ(trackIndex, 1U);
+    EXPECT_EQ(last()->header.trackId, 1U);
+}
+
 TEST_F(TrackTest, RefusedParametersAllocateNothing) {
     const uint64_t before = host.allocations;
-    MbxTrackParams params = TrackParams(1, 0);
-    EXPECT_EQ(create(MbxCode("vide"), params), MBX_ERR_INVALID_ARG);
-    params = TrackParams(1, 1000);
+    MbxTrackParams params = TrackParams(1, 1000);
     params.language = 0x8000;
     EXPECT_EQ(create(MbxCode("vide"), params), MBX_ERR_INVALID_ARG);
     EXPECT_EQ(create(MbxCode("hint"), TrackParams(1, 1000)), MBX_ERR_INTERNAL);

@@ -162,5 +162,31 @@ TEST(BlockingQueue, AClosedQueueTakesAndGivesNothing) {
     EXPECT_EQ(queue.Pop(), 0);
 }
 
+TEST(BlockingQueue, AFinishedQueueTakesNothingAndGivesWhatItStillHolds) {
+    IntQueue queue(3, kWait);
+    ASSERT_TRUE(queue.Push(1));
+    ASSERT_TRUE(queue.Push(2));
+    queue.Finish();
+    EXPECT_FALSE(queue.Push(3));
+    EXPECT_EQ(queue.Pop(), 1);
+    EXPECT_EQ(queue.Pop(), 2);
+    EXPECT_EQ(queue.Pop(), 0);
+}
+
+TEST(BlockingQueue, FinishFreesWaitingProducersAndConsumers) {
+    const SchedulePoints points;
+    IntQueue full(1, kWait);
+    ASSERT_TRUE(full.Push(1));
+    std::thread producer([&] { EXPECT_FALSE(full.Push(2)); });
+    IntQueue empty(1, kWait);
+    std::thread consumer([&] { EXPECT_EQ(empty.Pop(), 0); });
+    waitUntilInside(points, producer, full);
+    waitUntilInside(points, consumer, empty);
+    full.Finish();
+    empty.Finish();
+    producer.join();
+    consumer.join();
+}
+
 }  // namespace
 }  // namespace clipfileModule

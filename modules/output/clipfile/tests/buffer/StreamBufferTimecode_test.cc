@@ -173,6 +173,36 @@ TEST_F(StreamBufferTimecode, ARunningTimecodeMovesByTheDistanceOfVideoAndMetadat
     }
 }
 
+TEST_F(StreamBufferTimecode, WithExactRulesTheDistanceIsMeasuredInFramesOfTheTrack) {
+    struct Case {
+        stream_units::FrameRate rate;
+        std::int64_t distance;  // video less metadata, 90 kHz
+        int offset;
+    };
+    // A frame is 3600 ticks at 25 a second, 3003 at 29.97, 1800 at 50 and 1501.5 at 59.94.
+    const Case cases[] = {
+        {stream_units::kRate25, 3600, 1},        {stream_units::kRate25, 1799, 0},
+        {stream_units::kRate25, 1801, 1},        {stream_units::kRate25, -1799, 0},
+        {stream_units::kRate25, -1801, -1},      {stream_units::kRate25, -7200, -2},
+        {stream_units::kRate2997, 3003, 1},      {stream_units::kRate2997, -1502, -1},
+        {stream_units::kRate2997, -1501, 0},     {stream_units::kRate2997, -9009, -3},
+        {stream_units::kFrameRates[5], 1800, 1}, {stream_units::kFrameRates[5], -1800, -1},
+        {stream_units::kFrameRates[6], 1501, 1}, {stream_units::kFrameRates[6], 1502, 1},
+        {stream_units::kFrameRates[6], 750, 0},  {stream_units::kFrameRates[6], -3003, -2},
+    };
+    run();
+    harness.settings.recordRules = RecordRules::kExact;
+    for (const Case& one : cases) {
+        startAt(one.rate);
+        const std::uint64_t metaRtp = 1000000;
+        EXPECT_TRUE(harness.buffer->MakeFileTimecode(
+            firstUnits(metaRtp + static_cast<std::uint64_t>(one.distance), metaRtp, timecode(15))));
+        EXPECT_THAT(fileTimecode(), ElementsAre(10, 20, 30, 15 + one.offset))
+            << one.rate << ", " << one.distance;
+        harness.buffer->Stop();
+    }
+}
+
 TEST_F(StreamBufferTimecode, TheNominalRateFollowsTheFrameRate) {
     struct Case {
         std::uint32_t framerate;

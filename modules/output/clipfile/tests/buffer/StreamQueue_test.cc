@@ -168,11 +168,32 @@ TEST(StreamQueue, StopReturnsWithAFullQueueAndAProducerBlockedInPush) {
     EXPECT_EQ(handler.Entered(), std::vector<std::uint64_t>{0});
 }
 
+TEST(StreamQueue, FinishFirstHandlesTheUnitsThatWait) {
+    Handler handler;
+    handler.Hold();
+    StreamQueue queue(kCapacity, false);
+    queue.Start(handler.Function());
+    ASSERT_TRUE(queue.queue.Push(makeUnit(0)));
+    handler.WaitForEntries(1);
+    ASSERT_TRUE(queue.queue.Push(makeUnit(1)));
+    ASSERT_TRUE(queue.queue.Push(makeUnit(2)));
+    std::thread finisher([&] { queue.Finish(); });
+    // Units of size 0 are not handled.
+    ASSERT_TRUE(waitUntil([&] { return !queue.queue.Push(std::make_shared<StreamData>()); }));
+    handler.Release();
+    finisher.join();
+    EXPECT_EQ(handler.Entered(), (std::vector<std::uint64_t>{0, 1, 2}));
+}
+
 TEST(StreamQueue, StopOfAnIdleWorkerEndsIt) {
     for (int i = 0; i < 1000; ++i) {
         StreamQueue queue(kCapacity, false);
         queue.Start([](std::shared_ptr<StreamData>&) {});
-        queue.Stop();
+        if (i % 2 == 0) {
+            queue.Stop();
+        } else {
+            queue.Finish();
+        }
     }
 }
 

@@ -196,8 +196,8 @@ TEST_F(ControllerTest, RecordRulesAreKeptUnlessExactAreAskedFor) {
     host_.texts["-recordRules"] = "exact";
     ASSERT_TRUE(Initialize());
     EXPECT_EQ(peer_.Settings().recordRules, RecordRules::kExact);
-    EXPECT_TRUE(log_.Contains(LOG_PRIORITY_TRACE, "clipfileModule::Controller::Initialize",
-                              "recordRules = exact."));
+    EXPECT_TRUE(
+        log_.Contains(LOG_PRIORITY_TRACE, "clipfileModule::Controller::Initialize", "recordRules = exact."));
     Uninitialize();
     host_.texts["-recordRules"] = "kept";
     ASSERT_TRUE(Initialize());

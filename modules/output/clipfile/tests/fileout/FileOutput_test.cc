@@ -307,6 +307,84 @@ TEST_F(FileOutputTest, AFileOutgrowsItsLengthUntilAudioAndVideoAreInStep) {
     EXPECT_TRUE(Logged(LOG_PRIORITY_TRACE, "outputFile", "mp4 file over 1 min."));
 }
 
+class ExactFileOutputTest : public FileOutputTest {
+ protected:
+    ExactFileOutputTest() { settings.recordRules = RecordRules::kExact; }
+    ~ExactFileOutputTest() override { EndOutput(); }
+
+    void push(std::uint64_t number, bool sync, bool idr) {
+        output->PushChunk(MakeChunk(number, sync, 10, idr));
+    }
+};
+
+TEST_F(ExactFileOutputTest, AFileEndsWhereTheNextOneBeginsWithAnIdrFrame) {
+    settings.maxFileSize = 0;
+    Start();
+    push(0, true, true);
+    push(1, true, false);  // in step behind chunk 0, but no IDR frame
+    push(2, false, false);
+    push(3, true, true);  // an IDR frame, but not in step behind chunk 2
+    push(4, true, true);
+    push(5, true, false);
+    Finish();
+    EXPECT_THAT(MuxerCalls(" Write "),
+                ElementsAre("2 Write 0", "2 Write 1", "2 Write 2", "2 Write 3", "3 Write 4", "3 Write 5"));
+    EXPECT_EQ(log.Count(LOG_PRIORITY_DETAIL, "clipfileModule::FileOutput::outputFile",
+                        "mp4 file over. no idr frame. 8"),
+              1u);
+    EXPECT_TRUE(Logged(LOG_PRIORITY_DETAIL, "outputFile", "mp4 file over. no idr frame. 16"));
+    EXPECT_TRUE(Logged(LOG_PRIORITY_DETAIL, "outputFile", "mp4 file over. no a/v sync. 24"));
+    EXPECT_TRUE(Logged(LOG_PRIORITY_DETAIL, "outputFile", "mp4 file over. no idr frame. 40"));
+    EXPECT_EQ(log.Count("OP: FILE ROTATION."), 1u);
+}
+
+TEST_F(ExactFileOutputTest, AFileWaitsTwoMinutesForAnIdrFrame) {
+    // A chunk lasts half a minute; the length is one minute.
+    muxers.SetChunkDuration(25000 * 30);
+    settings.maxFileSize = 1;
+    Start();
+    for (std::uint64_t chunk = 0; chunk < 9; ++chunk) {
+        // The three minutes end with chunk 5, and the cadence is met behind chunk 6.
+        push(chunk, chunk != 5, chunk == 0);
+    }
+    Finish();
+    EXPECT_THAT(MuxerCalls(" Write "),
+                ElementsAre("2 Write 0", "2 Write 1", "2 Write 2", "2 Write 3", "2 Write 4", "2 Write 5",
+                            "2 Write 6", "3 Write 7", "3 Write 8"));
+}
+
+TEST_F(FileOutputTest, WithKeptRulesAFileEndsAtTheFirstCadencePoint) {
+    settings.maxFileSize = 0;
+    Start();
+    Push(0, true);
+    Push(1, true);
+    Finish();
+    EXPECT_THAT(MuxerCalls(" Write "), ElementsAre("2 Write 0", "3 Write 1"));
+    EXPECT_FALSE(log.Contains("mp4 file over. no idr frame. 8"));
+}
+
+TEST_F(FileOutputTest, TheThreadThatIsBroughtToItsOwnStopGetsTheErrorAndEndsAllTheSame) {
+    muxers.SetHooks(
+        [](FakeMuxers::Hooks& hooks) { hooks.write = [](std::uint64_t chunk) { return chunk != 1; }; });
+    std::promise<std::error_code> thrown;
+    controller.SetStatusHook([&] {
+        try {
+            output->Stop();
+        } catch (const std::system_error& error) {
+            thrown.set_value(error.code());
+        }
+    });
+    Start();
+    Push(0);
+    Push(1);
+    EXPECT_EQ(thrown.get_future().get(), std::errc::resource_deadlock_would_occur);
+    WaitForEnd();
+    Finish();
+    EXPECT_THAT(Statuses(), ElementsAre("7 26"));
+    EXPECT_FALSE(log.Contains("wait thread timeout..."));
+    EXPECT_THAT(Disk(), Contains(Pair(kToday + "1.txt", "open, chunk 0, tmcd 01:02:03:00, closed")));
+}
+
 TEST_F(FileOutputTest, TheLimitIsReachedAtExactlyTheLengthAndNotOneTickBelow) {
     settings.maxFileSize = 1;
     muxers.SetHooks([this](FakeMuxers::Hooks& hooks) {

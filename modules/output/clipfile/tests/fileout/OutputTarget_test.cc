@@ -39,6 +39,10 @@ class OutputTargetTest : public FileOutputTest {
                 }
                 return logonError;
             };
+            // The share is a folder of this disk.
+            hooks.realPath = [](const std::string& path) {
+                return path.compare(0, 2, "\\\\") == 0 ? path.substr(1) : path;
+            };
             hooks.impersonate = [=, this](LogonToken token) {
                 logons.push_back("impersonate " + std::to_string(token));
                 return impersonateError;
@@ -283,16 +287,27 @@ TEST_F(OutputTargetTest, ALogonThatCannotBeUsedIsReportedAndStillClosed) {
     EXPECT_THAT(Disk(), Contains(Key(kToday + "1.txt")));
 }
 
-TEST_F(OutputTargetTest, SharesAreNotThereYet) {
+TEST_F(OutputTargetTest, WhereSharesCannotBeReachedARemotePathFailsWithOrWithoutAUserName) {
+    SetLogon(0, 0);
+    platform.Set([](FakePlatform::Hooks& hooks) {
+        hooks.shareSupport = [](std::string& reason) {
+            reason = "no client";
+            return ENOTSUP;
+        };
+    });
     settings.outputPath = "\\\\server\\share";
-    settings.userName = "user";
-    settings.password = "secret";
-    Start();
-    output->Stop();
-    // ENOTSUP
-    EXPECT_TRUE(Logged(LOG_PRIORITY_ERROR, "useNetDrive",
-                       "LogonUser call failed. 0, 5f, \\\\server\\share, user, secret"));
-    EXPECT_THAT(Statuses(), ElementsAre("7 21"));
+    for (const char* userName : {"", "user"}) {
+        settings.userName = userName;
+        Start();
+        output->Stop();
+        EXPECT_TRUE(Logged(LOG_PRIORITY_WARNING, "useNetDrive", "no network shares: no client."));
+        // ENOTSUP
+        EXPECT_TRUE(
+            Logged(LOG_PRIORITY_ERROR, "useNetDrive",
+                   std::string("LogonUser call failed. 0, 5f, \\\\server\\share, ") + userName + ", "));
+    }
+    EXPECT_THAT(Statuses(), ElementsAre("7 21", "7 21"));
+    EXPECT_THAT(logons, IsEmpty());
 }
 
 using OutputTargetDeathTest = OutputTargetTest;

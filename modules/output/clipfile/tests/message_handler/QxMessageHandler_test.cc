@@ -3,8 +3,11 @@
 #include <gtest/gtest.h>
 
 #include <cstddef>
+#include <functional>
 #include <memory>
 #include <string>
+#include <system_error>
+#include <utility>
 #include <vector>
 
 #include "LogCapture.h"
@@ -198,6 +201,82 @@ TEST_F(QxMessageHandlerTest, ASetPropertiesRequestIsOnlyLogged) {
     EXPECT_EQ(handler_.NotifySetPropertiesRequest(nullptr), 0U);
     EXPECT_EQ(TakeLog("NotifySetPropertiesRequest"), (Texts{"start.", "end. result = 0."}));
     EXPECT_TRUE(TakeCalls().empty());
+}
+
+/// A controller that cannot stop a recording, or that runs no more.
+class TroubledController : public ControllerRecorder {
+ public:
+    bool throws = false;
+    bool running = true;
+
+    void BufferingStop() override {
+        ControllerRecorder::BufferingStop();
+        if (throws) {
+            throw std::system_error(std::make_error_code(std::errc::resource_deadlock_would_occur));
+        }
+    }
+    bool IsRunning() const override { return running; }
+};
+
+class QxMessageHandlerTroubleTest : public testing::Test {
+ protected:
+    using Texts = std::vector<std::string>;
+
+    LogCapture log_;
+    TroubledController controller_;
+    QxMessageHandler handler_{&controller_};
+};
+
+TEST_F(QxMessageHandlerTroubleTest, AStopThatThrowsLeavesTheHandlerReadyForTheNextStart) {
+    handler_.NotifyOnlineStatus();
+    controller_.throws = true;
+    EXPECT_THROW(handler_.NotifyOfflineStatus(), std::system_error);
+    controller_.throws = false;
+    handler_.NotifyOnlineStatus();
+    handler_.NotifyOfflineStatus();
+    EXPECT_EQ(controller_.Calls(), (Texts{"BufferingStart", "status 6 26", "BufferingStop", "BufferingStart",
+                                          "status 6 26", "BufferingStop"}));
+}
+
+TEST_F(QxMessageHandlerTroubleTest, ADisconnectThatThrowsLeavesTheOutputStopped) {
+    handler_.NotifyOnlineStatus();
+    controller_.throws = true;
+    QxInputOutputDisconnectionRequest request;
+    request.connectionKind = 1;
+    EXPECT_THROW(handler_.NotifyInputOutputDisconnectionRequest(&request), std::system_error);
+    EXPECT_EQ(handler_.NotifyInputOutputDisconnectionRequest(&request), 0U);
+    EXPECT_EQ(controller_.Calls(), (Texts{"BufferingStart", "BufferingStop"}));
+}
+
+TEST_F(QxMessageHandlerTroubleTest, OutsideALifeEachNotificationIsOneLineAndNothingElse) {
+    controller_.running = false;
+    const QxInputOutputConnectRequest connect;
+    QxInputOutputDisconnectionRequest disconnect;
+    disconnect.connectionKind = 1;
+    const std::vector<std::pair<std::string, std::function<void()>>> notifications = {
+        {"NotifyInputOutputConnectRequest",
+         [&] { EXPECT_EQ(handler_.NotifyInputOutputConnectRequest(&connect), 3U); }},
+        {"NotifyModuleConnectionRequestReply",
+         [&] { EXPECT_EQ(handler_.NotifyModuleConnectionRequestReply(nullptr), 3U); }},
+        {"NotifyInputOutputDisconnectionRequest",
+         [&] { EXPECT_EQ(handler_.NotifyInputOutputDisconnectionRequest(&disconnect), 3U); }},
+        {"NotifySetPropertiesRequest", [&] { EXPECT_EQ(handler_.NotifySetPropertiesRequest(nullptr), 3U); }},
+        {"NotifyOnlineStatus", [&] { handler_.NotifyOnlineStatus(); }},
+        {"NotifyOfflineStatus", [&] { handler_.NotifyOfflineStatus(); }},
+    };
+    for (const auto& [name, notify] : notifications) {
+        log_.Clear();
+        notify();
+        const auto lines = log_.Lines();
+        ASSERT_EQ(lines.size(), 1U) << name;
+        EXPECT_EQ(lines[0].priority, LOG_PRIORITY_WARNING) << name;
+        EXPECT_EQ(lines[0].text, name + " is called without initialize.");
+    }
+    EXPECT_TRUE(controller_.Calls().empty());
+    // The online state of before counts.
+    controller_.running = true;
+    handler_.NotifyOnlineStatus();
+    EXPECT_EQ(controller_.Calls(), Texts{"BufferingStart"});
 }
 
 }  // namespace

@@ -5,33 +5,34 @@
 
 #include <cstdio>
 #include <map>
-#include <memory>
 #include <sstream>
 #include <string>
 
-#include "mp4/Mp4MuxerFactory.h"
-#include "support/CodedMedia.h"
-#include "support/FakePlatform.h"
-#include "support/MuxerStream.h"
+#include "support/CodedRecording.h"
 
 namespace clipfileModule {
 namespace {
 
-constexpr int kChunks = 40;
-constexpr unsigned char kTimecode[4] = {1, 2, 3, 4};
+constexpr std::size_t kChunks = 40;
 
 struct Recording {
-    const char* type;
-    std::uint32_t key;  // frames per 1000 seconds
-    std::uint32_t timescale;
-    std::uint32_t duration;  // ticks of a frame
-    const char* rate;        // as ffprobe writes it
-    const char* shownRate;   // as MediaInfo writes it
-    bool dropFrame;
+    RecordingPlan plan;
+    const char* rate;       // as ffprobe writes it
+    const char* shownRate;  // as MediaInfo writes it
 };
 
+Recording recordingOf(const char* type, std::uint32_t key, std::uint32_t timescale, std::uint32_t duration,
+                      const char* rate, const char* shownRate, bool dropFrame,
+                      RecordRules rules = RecordRules::kKept) {
+    return {{type, rules, key, timescale, duration, dropFrame, kChunks}, rate, shownRate};
+}
+
+std::string nameOf(const RecordingPlan& plan) {
+    return plan.type + std::to_string(plan.key) + (plan.rules == RecordRules::kExact ? "Exact" : "");
+}
+
 std::ostream& operator<<(std::ostream& out, const Recording& recording) {
-    return out << recording.type << recording.key;
+    return out << nameOf(recording.plan);
 }
 
 /// The lines "key=value" of ffprobe's flat output.
@@ -51,55 +52,24 @@ std::map<std::string, std::string> parse(const std::string& output) {
 
 class JudgedFile : public ::testing::TestWithParam<Recording> {
  protected:
-    /// 40 chunks of 8 pictures, with the audio that belongs to them and a unit of metadata a picture.
     void SetUp() override {
-        const Recording& recording = GetParam();
-        muxer_stream::StopTheClock(platform);
-        media =
-            MakeCodedMedia(work, recording.timescale, recording.duration, kChunks * 8, audioBefore(kChunks));
-        OutputSettings settings = muxer_stream::MakeSettings(directory, recording.key);
-        settings.width = kCodedWidth;
-        settings.height = kCodedHeight;
-        settings.sps = media.sps;
-        settings.pps = media.pps;
-        std::shared_ptr<Mp4Muxer> muxer;
-        ASSERT_TRUE(Mp4MuxerFactory().Create(recording.type, muxer));
-        ASSERT_TRUE(muxer->Initialize());
-        ASSERT_TRUE(muxer->Open(settings, kTimecode, recording.dropFrame));
-        for (std::size_t i = 0; i < kChunks; ++i) {
-            const auto chunk = std::make_shared<ChunkData>();
-            const auto at = [](const auto& list, std::size_t n) {
-                return list.begin() + static_cast<std::ptrdiff_t>(n);
-            };
-            chunk->video.assign(at(media.video, 8 * i), at(media.video, 8 * i + 8));
-            chunk->audio.assign(at(media.audio, audioBefore(i)), at(media.audio, audioBefore(i + 1)));
-            for (std::size_t n = 0; n < 8; ++n) {
-                chunk->meta.push_back(muxer_stream::MakeSample(64, static_cast<unsigned char>(8 * i + n)));
-            }
-            ASSERT_TRUE(muxer->Write(chunk));
-        }
-        ASSERT_TRUE(muxer->WriteTmcd(kTimecode));
-        ASSERT_TRUE(muxer->Close());
-        file = "'" + (directory.Path() / "01_02_03_04.MP4").string() + "'";
+        recorded.Record(plan);
+        recorded.Close();
+        file = "'" + recorded.Path().string() + "'";
     }
 
-    /// Audio frames that begin before the chunk.
-    static std::size_t audioBefore(std::size_t chunk) {
-        const Recording& recording = GetParam();
-        return (chunk * 8 * recording.duration * 48000 + recording.timescale * 1024ULL - 1) /
-               (recording.timescale * 1024ULL);
-    }
-    /// The place of a fragmented file's timecode holds no value.
+    /// With the kept rules the place of a fragmented file's timecode holds no value.
     std::string firstTimecode() const {
-        const std::string separator = GetParam().dropFrame ? ";" : ":";
-        return fragmented() ? "00:00:00" + separator + "00" : "01:02:03" + separator + "04";
+        const std::string separator = plan.dropFrame ? ";" : ":";
+        return hasTimecode() ? "01:02:03" + separator + "04" : "00:00:00" + separator + "00";
     }
-    bool fragmented() const { return GetParam().type == std::string("fragment"); }
+    bool hasTimecode() const {
+        return plan.type == std::string("normal") || plan.rules == RecordRules::kExact;
+    }
 
-    FakePlatform platform;
-    TempDir directory;
-    TempDir work;
-    CodedMedia media;
+    const RecordingPlan plan = GetParam().plan;
+    CodedRecording recorded;
+    const TempDir& work = recorded.Work();
     std::string file;
 };
 
@@ -125,32 +95,31 @@ TEST_P(JudgedFile, FfprobeFindsFourTracksWithTheirCountsAndDurationsAndNothingTo
     EXPECT_EQ(stream(0, "height"), "180");
     EXPECT_EQ(stream(0, "r_frame_rate"), recording.rate);
     EXPECT_EQ(stream(0, "avg_frame_rate"), recording.rate);
-    EXPECT_EQ(stream(0, "time_base"), "1/" + std::to_string(recording.timescale));
+    EXPECT_EQ(stream(0, "time_base"), "1/" + std::to_string(plan.timescale));
     EXPECT_EQ(stream(0, "nb_read_packets"), "320");
-    EXPECT_EQ(stream(0, "duration_ts"), std::to_string(320 * recording.duration));
+    EXPECT_EQ(stream(0, "duration_ts"), std::to_string(320 * plan.duration));
     EXPECT_EQ(stream(0, "start_pts"), "0");
 
     EXPECT_EQ(stream(1, "codec_name"), "aac");
     EXPECT_EQ(stream(1, "profile"), "LC");
     EXPECT_EQ(stream(1, "sample_rate"), "48000");
     EXPECT_EQ(stream(1, "channels"), "2");
-    EXPECT_EQ(stream(1, "nb_read_packets"), std::to_string(audioBefore(kChunks)));
-    EXPECT_EQ(stream(1, "duration_ts"), std::to_string(1024 * audioBefore(kChunks)));
+    EXPECT_EQ(stream(1, "nb_read_packets"), std::to_string(recorded.AudioBefore(kChunks)));
+    EXPECT_EQ(stream(1, "duration_ts"), std::to_string(1024 * recorded.AudioBefore(kChunks)));
 
     EXPECT_EQ(stream(2, "codec_type"), "data");
     EXPECT_EQ(stream(2, "codec_tag_string"), "tmcd");
     EXPECT_EQ(stream(2, "nb_read_packets"), "1");
-    // In a fragmented file the sample stands in the last fragment, where ffprobe reads neither its value nor
-    // its length.
-    if (!fragmented()) {
-        EXPECT_EQ(stream(2, "duration_ts"), std::to_string(320 * recording.duration));
-        EXPECT_EQ(stream(2, "tags.timecode"), firstTimecode());
+    // In a fragmented file the sample stands in the last fragment, where ffprobe does not read its length.
+    if (plan.type == std::string("normal")) {
+        EXPECT_EQ(stream(2, "duration_ts"), std::to_string(320 * plan.duration));
     }
+    EXPECT_EQ(stream(2, "tags.timecode"), firstTimecode());
 
     EXPECT_EQ(stream(3, "codec_type"), "data");
     EXPECT_EQ(stream(3, "codec_tag_string"), "rtmd");
     EXPECT_EQ(stream(3, "nb_read_packets"), "320");
-    EXPECT_EQ(stream(3, "duration_ts"), std::to_string(320 * recording.duration));
+    EXPECT_EQ(stream(3, "duration_ts"), std::to_string(320 * plan.duration));
     for (int index = 0; index < 4; ++index) {
         EXPECT_EQ(stream(index, "id"), "0x" + std::to_string(index + 1));
         EXPECT_EQ(stream(index, "tags.language"), "eng");
@@ -185,8 +154,9 @@ TEST_P(JudgedFile, FfmpegCopiesItsSamplesOutByteForByte) {
         }
         return bytes;
     };
-    EXPECT_EQ(muxer_stream::ReadFile(copy + ".v"), joined(media.video, 320));
-    EXPECT_EQ(muxer_stream::ReadFile(copy + ".a"), joined(media.audio, audioBefore(kChunks)));
+    EXPECT_EQ(muxer_stream::ReadFile(copy + ".v"), joined(recorded.Media().video, 320));
+    EXPECT_EQ(muxer_stream::ReadFile(copy + ".a"),
+              joined(recorded.Media().audio, recorded.AudioBefore(kChunks)));
     EXPECT_EQ(muxer_stream::ReadFile(copy + ".m").size(), 320U * 64);
 }
 
@@ -200,40 +170,43 @@ TEST_P(JudgedFile, MediaInfoFindsTheTracksTheirLengthsAndTheTimecode) {
     const auto milliSec = [](std::uint64_t ticks, std::uint64_t timescale) {
         return std::to_string((ticks * 1000 + timescale / 2) / timescale);
     };
-    const std::string pictures = milliSec(320ULL * recording.duration, recording.timescale);
-    const std::string sound = milliSec(1024ULL * audioBefore(kChunks), 48000);
+    const std::string pictures = milliSec(320ULL * plan.duration, plan.timescale);
+    const std::string sound = milliSec(1024ULL * recorded.AudioBefore(kChunks), 48000);
     EXPECT_EQ(ask("General;%VideoCount% %AudioCount% %OtherCount%|%IsTruncated%|%ConformanceErrors%"),
               "1 1 1||");
     EXPECT_EQ(
         ask("Video;%ID% %Format% %Width% %Height%|%FrameRate%|%FrameCount%|%Duration%|%Delay_DropFrame%"),
         std::string("1 AVC 320 180|") + recording.shownRate + "|320|" + pictures + "|" +
-            (recording.dropFrame ? "Yes" : "No"));
+            (plan.dropFrame ? "Yes" : "No"));
     EXPECT_EQ(ask("Audio;%ID% %Format% %Format_AdditionalFeatures% %Channels% "
                   "%SamplingRate%|%FrameCount%|%Duration%"),
-              "2 AAC LC 2 48000|" + std::to_string(audioBefore(kChunks)) + "|" + sound);
+              "2 AAC LC 2 48000|" + std::to_string(recorded.AudioBefore(kChunks)) + "|" + sound);
     EXPECT_EQ(ask("Other;%ID% %Type%|%FrameRate%|%Duration%|%TimeCode_FirstFrame%"),
               std::string("3 Time code|") + recording.shownRate + "|" + pictures + "|" + firstTimecode());
 }
 
 INSTANTIATE_TEST_SUITE_P(
     Rates, JudgedFile,
-    ::testing::Values(Recording{"normal", 23980, 24000, 1001, "24000/1001", "23.976", false},
-                      Recording{"normal", 24000, 24000, 1000, "24/1", "24.000", false},
-                      Recording{"normal", 25000, 25000, 1000, "25/1", "25.000", false},
-                      Recording{"normal", 29970, 30000, 1001, "30000/1001", "29.970", true},
-                      Recording{"normal", 30000, 30000, 1000, "30/1", "30.000", false},
-                      Recording{"normal", 50000, 50000, 1000, "50/1", "50.000", false},
-                      Recording{"normal", 59940, 60000, 1001, "60000/1001", "59.940", true},
-                      Recording{"normal", 60000, 60000, 1000, "60/1", "60.000", false},
-                      Recording{"fragment", 23980, 24000, 1001, "24000/1001", "23.976", false},
-                      Recording{"fragment", 24000, 24000, 1000, "24/1", "24.000", false},
-                      Recording{"fragment", 25000, 25000, 1000, "25/1", "25.000", false},
-                      Recording{"fragment", 29970, 30000, 1001, "30000/1001", "29.970", true},
-                      Recording{"fragment", 30000, 30000, 1000, "30/1", "30.000", false},
-                      Recording{"fragment", 50000, 50000, 1000, "50/1", "50.000", false},
-                      Recording{"fragment", 59940, 60000, 1001, "60000/1001", "59.940", true},
-                      Recording{"fragment", 60000, 60000, 1000, "60/1", "60.000", false}),
-    [](const auto& recording) { return recording.param.type + std::to_string(recording.param.key); });
+    ::testing::Values(
+        recordingOf("normal", 23980, 24000, 1001, "24000/1001", "23.976", false),
+        recordingOf("normal", 24000, 24000, 1000, "24/1", "24.000", false),
+        recordingOf("normal", 25000, 25000, 1000, "25/1", "25.000", false),
+        recordingOf("normal", 29970, 30000, 1001, "30000/1001", "29.970", true),
+        recordingOf("normal", 30000, 30000, 1000, "30/1", "30.000", false),
+        recordingOf("normal", 50000, 50000, 1000, "50/1", "50.000", false),
+        recordingOf("normal", 59940, 60000, 1001, "60000/1001", "59.940", true),
+        recordingOf("normal", 60000, 60000, 1000, "60/1", "60.000", false),
+        recordingOf("fragment", 23980, 24000, 1001, "24000/1001", "23.976", false),
+        recordingOf("fragment", 24000, 24000, 1000, "24/1", "24.000", false),
+        recordingOf("fragment", 25000, 25000, 1000, "25/1", "25.000", false),
+        recordingOf("fragment", 29970, 30000, 1001, "30000/1001", "29.970", true),
+        recordingOf("fragment", 30000, 30000, 1000, "30/1", "30.000", false),
+        recordingOf("fragment", 50000, 50000, 1000, "50/1", "50.000", false),
+        recordingOf("fragment", 59940, 60000, 1001, "60000/1001", "59.940", true),
+        recordingOf("fragment", 60000, 60000, 1000, "60/1", "60.000", false),
+        recordingOf("fragment", 25000, 25000, 1000, "25/1", "25.000", false, RecordRules::kExact),
+        recordingOf("fragment", 59940, 60000, 1001, "60000/1001", "59.940", true, RecordRules::kExact)),
+    [](const auto& recording) { return nameOf(recording.param.plan); });
 
 }  // namespace
 }  // namespace clipfileModule

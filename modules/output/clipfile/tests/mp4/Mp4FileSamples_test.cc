@@ -106,6 +106,12 @@ TEST_F(Mp4FileSamplesTest, EverySampleIsLoggedAtPriority13) {
                             "2\t0\t2002\t90035\t1035\t9\t1001.",   //
                             "write video  ----------.",            //
                             "3\t1\t3003\t90062\t1062\t8\t1001."));
+    EXPECT_EQ(log.CountIf([](const CapturedLine& line) {
+        return line.priority == LOG_PRIORITY_SAMPLE &&
+               line.function == "clipfileModule::Mp4File::writeSampleInfo" &&
+               line.file->ends_with("mp4/Mp4FileSamples.cc");
+    }),
+              10U);
 }
 
 TEST_F(Mp4FileSamplesTest, WritingTheBytesIsLoggedAtPriority12) {

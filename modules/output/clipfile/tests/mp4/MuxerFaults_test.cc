@@ -27,6 +27,7 @@ struct Sweep {
     FaultyFiles::Operation operation;
     bool andAllAfter;
     long status;
+    RecordRules rules = RecordRules::kKept;
 };
 
 std::ostream& operator<<(std::ostream& out, const Sweep& sweep) {
@@ -53,7 +54,9 @@ class MuxerFaults : public ::testing::TestWithParam<Sweep> {
         std::shared_ptr<Mp4Muxer> muxer;
         EXPECT_TRUE(Mp4MuxerFactory().Create(sweep.type, muxer));
         bool good = muxer->Initialize();
-        good = good && muxer->Open(muxer_stream::MakeSettings(directory, 29970), kTimecode, true);
+        OutputSettings settings = muxer_stream::MakeSettings(directory, 29970);
+        settings.recordRules = sweep.rules;
+        good = good && muxer->Open(settings, kTimecode, true);
         for (int i = 0; good && i < sweep.chunks; ++i) {
             if (i == 0) {
                 static_cast<void>(muxer->GetBoxSize());
@@ -129,7 +132,13 @@ INSTANTIATE_TEST_SUITE_P(
         Sweep{"FragmentSeek", "fragment", 34, FaultyFiles::kSeek, false, MBX_ERR_IO},
         Sweep{"FragmentSeekAndAllAfter", "fragment", 34, FaultyFiles::kSeek, true, MBX_ERR_IO},
         Sweep{"FragmentAlloc", "fragment", 34, FaultyFiles::kAlloc, false, MBX_ERR_NO_MEMORY},
-        Sweep{"FragmentAllocAndAllAfter", "fragment", 34, FaultyFiles::kAlloc, true, MBX_ERR_NO_MEMORY}),
+        Sweep{"FragmentAllocAndAllAfter", "fragment", 34, FaultyFiles::kAlloc, true, MBX_ERR_NO_MEMORY},
+        Sweep{"ExactFragmentWrite", "fragment", 34, FaultyFiles::kWrite, false, MBX_ERR_IO,
+              RecordRules::kExact},
+        Sweep{"ExactFragmentSeekAndAllAfter", "fragment", 34, FaultyFiles::kSeek, true, MBX_ERR_IO,
+              RecordRules::kExact},
+        Sweep{"ExactFragmentAlloc", "fragment", 34, FaultyFiles::kAlloc, false, MBX_ERR_NO_MEMORY,
+              RecordRules::kExact}),
     [](const auto& sweep) { return std::string(sweep.param.name); });
 
 }  // namespace

@@ -84,8 +84,9 @@ Bytes trex(std::uint32_t trackId, std::uint32_t duration, std::uint32_t size, st
     return FullBox("trex", 0, 0, U32(trackId) + U32(1) + U32(duration) + U32(size) + U32(flags));
 }
 
-/// `payload` is where the samples begin.
-Bytes fragmentMoov(const RateRow& row, std::uint32_t payload) {
+/// `payload` is where the samples begin. With exact rules there are no edits.
+Bytes fragmentMoov(const RateRow& row, RecordRules rules, std::uint32_t payload) {
+    const bool hasEdits = rules == RecordRules::kKept;
     const std::uint32_t length = 256 * row.duration;
     Bytes sync;
     for (std::uint32_t i = 0; i < 32; ++i) {
@@ -104,9 +105,10 @@ Bytes fragmentMoov(const RateRow& row, std::uint32_t payload) {
                                        trex(2, 1024, 6, 0) +                         //
                                        trex(3, 272 * row.duration, 4, 0) +           //
                                        trex(4, row.duration, 5, 0));
-    return Box("moov", Mvhd(row, length) + VideoTrak(row, {length, length}, video) +
-                           AudioTrak({row.audio64, 64 * 1024}, audio) + TimecodeTrak(row, {0, 0}, timecode) +
-                           MetaTrak(row, {length, length}, meta) + mvex);
+    return Box("moov", Mvhd(row, length) + VideoTrak(row, {length, length, hasEdits}, video) +
+                           AudioTrak({row.audio64, 64 * 1024, hasEdits}, audio) +
+                           TimecodeTrak(row, {0, 0, hasEdits}, timecode) +
+                           MetaTrak(row, {length, length, hasEdits}, meta) + mvex);
 }
 
 /// 8.8.7, with the base data offset alone.
@@ -114,9 +116,17 @@ Bytes tfhd(std::uint32_t trackId, std::uint32_t base) {
     return FullBox("tfhd", 0, 0x000001, U32(trackId) + U64(base));
 }
 
+/// 8.8.7, with the base data offset and all four defaults.
+Bytes tfhdWithDefaults(std::uint32_t trackId, std::uint32_t base, std::uint32_t duration, std::uint32_t size,
+                       std::uint32_t flags) {
+    return FullBox("tfhd", 0, 0x00003B,
+                   U32(trackId) + U64(base) + U32(1) + U32(duration) + U32(size) + U32(flags));
+}
+
 /// `payload` is where the fragment's samples begin: chunk 33 with metadata 40, audio 13, video 75; chunk 34
-/// with metadata 40, video 72; the timecode 4.
-Bytes fragmentMoof(std::uint32_t payload) {
+/// with metadata 40, video 72; the timecode 4. With exact rules the timecode's track, which has no sample in
+/// `moov`, states its defaults here.
+Bytes fragmentMoof(const RateRow& row, RecordRules rules, std::uint32_t payload) {
     const Bytes video = tfhd(1, payload + 53) +
                         FullBox("trun", 0, 0x000205,      // data offset, first flags, sizes
                                 U32(8) + U32(0) + U32(0)  // count, data_offset, first_sample_flags
@@ -124,7 +134,10 @@ Bytes fragmentMoof(std::uint32_t payload) {
                         FullBox("trun", 0, 0x000201, U32(8) + U32(115) + Repeat(8, U32(9)));
     const Bytes audio =
         tfhd(2, payload + 40) + FullBox("trun", 0, 0x000201, U32(2) + U32(0) + U32(6) + U32(7));
-    const Bytes timecode = tfhd(3, payload + 240) + FullBox("trun", 0, 0x000001, U32(1) + U32(0));
+    const Bytes timecode =
+        (rules == RecordRules::kExact ? tfhdWithDefaults(3, payload + 240, 272 * row.duration, 4, 0)
+                                      : tfhd(3, payload + 240)) +
+        FullBox("trun", 0, 0x000001, U32(1) + U32(0));
     const Bytes meta = tfhd(4, payload) + FullBox("trun", 0, 0x000001, U32(8) + U32(0)) +
                        FullBox("trun", 0, 0x000001, U32(8) + U32(128));
     return Box("moof", FullBox("mfhd", 0, 0, U32(1)) + Box("traf", video) + Box("traf", audio) +
@@ -149,20 +162,21 @@ Bytes fragmentMfra(const RateRow& row, std::uint32_t moof) {
     return Box("mfra", tables + FullBox("mfro", 0, 0, U32(8 + tables.size() + 16)));
 }
 
-Bytes fragmentFile(const RateRow& row) {
+Bytes fragmentFile(const RateRow& row, RecordRules rules) {
     Bytes samples;
     for (unsigned char i = 0; i < 32; ++i) {
         samples = samples + muxer_stream::BytesOf(*MakeChunk(muxer_stream::kPlainChunk, i));
     }
-    const auto moovSize = static_cast<std::uint32_t>(fragmentMoov(row, 0).size());
-    const auto moofSize = static_cast<std::uint32_t>(fragmentMoof(0).size());
+    const auto moovSize = static_cast<std::uint32_t>(fragmentMoov(row, rules, 0).size());
+    const auto moofSize = static_cast<std::uint32_t>(fragmentMoof(row, rules, 0).size());
     const std::uint32_t payload = 176 + moovSize + 8;
     const std::uint32_t moof = payload + 32 * kPlainSize;
-    return Ftyp() + UuidProf(row, 0x30000000) + fragmentMoov(row, payload) + Box("mdat", samples) +
-           fragmentMoof(moof + moofSize + 8) +
-           // The timecode sample has a place and no value.
+    return Ftyp() + UuidProf(row, 0x30000000) + fragmentMoov(row, rules, payload) + Box("mdat", samples) +
+           fragmentMoof(row, rules, moof + moofSize + 8) +
+           // With the kept rules the timecode sample has a place and no value.
            Box("mdat", muxer_stream::BytesOf(*MakeChunk(kFragmentChunk, 32)) +
-                           muxer_stream::BytesOf(*MakeChunk(kLastChunk, 33)) + U32(0)) +
+                           muxer_stream::BytesOf(*MakeChunk(kLastChunk, 33)) +
+                           U32(rules == RecordRules::kExact ? row.frameNumber : 0)) +
            fragmentMfra(row, moof);
 }
 
@@ -194,12 +208,21 @@ void expectSameFile(const Bytes& actual, const Bytes& expected) {
 
 class WholeFile : public ::testing::TestWithParam<RateRow> {
  protected:
-    void open(const std::string& type) {
+    void open(const std::string& type, RecordRules rules = RecordRules::kKept) {
         muxer_stream::StopTheClock(platform);
         ASSERT_TRUE(Mp4MuxerFactory().Create(type, muxer));
         ASSERT_TRUE(muxer->Initialize());
-        ASSERT_TRUE(muxer->Open(muxer_stream::MakeSettings(directory, GetParam().key), kTimecode,
-                                /*dropFrame=*/true));
+        OutputSettings settings = muxer_stream::MakeSettings(directory, GetParam().key);
+        settings.recordRules = rules;
+        ASSERT_TRUE(muxer->Open(settings, kTimecode, /*dropFrame=*/true));
+    }
+    /// 34 chunks.
+    void writeFragments() {
+        for (unsigned char i = 0; i < 32; ++i) {
+            ASSERT_TRUE(muxer->Write(MakeChunk(muxer_stream::kPlainChunk, i)));
+        }
+        ASSERT_TRUE(muxer->Write(MakeChunk(kFragmentChunk, 32)));
+        ASSERT_TRUE(muxer->Write(MakeChunk(kLastChunk, 33)));
     }
     void close() {
         ASSERT_TRUE(muxer->WriteTmcd(kTimecode));
@@ -209,7 +232,8 @@ class WholeFile : public ::testing::TestWithParam<RateRow> {
     Bytes file() const { return muxer_stream::ReadFile(directory.Path() / "01_02_03_04.MP4"); }
     /// What a reader that knows the standard alone makes of the file: `counts` samples in the four tracks,
     /// with times that run on without a gap.
-    static void expectMovie(const iso::Movie& movie, const std::array<std::size_t, 4>& counts) {
+    static void expectMovie(const iso::Movie& movie, const std::array<std::size_t, 4>& counts,
+                            std::size_t edits = 1) {
         const RateRow& row = GetParam();
         const std::array<std::uint32_t, 4> timescales = {row.timescale, 48000, row.timescale, row.timescale};
         const std::array<std::uint64_t, 4> durations = {row.duration, 1024, counts[0] * row.duration,
@@ -227,7 +251,7 @@ class WholeFile : public ::testing::TestWithParam<RateRow> {
             EXPECT_EQ(track.entryTypes, std::vector<std::string>{entries[i]});
             EXPECT_EQ(track.timescale, timescales[i]);
             EXPECT_EQ(track.language, 0x15C7);
-            EXPECT_EQ(track.edits.size(), 1U);
+            EXPECT_EQ(track.edits.size(), edits);
             ASSERT_EQ(track.samples.size(), counts[i]) << entries[i];
             for (std::size_t n = 0; n < counts[i]; ++n) {
                 EXPECT_EQ(track.samples[n].decodeTime, n * durations[i]);
@@ -255,16 +279,28 @@ TEST_P(WholeFile, ANormalFileIsAsDescribed) {
     expectMovie(iso::ReadMovie(file()), {16, 5, 1, 16});
 }
 
+TEST_P(WholeFile, ANormalFileIsTheSameWithExactRules) {
+    open("normal", RecordRules::kExact);
+    ASSERT_TRUE(muxer->Write(MakeChunk(kFirstChunk, 1)));
+    ASSERT_TRUE(muxer->Write(MakeChunk(kSecondChunk, 2)));
+    close();
+    expectSameFile(file(), normalFile(GetParam()));
+}
+
 TEST_P(WholeFile, AFragmentedFileIsAsDescribed) {
     open("fragment");
-    for (unsigned char i = 0; i < 32; ++i) {
-        ASSERT_TRUE(muxer->Write(MakeChunk(muxer_stream::kPlainChunk, i)));
-    }
-    ASSERT_TRUE(muxer->Write(MakeChunk(kFragmentChunk, 32)));
-    ASSERT_TRUE(muxer->Write(MakeChunk(kLastChunk, 33)));
+    writeFragments();
     close();
-    expectSameFile(file(), fragmentFile(GetParam()));
+    expectSameFile(file(), fragmentFile(GetParam(), RecordRules::kKept));
     expectMovie(iso::ReadMovie(file()), {272, 66, 1, 272});
+}
+
+TEST_P(WholeFile, AFragmentedFileWithExactRulesIsAsDescribed) {
+    open("fragment", RecordRules::kExact);
+    writeFragments();
+    close();
+    expectSameFile(file(), fragmentFile(GetParam(), RecordRules::kExact));
+    expectMovie(iso::ReadMovie(file()), {272, 66, 1, 272}, /*edits=*/0);
 }
 
 INSTANTIATE_TEST_SUITE_P(Rates, WholeFile, ::testing::ValuesIn(kRates),

@@ -21,7 +21,11 @@ class ControllerPeer {
     Mutex& StreamBuffersMutex() { return controller_.streamBuffersMutex; }
     std::vector<std::shared_ptr<StreamBuffer>> StreamBuffers() {
         MutexLock lock(controller_.streamBuffersMutex);
-        return {controller_.streamBuffers.begin(), controller_.streamBuffers.end()};
+        std::vector<std::shared_ptr<StreamBuffer>> buffers;
+        for (const Recording& recording : controller_.streamBuffers) {
+            buffers.push_back(recording.buffer);
+        }
+        return buffers;
     }
     std::size_t WaitingEvents() {
         MutexLock lock(controller_.eventQueueMutex);

@@ -23,6 +23,14 @@ class ControllerRecorder : public clipfileModule::ControllerInterface {
     void BufferingStop() override { add("BufferingStop"); }
     void SetStatus(int status, int cause) override {
         add("status " + std::to_string(status) + " " + std::to_string(cause));
+        std::function<void()> hook;
+        {
+            const std::lock_guard lock(mutex_);
+            hook = statusHook_;
+        }
+        if (hook) {
+            hook();
+        }
     }
 
     /// All that came, in order: "post 5" for an event by its id, "status 6 24" for a status.
@@ -43,6 +51,11 @@ class ControllerRecorder : public clipfileModule::ControllerInterface {
     void SetEventHook(std::function<void(std::shared_ptr<clipfileModule::Event>)> hook) {
         const std::lock_guard lock(mutex_);
         hook_ = std::move(hook);
+    }
+    /// Runs inside each `SetStatus`, as what a host does there.
+    void SetStatusHook(std::function<void()> hook) {
+        const std::lock_guard lock(mutex_);
+        statusHook_ = std::move(hook);
     }
     /// Lets go of the events, and so of the buffers that they hold.
     void Clear() {
@@ -79,4 +92,5 @@ class ControllerRecorder : public clipfileModule::ControllerInterface {
     std::vector<std::string> calls_;
     std::vector<std::shared_ptr<clipfileModule::Event>> events_;
     std::function<void(std::shared_ptr<clipfileModule::Event>)> hook_;
+    std::function<void()> statusHook_;
 };

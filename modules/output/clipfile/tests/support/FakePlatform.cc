@@ -47,21 +47,31 @@ class HookedPlatform : public PlatformInterface {
     std::string NativePath(const std::string& path) const override { return real_.NativePath(path); }
     int AvailableSpace(const std::string& path, std::uint64_t& bytes) const override {
         const auto hooks = HookTable::Instance().Get();
-        return hooks->availableSpace ? hooks->availableSpace(path, bytes) : real_.AvailableSpace(path, bytes);
+        return hooks->availableSpace ? hooks->availableSpace(path, bytes)
+                                     : real_.AvailableSpace(realPath(*hooks, path), bytes);
     }
     int TestExistence(const std::string& path) const override {
         const auto hooks = HookTable::Instance().Get();
-        return hooks->testExistence ? hooks->testExistence(path) : real_.TestExistence(path);
+        return hooks->testExistence ? hooks->testExistence(path)
+                                    : real_.TestExistence(realPath(*hooks, path));
     }
     bool Exists(const std::string& path) const override {
         const auto hooks = HookTable::Instance().Get();
-        return hooks->exists ? hooks->exists(path) : real_.Exists(path);
+        return hooks->exists ? hooks->exists(path) : real_.Exists(realPath(*hooks, path));
     }
     bool CreateDirectories(const std::string& path, boost::system::error_code& error) const override {
         const auto hooks = HookTable::Instance().Get();
         return hooks->createDirectories ? hooks->createDirectories(path, error)
-                                        : real_.CreateDirectories(path, error);
+                                        : real_.CreateDirectories(realPath(*hooks, path), error);
     }
+    int ShareSupport(std::string& reason) const override {
+        const auto hooks = HookTable::Instance().Get();
+        if (hooks->shareSupport) {
+            return hooks->shareSupport(reason);
+        }
+        return hooks->logon ? 0 : real_.ShareSupport(reason);
+    }
+    std::FILE* OpenOnShare(const std::string& path) const override { return real_.OpenOnShare(path); }
     int Logon(const std::string& userName, const std::string& domain, const std::string& password,
               LogonToken& token) const override {
         const auto hooks = HookTable::Instance().Get();
@@ -82,6 +92,10 @@ class HookedPlatform : public PlatformInterface {
     }
 
  private:
+    static std::string realPath(const FakePlatform::Hooks& hooks, const std::string& path) {
+        return hooks.realPath ? hooks.realPath(path) : path;
+    }
+
     PosixPlatform real_;
 };
 

@@ -25,6 +25,10 @@ class FakePlatform {
         std::function<int(const std::string& path)> testExistence;
         std::function<bool(const std::string& path)> exists;
         std::function<bool(const std::string& path, boost::system::error_code& error)> createDirectories;
+        /// 0 by default when there is a hook for `logon`.
+        std::function<int(std::string& reason)> shareSupport;
+        /// The path that the real system gets, for the operations without a hook.
+        std::function<std::string(const std::string& path)> realPath;
         std::function<int(const std::string& userName, const std::string& domain, const std::string& password,
                           clipfileModule::LogonToken& token)>
             logon;

@@ -8,6 +8,7 @@
 
 #include "boxlib/mbx_stdio.h"
 #include "mp4/FileAccess.h"
+#include "platform/PlatformInterface.h"
 
 namespace {
 
@@ -74,7 +75,7 @@ MbxStatus faultyOpen(const char* path, std::uint32_t unused, MbxFile** file) {
     if (plans[FaultyFiles::kOpen].Fails()) {
         return MBX_ERR_IO;
     }
-    return MbxOpenFile(path, unused, file);
+    return MbxOpenFile(clipfileModule::GetPlatform().NativePath(path).c_str(), unused, file);
 }
 
 MbxStatus faultyWrite(MbxFile* file, const void* buffer, std::uint64_t size, std::uint64_t* count) {

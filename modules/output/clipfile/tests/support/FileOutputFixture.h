@@ -48,6 +48,7 @@ class TimecodeBuffer : public clipfileModule::StreamBufferInterface {
     }
     std::int64_t GetStartTimestamp() const override { return 0; }
     std::int64_t GetStopTimestamp() const override { return -1; }
+    std::int64_t GetEndTimestamp() const override { return -1; }
     void NotifyEndSync() override { add("NotifyEndSync"); }
 
     /// What the calls return. Timecodes are 01:02:03 with the chunk's number as frames.

@@ -14,15 +14,16 @@
 #include "support/FakeMuxer.h"
 #include "support/FileOutputFixture.h"
 
-/// Chunk `number` with 8 video samples, and with `size` bytes of payload for the fake muxers.
+/// Chunk `number` with 8 video samples, of which the first is a sync sample for `idr`, and with `size` bytes
+/// of payload for the fake muxers.
 inline std::shared_ptr<clipfileModule::ChunkData> MakeChunk(std::uint64_t number, bool sync = false,
-                                                            std::uint64_t size = 10) {
+                                                            std::uint64_t size = 10, bool idr = false) {
     auto chunk = std::make_shared<clipfileModule::ChunkData>();
     chunk->size = size;
     chunk->sync = sync;
     for (int i = 0; i < 8; ++i) {
-        chunk->video.push_back(
-            std::make_shared<nal_access::SampleData>(std::vector<unsigned char>{1, 2, 3, 4}, 0, 0, false));
+        chunk->video.push_back(std::make_shared<nal_access::SampleData>(
+            std::vector<unsigned char>{1, 2, 3, 4}, 0, 0, idr && i == 0));
     }
     chunk->firstVideo = std::make_shared<StreamData>();
     chunk->firstVideo->rtp_timestamp = number;

@@ -94,6 +94,11 @@ void FileOutputRecorder::SetStartHook(std::function<void()> hook) {
     startHook_ = std::move(hook);
 }
 
+void FileOutputRecorder::SetStopHook(std::function<void()> hook) {
+    const std::lock_guard lock(mutex_);
+    stopHook_ = std::move(hook);
+}
+
 void FileOutputRecorder::SetThreaded() {
     const std::lock_guard lock(mutex_);
     threaded_ = true;
@@ -175,15 +180,23 @@ void FileOutputRecorder::OnStart(const void* output, const OutputSettings& setti
 
 void FileOutputRecorder::OnStop(const void* output) {
     std::shared_ptr<Writer> writer;
+    std::function<void()> hook;
     {
         const std::lock_guard lock(mutex_);
         Entry& entry = find(output);
         entry.record.calls.push_back("Stop");
         writer.swap(entry.writer);
+        hook = stopHook_;
         changed_.notify_all();
+    }
+    if (hook) {
+        hook();
     }
     if (writer != nullptr) {
         writer->Stop();
+    }
+    if (hook) {
+        hook();
     }
 }
 

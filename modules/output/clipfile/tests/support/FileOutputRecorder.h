@@ -50,6 +50,8 @@ class FileOutputRecorder {
     void SetChunkHook(ChunkHook hook);
     /// Runs inside each `Start`.
     void SetStartHook(std::function<void()> hook);
+    /// Runs inside each `Stop`.
+    void SetStopHook(std::function<void()> hook);
     /// Each output runs a thread from `Start` to `Stop` that asks its buffer for timecodes as a writer does.
     void SetThreaded();
 
@@ -89,4 +91,5 @@ class FileOutputRecorder {
     std::size_t queueSize_ = 0;
     ChunkHook chunkHook_;
     std::function<void()> startHook_;
+    std::function<void()> stopHook_;
 };

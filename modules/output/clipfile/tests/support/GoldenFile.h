@@ -104,15 +104,6 @@ inline Bytes Tkhd(std::uint32_t trackId, std::uint32_t duration, std::uint16_t v
                        + U16(width) + U16(0) + U16(height) + U16(0));  // 16.16
 }
 
-/// 8.6.5 and 8.6.6, with one edit from the start of the media.
-inline Bytes Edts(std::uint32_t duration) {
-    return Box("edts", FullBox("elst", 0, 0,
-                               U32(1)                    // entry_count
-                                   + U32(duration)       // segment_duration
-                                   + U32(0)              // media_time
-                                   + U16(1) + U16(0)));  // media_rate
-}
-
 /// 8.4.2
 inline Bytes Mdhd(std::uint32_t timescale, std::uint32_t duration) {
     return FullBox("mdhd", 0, 0,
@@ -212,30 +203,43 @@ inline Bytes Stss(std::uint32_t count, const Bytes& rows) {
     return FullBox("stss", 0, 0, U32(count) + rows);
 }
 
-/// Durations of a track: of its edit in movie ticks, and of its media in its own.
+/// Durations of a track: in movie ticks, which is that of its edit too, and of its media in its own.
 struct Durations {
-    std::uint32_t edit;
+    std::uint32_t movie;
     std::uint32_t media;
+    bool hasEdit = true;
 };
+
+/// 8.6.5 and 8.6.6, with one edit from the start of the media; nothing for a track without.
+inline Bytes Edts(const Durations& durations) {
+    if (!durations.hasEdit) {
+        return {};
+    }
+    return Box("edts", FullBox("elst", 0, 0,
+                               U32(1)                      // entry_count
+                                   + U32(durations.movie)  // segment_duration
+                                   + U32(0)                // media_time
+                                   + U16(1) + U16(0)));    // media_rate
+}
 
 // The four tracks, with their sample tables behind `stsd`.
 inline Bytes VideoTrak(const RateRow& row, const Durations& durations, const Bytes& tables) {
     return Box("trak",
-               Tkhd(1, durations.edit, 0, 1920, 1080) + Edts(durations.edit) +
+               Tkhd(1, durations.movie, 0, 1920, 1080) + Edts(durations) +
                    Box("mdia", Mdhd(row.timescale, durations.media) + Hdlr("vide", "Video Media Handler") +
                                    Box("minf", FullBox("vmhd", 0, 1, Zeros(8)) + Dinf() +
                                                    Box("stbl", VideoStsd() + tables))) +
                    Usage(U32(1) + Zeros(4)));
 }
 inline Bytes AudioTrak(const Durations& durations, const Bytes& tables) {
-    return Box("trak", Tkhd(2, durations.edit, 0x0100, 0, 0) + Edts(durations.edit) +
+    return Box("trak", Tkhd(2, durations.movie, 0x0100, 0, 0) + Edts(durations) +
                            Box("mdia", Mdhd(48000, durations.media) + Hdlr("soun", "Sound Media Handler") +
                                            Box("minf", FullBox("smhd", 0, 0, Zeros(4)) + Dinf() +
                                                            Box("stbl", AudioStsd() + tables))) +
                            Usage(U32(1) + Zeros(4)));
 }
 inline Bytes TimecodeTrak(const RateRow& row, const Durations& durations, const Bytes& tables) {
-    return Box("trak", Tkhd(3, durations.edit, 0, 0, 0) + Edts(durations.edit) +
+    return Box("trak", Tkhd(3, durations.movie, 0, 0, 0) + Edts(durations) +
                            Box("mdia", Mdhd(row.timescale, durations.media) +
                                            Hdlr("tmcd", "Time Code Media Handler") +
                                            Box("minf", FullBox("nmhd", 0, 0, {}) + Dinf() +
@@ -245,7 +249,7 @@ inline Bytes TimecodeTrak(const RateRow& row, const Durations& durations, const 
 inline Bytes MetaTrak(const RateRow& row, const Durations& durations, const Bytes& tables) {
     return Box(
         "trak",
-        Tkhd(4, durations.edit, 0, 0, 0) + Box("tref", Box("cdsc", U32(1))) + Edts(durations.edit) +
+        Tkhd(4, durations.movie, 0, 0, 0) + Box("tref", Box("cdsc", U32(1))) + Edts(durations) +
             Box("mdia",
                 Mdhd(row.timescale, durations.media) + Hdlr("meta", "Timed Metadata Media Handler") +
                     Box("minf", FullBox("nmhd", 0, 0, {}) + Dinf() + Box("stbl", MetaStsd() + tables))) +

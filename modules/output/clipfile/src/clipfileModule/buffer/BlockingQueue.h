@@ -12,7 +12,8 @@ namespace clipfileModule {
 
 /// A bounded first-in first-out queue between threads. `Q` is the container adaptor that holds the items.
 ///
-/// Any thread may call any operation. A queue that was closed takes nothing more and lets nobody wait.
+/// Any thread may call any operation. A queue that was closed takes nothing more and lets nobody wait; one
+/// that was finished does the same once it is empty.
 template <typename T, typename Q>
 class BlockingQueue {
  public:
@@ -21,17 +22,17 @@ class BlockingQueue {
     BlockingQueue(std::uint64_t itemCapacity, bool drop)
         : capacity(itemCapacity), dropWhenFull(drop), flushPredicate([](T) { return true; }) {}
 
-    /// True when the item went in, false when it was dropped: the queue is full and `dropWhenFull`, or
-    /// closed.
+    /// True when the item went in, false when it was dropped: the queue is full and `dropWhenFull`, finished
+    /// or closed.
     bool Push(T item) {
         MutexLock lock(mutex);
-        while (queue.size() >= capacity && !closed) {
+        while (queue.size() >= capacity && !finished) {
             if (dropWhenFull) {
                 return false;
             }
             lock.Wait(notFull);
         }
-        if (closed) {
+        if (finished) {
             return false;
         }
         queue.push(std::move(item));
@@ -40,13 +41,13 @@ class BlockingQueue {
     }
 
     /// Waits for an item and takes it from the front. Gives a default `T` once the queue is closed, whatever
-    /// it still holds.
+    /// it still holds, and once it is finished and empty.
     T Pop() {
         MutexLock lock(mutex);
-        while (queue.empty() && !closed) {
+        while (queue.empty() && !finished) {
             lock.Wait(notEmpty);
         }
-        if (closed) {
+        if (closed || queue.empty()) {
             return T();
         }
         T item = std::move(queue.front());
@@ -69,7 +70,7 @@ class BlockingQueue {
             queue.pop();
         }
         queue = std::move(kept);
-        // Several producers may wait, and the flush made room for all of them.
+        // Contract: flush-wakes-all. Several producers may wait, and there is room for all of them.
         notFull.notify_all();
     }
 
@@ -82,6 +83,15 @@ class BlockingQueue {
     void Close() {
         MutexLock lock(mutex);
         closed = true;
+        finished = true;
+        notFull.notify_all();
+        notEmpty.notify_all();
+    }
+
+    /// As `Close`, but what waits in the queue can still be popped.
+    void Finish() {
+        MutexLock lock(mutex);
+        finished = true;
         notFull.notify_all();
         notEmpty.notify_all();
     }
@@ -100,6 +110,8 @@ class BlockingQueue {
     std::condition_variable notFull;
     std::condition_variable notEmpty;
     std::function<bool(T)> flushPredicate GUARDED_BY(mutex);
+    /// Nothing goes in any more, and with `closed` nothing comes out.
+    bool finished GUARDED_BY(mutex) = false;
     bool closed GUARDED_BY(mutex) = false;
 };
 

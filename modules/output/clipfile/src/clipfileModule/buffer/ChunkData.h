@@ -14,7 +14,7 @@ namespace clipfileModule {
 struct ChunkData {
     /// Bytes of all samples in the three lists together.
     std::uint64_t size = 0;
-    /// Always zero.
+    // Contract: chunk-reserved-words. Always zero.
     std::uint64_t reserved0 = 0;
     std::uint64_t reserved1 = 0;
     std::uint64_t reserved2 = 0;

@@ -21,4 +21,12 @@ constexpr int CountUntil(std::uint64_t end, std::uint64_t before, std::uint64_t 
     return -1;
 }
 
+/// The same number for a chunk that nothing needs to follow; -1 when the cache holds fewer units. `duration`
+/// is not 0.
+constexpr int CountUpTo(std::uint64_t end, std::uint64_t before, std::uint64_t duration, std::size_t cached) {
+    const std::uint64_t all = end / duration + 1;
+    const std::uint64_t count = all > before ? all - before : 0;
+    return count <= cached ? static_cast<int>(count) : -1;
+}
+
 }  // namespace clipfileModule

@@ -1,6 +1,7 @@
 #include "buffer/StreamBuffer.h"
 
 #include <algorithm>
+#include <cmath>
 #include <cstring>
 #include <iterator>
 #include <utility>
@@ -9,6 +10,7 @@
 #include "buffer/state/ErrorCacheState.h"
 #include "buffer/state/StopCacheState.h"
 #include "buffer/state/WaitStartCacheState.h"
+#include "common/JoinThread.h"
 #include "common/Log.h"
 
 namespace clipfileModule {
@@ -18,6 +20,7 @@ namespace {
 /// Units between a push and the cache. A push waits while they stand full.
 constexpr std::uint64_t kQueueCapacity = 20;
 
+// Contract: block-with-a-byte-in-front. A packet begins with its label (SMPTE ST 336).
 /// A packet in the key, length, value form of SMPTE ST 336: one byte 01, universal label, BER length 43, and
 /// the items E000, 8500, 8509 and 8512 ("WGS-84"), each with a 2-byte tag and a 2-byte length.
 constexpr unsigned char kMetaBlock[64] = {
@@ -45,7 +48,12 @@ StreamBuffer::StreamBuffer(ControllerInterface* owner, std::int64_t start, std::
       startTimestamp(start),
       stopTimestamp(stop) {}
 
-StreamBuffer::~StreamBuffer() = default;
+StreamBuffer::~StreamBuffer() {
+    MutexLock control(controlMutex);
+    if (stopPending) {
+        finishStop();
+    }
+}
 
 void StreamBuffer::Start(const OutputSettings& recordSettings) {
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
@@ -54,9 +62,13 @@ void StreamBuffer::Start(const OutputSettings& recordSettings) {
         CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
         return;
     }
+    if (stopPending) {
+        finishStop();
+    }
     settings = recordSettings;
     auto output = std::make_shared<FileOutput>();
     if (!output->Initialize(controller, this, settings.fileType)) {
+        // Contract: muxer-failure-goes-on. Status 7 has been set already.
         CLIPFILE_LOG(LOG_PRIORITY_WARNING, "mp4File initialize failed.");
     }
     {
@@ -65,6 +77,7 @@ void StreamBuffer::Start(const OutputSettings& recordSettings) {
         videoBuffer.clear();
         audioBuffer.clear();
         metaBuffer.clear();
+        firstPicture.reset();
         metaBlock.assign(std::begin(kMetaBlock), std::end(kMetaBlock));
         chunkedVideo = 0;
         chunkedAudio = 0;
@@ -77,6 +90,7 @@ void StreamBuffer::Start(const OutputSettings& recordSettings) {
         MutexLock lock(analyzerMutex);
         fileTimecode.clear();
     }
+    // Contract: sps-line-at-each-start. The sets come with the IDR frame.
     streamInfo.MakeInputStreamInfo(settings);
 
     std::vector<std::shared_ptr<StreamQueue>> started(kMediumCount);
@@ -86,7 +100,7 @@ void StreamBuffer::Start(const OutputSettings& recordSettings) {
     {
         MutexLock lock(stateMutex);
         queues = started;
-        changeState(std::make_shared<WaitStartCacheState>(this));
+        changeState(std::make_shared<WaitStartCacheState>(this, settings.recordRules));
     }
     UnitList StreamBuffer::*const caches[] = {&StreamBuffer::videoBuffer, &StreamBuffer::audioBuffer,
                                               &StreamBuffer::metaBuffer};
@@ -108,33 +122,56 @@ void StreamBuffer::Stop() {
         // A push may wait here for room in a queue. Its worker runs until it is stopped below, and nothing
         // that the worker waits for waits for this lock, so the push gets its room and the lock comes free.
         MutexLock lock(stateMutex);
-        if (stateId == kStopState) {
+        if (stateId == kStopState && !stopPending) {
             CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
             return;
         }
-        changeState(std::make_shared<StopCacheState>(this));
-        stopped.swap(queues);
+        if (stateId != kStopState) {
+            // A record that found its end has nothing more to cut.
+            restPending = isExact() && (stateId == kStartState || stateId == kErrorState);
+            stopPending = true;
+            changeState(std::make_shared<StopCacheState>(this));
+            stopped.swap(queues);
+        }
     }
+    // Contract: leftovers-dropped. Units in queues and caches are not written.
     for (std::shared_ptr<StreamQueue>& queue : stopped) {
         if (queue != nullptr) {
-            queue->Stop();
+            if (restPending) {
+                queue->Finish();
+            } else {
+                queue->Stop();
+            }
             queue.reset();
         }
     }
+    finishStop();
+    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
+}
+
+void StreamBuffer::finishStop() {
     Cancel();
-    startTimestamp = 0;
-    stopTimestamp = -1;
     std::shared_ptr<FileOutput> output;
     {
         MutexLock lock(bufferMutex);
-        output.swap(fileOutput);
+        if (restPending) {
+            cutRest();
+            restPending = false;
+        }
+        output = fileOutput;
     }
+    // Contract: restart-forgets-the-stop. A stop that was commanded is lost.
+    startTimestamp = 0;
+    stopTimestamp = -1;
+    endTimestamp = -1;
     if (output != nullptr) {
+        // It throws on its own thread, and must outlive that thread.
         output->Stop();
         output->Uninitialize();
-        output.reset();
+        MutexLock lock(bufferMutex);
+        fileOutput.reset();
     }
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
+    stopPending = false;
 }
 
 void StreamBuffer::Cancel() {
@@ -148,7 +185,7 @@ void StreamBuffer::Cancel() {
                 MutexLock lock(bufferMutex);
                 bufferCondition.notify_one();
             }
-            chunkThread->join();
+            JoinThread(*chunkThread);
             CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end join...");
         }
         chunkThread.reset();
@@ -193,11 +230,12 @@ void StreamBuffer::updateTimecodeStatus(const std::shared_ptr<StreamData>& unit)
     std::shared_ptr<nal_access::SampleData> sample;
     bool flag = false;
     analyzer.ConvertTmcd(unit, sample, flag, 0, 0);
+    // Contract: timecode-status-for-life. The first two timecodes decide, also for what a restart records.
     if (tcStatus != 0 || sample == nullptr) {
         return;
     }
     if (lastTimecode != nullptr) {
-        // A sample is compared in the length that both have.
+        // Contract: timecode-common-length. Compared in the length that both have.
         const std::uint64_t size = std::min(sample->GetDataSize(), lastTimecode->GetDataSize());
         const bool still = std::memcmp(sample->GetData(), lastTimecode->GetData(), size) == 0;
         tcStatus = still ? 1 : 2;
@@ -209,6 +247,7 @@ void StreamBuffer::updateTimecodeStatus(const std::shared_ptr<StreamData>& unit)
 void StreamBuffer::changeState(const std::shared_ptr<CacheState>& next) {
     CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: CHANGE STATE %s -> %s.", state->GetName().c_str(),
                        next->GetName().c_str());
+    // Contract: enter-before-leave. The old state is still in place.
     next->OnEnter();
     const std::shared_ptr<CacheState> old = state;
     state = next;
@@ -216,12 +255,13 @@ void StreamBuffer::changeState(const std::shared_ptr<CacheState>& next) {
     old->OnExit();
 }
 
+// Contract: media-word-unused. The last argument.
 void StreamBuffer::addToCache(const std::shared_ptr<StreamData>& unit, UnitList StreamBuffer::*cache,
                               const char* /*mediaType*/) {
     {
         MutexLock lock(bufferMutex);
         UnitList& units = this->*cache;
-        // The cache is in order, so a unit that is late goes to its place, behind those of its own time.
+        // Contract: sorted-insertion. The cache is in order; a late unit goes behind those of its own time.
         units.insert(std::upper_bound(units.begin(), units.end(), unit, byRtpTimestamp), unit);
     }
     bufferCondition.notify_one();
@@ -232,17 +272,25 @@ void StreamBuffer::SetVideoSequenceHeader(const nal_access::NalUnit& sps, const 
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
     const double frameMilliSec = static_cast<double>(streamInfo.audio_sample_duration) /
                                  static_cast<double>(streamInfo.audio_track_timescale) * 1000;
+    // Contract: half-an-audio-frame-is-10-ms. Cut twice: 21.3 to 21, and 10.5 to 10.
     const std::uint64_t half = static_cast<std::uint64_t>(frameMilliSec) >> 1;
 
     MutexLock lock(bufferMutex);
-    const std::uint64_t limit = unit->timestamp == 0 ? 0 : unit->timestamp - half;
-    removeBefore(videoBuffer, limit);
-    removeBefore(audioBuffer, limit);
-    removeBefore(metaBuffer, limit);
+    if (!isExact()) {
+        const std::uint64_t limit = unit->timestamp == 0 ? 0 : unit->timestamp - half;
+        removeBefore(videoBuffer, limit);
+        removeBefore(audioBuffer, limit);
+        removeBefore(metaBuffer, limit);
+    }
     settings.sps = sps;
     settings.pps = pps;
     fileOutput->Start(settings);
+    // Contract: idr-frame-unsorted. The cache is empty here.
     videoBuffer.push_back(unit);
+    firstPicture = unit;
+    if (isExact()) {
+        startInStep();
+    }
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
@@ -258,7 +306,7 @@ void StreamBuffer::removeBefore(UnitList& cache, std::uint64_t limit) {
                            static_cast<unsigned long long>((*it)->timestamp),
                            static_cast<unsigned long long>((*it)->rtp_timestamp));
     }
-    // The unit where the walk stopped stays, also when it is the last one and lies below the limit.
+    // Contract: last-unit-stays. The unit where the walk stopped, also when it lies below the limit.
     cache.erase(cache.begin(), end);
 }
 
@@ -269,17 +317,22 @@ void StreamBuffer::NotifyEndSync() {
 void StreamBuffer::setError(int code) {
     {
         MutexLock lock(stateMutex);
-        // Stopped or ended since the limit was seen: then there is no recording left to fail.
+        // Contract: stopped-cannot-fail. Stopped or ended since the limit was seen: nothing is left to fail.
         if (stateId != kWaitStartState && stateId != kStartState) {
             return;
         }
         changeState(std::make_shared<ErrorCacheState>(this));
     }
     controller->SetStatus(6, code);
-    if (chunkProduced) {
-        controller->PostEvent(std::make_shared<RestartStreamingEvent>(shared_from_this()));
-    } else {
+    if (!chunkProduced) {
+        // Contract: fault-before-first-chunk. Ends the module for good, whatever the cause was.
         controller->SetStatus(7, 26);
+        return;
+    }
+    MutexLock lock(stateMutex);
+    // The host may have stopped it inside its status. What is stopped must not begin again.
+    if (stateId == kErrorState) {
+        controller->PostEvent(std::make_shared<RestartStreamingEvent>(shared_from_this()));
     }
 }
 
@@ -290,8 +343,12 @@ bool StreamBuffer::MakeFileTimecode(const std::shared_ptr<ChunkData>& chunk) {
     if (tcStatus == 2 && duration != 0) {
         const auto distance =
             static_cast<std::int64_t>(chunk->firstVideo->rtp_timestamp - chunk->firstMeta->rtp_timestamp);
-        // From 90 kHz to 30 kHz, at every frame rate.
-        offset = static_cast<int>((distance / 3 + duration / 2) / duration);
+        if (isExact()) {
+            offset = framesIn(distance);
+        } else {
+            // Contract: timecode-offset-by-3. From 90 kHz to 30 kHz, at every frame rate.
+            offset = static_cast<int>((distance / 3 + duration / 2) / duration);
+        }
     }
     fileTimecode.assign(4, 0);
     bool result = false;
@@ -304,10 +361,16 @@ bool StreamBuffer::MakeFileTimecode(const std::shared_ptr<ChunkData>& chunk) {
             result = true;
         }
     }
+    // Contract: file-first-without-timecode. Logged with zeros then.
     CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: FILE FIRST. %02d:%02d:%02d:%02d. RTPTS = %lld.",
                        fileTimecode[0], fileTimecode[1], fileTimecode[2], fileTimecode[3],
                        static_cast<long long>(chunk->firstVideo->rtp_timestamp));
     return result;
+}
+
+int StreamBuffer::framesIn(std::int64_t distance) const {
+    const double ticks = static_cast<double>(distance) * streamInfo.video_track_timescale / videoRtpRate;
+    return static_cast<int>(std::llround(ticks / streamInfo.video_sample_duration));
 }
 
 unsigned int StreamBuffer::getTimecodeFrameCount(std::uint32_t framerate) {
@@ -326,6 +389,7 @@ unsigned int StreamBuffer::getTimecodeFrameCount(std::uint32_t framerate) {
         case 60000:
             return 60;
         default:
+            // Contract: unknown-frame-rate. Logged here for each file, and where the stream is described.
             CLIPFILE_LOG(LOG_PRIORITY_WARNING, "no type.");
             return 0;
     }

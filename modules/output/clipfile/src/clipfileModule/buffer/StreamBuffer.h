@@ -5,6 +5,7 @@
 #include <cstddef>
 #include <cstdint>
 #include <memory>
+#include <optional>
 #include <string>
 #include <thread>
 #include <vector>
@@ -13,6 +14,7 @@
 #include "StreamAnalyzer.h"
 #include "StreamData.h"
 #include "buffer/ChunkData.h"
+#include "buffer/ChunkPass.h"
 #include "buffer/StreamQueue.h"
 #include "buffer/state/CacheState.h"
 #include "buffer/state/StreamBufferInterface.h"
@@ -31,6 +33,9 @@ namespace clipfileModule {
 /// `Stop` begins again on the same object. `Stop` must have run before destruction. Every public operation
 /// may be called from any thread, at any time in that life.
 ///
+/// Sources: StreamBuffer.cc has life and states, StreamBufferChunk.cc the chunk thread, StreamBufferExact.cc
+/// what is different there with exact rules.
+///
 /// Order of the locks: `controlMutex`, `stateMutex`, `bufferMutex`, and last, one at a time,
 /// `analyzerMutex`, the locks of the queues and of `FileOutput`.
 class StreamBuffer final : public QxModuleStreamInterface,
@@ -48,15 +53,22 @@ class StreamBuffer final : public QxModuleStreamInterface,
     /// stopped. Throws `std::system_error` when no thread can be started.
     void Start(const OutputSettings& recordSettings) EXCLUDES(controlMutex);
     /// Ends the recording: joins its threads, writes the chunks that wait and closes the file. Leaves start
-    /// and stop timestamp at 0 and -1. Does nothing when the buffer is stopped.
+    /// and stop timestamp at 0 and -1. Does nothing when the buffer is stopped. With exact rules what is
+    /// complete in the caches becomes a last chunk before that.
+    ///
+    /// A host can bring a thread of the recording here, out of a status that the thread reports. Throws
+    /// `std::system_error` then: units are dropped from now on, and the next `Stop`, `Start` or the
+    /// destruction on another thread does what is left.
     void Stop() EXCLUDES(controlMutex);
+    /// Sets where the record starts: units before it do not belong to it. Has an effect until the recording
+    /// has met its first IDR frame.
+    void SetStartTimestamp(std::int64_t start) { startTimestamp = start; }
     /// Sets where the record ends; -1 leaves it open.
     void SetStopTimestamp(std::int64_t stop) { stopTimestamp = stop; }
     /// With exact rules: the first instant, in 90 kHz ticks, that does not belong to the record any more; -1
     /// while that is open. The controller sets it before the metadata unit that carries the command reaches
     /// the buffer, so that no chunk can be cut across it, however late the stop itself is carried out.
     void SetEndTimestamp(std::int64_t end) { endTimestamp = end; }
-    std::int64_t GetEndTimestamp() const { return endTimestamp; }
 
     // QxModuleStreamInterface. A push waits while the queue of its medium is full.
     void PushReserved(const std::shared_ptr<StreamData>& unit) override;
@@ -72,6 +84,7 @@ class StreamBuffer final : public QxModuleStreamInterface,
     bool GetFileTimecode(unsigned char* timecode) override EXCLUDES(analyzerMutex);
     std::int64_t GetStartTimestamp() const override { return startTimestamp; }
     std::int64_t GetStopTimestamp() const override { return stopTimestamp; }
+    std::int64_t GetEndTimestamp() const override { return endTimestamp; }
     void NotifyEndSync() override;
 
  private:
@@ -84,6 +97,19 @@ class StreamBuffer final : public QxModuleStreamInterface,
     enum Medium : std::size_t { kVideo = 0, kAudio = 1, kMeta = 2, kMediumCount = 3 };
     static constexpr const char* kMediaTypes[] = {"video", "audio", "meta"};
 
+    /// Units of each medium in a chunk.
+    struct ChunkCounts {
+        std::size_t video;
+        std::size_t audio;
+        std::size_t meta;
+    };
+    /// Where a chunk ends on the time line of unit counts, less half an audio frame: in ticks of the video
+    /// and of the audio track.
+    struct ChunkEnd {
+        std::uint64_t video;
+        std::uint64_t audio;
+    };
+
     // Life cycle and states.
     void pushUnit(const std::shared_ptr<StreamData>& unit, Medium medium) EXCLUDES(stateMutex);
     void updateTimecodeStatus(const std::shared_ptr<StreamData>& unit) EXCLUDES(analyzerMutex);
@@ -92,20 +118,39 @@ class StreamBuffer final : public QxModuleStreamInterface,
                     const char* mediaType) EXCLUDES(bufferMutex);
     void removeBefore(UnitList& cache, std::uint64_t limit) REQUIRES(bufferMutex);
     void setError(int code) EXCLUDES(stateMutex, bufferMutex);
+    void finishStop() REQUIRES(controlMutex) EXCLUDES(bufferMutex);
     void Cancel() REQUIRES(controlMutex) EXCLUDES(bufferMutex);
+    bool isExact() const { return settings.recordRules == RecordRules::kExact; }
+    int framesIn(std::int64_t distance) const;
     static unsigned int getTimecodeFrameCount(std::uint32_t framerate);
 
     // The chunk thread.
     void makeChunk() EXCLUDES(stateMutex, bufferMutex);
     void endSync() EXCLUDES(stateMutex, bufferMutex);
-    int findPassedLimit() const REQUIRES(bufferMutex);
-    int cutChunk() REQUIRES(bufferMutex);
+    PassResult findPassedLimit() const REQUIRES(bufferMutex);
+    PassResult makePass() REQUIRES(bufferMutex);
+    ChunkEnd findChunkEnd(std::size_t pictures) REQUIRES(bufferMutex);
+    std::optional<ChunkCounts> findChunk(std::size_t pictures, std::uint64_t end) REQUIRES(bufferMutex);
+    PassResult pushChunk(const ChunkCounts& counts, std::uint64_t end) REQUIRES(bufferMutex);
+    /// Units in front of `end`.
+    static std::size_t countBefore(const UnitList& cache, std::uint64_t end);
     std::uint64_t rescale(std::uint64_t value, std::uint32_t from, std::uint32_t to) EXCLUDES(analyzerMutex);
-    void splitVideo(ChunkData& chunk, std::size_t count) REQUIRES(bufferMutex);
+    void splitVideo(ChunkData& chunk, std::size_t count, std::uint64_t end) REQUIRES(bufferMutex);
     void splitAudio(ChunkData& chunk, std::size_t count) REQUIRES(bufferMutex);
-    void splitMeta(ChunkData& chunk, std::size_t count) REQUIRES(bufferMutex);
+    void splitMeta(ChunkData& chunk, std::size_t count, std::uint64_t end) REQUIRES(bufferMutex);
     void setDurations(SampleList& samples, std::uint64_t next, std::uint32_t clock, std::uint32_t timescale)
         REQUIRES(analyzerMutex);
+
+    // The chunk thread with exact rules.
+    PassResult makeExactPass() REQUIRES(bufferMutex);
+    void cutRest() REQUIRES(bufferMutex);
+    bool hasTimeline() const;
+    std::uint64_t findEnd() const;
+    bool startInStep() REQUIRES(bufferMutex);
+    bool startInStep(UnitList& cache, std::uint32_t clock) REQUIRES(bufferMutex);
+    void removeFront(UnitList& cache, std::size_t count) REQUIRES(bufferMutex);
+    std::optional<ChunkCounts> findCompleteChunk(std::size_t pictures, std::uint64_t end)
+        REQUIRES(bufferMutex);
 
     // Log helpers.
     void dumpBuffer() const REQUIRES(bufferMutex);
@@ -121,9 +166,13 @@ class StreamBuffer final : public QxModuleStreamInterface,
     const std::uint32_t videoRtpRate = 90000;
     const std::uint32_t audioRtpRate = 48000;
 
-    /// Makes each `Start` and each `Stop` one step to the others.
+    // Contract: start-and-stop-in-turn. Each is one step to the others.
     Mutex controlMutex;
     std::shared_ptr<std::thread> chunkThread GUARDED_BY(controlMutex);
+    /// A stop has begun and threads are left; it stays so when the stop met one of them as its caller.
+    bool stopPending GUARDED_BY(controlMutex) = false;
+    /// What is complete in the caches is still to be cut.
+    bool restPending GUARDED_BY(controlMutex) = false;
 
     /// Guards each call of `Execute` with the change of state that follows it, and every other change.
     Mutex stateMutex;
@@ -139,6 +188,8 @@ class StreamBuffer final : public QxModuleStreamInterface,
     UnitList videoBuffer GUARDED_BY(bufferMutex);
     UnitList audioBuffer GUARDED_BY(bufferMutex);
     UnitList metaBuffer GUARDED_BY(bufferMutex);
+    /// The IDR frame that the record begins with.
+    std::shared_ptr<StreamData> firstPicture GUARDED_BY(bufferMutex);
     /// Units moved into chunks.
     std::uint64_t chunkedVideo GUARDED_BY(bufferMutex) = 0;
     std::uint64_t chunkedAudio GUARDED_BY(bufferMutex) = 0;
@@ -168,7 +219,7 @@ class StreamBuffer final : public QxModuleStreamInterface,
     std::atomic<bool> chunkProduced = false;
     /// 0 unknown, 1 the timecode stands still, 2 it runs. Decided once in the object's life.
     std::atomic<std::int32_t> tcStatus = 0;
-    /// Units received.
+    // Contract: push-counters-unread. Units received.
     std::atomic<std::uint64_t> pushedVideo = 0;
     std::atomic<std::uint64_t> pushedAudio = 0;
     std::atomic<std::uint64_t> pushedMeta = 0;

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <iterator>
+#include <limits>
 #include <utility>
 
 #include "buffer/ChunkTimeline.h"
@@ -13,22 +14,17 @@ namespace clipfileModule {
 
 namespace {
 
-/// Video units that must be cached before a chunk is cut.
-constexpr std::size_t kMinimumVideoUnits = 16;
+// Contract: waiting-fills-a-cache. Audio and metadata are cached while no IDR frame comes.
 /// Units in a cache, and chunks that wait for `FileOutput`; passing one of these ends the recording.
 constexpr std::size_t kVideoLimit = 600;
 constexpr std::size_t kAudioLimit = 900;
 constexpr std::size_t kMetaLimit = 600;
 constexpr std::size_t kFileQueueLimit = 48;
 
-/// Causes of status 6.
-constexpr int kNoError = 0;
-constexpr int kFileTooSlow = 22;
-constexpr int kVideoBufferFull = 23;
-constexpr int kAudioBufferFull = 24;
-constexpr int kMetaBufferFull = 25;
+/// A record whose end is not known.
+constexpr std::uint64_t kNoEnd = std::numeric_limits<std::uint64_t>::max();
 
-const char* messageOf(int error) {
+const char* messageOf(PassResult error) {
     switch (error) {
         case kFileTooSlow:
             return "file access is too slow. buffer is full.";
@@ -44,17 +40,18 @@ const char* messageOf(int error) {
 using UnitList = std::vector<std::shared_ptr<StreamData>>;
 using SampleList = std::vector<std::shared_ptr<nal_access::SampleData>>;
 
-/// Moves the first `count` units of the cache to `units`, and gives the RTP timestamp of the unit that
-/// follows them in `next`, 0 when there is none. False, with nothing done, when the cache is empty or holds
-/// fewer units.
-bool takeUnits(UnitList& cache, std::size_t count, UnitList& units, std::uint64_t& next) {
+/// Moves the first `count` units of the cache to `units`, and gives the RTP timestamp where the last of them
+/// ends in `next`: that of the unit that follows, or, when there is none, `duration` after its own. False,
+/// with nothing done, when the cache is empty or holds fewer units.
+bool takeUnits(UnitList& cache, std::size_t count, std::uint64_t duration, UnitList& units,
+               std::uint64_t& next) {
     if (cache.empty() || cache.size() < count) {
         return false;
     }
     const auto end = cache.begin() + static_cast<std::ptrdiff_t>(count);
     units.assign(std::make_move_iterator(cache.begin()), std::make_move_iterator(end));
     cache.erase(cache.begin(), end);
-    next = cache.empty() ? 0 : cache.front()->rtp_timestamp;
+    next = cache.empty() ? units.back()->rtp_timestamp + duration : cache.front()->rtp_timestamp;
     return true;
 }
 
@@ -69,50 +66,60 @@ std::uint64_t sumOfSizes(const SampleList& samples) {
 }  // namespace
 
 void StreamBuffer::makeChunk() {
-    bool recordEnded = false;
-    int error = kNoError;
+    PassResult result = kGoOn;
     {
         MutexLock lock(bufferMutex);
+        // What was cached before the thread came here has woken nobody.
+        bool passFirst = isExact();
         while (stateId != kStopState) {
             // No predicate: each wake-up makes one pass, whatever woke it.
-            lock.Wait(bufferCondition);
+            if (!passFirst) {
+                lock.Wait(bufferCondition);
+            }
+            passFirst = false;
             if (stateId == kStopState) {
                 break;
             }
-            error = findPassedLimit();
-            if (error != kNoError) {
-                break;
+            result = findPassedLimit();
+            if (result == kGoOn) {
+                result = isExact() ? makeExactPass() : makePass();
+            } else if (isExact()) {
+                cutRest();
             }
-            if (videoBuffer.empty()) {
-                continue;
-            }
-            // In ticks, and unsigned: an open stop of -1 lies above every timestamp.
-            if (static_cast<std::uint64_t>(stopTimestamp.load()) < videoBuffer.front()->rtp_timestamp) {
-                recordEnded = true;
-                break;
-            }
-            if (videoBuffer.size() < kMinimumVideoUnits) {
-                continue;
-            }
-            error = cutChunk();
-            if (error != kNoError) {
+            if (result != kGoOn) {
                 break;
             }
         }
     }
-    // Both wait for the lock of the state, and whoever holds that one may wait for a worker that adds to a
-    // cache: the lock of the caches had to be given back first.
-    if (recordEnded) {
+    // Contract: one-order-of-locks. Both wait for the lock of the state, and whoever holds that one may wait
+    // for a worker that adds to a cache: the lock of the caches had to be given back first.
+    if (result == kRecordEnded) {
         endSync();
-    } else if (error != kNoError) {
-        CLIPFILE_LOG(LOG_PRIORITY_ERROR, "%s", messageOf(error));
-        setError(error);
+    } else if (result != kGoOn) {
+        CLIPFILE_LOG(LOG_PRIORITY_ERROR, "%s", messageOf(result));
+        setError(result);
     }
 }
 
+PassResult StreamBuffer::makePass() {
+    if (videoBuffer.empty()) {
+        return kGoOn;
+    }
+    // Contract: stop-in-two-units. In ticks here, and unsigned: an open stop, -1, is above all.
+    if (static_cast<std::uint64_t>(stopTimestamp.load()) < videoBuffer.front()->rtp_timestamp) {
+        // Contract: record-ends-on-chunk. The last one may hold 7 units beyond the stop.
+        return kRecordEnded;
+    }
+    if (videoBuffer.size() < kMinimumVideoUnits) {
+        return kGoOn;
+    }
+    const std::optional<ChunkCounts> counts = findChunk(chunkFrames, kNoEnd);
+    return counts ? pushChunk(*counts, kNoEnd) : kGoOn;
+}
+
 void StreamBuffer::endSync() {
-    CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: END SYNC REC. RTPTS = %lld.",
-                       static_cast<long long>(stopTimestamp));
+    const std::int64_t end = isExact() ? static_cast<std::int64_t>(findEnd()) : stopTimestamp.load();
+    CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: END SYNC REC. RTPTS = %lld.", static_cast<long long>(end));
     CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "start.");
     MutexLock lock(stateMutex);
     // A stop that came first has ended the record already.
@@ -122,66 +129,81 @@ void StreamBuffer::endSync() {
     CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "end.");
 }
 
-int StreamBuffer::findPassedLimit() const {
+// Contract: full-cache-names-itself. Not the medium that is missing; video is looked at first.
+PassResult StreamBuffer::findPassedLimit() const {
     if (videoBuffer.size() > kVideoLimit) {
         return kVideoBufferFull;
     }
     if (audioBuffer.size() > kAudioLimit) {
         return kAudioBufferFull;
     }
-    return metaBuffer.size() > kMetaLimit ? kMetaBufferFull : kNoError;
+    return metaBuffer.size() > kMetaLimit ? kMetaBufferFull : kGoOn;
 }
 
-int StreamBuffer::cutChunk() {
+StreamBuffer::ChunkEnd StreamBuffer::findChunkEnd(std::size_t pictures) {
     // The time line is made of unit counts. An audio frame belongs to the chunk when it starts, by count, not
     // after the chunk's end less half an audio frame.
     const std::uint64_t audioFrame = rescale(
         streamInfo.audio_sample_duration, streamInfo.audio_track_timescale, streamInfo.video_track_timescale);
-    const std::uint64_t videoEnd =
-        (chunkFrames + chunkedVideo) * streamInfo.video_sample_duration - (audioFrame >> 1);
-    const std::uint64_t audioEnd =
-        rescale(videoEnd, streamInfo.video_track_timescale, streamInfo.audio_track_timescale);
+    const std::uint64_t video =
+        (pictures + chunkedVideo) * streamInfo.video_sample_duration - (audioFrame >> 1);
+    return {video, rescale(video, streamInfo.video_track_timescale, streamInfo.audio_track_timescale)};
+}
+
+std::optional<StreamBuffer::ChunkCounts> StreamBuffer::findChunk(std::size_t pictures, std::uint64_t end) {
+    const ChunkEnd chunkEnd = findChunkEnd(pictures);
     const int audioCount =
-        CountUntil(audioEnd, chunkedAudio, streamInfo.audio_sample_duration, audioBuffer.size());
-    // One metadata unit a video frame.
-    const int metaCount =
-        CountUntil(videoEnd, chunkedMeta, streamInfo.video_sample_duration, metaBuffer.size());
+        CountUntil(chunkEnd.audio, chunkedAudio, streamInfo.audio_sample_duration, audioBuffer.size());
+    // One metadata unit a video frame, and none past the end of the record.
+    int metaCount =
+        CountUntil(chunkEnd.video, chunkedMeta, streamInfo.video_sample_duration, metaBuffer.size());
+    const std::size_t metaBeforeEnd = countBefore(metaBuffer, end);
+    if (metaBeforeEnd < metaBuffer.size() &&
+        (metaCount == -1 || metaBeforeEnd < static_cast<std::size_t>(metaCount))) {
+        metaCount = static_cast<int>(metaBeforeEnd);
+    }
 
     if (audioCount == -1) {
         CLIPFILE_LOG_PLAIN(LOG_PRIORITY_TRACE, "ST: no audio buffer.");
         dumpBuffer();
-        return kNoError;
+        return std::nullopt;
     }
     if (static_cast<std::size_t>(audioCount) >= audioBuffer.size()) {
+        // Contract: incomplete-lines-unreached. A count that was found is below the size.
         CLIPFILE_LOG_PLAIN(LOG_PRIORITY_TRACE, "ST: audio buffer is not complete.");
         dumpBuffer();
-        return kNoError;
+        return std::nullopt;
     }
     if (metaBuffer.empty()) {
+        // Contract: metadata-is-required. And this line alone comes without the caches.
         CLIPFILE_LOG_PLAIN(LOG_PRIORITY_TRACE, "ST: rtmeta buffer is empty.");
-        return kNoError;
+        return std::nullopt;
     }
     if (metaCount == -1) {
         CLIPFILE_LOG_PLAIN(LOG_PRIORITY_TRACE, "ST: no rtmeta buffer.");
         dumpBuffer();
-        return kNoError;
+        return std::nullopt;
     }
     if (static_cast<std::size_t>(metaCount) >= metaBuffer.size()) {
+        // Contract: incomplete-lines-unreached. As above.
         CLIPFILE_LOG_PLAIN(LOG_PRIORITY_TRACE, "ST: rtmeta buffer is not complete.");
         dumpBuffer();
-        return kNoError;
+        return std::nullopt;
     }
+    return ChunkCounts{pictures, static_cast<std::size_t>(audioCount), static_cast<std::size_t>(metaCount)};
+}
 
+PassResult StreamBuffer::pushChunk(const ChunkCounts& counts, std::uint64_t end) {
     auto chunk = std::make_shared<ChunkData>();
     chunk->firstVideo = videoBuffer.front();
     chunk->firstMeta = metaBuffer.front();
-    splitVideo(*chunk, chunkFrames);
-    splitAudio(*chunk, static_cast<std::size_t>(audioCount));
-    splitMeta(*chunk, static_cast<std::size_t>(metaCount));
+    splitVideo(*chunk, counts.video, end);
+    splitAudio(*chunk, counts.audio);
+    splitMeta(*chunk, counts.meta, end);
     dumpChunk(*chunk);
-    chunkedVideo += chunkFrames;
-    chunkedAudio += static_cast<std::uint64_t>(audioCount);
-    chunkedMeta += static_cast<std::uint64_t>(metaCount);
+    chunkedVideo += counts.video;
+    chunkedAudio += counts.audio;
+    chunkedMeta += counts.meta;
 
     // The cadence is never 0 here: without a frame rate the time line of the metadata stands still, and no
     // chunk was complete.
@@ -195,18 +217,31 @@ int StreamBuffer::cutChunk() {
     }
     chunk->size = sumOfSizes(chunk->video) + sumOfSizes(chunk->audio) + sumOfSizes(chunk->meta);
     if (chunk->video.empty() && chunk->audio.empty() && chunk->meta.empty()) {
-        return kNoError;
+        return kGoOn;
     }
 
     const std::size_t queued = fileOutput->PushChunk(chunk);
+    // Contract: first-chunk-counts-for-life. Never cleared, also not by a restart.
     chunkProduced = true;
-    CLIPFILE_LOG_PLAIN(LOG_PRIORITY_TRACE, "ST: [C]\t%d\t%d\t%d\t%llu", static_cast<int>(chunkFrames),
-                       audioCount, metaCount, static_cast<unsigned long long>(queued));
+    CLIPFILE_LOG_PLAIN(LOG_PRIORITY_TRACE, "ST: [C]\t%d\t%d\t%d\t%llu", static_cast<int>(counts.video),
+                       static_cast<int>(counts.audio), static_cast<int>(counts.meta),
+                       static_cast<unsigned long long>(queued));
     if (queued > kFileQueueLimit) {
+        // Contract: late-chunk-is-written. The chunk that was one too many stays queued.
         return kFileTooSlow;
     }
     dumpBuffer();
-    return kNoError;
+    return kGoOn;
+}
+
+std::size_t StreamBuffer::countBefore(const UnitList& cache, std::uint64_t end) {
+    if (end == kNoEnd) {
+        return cache.size();
+    }
+    const auto first = std::lower_bound(
+        cache.begin(), cache.end(), end,
+        [](const std::shared_ptr<StreamData>& unit, std::uint64_t rtp) { return unit->rtp_timestamp < rtp; });
+    return static_cast<std::size_t>(first - cache.begin());
 }
 
 std::uint64_t StreamBuffer::rescale(std::uint64_t value, std::uint32_t from, std::uint32_t to) {
@@ -214,21 +249,25 @@ std::uint64_t StreamBuffer::rescale(std::uint64_t value, std::uint32_t from, std
     return analyzer.ConvertTimestamp(value, from, to);
 }
 
-void StreamBuffer::splitVideo(ChunkData& chunk, std::size_t count) {
+void StreamBuffer::splitVideo(ChunkData& chunk, std::size_t count, std::uint64_t end) {
     UnitList units;
     std::uint64_t next = 0;
-    if (!takeUnits(videoBuffer, count, units, next)) {
+    const std::uint64_t duration =
+        rescale(streamInfo.video_sample_duration, streamInfo.video_track_timescale, videoRtpRate);
+    if (!takeUnits(videoBuffer, count, duration, units, next)) {
         return;
     }
     MutexLock lock(analyzerMutex);
     analyzer.ConvertVideo(units, chunk.video);
-    setDurations(chunk.video, next, videoRtpRate, streamInfo.video_track_timescale);
+    setDurations(chunk.video, std::min(next, end), videoRtpRate, streamInfo.video_track_timescale);
 }
 
 void StreamBuffer::splitAudio(ChunkData& chunk, std::size_t count) {
     UnitList units;
     std::uint64_t next = 0;
-    if (!takeUnits(audioBuffer, count, units, next)) {
+    const std::uint64_t duration =
+        rescale(streamInfo.audio_sample_duration, streamInfo.audio_track_timescale, audioRtpRate);
+    if (!takeUnits(audioBuffer, count, duration, units, next)) {
         return;
     }
     MutexLock lock(analyzerMutex);
@@ -236,17 +275,20 @@ void StreamBuffer::splitAudio(ChunkData& chunk, std::size_t count) {
     setDurations(chunk.audio, next, audioRtpRate, streamInfo.audio_track_timescale);
 }
 
-void StreamBuffer::splitMeta(ChunkData& chunk, std::size_t count) {
+void StreamBuffer::splitMeta(ChunkData& chunk, std::size_t count, std::uint64_t end) {
     UnitList units;
     std::uint64_t next = 0;
-    if (!takeUnits(metaBuffer, count, units, next)) {
+    const std::uint64_t duration =
+        rescale(streamInfo.video_sample_duration, streamInfo.video_track_timescale, videoRtpRate);
+    if (!takeUnits(metaBuffer, count, duration, units, next)) {
         return;
     }
     MutexLock lock(analyzerMutex);
     analyzer.ConvertMeta(units, chunk.meta, metaBlock);
-    setDurations(chunk.meta, next, videoRtpRate, streamInfo.video_track_timescale);
+    setDurations(chunk.meta, std::min(next, end), videoRtpRate, streamInfo.video_track_timescale);
 }
 
+// Contract: rtp-durations-only-logged. Files take theirs from the frame rate.
 void StreamBuffer::setDurations(SampleList& samples, std::uint64_t next, std::uint32_t clock,
                                 std::uint32_t timescale) {
     for (std::size_t i = 0; i < samples.size(); ++i) {
@@ -259,7 +301,7 @@ void StreamBuffer::setDurations(SampleList& samples, std::uint64_t next, std::ui
 void StreamBuffer::dumpBuffer() const {
     CLIPFILE_LOG_PLAIN(LOG_PRIORITY_TRACE, "ST: [B]\t%d\t%d\t%d", static_cast<int>(videoBuffer.size()),
                        static_cast<int>(audioBuffer.size()), static_cast<int>(metaBuffer.size()));
-    // No copies are needed: the lock keeps the caches as they are.
+    // Contract: dump-without-copies. The lock keeps the caches as they are.
     const auto rtp = [](const std::shared_ptr<StreamData>& unit) {
         return static_cast<unsigned long long>(unit->rtp_timestamp);
     };

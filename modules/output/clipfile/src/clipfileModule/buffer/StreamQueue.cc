@@ -16,9 +16,18 @@ void StreamQueue::Start(std::function<void(std::shared_ptr<StreamData>&)> unitHa
 
 void StreamQueue::Stop() {
     running = false;
-    // Closing takes the place of a stop unit: that one would have to wait for room in a full queue whose
-    // worker may have gone.
+    // Contract: closed-queues. A stop unit would have to wait for room in a full queue whose worker may have
+    // gone.
     queue.Close();
+    join();
+}
+
+void StreamQueue::Finish() {
+    queue.Finish();
+    join();
+}
+
+void StreamQueue::join() {
     if (thread != nullptr && thread->joinable()) {
         thread->join();
     }
@@ -27,8 +36,11 @@ void StreamQueue::Stop() {
 void StreamQueue::run() {
     while (running) {
         std::shared_ptr<StreamData> unit = queue.Pop();
-        // A null unit says that the queue was closed.
-        if (unit != nullptr && unit->size != 0) {
+        if (unit == nullptr) {
+            // The queue was closed, or finished and is empty.
+            break;
+        }
+        if (unit->size != 0) {
             handler(unit);
         }
     }

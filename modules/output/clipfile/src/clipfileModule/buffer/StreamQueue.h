@@ -19,8 +19,8 @@ using StreamDataQueue =
 
 /// A bounded queue with a worker thread that hands each unit to a handler.
 ///
-/// Life: construction, `Start`, any number of pushes on `queue`, `Stop`. `Stop` must have run before
-/// destruction.
+/// Life: construction, `Start`, any number of pushes on `queue`, `Stop` or `Finish`. One of these must have
+/// run before destruction.
 class StreamQueue {
  public:
     StreamQueue(std::uint64_t capacity, bool dropWhenFull);
@@ -34,11 +34,15 @@ class StreamQueue {
     /// `std::system_error` when the worker cannot be joined, as by itself.
     void Stop();
 
+    /// As `Stop`, but the worker first handles the units that wait.
+    void Finish();
+
     /// Producers push here directly.
     StreamDataQueue queue;
 
  private:
     void run();
+    void join();
 
     std::unique_ptr<std::thread> thread;
     std::function<void(std::shared_ptr<StreamData>&)> handler;

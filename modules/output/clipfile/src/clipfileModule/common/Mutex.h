@@ -61,6 +61,11 @@ class CLIPFILE_THREAD_ATTRIBUTE(scoped_lockable) MutexLock {
         SchedulePoint();
         condition.wait(lock_);
     }
+    /// As `Wait`, but not beyond `deadline`: false once that has passed.
+    bool WaitUntil(std::condition_variable& condition, std::chrono::steady_clock::time_point deadline) {
+        SchedulePoint();
+        return condition.wait_until(lock_, deadline) == std::cv_status::no_timeout;
+    }
 
  private:
     std::unique_lock<std::mutex> lock_;

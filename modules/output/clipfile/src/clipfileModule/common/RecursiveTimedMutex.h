@@ -8,6 +8,7 @@
 
 namespace clipfileModule {
 
+// Contract: timed-lock-of-our-own. The thread sanitizer does not know the standard one's wait.
 /// Has the operations and the effect of `std::recursive_timed_mutex`, for locks that are held for long and
 /// taken rarely. GCC's thread sanitizer follows every step of it; of the standard one it does not know the
 /// call that waits on the steady clock (pthread_mutex_clocklock).

@@ -33,6 +33,7 @@ const std::string kParameterFramerate = "-encodedFPS";
 const std::string kParameterBitrate = "-encodedBPS";
 const std::string kParameterRecordRules = "-recordRules";
 
+// Contract: output-path-none. A path of this name cannot be given as start parameter.
 constexpr const char* kNoOutputPath = "none";
 
 constexpr const char* kRecordRulesKept = "kept";
@@ -69,14 +70,26 @@ Controller::Controller() = default;
 Controller::~Controller() = default;
 
 bool Controller::Initialize(QxModuleHostInterface* moduleHost) {
+    if (IsRunning()) {
+        CLIPFILE_LOG(LOG_PRIORITY_WARNING, "initialize is called twice.");
+        return true;
+    }
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
     recFlag = -1;
+    strayUnitNoted = false;
     host = moduleHost;
     eventPending = false;
     terminated = false;
+    const auto channel = std::make_shared<StatusChannel>(moduleHost);
+    {
+        MutexLock lock(statusMutex);
+        statusChannel = channel;
+    }
+    // Contract: static-config-never-fails. A guard that nothing reaches.
     if (!getStaticConfig()) {
         CLIPFILE_LOG(LOG_PRIORITY_ERROR, "end. static config error.");
         SetStatus(kStatusFailed, kCauseInitialize);
+        endStatusChannel();
         return false;
     }
     {
@@ -86,9 +99,12 @@ bool Controller::Initialize(QxModuleHostInterface* moduleHost) {
     if (!getStartParameters()) {
         CLIPFILE_LOG(LOG_PRIORITY_ERROR, "end. file output path is none.");
         SetStatus(kStatusFailed, kCauseInitialize);
+        endStatusChannel();
         return false;
     }
     const OutputSettings now = getSettings();
+    isExact = now.recordRules == RecordRules::kExact;
+    isSync = isOutputMode(kOutputModeSync);
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "file output path = %s.", now.outputPath.c_str());
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "fileType   = %s.", now.fileType.c_str());
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "naluType   = %s.", now.naluType.c_str());
@@ -111,14 +127,15 @@ bool Controller::Initialize(QxModuleHostInterface* moduleHost) {
     queueThreads.resize(kQueueCount);
     queues.resize(kQueueCount);
     const UnitConsumer consumers[kQueueCount] = {
-        [this](const std::shared_ptr<StreamData>& unit) { pushToBuffers(&StreamBuffer::PushVideo, unit); },
-        [this](const std::shared_ptr<StreamData>& unit) { pushToBuffers(&StreamBuffer::PushAudio, unit); },
+        [this](const std::shared_ptr<StreamData>& unit) { pushToBuffers(Medium::kVideo, unit); },
+        [this](const std::shared_ptr<StreamData>& unit) { pushToBuffers(Medium::kAudio, unit); },
         [this](const std::shared_ptr<StreamData>& unit) { processMeta(unit); },
     };
     for (std::size_t i = 0; i < kQueueCount; ++i) {
         startQueueThread(i, consumers[i]);
         CLIPFILE_LOG(LOG_PRIORITY_TRACE, "count = %d.", static_cast<int>(i));
     }
+    intake = channel.get();
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
     return true;
 }
@@ -136,6 +153,7 @@ bool Controller::getStaticConfig() {
         for (const auto& [key, field] : fields) {
             std::string value;
             if (!registry->getValue(kSettingsSection, key, value)) {
+                // Contract: missing-text-is-empty. Only a missing number is logged.
                 value.clear();
             }
             *field = value;
@@ -172,6 +190,7 @@ bool Controller::getStartParameters() {
     MutexLock lock(settingsMutex);
     settings.filePrefix = filePrefix;
     if (outputPath != kNoOutputPath) {
+        // Contract: settings-path-keeps-slashes. A path of the settings store stands as it was written.
         std::replace(outputPath.begin(), outputPath.end(), '/', '\\');
         settings.outputPath = outputPath;
     }
@@ -184,6 +203,7 @@ bool Controller::getStartParameters() {
     settings.naluType = naluType;
     settings.outputMode = outputMode;
     settings.recordRules = recordRules;
+    // Contract: stream-start-is-0. Nothing else sets it.
     settings.streamStart = 0;
     settings.bitrate = bitrate;
     settings.framerate = framerate;
@@ -196,6 +216,12 @@ void Controller::startQueueThread(std::size_t index, const UnitConsumer& consume
     MutexLock lock(queueStartMutex);
     queueThreadStarted = false;
     queues[index] = std::make_shared<StreamDataQueue>(queueCapacity, dropWhenFull);
+    if (isExact) {
+        queues[index]->SetFlushPredicate([this, index](const std::shared_ptr<StreamData>& unit) {
+            noteFlushed(static_cast<Medium>(index), unit);
+            return true;
+        });
+    }
     queueThreads[index] = std::make_shared<std::thread>(&Controller::queueing, this, queues[index], consumer);
     while (!queueThreadStarted) {
         lock.Wait(queueStartCondition);
@@ -207,12 +233,17 @@ OutputSettings Controller::getSettings() const {
     return settings;
 }
 
+// Contract: unknown-output-mode. Any other mode records nothing, without a word.
 bool Controller::isOutputMode(const char* mode) const {
     MutexLock lock(settingsMutex);
     return settings.outputMode == mode;
 }
 
 void Controller::Uninitialize() {
+    if (intake.exchange(nullptr) == nullptr) {
+        CLIPFILE_LOG(LOG_PRIORITY_WARNING, "uninitialize is called without initialize.");
+        return;
+    }
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
     terminated = true;
     if (eventThread->joinable()) {
@@ -225,27 +256,36 @@ void Controller::Uninitialize() {
     stopAndRemoveBuffers();
     for (std::size_t i = 0; i < queueThreads.size(); ++i) {
         queues[i]->Clear();
-        // Closing wakes the thread, which then finds `terminated`.
+        // Contract: closed-queues. Closing wakes the thread, which then finds `terminated`.
         queues[i]->Close();
         if (queueThreads[i]->joinable()) {
             queueThreads[i]->join();
         }
     }
-    // The metadata thread may have been on its way into StartStream with the record flag of its last unit.
+    // Contract: last-start-is-ended. The metadata thread may have been in StartStream with its last unit.
     stopAndRemoveBuffers();
+    {
+        MutexLock lock(streamBuffersMutex);
+        forgetPreRoll();
+        preRoll = PreRoll();
+    }
     queueThreads.clear();
     queues.clear();
     eventHandlers.clear();
     {
-        // What stayed undelivered, the TerminateEvent above all, must not end a later run.
+        // Contract: undelivered-events-dropped. The TerminateEvent above all must not end a later run.
         MutexLock lock(eventQueueMutex);
         eventQueue.clear();
     }
-    host = nullptr;
+    endStatusChannel();
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
 void Controller::Execute() {
+    if (!IsRunning()) {
+        CLIPFILE_LOG(LOG_PRIORITY_WARNING, "execute is called without initialize.");
+        return;
+    }
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
     PostEvent(std::make_shared<TransferStatusNotifyEvent>(
         std::map<std::string, std::string>{{kFileOutputStatusKey, kFileOutputStatusStandby}}));
@@ -253,9 +293,24 @@ void Controller::Execute() {
 }
 
 void Controller::SetStatus(int status, int cause) {
-    if (host->GetStatus() != kStatusFailed) {
-        host->SetStatus(status, cause);
+    if (const std::shared_ptr<StatusChannel> channel = getStatusChannel(); channel != nullptr) {
+        channel->Set(status, cause);
     }
+}
+
+std::shared_ptr<StatusChannel> Controller::getStatusChannel() const {
+    MutexLock lock(statusMutex);
+    return statusChannel;
+}
+
+void Controller::endStatusChannel() {
+    std::shared_ptr<StatusChannel> ended;
+    {
+        MutexLock lock(statusMutex);
+        ended.swap(statusChannel);
+    }
+    ended->Close();
+    host = nullptr;
 }
 
 }  // namespace clipfileModule

@@ -1,9 +1,11 @@
 #pragma once
 
+#include <array>
 #include <atomic>
 #include <condition_variable>
 #include <cstdint>
 #include <deque>
+#include <exception>
 #include <functional>
 #include <list>
 #include <map>
@@ -19,10 +21,11 @@
 #include "common/Mutex.h"
 #include "controller/ControllerInterface.h"
 #include "controller/OutputSettings.h"
+#include "controller/PreRoll.h"
+#include "controller/Recording.h"
+#include "controller/StatusChannel.h"
 
 namespace clipfileModule {
-
-class StreamBuffer;
 
 /// The centre of the module: reads the configuration, owns the intake of the stream and its threads, turns
 /// record commands into recordings, and runs on a thread of its own, one event at a time, whatever must not
@@ -30,6 +33,7 @@ class StreamBuffer;
 ///
 /// Life: construction starts nothing. `Initialize` starts the event thread and three queue threads; after it
 /// has returned true, `Uninitialize` must run before destruction, and `Initialize` may run again after that.
+/// Calls of a host outside this order that can be told change nothing and are logged at priority 5.
 class Controller : public ControllerInterface, public QxModuleStreamInterface {
  public:
     Controller();
@@ -37,12 +41,13 @@ class Controller : public ControllerInterface, public QxModuleStreamInterface {
 
     /// Reads the settings store and the start parameters of `moduleHost`, which must live until
     /// `Uninitialize`, and starts the threads. False when no output path is known: the host then has status
-    /// 7, cause 2, and no thread runs. Throws `std::system_error` when a thread cannot be started.
+    /// 7, cause 2, and no thread runs. Throws `std::system_error` when a thread cannot be started. A life
+    /// that runs already goes on with the host that it has, and the result is true.
     bool Initialize(QxModuleHostInterface* moduleHost);
-    /// Ends the event thread, every recording and every queue thread, in this order. Only after a successful
-    /// `Initialize`, once the host has stopped pushing.
+    /// Ends the event thread, every recording and every queue thread, in this order, once the host has
+    /// stopped pushing. Nothing outside a life.
     void Uninitialize();
-    /// Posts the first status map, "standby".
+    /// Posts the first status map, "standby". Nothing outside a life.
     void Execute();
 
     void PostEvent(std::shared_ptr<Event> event) override;
@@ -50,9 +55,11 @@ class Controller : public ControllerInterface, public QxModuleStreamInterface {
     void BufferingStart() override;
     void BufferingStop() override;
     void SetStatus(int status, int cause) override;
+    bool IsRunning() const override { return intake != nullptr; }
 
     /// The pushes cost one status query, one reference and one push under the queue's own lock. A unit that
-    /// finds its queue full is lost and logged; with status 7 all units are dropped in silence.
+    /// finds its queue full is lost and logged; with status 7 all units are dropped in silence. Outside a
+    /// life the first unit of a run is logged.
     void PushReserved(const std::shared_ptr<StreamData>& unit) override;
     void PushVideo(const std::shared_ptr<StreamData>& unit) override;
     void PushAudio(const std::shared_ptr<StreamData>& unit) override;
@@ -64,13 +71,15 @@ class Controller : public ControllerInterface, public QxModuleStreamInterface {
     using UnitConsumer = std::function<void(const std::shared_ptr<StreamData>&)>;
     using EventHandler = std::function<void(std::shared_ptr<Event>)>;
 
-    /// Places of the three media in `queues` and `queueThreads`.
-    enum QueueIndex : std::size_t { kVideoQueue, kAudioQueue, kMetaQueue, kQueueCount };
+    /// One queue and one thread for each `Medium`, in this order.
+    static constexpr std::size_t kQueueCount = 3;
 
     // Configuration (Controller.cc).
     bool getStaticConfig();
     bool getStartParameters();
     void startQueueThread(std::size_t index, const UnitConsumer& consumer);
+    void endStatusChannel() EXCLUDES(statusMutex);
+    std::shared_ptr<StatusChannel> getStatusChannel() const EXCLUDES(statusMutex);
     OutputSettings getSettings() const EXCLUDES(settingsMutex);
     bool isOutputMode(const char* mode) const EXCLUDES(settingsMutex);
 
@@ -84,18 +93,22 @@ class Controller : public ControllerInterface, public QxModuleStreamInterface {
     void OnTerminate(const std::shared_ptr<Event>& event);
 
     // Intake and record commands (ControllerStream.cc).
-    bool pushUnit(std::size_t index, const std::shared_ptr<StreamData>& unit);
+    bool pushUnit(Medium medium, const std::shared_ptr<StreamData>& unit);
+    void noteStrayUnit();
     void queueing(const std::shared_ptr<StreamDataQueue>& queue, UnitConsumer consumer);
     void processMeta(const std::shared_ptr<StreamData>& unit);
     std::int32_t readRecFlag(const StreamData& unit) EXCLUDES(analyzerMutex);
     std::shared_ptr<nal_access::SampleData> readTimecode(const std::shared_ptr<StreamData>& unit)
         EXCLUDES(analyzerMutex);
-    void pushToBuffers(void (StreamBuffer::*push)(const std::shared_ptr<StreamData>&),
-                       const std::shared_ptr<StreamData>& unit) EXCLUDES(streamBuffersMutex);
+    static void pushTo(StreamBuffer& buffer, Medium medium, const std::shared_ptr<StreamData>& unit);
+    void pushToBuffers(Medium medium, const std::shared_ptr<StreamData>& unit) EXCLUDES(streamBuffersMutex);
     void StartStream(const std::shared_ptr<StreamData>& unit) EXCLUDES(streamBuffersMutex);
-    void StopStream(const std::shared_ptr<StreamData>& unit) EXCLUDES(streamBuffersMutex);
+    void StopStream(const std::shared_ptr<StreamData>& unit, std::uint64_t order)
+        EXCLUDES(streamBuffersMutex);
     void RemoveStream(const std::shared_ptr<StreamBuffer>& buffer) EXCLUDES(streamBuffersMutex);
+    std::exception_ptr stopBuffers() REQUIRES(streamBuffersMutex);
     void stopAndRemoveBuffers() EXCLUDES(streamBuffersMutex);
+    bool restart(const RestartStreamingEvent& event) EXCLUDES(streamBuffersMutex);
     void flushQueues();
     void OnChangeInStreamInfo(const std::shared_ptr<Event>& event);
     void OnStartStream(const std::shared_ptr<Event>& event);
@@ -103,12 +116,24 @@ class Controller : public ControllerInterface, public QxModuleStreamInterface {
     void OnRetartStream(const std::shared_ptr<Event>& event);
     void OnRemoveStreaming(const std::shared_ptr<Event>& event);
 
+    // What exact rules add (ControllerExact.cc). Nothing happens in them with kept rules.
+    void followCommand(const StreamData& unit) EXCLUDES(streamBuffersMutex);
+    void endRecordings(std::int64_t end) EXCLUDES(streamBuffersMutex);
+    void replayInto(const Recording& recording, std::int64_t start) REQUIRES(streamBuffersMutex);
+    bool keepsStop(const Recording& recording) const REQUIRES(streamBuffersMutex);
+    void startBehindStream(Recording& recording) REQUIRES(streamBuffersMutex);
+    void keepUnit(Medium medium, const std::shared_ptr<StreamData>& unit) REQUIRES(streamBuffersMutex);
+    void noteFlushed(Medium medium, const std::shared_ptr<StreamData>& unit);
+    void forgetPreRoll() REQUIRES(streamBuffersMutex);
+
     // Changed by Initialize and Uninitialize only, while none of the module's threads runs.
     QxModuleHostInterface* host = nullptr;
     std::vector<std::shared_ptr<std::thread>> queueThreads;
     std::vector<std::shared_ptr<StreamDataQueue>> queues;
     std::map<int, EventHandler> eventHandlers;
     std::shared_ptr<std::thread> eventThread;
+    bool isExact = false;
+    bool isSync = false;
 
     // Constant after construction.
     const int queueCapacity = 50;
@@ -119,12 +144,31 @@ class Controller : public ControllerInterface, public QxModuleStreamInterface {
     const std::uint32_t defaultFramerate = 29970;
     const std::uint32_t defaultBitrate = 60000;
 
+    mutable Mutex statusMutex;
+    /// Null outside a life. Copied for each use: a thread that was given up may come for it late.
+    std::shared_ptr<StatusChannel> statusChannel GUARDED_BY(statusMutex);
+    /// The same for the pushes, which the host keeps inside a life. Null from the first moment of
+    /// `Uninitialize` on.
+    std::atomic<const StatusChannel*> intake = nullptr;
+    /// A unit came outside a life, and was logged.
+    std::atomic<bool> strayUnitNoted = false;
+
+    /// Numbers the commands in the order in which they are given: events when they are posted, recordings
+    /// when they are made and stopped.
+    std::atomic<std::uint64_t> commandOrder = 0;
+
     /// Held while a unit goes to the recordings and during every command, so that no unit falls into a
     /// change.
     Mutex streamBuffersMutex;
     /// One entry a recording in progress or in completion, oldest first.
-    std::list<std::shared_ptr<StreamBuffer>> streamBuffers GUARDED_BY(streamBuffersMutex);
+    std::list<Recording> streamBuffers GUARDED_BY(streamBuffersMutex);
+    /// With exact rules: the stream as it was handed to the recordings, kept in "sync" mode.
+    PreRoll preRoll GUARDED_BY(streamBuffersMutex);
+    /// With exact rules: the latest `timestamp` of each medium that a flush has dropped since the pre-roll
+    /// was told.
+    std::array<std::atomic<std::uint64_t>, kQueueCount> flushedUntil = {};
 
+    // Contract: locks-for-shared-state. Settings and analyser serve several threads.
     /// Innermost lock: a connected input changes the settings while a recording starts from them.
     mutable Mutex settingsMutex;
     OutputSettings settings GUARDED_BY(settingsMutex);
@@ -141,6 +185,7 @@ class Controller : public ControllerInterface, public QxModuleStreamInterface {
     std::condition_variable queueStartCondition;
     bool queueThreadStarted GUARDED_BY(queueStartMutex) = false;
 
+    // Contract: atomic-flags. Others read them without the lock that guards the events.
     /// Once true, every thread of the Controller ends.
     std::atomic<bool> terminated = false;
 

@@ -14,6 +14,7 @@ void Controller::PostEvent(std::shared_ptr<Event> event) {
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
+// Contract: send-event-unused. Two in a row run in reverse order.
 void Controller::SendEvent(std::shared_ptr<Event> event) {
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start. event_id = %d.", event->id);
     enqueueEvent(std::move(event), true);
@@ -23,6 +24,7 @@ void Controller::SendEvent(std::shared_ptr<Event> event) {
 void Controller::enqueueEvent(std::shared_ptr<Event> event, bool atHead) {
     {
         MutexLock lock(eventQueueMutex);
+        event->order = ++commandOrder;
         if (atHead) {
             eventQueue.push_front(std::move(event));
         } else {
@@ -87,8 +89,8 @@ void Controller::EventLoop() {
 
 void Controller::waitForEvent(bool firstWait) {
     MutexLock lock(eventQueueMutex);
-    // An event that was posted before the thread first came here waits for a later signal; that is how the
-    // loop has always started. From then on the wait is not entered while there is something to do.
+    // Contract: first-post-may-wait. A post before the thread first comes here waits for a later signal.
+    // Contract: event-wait-tests-first. From then on the wait is not entered while there is work to do.
     if (terminated || (!firstWait && !eventQueue.empty())) {
         return;
     }
@@ -100,12 +102,14 @@ void Controller::OnTransferStatusNotify(const std::shared_ptr<Event>& event) {
     const std::map<std::string, std::string> status =
         std::static_pointer_cast<TransferStatusNotifyEvent>(event)->status;
     const int result = host->SendTransmissionStatus(status);
+    // Contract: refused-map-not-repeated. The log has the only trace.
     if (result != 0) {
         CLIPFILE_LOG(LOG_PRIORITY_ERROR, "SendTransmissionStatus() failed. result = %d.", result);
     }
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
+// Contract: terminate-event-undelivered. Runs only when the event lands in a drain.
 void Controller::OnTerminate(const std::shared_ptr<Event>&) {
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
     terminated = true;

@@ -18,8 +18,12 @@ class ControllerInterface {
     virtual void BufferingStart() = 0;
     /// Stops every recording: status 3.
     virtual void BufferingStop() = 0;
-    /// Tells the host status and cause, unless the host already holds the final status 7.
+    /// Tells the host status and cause, unless the final status 7 came before or the host already holds it.
+    /// While another thread tells the host something, that thread goes on with this status, and the call
+    /// returns at once.
     virtual void SetStatus(int status, int cause) = 0;
+    /// True while the module may be called: from a successful `Initialize` to `Uninitialize`.
+    virtual bool IsRunning() const { return true; }
 };
 
 }  // namespace clipfileModule

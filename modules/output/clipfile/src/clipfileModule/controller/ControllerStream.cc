@@ -2,6 +2,7 @@
 // of a command from the place where it arises to a recording with start and stop timestamps.
 
 #include <algorithm>
+#include <system_error>
 #include <utility>
 
 #include "buffer/StreamBuffer.h"
@@ -13,12 +14,6 @@ namespace clipfileModule {
 
 namespace {
 
-/// Stop timestamp of a recording that is open.
-constexpr std::int64_t kOpenStop = -1;
-
-constexpr const char* kOutputModeOn = "on";
-constexpr const char* kOutputModeSync = "sync";
-
 /// The host system's printf formats are as wide as `long long`.
 long long wide(std::int64_t value) {
     return value;
@@ -29,25 +24,42 @@ long long wide(std::int64_t value) {
 void Controller::PushReserved(const std::shared_ptr<StreamData>&) {}
 
 void Controller::PushVideo(const std::shared_ptr<StreamData>& unit) {
-    if (!pushUnit(kVideoQueue, unit)) {
+    // Contract: overflow-only-logged. No status, no count.
+    if (!pushUnit(Medium::kVideo, unit)) {
         CLIPFILE_LOG(LOG_PRIORITY_WARNING, "queue overflow (video)");
     }
 }
 
 void Controller::PushAudio(const std::shared_ptr<StreamData>& unit) {
-    if (!pushUnit(kAudioQueue, unit)) {
+    if (!pushUnit(Medium::kAudio, unit)) {
         CLIPFILE_LOG(LOG_PRIORITY_WARNING, "queue overflow (audio)");
     }
 }
 
 void Controller::PushMeta(const std::shared_ptr<StreamData>& unit) {
-    if (!pushUnit(kMetaQueue, unit)) {
+    if (!pushUnit(Medium::kMeta, unit)) {
         CLIPFILE_LOG(LOG_PRIORITY_WARNING, "queue overflow (meta)");
     }
 }
 
-bool Controller::pushUnit(std::size_t index, const std::shared_ptr<StreamData>& unit) {
-    return host->GetStatus() == kStatusFailed || queues[index]->Push(unit);
+bool Controller::pushUnit(Medium medium, const std::shared_ptr<StreamData>& unit) {
+    const StatusChannel* const channel = intake;
+    if (channel == nullptr) {
+        noteStrayUnit();
+        return true;
+    }
+    // Contract: silent-after-status-7. Dropped units are not logged. Both are asked: the host's status may be
+    // older than the module's 7, and a host may hold a 7 of its own.
+    if (channel->IsFinal() || host->GetStatus() == kStatusFailed) {
+        return true;
+    }
+    return queues[static_cast<std::size_t>(medium)]->Push(unit);
+}
+
+void Controller::noteStrayUnit() {
+    if (!strayUnitNoted.exchange(true)) {
+        CLIPFILE_LOG(LOG_PRIORITY_WARNING, "unit is pushed without initialize.");
+    }
 }
 
 void Controller::queueing(const std::shared_ptr<StreamDataQueue>& queue, UnitConsumer consumer) {
@@ -59,6 +71,7 @@ void Controller::queueing(const std::shared_ptr<StreamDataQueue>& queue, UnitCon
     }
     while (!terminated) {
         const std::shared_ptr<StreamData> unit = queue->Pop();
+        // Contract: empty-unit-two-tests. By payload here, by size behind the recordings' queues.
         if (unit != nullptr && unit->payload != nullptr) {
             consumer(unit);
         }
@@ -66,29 +79,49 @@ void Controller::queueing(const std::shared_ptr<StreamDataQueue>& queue, UnitCon
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
-void Controller::pushToBuffers(void (StreamBuffer::*push)(const std::shared_ptr<StreamData>&),
-                               const std::shared_ptr<StreamData>& unit) {
+void Controller::pushTo(StreamBuffer& buffer, Medium medium, const std::shared_ptr<StreamData>& unit) {
+    switch (medium) {
+        case Medium::kVideo:
+            buffer.PushVideo(unit);
+            break;
+        case Medium::kAudio:
+            buffer.PushAudio(unit);
+            break;
+        case Medium::kMeta:
+            buffer.PushMeta(unit);
+            break;
+    }
+}
+
+void Controller::pushToBuffers(Medium medium, const std::shared_ptr<StreamData>& unit) {
     MutexLock lock(streamBuffersMutex);
-    for (const std::shared_ptr<StreamBuffer>& buffer : streamBuffers) {
-        (*buffer.*push)(unit);
+    keepUnit(medium, unit);
+    for (const Recording& recording : streamBuffers) {
+        pushTo(*recording.buffer, medium, unit);
     }
 }
 
 void Controller::processMeta(const std::shared_ptr<StreamData>& unit) {
     if (isOutputMode(kOutputModeSync)) {
         const std::int32_t flag = readRecFlag(*unit);
+        // Contract: first-unit-is-a-change. -1 differs from both values of a flag.
         if (flag != recFlag) {
             recFlag = flag;
             if (flag == 1) {
                 CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: REC FLAG OFF -> ON.");
+                followCommand(*unit);
+                // Contract: start-direct-stop-posted. A start holds for this very unit, a stop may be late.
                 StartStream(unit);
             } else {
                 CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: REC FLAG ON -> OFF.");
+                // In this order: a recording that meets its end asks for its removal, and the stop must stand
+                // in front of that among the events.
                 PostEvent(std::make_shared<StopStreamingEvent>(unit));
+                endRecordings(static_cast<std::int64_t>(unit->rtp_timestamp));
             }
         }
     }
-    pushToBuffers(&StreamBuffer::PushMeta, unit);
+    pushToBuffers(Medium::kMeta, unit);
 }
 
 std::int32_t Controller::readRecFlag(const StreamData& unit) {
@@ -113,33 +146,49 @@ void Controller::StartStream(const std::shared_ptr<StreamData>& unit) {
     }
     if (timecode != nullptr) {
         const unsigned char* const t = timecode->GetData();
+        // Contract: rec-start-full-stop. Before the arrow; in REC STOP it ends the line.
         CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: REC START. %02d:%02d:%02d:%02d. RTPTS = %lld. -> %lld",
                            t[0], t[1], t[2], t[3], wide(rtp), wide(kOpenStop));
     } else {
         CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: REC START. 00:00:00:00. RTPTS = %lld. -> %lld",
                            wide(rtp), wide(kOpenStop));
     }
+    const StatusChannel::Hold hold(getStatusChannel());
     MutexLock lock(streamBuffersMutex);
-    // A new recording closes every open one at the same instant.
-    for (const std::shared_ptr<StreamBuffer>& buffer : streamBuffers) {
-        if (buffer->GetStopTimestamp() == kOpenStop) {
-            buffer->SetStopTimestamp(rtp);
+    // A new recording closes every open one at the same instant. One that has an end of its own waits for the
+    // stop that set it.
+    for (const Recording& recording : streamBuffers) {
+        if (recording.IsOpen()) {
+            if (isExact) {
+                recording.buffer->SetEndTimestamp(rtp);
+            }
+            recording.buffer->SetStopTimestamp(rtp);
         }
     }
-    const auto buffer = std::make_shared<StreamBuffer>(this, rtp, kOpenStop);
-    buffer->Start(getSettings());
-    streamBuffers.push_back(buffer);
+    Recording recording;
+    recording.buffer = std::make_shared<StreamBuffer>(this, rtp, kOpenStop);
+    recording.made = ++commandOrder;
+    recording.buffer->Start(getSettings());
+    if (unit->payload != nullptr) {
+        replayInto(recording, rtp);
+    } else {
+        startBehindStream(recording);
+    }
+    streamBuffers.push_back(recording);
     lock.Unlock();
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
-void Controller::StopStream(const std::shared_ptr<StreamData>& unit) {
+void Controller::StopStream(const std::shared_ptr<StreamData>& unit, std::uint64_t order) {
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
     const auto rtp = static_cast<std::int64_t>(unit->rtp_timestamp);
+    // Contract: stop-reads-any-unit. A start asks for a payload first.
     const std::shared_ptr<nal_access::SampleData> timecode = readTimecode(unit);
     MutexLock lock(streamBuffersMutex);
-    for (const std::shared_ptr<StreamBuffer>& buffer : streamBuffers) {
-        if (buffer->GetStopTimestamp() != kOpenStop) {
+    for (const Recording& recording : streamBuffers) {
+        const std::shared_ptr<StreamBuffer>& buffer = recording.buffer;
+        // However late the event thread carries it out, a stop is for what ran when it was commanded.
+        if (buffer->GetStopTimestamp() != kOpenStop || recording.made > order) {
             continue;
         }
         buffer->SetStopTimestamp(rtp);
@@ -161,7 +210,7 @@ void Controller::RemoveStream(const std::shared_ptr<StreamBuffer>& buffer) {
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
     {
         MutexLock lock(streamBuffersMutex);
-        streamBuffers.remove(buffer);
+        streamBuffers.remove_if([&](const Recording& recording) { return recording.buffer == buffer; });
     }
     CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: REMOVE STREAM. RTPTS = %lld -> %lld.",
                        wide(buffer->GetStartTimestamp()), wide(buffer->GetStopTimestamp()));
@@ -172,18 +221,27 @@ void Controller::RemoveStream(const std::shared_ptr<StreamBuffer>& buffer) {
 void Controller::BufferingStart() {
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
     if (isOutputMode(kOutputModeOn)) {
+        // Contract: second-online-cancels. Recordings of an earlier online are closed at 0.
         StartStream(std::make_shared<StreamData>());
     }
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "stream buffering start.");
     if (terminated) {
+        // Contract: terminated-start-has-no-end. A way out without the last line.
         CLIPFILE_LOG(LOG_PRIORITY_TRACE, "process is terminated.");
         return;
     }
     SetStatus(kStatusBufferingStarted, kCauseNone);
+    const StatusChannel::Hold hold(getStatusChannel());
     MutexLock lock(streamBuffersMutex);
+    streamBuffers.remove_if([](const Recording& recording) { return recording.isOver; });
+    // Contract: online-records-again. What an offline stopped is still in the list.
     const OutputSettings now = getSettings();
-    for (const std::shared_ptr<StreamBuffer>& buffer : streamBuffers) {
-        buffer->Start(now);
+    for (Recording& recording : streamBuffers) {
+        recording.buffer->Start(now);
+        if (recording.isStopped) {
+            recording.isStopped = false;
+            startBehindStream(recording);
+        }
     }
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
@@ -192,20 +250,47 @@ void Controller::BufferingStop() {
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "stream buffering stop.");
     SetStatus(kStatusBufferingStopped, kCauseNone);
+    std::exception_ptr fault;
     {
+        const StatusChannel::Hold hold(getStatusChannel());
         MutexLock lock(streamBuffersMutex);
-        for (const std::shared_ptr<StreamBuffer>& buffer : streamBuffers) {
-            buffer->Stop();
-        }
+        // Contract: stop-under-the-list-lock. Units wait meanwhile; a removal stops outside.
+        fault = stopBuffers();
     }
     flushQueues();
+    {
+        MutexLock lock(streamBuffersMutex);
+        forgetPreRoll();
+    }
+    if (fault != nullptr) {
+        std::rethrow_exception(fault);
+    }
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
+/// Stops all that there are also when one of them cannot be joined, as by its own thread. Returns what it
+/// threw first.
+std::exception_ptr Controller::stopBuffers() {
+    std::exception_ptr fault;
+    for (Recording& recording : streamBuffers) {
+        recording.isOver = recording.isOver || keepsStop(recording);
+        try {
+            recording.buffer->Stop();
+        } catch (const std::system_error&) {
+            if (fault == nullptr) {
+                fault = std::current_exception();
+            }
+        }
+        recording.MarkStopped(++commandOrder);
+    }
+    return fault;
+}
+
 void Controller::stopAndRemoveBuffers() {
+    const StatusChannel::Hold hold(getStatusChannel());
     MutexLock lock(streamBuffersMutex);
-    for (const std::shared_ptr<StreamBuffer>& buffer : streamBuffers) {
-        buffer->Stop();
+    if (const std::exception_ptr fault = stopBuffers(); fault != nullptr) {
+        std::rethrow_exception(fault);
     }
     streamBuffers.clear();
 }
@@ -220,6 +305,7 @@ void Controller::OnChangeInStreamInfo(const std::shared_ptr<Event>& event) {
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
     const OutputSettings& input = std::static_pointer_cast<ChangeInStreamInfoEvent>(event)->settings;
     MutexLock lock(settingsMutex);
+    // Contract: connect-changes-the-rate. The prefix is never taken over, the rest only with "direct".
     settings.framerate = input.framerate;
     if (settings.naluType == "direct") {
         settings.bitrate = input.bitrate;
@@ -234,6 +320,7 @@ void Controller::OnChangeInStreamInfo(const std::shared_ptr<Event>& event) {
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
+// Contract: start-event-unused. Nothing posts one.
 void Controller::OnStartStream(const std::shared_ptr<Event>& event) {
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
     StartStream(std::static_pointer_cast<StartStreamingEvent>(event)->unit);
@@ -242,24 +329,51 @@ void Controller::OnStartStream(const std::shared_ptr<Event>& event) {
 
 void Controller::OnStopStream(const std::shared_ptr<Event>& event) {
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
-    StopStream(std::static_pointer_cast<StopStreamingEvent>(event)->unit);
+    StopStream(std::static_pointer_cast<StopStreamingEvent>(event)->unit, event->order);
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
+// Contract: restart-misspelled. The log shows the name so.
 void Controller::OnRetartStream(const std::shared_ptr<Event>& event) {
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
-    const std::shared_ptr<StreamBuffer> buffer =
-        std::static_pointer_cast<RestartStreamingEvent>(event)->buffer;
+    const auto restarting = std::static_pointer_cast<RestartStreamingEvent>(event);
+    const std::shared_ptr<StreamBuffer>& buffer = restarting->buffer;
     CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: REC RESTART. RTPTS = %lld -> %lld.",
                        wide(buffer->GetStartTimestamp()), wide(buffer->GetStopTimestamp()));
-    MutexLock lock(streamBuffersMutex);
-    if (std::find(streamBuffers.begin(), streamBuffers.end(), buffer) != streamBuffers.end()) {
-        buffer->Stop();
-        buffer->Start(getSettings());
+    if (!restart(*restarting)) {
+        RemoveStream(buffer);
     }
-    flushQueues();
-    lock.Unlock();
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
+}
+
+/// False when the recording has to be removed instead, with nothing done.
+bool Controller::restart(const RestartStreamingEvent& event) {
+    const StatusChannel::Hold hold(getStatusChannel());
+    MutexLock lock(streamBuffersMutex);
+    const auto found = std::find_if(streamBuffers.begin(), streamBuffers.end(),
+                                    [&](const Recording& r) { return r.buffer == event.buffer; });
+    // Stopped since the event was posted, as by a host that went offline, it stays stopped, or has begun
+    // again already.
+    const bool restarts = found != streamBuffers.end() && found->stopped < event.order;
+    if (restarts && keepsStop(*found)) {
+        if (found->buffer->GetStopTimestamp() == kOpenStop) {
+            found->buffer->SetStopTimestamp(found->buffer->GetEndTimestamp());
+        }
+        return false;
+    }
+    if (restarts) {
+        found->buffer->Stop();
+        found->MarkStopped(++commandOrder);
+        found->buffer->Start(getSettings());
+        found->isStopped = false;
+    }
+    // Contract: restart-flushes-all. Also the units of other recordings, and for a buffer that has gone.
+    flushQueues();
+    forgetPreRoll();
+    if (restarts) {
+        startBehindStream(*found);
+    }
+    return true;
 }
 
 void Controller::OnRemoveStreaming(const std::shared_ptr<Event>& event) {

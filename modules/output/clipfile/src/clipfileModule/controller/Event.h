@@ -30,6 +30,8 @@ struct Event {
     virtual ~Event() = default;
 
     std::int32_t id;
+    /// Place among the commands, by the counter of `Controller`, which sets it when the event is posted.
+    std::uint64_t order = 0;
 };
 
 /// The host has connected an input.

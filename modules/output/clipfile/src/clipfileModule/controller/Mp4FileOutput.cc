@@ -4,7 +4,7 @@ namespace clipfileModule {
 
 namespace {
 
-/// What `GetModuleInterval` gives; its meaning is the host's.
+// Contract: module-interval. What `GetModuleInterval` gives; its meaning is the host's.
 constexpr unsigned int kModuleInterval = 10000;
 
 }  // namespace
@@ -32,6 +32,7 @@ bool Mp4FileOutput::GetModuleInterval(unsigned int* value) {
     return true;
 }
 
+// Contract: reserved-operations. They do nothing, and keep their places in the table.
 bool Mp4FileOutput::ReservedOperationA() {
     return true;
 }

@@ -6,8 +6,8 @@
 
 namespace clipfileModule {
 
-/// The module object: what a host holds. Every operation forwards to the controller; the object has no state
-/// of its own.
+/// The module object: what a host holds. `Initialize`, `Uninitialize` and `Execute` go to the controller, the
+/// two getters give controller and message handler, all else is constant. It has no state of its own.
 class Mp4FileOutput : public QxModuleInterface {
  public:
     Mp4FileOutput();

@@ -15,6 +15,10 @@ enum class RecordRules {
     kExact,
 };
 
+/// Values of the output mode: where record commands come from. With any other value nothing is recorded.
+constexpr const char* kOutputModeOn = "on";
+constexpr const char* kOutputModeSync = "sync";
+
 /// Everything that a recording needs to know. `Controller` holds the master copy; each recording works on its
 /// own.
 struct OutputSettings {

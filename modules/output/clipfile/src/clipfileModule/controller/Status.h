@@ -10,6 +10,7 @@ constexpr int kStatusStreamFault = 6;
 /// Final: afterwards the module sets no status and ignores pushed units.
 constexpr int kStatusFailed = 7;
 
+// Contract: causes-reused. A cause means something only together with its status.
 /// Causes that go with status 7 when the module cannot be initialised, and with status 6 when the host goes
 /// offline while file output runs.
 constexpr int kCauseNone = 0;

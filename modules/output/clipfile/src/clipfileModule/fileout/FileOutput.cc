@@ -5,6 +5,7 @@
 #include <mutex>
 #include <utility>
 
+#include "common/JoinThread.h"
 #include "common/Log.h"
 #include "controller/Event.h"
 #include "controller/Status.h"
@@ -14,9 +15,9 @@ namespace clipfileModule {
 
 namespace {
 
-/// How long `Stop` waits for the thread.
+// Contract: stop-waits-3500-ms. How long `Stop` waits for the thread; not to be configured.
 constexpr std::chrono::milliseconds stopWaitMilliSec(3500);
-/// How long it then waits for a call of the controller that the thread may be in.
+// Contract: half-a-second-for-a-host. How long it then waits for a host's call that the thread is in.
 constexpr std::chrono::milliseconds kOwnerCallWait(500);
 
 }  // namespace
@@ -32,6 +33,7 @@ bool FileOutput::Initialize(ControllerInterface* owner, StreamBufferInterface* s
     buffer = streamBuffer;
     type = fileType;
     work = std::make_shared<Work>(owner, streamBuffer, fileType);
+    // Contract: first-muxer-unused. Each file gets a new one.
     const bool result = createMp4FileObject(*work);
     CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "end. func_result = %d.", result ? 1 : 0);
     return result;
@@ -41,6 +43,7 @@ bool FileOutput::Uninitialize() {
     CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "start.");
     work->running = false;
     leaveWork();
+    // Contract: delete-until-true. It is true the first time.
     while (!deleteMp4FileObject(*work)) {
     }
     CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "end. func_result = %d.", 1);
@@ -59,7 +62,7 @@ void FileOutput::Start(const OutputSettings& outputSettings) {
     work->started = false;
     work->running = true;
     thread = std::make_shared<std::thread>([shared = work] { outputThread(*shared); });
-    // A `Stop` that took the lock of the thread before the thread does would wait for it for ever.
+    // Contract: writer-handshake. A `Stop` that took the thread's lock before it does would wait for ever.
     while (!work->started) {
         lock.Wait(work->chunkCondition);
     }
@@ -81,14 +84,14 @@ void FileOutput::Stop() {
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "wait thread start...");
     std::unique_lock lock(*work->threadLock, std::chrono::steady_clock::now() + stopWaitMilliSec);
     if (lock.owns_lock()) {
-        if (thread->joinable()) {
-            thread->join();
-        }
+        JoinThread(*thread);
         lock.unlock();
     } else {
         work->owner.Cut(kOwnerCallWait);
+        // Contract: time-out-line-is-trace. The one fault whose line is no error.
         CLIPFILE_LOG(LOG_PRIORITY_TRACE, "wait thread timeout...");
         controller->SetStatus(kStatusFailed, kCauseFileClose);
+        // Contract: writer-given-up. A thread cannot be ended from outside without harm.
         GetPlatform().GiveUp(*thread);
         thread.reset();
         CLIPFILE_LOG(LOG_PRIORITY_TRACE, "terminate thread...");
@@ -119,11 +122,13 @@ void FileOutput::outputThread(Work& work) {
     }
     work.chunkCondition.notify_all();
 
+    // Contract: output-means-a-writer. No file is open yet.
     notifyTransferStatus(work, kFileOutputStatusOutput);
     const LogonToken token = useNetDrive(work);
     const auto takeChunks = [&work](bool wait) {
         std::deque<std::shared_ptr<ChunkData>> taken;
         MutexLock lock(work.chunkMutex);
+        // Contract: writer-wait-tests-first. No signal is lost.
         if (wait && work.chunks.empty() && work.running) {
             lock.Wait(work.chunkCondition);
         }
@@ -152,6 +157,7 @@ void FileOutput::outputThread(Work& work) {
         work.muxer->Uninitialize();
         work.muxer.reset();
     }
+    // Contract: standby-while-recording. Others may still write.
     notifyTransferStatus(work, kFileOutputStatusStandby);
     run.unlock();
     if (!work.owner.IsCut()) {
@@ -161,6 +167,8 @@ void FileOutput::outputThread(Work& work) {
 
 bool FileOutput::outputFile(Work& work, std::deque<std::shared_ptr<ChunkData>>& deque) {
     bool limitReached = false;
+    std::uint64_t excess = 0;
+    // Contract: box-size-of-the-old-file. Holds for the first chunk behind a rotation too.
     std::uint64_t boxSize = 0;
     while (!deque.empty()) {
         const std::shared_ptr<ChunkData> chunk = std::move(deque.front());
@@ -170,10 +178,12 @@ bool FileOutput::outputFile(Work& work, std::deque<std::shared_ptr<ChunkData>>& 
         }
         if (work.IsFileOpen()) {
             boxSize = work.muxer->GetBoxSize();
+            // Contract: file-size-in-minutes. Bytes are only logged.
             const std::uint64_t size = Work::fileSizeMargin + work.muxer->GetWrittenSize() + boxSize;
             const std::uint64_t limit = work.muxer->MinutesToDuration(work.settings.maxFileSize);
             const std::uint64_t written = work.muxer->GetDuration();
             limitReached = written >= limit;
+            excess = limitReached ? written - limit : 0;
             CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "file size. %llu\t%llu\t%llu\t%llu.",
                          static_cast<unsigned long long>(limit), static_cast<unsigned long long>(written),
                          static_cast<unsigned long long>(size), static_cast<unsigned long long>(boxSize));
@@ -181,17 +191,20 @@ bool FileOutput::outputFile(Work& work, std::deque<std::shared_ptr<ChunkData>>& 
             return true;
         }
         if (limitReached) {
-            // A file ends only where audio and video are in step.
-            if (work.lastChunk != nullptr && work.lastChunk->sync) {
+            // Contract: rotation-at-cadence. A file ends only where audio and video are in step.
+            if (work.lastChunk == nullptr || !work.lastChunk->sync) {
+                CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "mp4 file over. no a/v sync. %d",
+                             static_cast<int>(work.writtenVideoSamples));
+            } else if (waitsForIdrFrame(work, *chunk, excess)) {
+                CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "mp4 file over. no idr frame. %d",
+                             static_cast<int>(work.writtenVideoSamples));
+            } else {
                 CLIPFILE_LOG(LOG_PRIORITY_TRACE, "mp4 file over %lld min.",
                              static_cast<long long>(work.settings.maxFileSize));
                 CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: FILE ROTATION.");
                 if (!newFile(work, chunk)) {
                     return true;
                 }
-            } else {
-                CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "mp4 file over. no a/v sync. %d",
-                             static_cast<int>(work.writtenVideoSamples));
             }
         }
 
@@ -205,15 +218,17 @@ bool FileOutput::outputFile(Work& work, std::deque<std::shared_ptr<ChunkData>>& 
             work.owner.SetStatus(kStatusFailed, kCauseFreeSpaceUnknown);
             return true;
         }
-        // The closing boxes must still find room. Boxes that could not be measured count 2^64 - 1 bytes,
-        // which no disk has: the sum must not run over.
+        // Contract: unmeasured-boxes-are-cause-23. The closing boxes must still find room. What could not be
+        // measured counts 2^64 - 1 bytes, which no disk has: the sum must not run over.
         if (freeSpace < Work::minFreeSpaceWrite || freeSpace - Work::minFreeSpaceWrite < boxSize) {
+            // Contract: free-space-two-spellings. "freespace" for a chunk, "free space" for a file.
             CLIPFILE_LOG(LOG_PRIORITY_ERROR, "no disk freespace. %llu.",
                          static_cast<unsigned long long>(freeSpace));
             work.owner.SetStatus(kStatusFailed, kCauseDiskFull);
             return true;
         }
 
+        // Contract: written-samples-run-on. Across files.
         work.writtenVideoSamples += chunk->video.size();
         CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "write chunk. %d", static_cast<int>(work.writtenVideoSamples));
         const bool written = work.muxer->Write(chunk);
@@ -228,6 +243,14 @@ bool FileOutput::outputFile(Work& work, std::deque<std::shared_ptr<ChunkData>>& 
         work.lastChunk = chunk;
     }
     return false;
+}
+
+bool FileOutput::waitsForIdrFrame(const Work& work, const ChunkData& chunk, std::uint64_t excess) {
+    // Pictures in front of the first IDR frame could not be decoded in the file that begins here. A stream
+    // whose IDR frames never meet the cadence must not make one endless file, though.
+    return work.settings.recordRules == RecordRules::kExact &&
+           (chunk.video.empty() || !chunk.video.front()->GetSync()) &&
+           excess < work.muxer->MinutesToDuration(Work::idrWaitMinutes);
 }
 
 void FileOutput::notifyTransferStatus(Work& work, const std::string& value) {

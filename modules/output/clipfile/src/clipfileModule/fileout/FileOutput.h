@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstddef>
+#include <cstdint>
 #include <deque>
 #include <memory>
 #include <string>
@@ -46,7 +47,8 @@ class FileOutput {
     void Start(const OutputSettings& outputSettings);
     /// Lets the thread write the chunks that still wait and close the file, and returns when that is done. A
     /// thread that has not finished after 3500 ms is given up: that is reported as status 7, cause 27, and
-    /// its file stays without closing boxes.
+    /// its file stays without closing boxes. Throws `std::system_error` on the thread itself, which a host
+    /// can bring here out of a status; the thread ends then all the same, and the next `Stop` joins it.
     void Stop();
     /// Appends a chunk and returns the number of chunks that now wait. Called by the chunk thread of
     /// `StreamBuffer`; never waits for a disk.
@@ -62,6 +64,9 @@ class FileOutput {
     static void outputThread(Work& work);
     /// Writes the chunks of `deque`. True on a failure, which has been reported.
     static bool outputFile(Work& work, std::deque<std::shared_ptr<ChunkData>>& deque);
+    /// True when a file that is `excess` ticks past its length must go on with `chunk`, since a new one could
+    /// not be decoded from there.
+    static bool waitsForIdrFrame(const Work& work, const ChunkData& chunk, std::uint64_t excess);
     static void notifyTransferStatus(Work& work, const std::string& value);
     /// Closes the file in work, if any, and opens the one that begins with `chunk`. False on a failure, which
     /// has been reported; no file is open then.

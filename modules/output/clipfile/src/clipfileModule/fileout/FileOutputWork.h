@@ -37,12 +37,16 @@ enum FileOutputCause : int {
 /// Everything that the file output thread works on. The thread and its `FileOutput` own it together, and the
 /// one that lets go last destroys it.
 struct FileOutput::Work {
+    // Contract: opening-ignores-boxes. A write leaves room for them, an open does not.
     /// Free space in bytes that must be there before a file is opened, and beyond the file's closing boxes
     /// before a chunk is written: 150 MiB.
     static constexpr std::uint64_t minFreeSpaceOpen = 157286400;
     static constexpr std::uint64_t minFreeSpaceWrite = 157286400;
     /// Added in the size log line, in bytes: 200 MiB.
     static constexpr std::uint64_t fileSizeMargin = 209715200;
+
+    /// How far beyond its length a file waits for an IDR frame, in minutes.
+    static constexpr std::uint64_t idrWaitMinutes = 2;
 
     Work(ControllerInterface* controller, StreamBufferInterface* streamBuffer, const std::string& fileType)
         : owner(controller, streamBuffer), type(fileType) {}
@@ -61,6 +65,7 @@ struct FileOutput::Work {
     bool CloseFile() {
         unsigned char timecode[4] = {};
         owner.GetFileTimecode(timecode);
+        // Contract: timecode-result-unread. The file is closed all the same.
         muxer->WriteTmcd(timecode);
         return muxer->Close();
     }

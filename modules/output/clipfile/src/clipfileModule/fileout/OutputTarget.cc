@@ -9,6 +9,7 @@
 #include "fileout/FileOutput.h"
 #include "fileout/FileOutputWork.h"
 #include "mp4/Mp4MuxerFactory.h"
+#include "platform/SharePath.h"
 
 namespace clipfileModule {
 
@@ -32,7 +33,7 @@ bool FileOutput::newFile(Work& work, const std::shared_ptr<ChunkData>& chunk) {
         return fail(kCauseFileClose);
     }
 
-    // The directory for today need not exist yet.
+    // Contract: free-space-of-the-root. The directory for today need not exist yet.
     std::uint64_t freeSpace = 0;
     const int error = GetPlatform().AvailableSpace(work.settings.outputPath, freeSpace);
     if (work.owner.IsCut()) {
@@ -43,6 +44,7 @@ bool FileOutput::newFile(Work& work, const std::shared_ptr<ChunkData>& chunk) {
         return fail(kCauseFreeSpaceUnknown);
     }
     if (freeSpace < Work::minFreeSpaceOpen) {
+        // Contract: free-space-two-spellings. Two words here.
         CLIPFILE_LOG(LOG_PRIORITY_ERROR, "no disk free space. %llu.",
                      static_cast<unsigned long long>(freeSpace));
         return fail(kCauseDiskFull);
@@ -94,6 +96,7 @@ bool FileOutput::makeOutputPath(Work& work, const OutputSettings& settings, std:
     }
     made += date.data();
     made += '\\';
+    // Contract: empty-prefix-ends-in-backslash. The directory is then that of the date.
     made += settings.filePrefix;
     if (!createOutputDirectory(work, made)) {
         return false;
@@ -104,6 +107,8 @@ bool FileOutput::makeOutputPath(Work& work, const OutputSettings& settings, std:
 
 bool FileOutput::createOutputDirectory(Work& work, const std::string& path) {
     const PlatformInterface& platform = GetPlatform();
+    // Contract: anything-counts-as-directory. A file too.
+    // Contract: directory-errors-end-the-process. What looking throws is not caught.
     if (platform.Exists(path)) {
         return true;
     }
@@ -120,24 +125,32 @@ bool FileOutput::createOutputDirectory(Work& work, const std::string& path) {
 
 LogonToken FileOutput::useNetDrive(Work& work) {
     const OutputSettings& settings = work.settings;
-    if (settings.outputPath.compare(0, 2, "\\\\") != 0) {
+    // Contract: remote-by-two-backslashes. A mapped drive or a mount is local.
+    if (!IsSharePath(settings.outputPath)) {
         CLIPFILE_LOG(LOG_PRIORITY_TRACE, "is local drive.");
         return kNoLogon;
     }
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "is remote drive.");
-    if (settings.userName.empty()) {
-        return kNoLogon;
-    }
     LogonToken token = kNoLogon;
-    const int logonError =
-        GetPlatform().Logon(settings.userName, settings.outputPath, settings.password, token);
+    std::string reason;
+    int logonError = GetPlatform().ShareSupport(reason);
+    if (logonError != 0) {
+        CLIPFILE_LOG(LOG_PRIORITY_WARNING, "no network shares: %s.", reason.c_str());
+    } else if (settings.userName.empty()) {
+        return kNoLogon;
+    } else {
+        // Contract: path-as-domain. The whole output path stands in the domain's place.
+        logonError = GetPlatform().Logon(settings.userName, settings.outputPath, settings.password, token);
+    }
     if (work.owner.IsCut()) {
         return token;
     }
     if (logonError != 0) {
+        // Contract: password-in-the-log. In clear.
         CLIPFILE_LOG(LOG_PRIORITY_ERROR, "LogonUser call failed. %d, %x, %s, %s, %s", 0,
                      static_cast<unsigned int>(logonError), settings.outputPath.c_str(),
                      settings.userName.c_str(), settings.password.c_str());
+        // Contract: logon-failure-goes-on. Later faults decide.
         work.owner.SetStatus(kStatusFailed, kCauseLogon);
         return token;
     }
@@ -156,6 +169,7 @@ bool FileOutput::createMp4FileObject(Work& work) {
     }
     const Mp4MuxerFactory factory;
     if (!factory.Create(work.type, work.muxer)) {
+        // Contract: unknown-type-is-normal. Told once a muxer.
         CLIPFILE_LOG(LOG_PRIORITY_WARNING, "mp4 file create error. type = %s.", work.type.c_str());
         factory.Create("normal", work.muxer);
     }
@@ -173,6 +187,7 @@ bool FileOutput::deleteMp4FileObject(Work& work) {
     // There is none after a thread was given up: its muxer is its own.
     if (work.muxer != nullptr) {
         if (!work.muxer->Uninitialize()) {
+            // Contract: wrong-word-at-the-end. It is the release that failed, which never happens.
             CLIPFILE_LOG(LOG_PRIORITY_WARNING, "mp4 file initialize failed.");
         }
         work.muxer.reset();

@@ -18,7 +18,7 @@ constexpr std::uint32_t kResultNotHandled = 3;
 /// The only kind of connection whose end stops file output.
 constexpr std::uint32_t kConnectionKindInput = 1;
 
-/// Frame rate of the file for the rate of an input: these three are halved, all others stay.
+// Contract: rates-halved. Frame rate of the file for that of an input: these three are halved, no other.
 std::uint32_t fileFramerate(std::uint32_t inputRate) {
     switch (inputRate) {
         case 50000:
@@ -41,6 +41,9 @@ QxMessageHandler::~QxMessageHandler() {
 }
 
 std::uint32_t QxMessageHandler::NotifyInputOutputConnectRequest(const QxInputOutputConnectRequest* request) {
+    if (!mayCall("NotifyInputOutputConnectRequest")) {
+        return kResultNotHandled;
+    }
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "notify input output connect request received.");
     settings.framerate = fileFramerate(request->framerate);
@@ -51,6 +54,7 @@ std::uint32_t QxMessageHandler::NotifyInputOutputConnectRequest(const QxInputOut
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "bitrate   : %d.", static_cast<int>(settings.bitrate));
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "width     : %d.", static_cast<int>(settings.width));
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "height    : %d.", static_cast<int>(settings.height));
+    // Contract: prefix-lives-on. A connection without one repeats the one before.
     const auto prefix = request->properties.find(kPropertyFilePrefix);
     if (prefix != request->properties.end()) {
         settings.filePrefix = prefix->second;
@@ -61,6 +65,9 @@ std::uint32_t QxMessageHandler::NotifyInputOutputConnectRequest(const QxInputOut
 }
 
 std::uint32_t QxMessageHandler::NotifyModuleConnectionRequestReply(const void*) {
+    if (!mayCall("NotifyModuleConnectionRequestReply")) {
+        return kResultNotHandled;
+    }
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "notify module connection request reply.");
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end. result = %d.", static_cast<int>(kResultSuccess));
@@ -69,11 +76,16 @@ std::uint32_t QxMessageHandler::NotifyModuleConnectionRequestReply(const void*) 
 
 std::uint32_t QxMessageHandler::NotifyInputOutputDisconnectionRequest(
     const QxInputOutputDisconnectionRequest* request) {
+    if (!mayCall("NotifyInputOutputDisconnectionRequest")) {
+        return kResultNotHandled;
+    }
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "notify disconnect received.");
+    // Contract: other-disconnects-give-3. Nothing else happens then.
     std::uint32_t result = kResultNotHandled;
     if (request->connectionKind == kConnectionKindInput) {
         if (fileOutputStarted) {
+            // Contract: disconnect-leaves-online. The next online is none then.
             stopFileOutput();
         }
         result = kResultSuccess;
@@ -83,12 +95,19 @@ std::uint32_t QxMessageHandler::NotifyInputOutputDisconnectionRequest(
 }
 
 std::uint32_t QxMessageHandler::NotifySetPropertiesRequest(const void*) {
+    if (!mayCall("NotifySetPropertiesRequest")) {
+        return kResultNotHandled;
+    }
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end. result = %d.", static_cast<int>(kResultSuccess));
     return kResultSuccess;
 }
 
+// Contract: online-outlives-a-life. `Initialize` and `Uninitialize` do not touch the flags.
 void QxMessageHandler::NotifyOnlineStatus() {
+    if (!mayCall("NotifyOnlineStatus")) {
+        return;
+    }
     bool changed = false;
     {
         boost::upgrade_lock<boost::shared_mutex> lock(onlineMutex);
@@ -105,6 +124,9 @@ void QxMessageHandler::NotifyOnlineStatus() {
 }
 
 void QxMessageHandler::NotifyOfflineStatus() {
+    if (!mayCall("NotifyOfflineStatus")) {
+        return;
+    }
     bool changed = false;
     {
         boost::upgrade_lock<boost::shared_mutex> lock(onlineMutex);
@@ -116,6 +138,7 @@ void QxMessageHandler::NotifyOfflineStatus() {
         }
     }
     if (changed && fileOutputStarted) {
+        // Contract: offline-is-a-fault. Also when it was meant.
         controller->SetStatus(kStatusStreamFault, kCauseOffline);
         stopFileOutput();
     }
@@ -129,8 +152,22 @@ void QxMessageHandler::startFileOutput() {
 
 void QxMessageHandler::stopFileOutput() {
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "stop file output.");
-    controller->BufferingStop();
+    try {
+        controller->BufferingStop();
+    } catch (...) {
+        // Every recording has been stopped all the same, and the next start must find that so.
+        fileOutputStarted = false;
+        throw;
+    }
     fileOutputStarted = false;
+}
+
+bool QxMessageHandler::mayCall(const char* notification) const {
+    if (controller->IsRunning()) {
+        return true;
+    }
+    CLIPFILE_LOG(LOG_PRIORITY_WARNING, "%s is called without initialize.", notification);
+    return false;
 }
 
 }  // namespace clipfileModule

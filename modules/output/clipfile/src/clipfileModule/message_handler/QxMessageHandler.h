@@ -14,6 +14,8 @@ namespace clipfileModule {
 /// buffering runs, from two facts: whether the host is online, and whether file output has been started.
 ///
 /// It has no thread: each notification runs on the host's thread, and the host delivers them one at a time.
+/// Outside a life of the module a notification changes nothing: it is logged, and gives 3 where it gives a
+/// result.
 class QxMessageHandler : public QxModuleNotifyInterface {
  public:
     /// `owner` is not owned and must live as long as this object. Throws `boost::thread_resource_error` when
@@ -38,6 +40,8 @@ class QxMessageHandler : public QxModuleNotifyInterface {
  private:
     void startFileOutput();
     void stopFileOutput();
+    /// False, with a log line, outside a life of the module.
+    bool mayCall(const char* notification) const;
 
     ControllerInterface* controller;
     /// Only prefix, bit rate, frame rate and picture size are ever filled. The prefix lives on from one

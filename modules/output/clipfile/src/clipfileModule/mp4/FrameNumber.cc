@@ -11,6 +11,7 @@ std::uint32_t FrameNumber(const unsigned char* timecode, std::uint32_t numFrames
     const std::uint32_t frames = timecode[3];
     std::uint32_t dropped = 0;
     if (dropFrame) {
+        // Contract: drop-count-in-doubles. From hours and minutes alone; exact for every timecode of a day.
         const double total = hours * 60.0 + minutes;
         const double droppedEachMinute = std::trunc(numFrames / 15.0 + 0.5);
         dropped =

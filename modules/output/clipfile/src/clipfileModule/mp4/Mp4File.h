@@ -10,6 +10,7 @@
 
 #include "boxlib/mbx.h"
 #include "boxlib/mbx_stdio.h"
+#include "mp4/FrameNumber.h"
 #include "mp4/Mp4Muxer.h"
 #include "platform/PlatformInterface.h"
 
@@ -64,11 +65,19 @@ class Mp4File : public Mp4Muxer {
     /// the same.
     MbxStatus closeFile();
 
+    /// With exact rules, which the host asks for, some steps differ.
+    bool isExact() const { return m_stream.recordRules == RecordRules::kExact; }
+
+    /// Whether the tracks get edits. A track without shows all of its media.
+    virtual bool hasEdits() const { return true; }
     /// Adds the edit of each track, which spans what the track's tables hold by now.
     MbxStatus createElst();
     /// Sets all times to that of `Open`.
     MbxStatus updateTimestamp();
 
+    /// Puts the bytes of the timecode sample, which is entered already, where they belong: at once, at the
+    /// file's position.
+    virtual MbxStatus storeTimecode(const std::array<std::uint8_t, kTimecodeSize>& bytes);
     /// Writes the bytes of a chunk at the file's position in one call, in the order of the tables.
     MbxStatus writeSample(const ChunkData& chunk);
     MbxStatus seekTo(std::uint64_t position);
@@ -137,6 +146,7 @@ class Mp4File : public Mp4Muxer {
     MbxStatus createAprf();
     MbxStatus createVprf();
     MbxStatus createMoov();
+    MbxTrackParams trackParams(std::uint32_t trackId, std::uint32_t timescale) const;
     MbxStatus createVideoTrack();
     MbxStatus createAudioTrack();
     MbxStatus createTimcdTrack();
@@ -145,7 +155,8 @@ class Mp4File : public Mp4Muxer {
     MbxStatus beginMdat(MuxerRoutine& routine);
     MbxStatus completeFile(MuxerRoutine& routine);
 
-    MbxStatus enterSamples(const SamplePass& pass);
+    /// A part of `routine`, under whose name each sample is logged.
+    MbxStatus enterSamples(const MuxerRoutine& routine, const SamplePass& pass);
     MbxStatus writeTmcd(const unsigned char* timecode);
     MbxStatus writeBytes(const void* data, std::uint64_t size);
 };

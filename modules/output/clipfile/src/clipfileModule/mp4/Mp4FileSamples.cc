@@ -13,6 +13,7 @@ namespace clipfileModule {
 
 namespace {
 
+// Contract: timecode-line-reversed. The line shows the stored bytes as a number of this machine.
 std::uint32_t reverseBytes(std::uint32_t value) {
     return value << 24 | (value & 0xFF00U) << 8 | (value >> 8 & 0xFF00U) | value >> 24;
 }
@@ -24,6 +25,7 @@ bool Mp4File::Write(const std::shared_ptr<ChunkData>& chunk) {
     if (!IsOpen()) {
         return routine.ReturnNotOpen();
     }
+    // Contract: failed-chunk-stays-in-tables. Nothing takes it back.
     if (MUXER_FAILED(routine, writeSampleInfo(m_info, *chunk)) ||
         MUXER_FAILED(routine, writeSample(*chunk))) {
         return routine.Return(false);
@@ -35,30 +37,31 @@ MbxStatus Mp4File::writeSampleInfo(const InputStreamInfo& info, const ChunkData&
     MUXER_ROUTINE(routine);
     if (!chunk.meta.empty()) {
         CLIPFILE_LOG(LOG_PRIORITY_SAMPLE, "write rtmeta ----------.");
-        MUXER_STEP(routine,
-                   enterSamples({chunk.meta, kMetaTrack, info.video_sample_duration, true, m_meta_count}));
+        MUXER_STEP(routine, enterSamples(routine, {chunk.meta, kMetaTrack, info.video_sample_duration, true,
+                                                   m_meta_count}));
     }
     if (!chunk.audio.empty()) {
         CLIPFILE_LOG(LOG_PRIORITY_SAMPLE, "write audio  ----------.");
-        MUXER_STEP(routine,
-                   enterSamples({chunk.audio, kAudioTrack, info.audio_sample_duration, true, m_audio_count}));
+        MUXER_STEP(routine, enterSamples(routine, {chunk.audio, kAudioTrack, info.audio_sample_duration, true,
+                                                   m_audio_count}));
     }
     if (!chunk.video.empty()) {
         CLIPFILE_LOG(LOG_PRIORITY_SAMPLE, "write video  ----------.");
-        MUXER_STEP(routine, enterSamples({chunk.video, kVideoTrack, info.video_sample_duration, false,
-                                          m_video_count}));
+        MUXER_STEP(routine, enterSamples(routine, {chunk.video, kVideoTrack, info.video_sample_duration,
+                                                   false, m_video_count}));
     }
     m_video_duration += chunk.video.size() * info.video_sample_duration;
     return routine.Return(MBX_OK);
 }
 
-MbxStatus Mp4File::enterSamples(const SamplePass& pass) {
+MbxStatus Mp4File::enterSamples(const MuxerRoutine& routine, const SamplePass& pass) {
     std::uint32_t randomAccess = IsFragmentOpen();
     const std::uint32_t track = m_track_ids[pass.track];
     for (const auto& data : pass.samples) {
         MbxSampleInfo sample = {};
         sample.size = static_cast<std::uint32_t>(data->GetDataSize());
         sample.offset = m_payload;
+        // Contract: gaps-close-up. Samples are counted, their timestamps are only logged.
         sample.duration = pass.duration;
         sample.isSync = pass.alwaysSync || data->GetSync() ? 1 : 0;
         sample.descriptionIndex = m_entry_indexes[pass.track];
@@ -69,12 +72,13 @@ MbxStatus Mp4File::enterSamples(const SamplePass& pass) {
         randomAccess = 0;
         m_payload += sample.size;
         ++pass.counter;
-        CLIPFILE_LOG(LOG_PRIORITY_SAMPLE, "%d\t%d\t%llu\t%llu\t%llu\t%d\t%d.", static_cast<int>(pass.counter),
-                     static_cast<int>(sample.isSync),
-                     static_cast<unsigned long long>(pass.counter * pass.duration),
-                     static_cast<unsigned long long>(data->GetRtpTimestamp()),
-                     static_cast<unsigned long long>(data->GetTimestamp()), static_cast<int>(sample.size),
-                     static_cast<int>(sample.duration));
+        const unsigned long long end = pass.counter * pass.duration;
+        Logger::Put(LOG_PRIORITY_SAMPLE, __FILE__, routine.Function(), __LINE__,
+                    "%d\t%d\t%llu\t%llu\t%llu\t%d\t%d.", static_cast<int>(pass.counter),
+                    static_cast<int>(sample.isSync), end,
+                    static_cast<unsigned long long>(data->GetRtpTimestamp()),
+                    static_cast<unsigned long long>(data->GetTimestamp()), static_cast<int>(sample.size),
+                    static_cast<int>(sample.duration));
     }
     return MbxEndChunk(m_session.get(), track);
 }
@@ -131,10 +135,9 @@ MbxStatus Mp4File::writeTmcd(const unsigned char* timecode) {
 
     const bool dropFrame = (m_info.tmcd_m_data_type_it & 1U) != 0;
     const std::uint32_t value = FrameNumber(timecode, m_info.timecode_numFrames, dropFrame);
-    const std::uint8_t stored[kTimecodeSize] = {
-        static_cast<std::uint8_t>(value >> 24), static_cast<std::uint8_t>(value >> 16),
-        static_cast<std::uint8_t>(value >> 8), static_cast<std::uint8_t>(value)};
-    MUXER_STEP(routine, writeBytes(stored, sizeof stored));
+    MUXER_STEP(routine,
+               storeTimecode({static_cast<std::uint8_t>(value >> 24), static_cast<std::uint8_t>(value >> 16),
+                              static_cast<std::uint8_t>(value >> 8), static_cast<std::uint8_t>(value)}));
     CLIPFILE_LOG_PLAIN(LOG_PRIORITY_TRACE, "ST: write tmcd  : %02d:%02d:%02d:%02d:%s", timecode[0],
                        timecode[1], timecode[2], timecode[3], dropFrame ? "DF" : "NDF");
     CLIPFILE_LOG_PLAIN(LOG_PRIORITY_TRACE, "ST: write tmcd  : %lX(%d)",
@@ -142,7 +145,12 @@ MbxStatus Mp4File::writeTmcd(const unsigned char* timecode) {
     return routine.Return(MBX_OK);
 }
 
+MbxStatus Mp4File::storeTimecode(const std::array<std::uint8_t, kTimecodeSize>& bytes) {
+    return writeBytes(bytes.data(), bytes.size());
+}
+
 MbxStatus Mp4File::writeBytes(const void* data, std::uint64_t size) {
+    // Contract: empty-chunk-is-a-fault. Without a sample there is no data.
     if (m_file == nullptr || data == nullptr) {
         return MBX_ERR_INVALID_ARG;
     }

@@ -16,7 +16,7 @@ namespace {
 
 constexpr std::uint32_t kNormalProfile = 0x20000000;
 
-/// Identifiers of the tracks that the profile names before they exist.
+// Contract: profile-before-tracks. Identifiers that the profile names before the tracks exist.
 constexpr std::uint32_t kVideoTrackId = 1;
 constexpr std::uint32_t kAudioTrackId = 2;
 
@@ -28,15 +28,6 @@ constexpr std::uint16_t kAudioChannels = 2;
 constexpr std::uint32_t kAvcEntry = 2;
 constexpr std::uint64_t kMinimumSpsSize = 4;
 constexpr std::uint32_t kUsageItem = 10;
-
-MbxTrackParams trackParams(std::uint32_t trackId, std::uint32_t timescale) {
-    MbxTrackParams params = {};
-    params.trackId = trackId;
-    params.timescale = timescale;
-    params.language = kEnglish;
-    params.enable_mode = 1;
-    return params;
-}
 
 /// A reference to this very file.
 MbxStatus addOwnFile(MbxSession* session, std::uint32_t track, std::uint32_t& index) {
@@ -65,9 +56,11 @@ MbxStatus Mp4File::createFprf() {
 
 MbxStatus Mp4File::createAprf() {
     MUXER_ROUTINE(routine);
+    // Contract: always-aac-lc. Constants, whatever the stream carries.
     m_aprf = {{
         kAudioTrackId,
         FourCc("mp4a"),
+        // Contract: profile-numbers. This one, and 00030000 below; readers of the box know what they mean.
         553,
         0,
         125,  // average rate in kbit/s
@@ -83,6 +76,7 @@ MbxStatus Mp4File::createVprf() {
     MUXER_ROUTINE(routine);
     const auto rate = static_cast<std::uint16_t>(m_info.video_average_framerate);
     const auto fraction = static_cast<std::uint16_t>(m_info.video_average_framerate_point);
+    // Contract: bit-rate-as-given. In the host's unit.
     m_vprf = {
         {kVideoTrackId, FourCc("avc1"), m_info.video_codec_specific_information, 0x00030000,
          m_info.video_average_bitrate, m_info.video_max_bitrate},
@@ -105,6 +99,16 @@ MbxStatus Mp4File::createMoov() {
     return routine.Return(MBX_OK);
 }
 
+MbxTrackParams Mp4File::trackParams(std::uint32_t trackId, std::uint32_t timescale) const {
+    MbxTrackParams params = {};
+    params.noEditList = hasEdits() ? 0 : 1;
+    params.trackId = trackId;
+    params.timescale = timescale;
+    params.language = kEnglish;
+    params.enable_mode = 1;
+    return params;
+}
+
 MbxStatus Mp4File::createVideoTrack() {
     MUXER_ROUTINE(routine);
     MbxSession* const session = m_session.get();
@@ -117,6 +121,7 @@ MbxStatus Mp4File::createVideoTrack() {
     MUXER_STEP(routine, MbxAddVideoTrack(session, &params, &track));
 
     MbxVisualEntryParams visual = {};
+    // Contract: always-avc1. Nothing looks at the codec.
     visual.kind = kAvcEntry;
     MUXER_STEP(routine, addOwnFile(session, track, visual.dataReferenceIndex));
     visual.width = m_info.video_size_width;
@@ -127,7 +132,7 @@ MbxStatus Mp4File::createVideoTrack() {
 
     const nal_access::NalUnit& sps = m_stream.sps;
     const nal_access::NalUnit& pps = m_stream.pps;
-    // A set too short to carry its level came from a broken stream.
+    // Contract: short-set-counts-as-missing. Such a set came from a broken stream.
     MUXER_STEP(routine, sps.data != nullptr && sps.size >= kMinimumSpsSize ? MBX_OK : MBX_ERR_INVALID_ARG);
     MbxAvcConfigParams config = {};
     config.configurationVersion = 1;
@@ -156,7 +161,7 @@ MbxStatus Mp4File::createAudioTrack() {
     audio.sampleSize = 16;
     MUXER_STEP(routine, MbxAddSoundEntry(session, track, &audio, &entry));
 
-    // AudioSpecificConfig (ISO/IEC 14496-3 1.6.2.1): AAC LC, 48 kHz, stereo, whatever the stream carries.
+    // Contract: always-aac-lc. AudioSpecificConfig (ISO/IEC 14496-3 1.6.2.1): AAC LC, 48 kHz, stereo.
     static constexpr std::uint8_t kAacLc48Stereo[] = {0x11, 0x90};
     MbxEsdsParams esds = {};
     esds.objectTypeIndication = 0x40;  // ISO/IEC 14496-3
@@ -170,6 +175,7 @@ MbxStatus Mp4File::createAudioTrack() {
     return routine.Return(MBX_OK);
 }
 
+// Contract: track-names-misspelled. The log shows this name and that of the metadata track so.
 MbxStatus Mp4File::createTimcdTrack() {
     MUXER_ROUTINE(routine);
     MbxSession* const session = m_session.get();
@@ -179,11 +185,14 @@ MbxStatus Mp4File::createTimcdTrack() {
     std::uint32_t trackId = 0;
     MUXER_STEP(routine, MbxGetNextTrackId(session, &trackId));
     MbxTrackParams params = trackParams(trackId, m_info.video_track_timescale);
-    // The one sample comes when the file is closed, and its fragment leaves the size to `trex`. A file that
-    // is cut off before its `moov` is written again has to tell it too: readers refuse a whole file for a
-    // sample of no size.
-    static constexpr std::size_t kSize = 2;
-    params.fragmentDefaults[kSize] = kTimecodeSize;
+    if (!isExact()) {
+        // Contract: timecode-size-in-trex. The one sample comes when the file is closed, and its fragment
+        // leaves the size to `trex`. A file that is cut off before its `moov` is written again has to tell it
+        // too: readers refuse a whole file for a sample of no size. With exact rules the fragment tells it
+        // itself.
+        static constexpr std::size_t kSize = 2;
+        params.fragmentDefaults[kSize] = kTimecodeSize;
+    }
     MUXER_STEP(routine, MbxAddTimecodeTrack(session, &params, &track));
 
     MbxTimecodeEntryParams timecode = {};
@@ -194,6 +203,7 @@ MbxStatus Mp4File::createTimcdTrack() {
     timecode.frameCount = static_cast<std::uint8_t>(m_info.timecode_numFrames);
     MUXER_STEP(routine, MbxAddTimecodeEntry(session, track, &timecode, &entry));
 
+    // Contract: usage-items-differ. Other tracks get their enable mode and zeros.
     static constexpr std::uint8_t kUsage[] = {0xFF, 0xFF, 0xFF, 0xFF, 0x00, 0x00, 0xFF, 0xFF};
     MbxMetadataItemParams item = {};
     item.type = kUsageItem;
@@ -220,6 +230,7 @@ MbxStatus Mp4File::createRtmtaTrack() {
     std::uint32_t target = 0;
     MUXER_STEP(routine, MbxAddTrackReference(session, track, &reference, &target));
 
+    // Contract: metadata-entry-of-its-own. `rtmd`, none of the standard's.
     MbxMetaEntryParams meta = {};
     MUXER_STEP(routine, addOwnFile(session, track, meta.dataReferenceIndex));
     MUXER_STEP(routine, MbxAddMetaEntry(session, track, &meta, &entry));
@@ -244,8 +255,9 @@ MbxStatus Mp4File::updateTimestamp() {
         static_cast<std::uint16_t>(opened.minute), static_cast<std::uint16_t>(opened.second),
     };
     std::uint64_t seconds = 0;
-    // Local time goes in as if it were UTC: files show the time of the place where they were recorded.
+    // Contract: local-time-as-utc. Files show the time of the place where they were recorded.
     const MbxStatus converted = MbxToMp4Time(m_context.get(), &date, &seconds);
+    // Contract: one-time-failure-counts. There is no other.
     MUXER_STEP(routine, converted == MBX_ERR_INVALID_ARG ? converted : MBX_OK);
     MUXER_STEP(routine, MbxSetMovieTimes(m_session.get(), 0, std::numeric_limits<std::uint32_t>::max(),
                                          seconds, seconds));

@@ -17,6 +17,7 @@ bool MuxerRoutine::Failed(MbxStatus status, const char* file, int line) const {
     if (status == MBX_OK) {
         return false;
     }
+    // Contract: error-line-is-ours. Changes with every edit of the source.
     Logger::Put(LOG_PRIORITY_ERROR, file, function_, line, "error. error_line = %d, result = %d.", line,
                 static_cast<int>(status));
     return true;

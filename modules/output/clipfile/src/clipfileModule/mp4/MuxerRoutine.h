@@ -14,6 +14,9 @@ class MuxerRoutine {
     MuxerRoutine& operator=(const MuxerRoutine&) = delete;
     ~MuxerRoutine();
 
+    /// The name under which the routine logs, for lines of its parts.
+    const char* Function() const { return function_; }
+
     /// True for a step that failed, which is logged as one of the routine, with the place where it stands.
     bool Failed(MbxStatus status, const char* file, int line) const;
     /// Notes the result for the last line, and passes it on.

@@ -11,8 +11,8 @@ namespace {
 
 /// A path whose bytes count as UTF-8 wherever the system wants wide characters.
 boost::filesystem::path utf8Path(const std::string& nativePath) {
-    // The locale belongs to all paths of the process, and changing it while another thread uses one is a
-    // race: it is set once, before the module's first path.
+    // Contract: locale-set-once. It belongs to all paths of the process, and changing it while another thread
+    // uses one is a race.
     static const std::locale previous = boost::filesystem::path::imbue(
         std::locale(std::locale(), new boost::filesystem::detail::utf8_codecvt_facet));
     return {nativePath};

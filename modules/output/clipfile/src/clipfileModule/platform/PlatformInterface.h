@@ -3,6 +3,7 @@
 #include <boost/system/error_code.hpp>
 #include <chrono>
 #include <cstdint>
+#include <cstdio>
 #include <string>
 #include <thread>
 
@@ -31,7 +32,10 @@ constexpr int kNoSuchPath = 2;
 ///
 /// Paths are strings as the module builds them: UTF-8, separated by backslashes. Operations that return an
 /// error number return 0 for success. All operations may be called from any thread; those on paths may wait
-/// for a disk or a network for any length of time.
+/// for a disk for any length of time.
+///
+/// Paths that count as remote (`IsSharePath`) go to network shares with the rights of the calling thread, and
+/// never to the local disk.
 class PlatformInterface {
  public:
     virtual ~PlatformInterface() = default;
@@ -50,14 +54,23 @@ class PlatformInterface {
     /// `kNoSuchPath` for nothing, another number when that cannot be told.
     virtual int TestExistence(const std::string& path) const = 0;
     /// True when there is anything at `path`. A failure other than a missing path or a missing part of it
-    /// throws `boost::filesystem::filesystem_error`.
+    /// throws `boost::filesystem::filesystem_error`; on a share, where failures are to be expected, it counts
+    /// as nothing there.
     virtual bool Exists(const std::string& path) const = 0;
     /// Makes the directory `path` with all missing levels above it. True when it was made; false with `error`
     /// set when that failed, and with `error` clear when there was nothing to make.
     virtual bool CreateDirectories(const std::string& path, boost::system::error_code& error) const = 0;
 
-    /// Logs on with credentials that count for network access alone; nothing changes for any thread yet.
-    /// Returns the system's error number, which leaves `token` alone.
+    /// 0 when shares can be reached at all, else an error number, and `reason` then says why not.
+    virtual int ShareSupport(std::string& reason) const = 0;
+    /// Creates the file at `path`, which is on a share, or truncates it, as a stream for reading and writing
+    /// that keeps other writers off. Null when that fails, with the reason in `errno`. Local files are the
+    /// box library's.
+    virtual std::FILE* OpenOnShare(const std::string& path) const = 0;
+
+    /// Logs on with credentials that count for network access alone; nobody uses them yet. `domain` is the
+    /// path on the share. Returns the system's error number, which leaves `token` alone; the calling thread
+    /// then has no rights on shares any more.
     virtual int Logon(const std::string& userName, const std::string& domain, const std::string& password,
                       LogonToken& token) const = 0;
     /// From now on the calling thread, and no other, uses the logon. Ends with the thread. Returns the

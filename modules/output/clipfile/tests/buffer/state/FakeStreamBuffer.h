@@ -31,10 +31,12 @@ class FakeStreamBuffer : public clipfileModule::StreamBufferInterface {
     }
     std::int64_t GetStartTimestamp() const override { return start; }
     std::int64_t GetStopTimestamp() const override { return stop; }
+    std::int64_t GetEndTimestamp() const override { return end; }
     void NotifyEndSync() override { calls.emplace_back("NotifyEndSync"); }
 
     std::int64_t start = 0;
     std::int64_t stop = -1;
+    std::int64_t end = -1;
     std::vector<std::string> calls;
     nal_access::NalUnit lastSps;
     nal_access::NalUnit lastPps;

@@ -203,5 +203,60 @@ TEST_F(WaitStartCacheStateTest, RtpTimestampsAreShownAsSignedNumbers) {
                 Contains("OP: IDR FRAME RECV. RTPTS = -9223372036854775808."));
 }
 
+class ExactWaitStartCacheStateTest : public WaitStartCacheStateTest {
+ protected:
+    std::shared_ptr<CacheState> executeExact(const std::shared_ptr<StreamData>& unit, const char* mediaType) {
+        return exact.Execute(unit, queue, mediaType);
+    }
+
+    WaitStartCacheState exact{&buffer, RecordRules::kExact};
+};
+
+TEST_F(ExactWaitStartCacheStateTest, KeepsTheAudioThatAnIdrFrameOnTheStartNeeds) {
+    buffer.start = 90000;
+    EXPECT_EQ(executeExact(audio(988), "audio"), nullptr);
+    EXPECT_EQ(queue->queue.Size(), 0u);
+    // Half a frame of 1024 samples is 10.67 ms.
+    EXPECT_EQ(executeExact(audio(989), "audio"), nullptr);
+    EXPECT_EQ(queue->queue.Size(), 1u);
+    EXPECT_EQ(executeExact(meta(999), "meta"), nullptr);
+    EXPECT_EQ(executeExact(video(999), "video"), nullptr);
+    EXPECT_EQ(queue->queue.Size(), 1u);
+    EXPECT_EQ(executeExact(video(1000), "video")->GetId(), kStartState);
+}
+
+TEST_F(ExactWaitStartCacheStateTest, APictureAtTheStopCancelsTheRecord) {
+    buffer.start = 900;
+    buffer.stop = 90000;
+    EXPECT_EQ(executeExact(video(999, stream_units::kPicture), "video"), nullptr);
+    const std::shared_ptr<CacheState> next = executeExact(video(1000), "video");
+    ASSERT_NE(next, nullptr);
+    EXPECT_EQ(next->GetId(), kEndSyncRecState);
+    EXPECT_THAT(log.Texts(), ElementsAre("OP: REC CANCEL. RTPTS = 900. -> 90000"));
+}
+
+TEST_F(ExactWaitStartCacheStateTest, TheEndHoldsWhateverStopIsSet) {
+    buffer.stop = 180000;
+    buffer.end = 90000;
+    EXPECT_EQ(executeExact(video(1000), "video")->GetId(), kEndSyncRecState);
+    EXPECT_THAT(log.Texts(), ElementsAre("OP: REC CANCEL. RTPTS = 0. -> 90000"));
+}
+
+TEST_F(ExactWaitStartCacheStateTest, OtherMediaThatOvertookThePicturesDoNotCancelTheRecord) {
+    buffer.end = 90000;
+    // A queue of 50 pictures and the one in hand last 2.13 s at 23.98 frames a second.
+    EXPECT_EQ(executeExact(audio(3200), "audio"), nullptr);
+    EXPECT_EQ(executeExact(meta(3200), "meta"), nullptr);
+    EXPECT_EQ(queue->queue.Size(), 2u);
+    EXPECT_EQ(executeExact(video(999), "video")->GetId(), kStartState);
+}
+
+TEST_F(ExactWaitStartCacheStateTest, WithoutPicturesTheOtherMediaCancelTheRecordALittleLater) {
+    buffer.end = 90000;
+    EXPECT_EQ(executeExact(audio(3999), "audio"), nullptr);
+    EXPECT_EQ(executeExact(audio(4000), "audio")->GetId(), kEndSyncRecState);
+    EXPECT_EQ(executeExact(meta(4000), "meta")->GetId(), kEndSyncRecState);
+}
+
 }  // namespace
 }  // namespace clipfileModule

@@ -14,8 +14,8 @@ static_assert(sizeof(off_t) == 8);
 
 namespace {
 
-// False when another writer holds the file. A file system without locks protects nothing, but can be recorded
-// to.
+// Contract: advisory-lock. False when another writer holds the file. A file system without locks protects
+// nothing, but can be recorded to.
 bool lockAgainstWriters(int descriptor) {
     int result = 0;
     do {

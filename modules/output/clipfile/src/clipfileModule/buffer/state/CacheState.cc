@@ -13,6 +13,7 @@ constexpr std::uint64_t kBytesPerLine = 32;
 CacheState::CacheState(const char* stateName, CacheStateId stateId, StreamBufferInterface* owner)
     : name(stateName), id(stateId), buffer(owner) {}
 
+// Contract: state-operations-unused. This one has no caller, and `OnExit` does nothing in any state.
 bool CacheState::CanFinish(const StreamDataQueue& /*queue*/) {
     return true;
 }

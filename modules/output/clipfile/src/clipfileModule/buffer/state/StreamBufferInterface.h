@@ -32,6 +32,9 @@ class StreamBufferInterface {
     virtual std::int64_t GetStartTimestamp() const = 0;
     /// Where it ends, in 90 kHz ticks; -1 while it is open. Any thread.
     virtual std::int64_t GetStopTimestamp() const = 0;
+    /// With exact rules: the first instant, in 90 kHz ticks, that does not belong to the record any more; -1
+    /// while the record is open. Any thread.
+    virtual std::int64_t GetEndTimestamp() const = 0;
     /// Asks the controller to remove this recording. Throws `std::bad_weak_ptr` when the buffer does not live
     /// in a `shared_ptr`. Any thread.
     virtual void NotifyEndSync() = 0;

@@ -1,7 +1,5 @@
 #include "buffer/state/WaitStartCacheState.h"
 
-#include <string_view>
-
 #include "buffer/state/EndSyncRecState.h"
 #include "buffer/state/StartCacheState.h"
 #include "common/Log.h"
@@ -13,6 +11,15 @@ namespace {
 /// Ticks of the 90 kHz clock in a millisecond.
 constexpr std::uint64_t kTicksPerMilliSec = 90;
 
+/// Half an AAC frame of 1024 samples at 48 kHz, rounded up.
+constexpr std::uint64_t kHalfAudioFrameMilliSec = 11;
+/// How far the other media may be ahead of the pictures: a queue of 50 pictures and the one in hand last 2.13
+/// s at the lowest frame rate.
+constexpr std::uint64_t kVideoLagMilliSec = 3000;
+
+constexpr std::string_view kVideo = "video";
+constexpr std::string_view kAudio = "audio";
+
 /// Unsigned on purpose: an open stop of -1 lies above every timestamp.
 std::uint64_t toMilliSec(std::int64_t ticks) {
     return static_cast<std::uint64_t>(ticks) / kTicksPerMilliSec;
@@ -20,24 +27,45 @@ std::uint64_t toMilliSec(std::int64_t ticks) {
 
 }  // namespace
 
-WaitStartCacheState::WaitStartCacheState(StreamBufferInterface* owner)
-    : CacheState("wait_state", kWaitStartState, owner) {}
+WaitStartCacheState::WaitStartCacheState(StreamBufferInterface* owner, RecordRules recordRules)
+    : CacheState("wait_state", kWaitStartState, owner), rules(recordRules) {}
+
+bool WaitStartCacheState::isBeforeStart(const StreamData& unit, std::string_view mediaType) const {
+    // An IDR frame on the start itself needs the audio that begins up to half a frame ahead of it.
+    const bool mayLead = rules == RecordRules::kExact && mediaType == kAudio;
+    return unit.timestamp + (mayLead ? kHalfAudioFrameMilliSec : 0) < toMilliSec(buffer->GetStartTimestamp());
+}
+
+std::optional<std::int64_t> WaitStartCacheState::stopPassedBy(const StreamData& unit,
+                                                              std::string_view mediaType) const {
+    // Contract: stop-read-once. It may be set at any moment, and the line shall show what the test saw.
+    const std::int64_t stop = buffer->GetStopTimestamp();
+    if (rules == RecordRules::kKept) {
+        // Contract: stop-in-two-units. In milliseconds here, in ticks in the chunk thread.
+        return unit.timestamp > toMilliSec(stop) ? std::optional(stop) : std::nullopt;
+    }
+    const std::int64_t commandedEnd = buffer->GetEndTimestamp();
+    const std::int64_t end = commandedEnd != -1 ? commandedEnd : stop;
+    // The other media may have overtaken a picture that still belongs to the record.
+    const std::uint64_t lag = mediaType == kVideo ? 0 : kVideoLagMilliSec;
+    return unit.timestamp >= toMilliSec(end) + lag ? std::optional(end) : std::nullopt;
+}
 
 std::shared_ptr<CacheState> WaitStartCacheState::Execute(const std::shared_ptr<StreamData>& unit,
                                                          std::shared_ptr<StreamQueue>& queue,
                                                          const char* mediaType) {
     nal_access::StreamAnalyzer analyzer;
-    if (unit->timestamp < toMilliSec(buffer->GetStartTimestamp())) {
+    if (isBeforeStart(*unit, mediaType)) {
         return nullptr;
     }
-    // Read once: the stop may be set at any moment, and the line shall show what the test saw.
-    const std::int64_t stop = buffer->GetStopTimestamp();
-    if (unit->timestamp > toMilliSec(stop)) {
+    if (const std::optional<std::int64_t> stop = stopPassedBy(*unit, mediaType)) {
         CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: REC CANCEL. RTPTS = %lld. -> %lld",
-                           static_cast<long long>(buffer->GetStartTimestamp()), static_cast<long long>(stop));
+                           static_cast<long long>(buffer->GetStartTimestamp()),
+                           static_cast<long long>(*stop));
+        // Contract: any-medium-cancels. Audio or metadata may be first.
         return std::make_shared<EndSyncRecState>(buffer);
     }
-    if (std::string_view(mediaType) != "video") {
+    if (mediaType != kVideo) {
         queue->queue.Push(unit);
         return nullptr;
     }

@@ -1,6 +1,12 @@
 #pragma once
 
+#include <cstdint>
+#include <memory>
+#include <optional>
+#include <string_view>
+
 #include "buffer/state/CacheState.h"
+#include "controller/OutputSettings.h"
 
 namespace clipfileModule {
 
@@ -8,7 +14,7 @@ namespace clipfileModule {
 /// the start timestamp on, video is dropped.
 class WaitStartCacheState : public CacheState {
  public:
-    explicit WaitStartCacheState(StreamBufferInterface* owner);
+    explicit WaitStartCacheState(StreamBufferInterface* owner, RecordRules recordRules = RecordRules::kKept);
 
     /// Drops or queues the unit, or takes it as the start of the recording. The IDR frame that starts it is
     /// not queued: it reaches the video cache on entry of the start state.
@@ -16,6 +22,11 @@ class WaitStartCacheState : public CacheState {
                                         std::shared_ptr<StreamQueue>& queue, const char* mediaType) override;
 
  private:
+    bool isBeforeStart(const StreamData& unit, std::string_view mediaType) const;
+    /// The stop timestamp to cancel the recording with, when the unit says that it can begin no more.
+    std::optional<std::int64_t> stopPassedBy(const StreamData& unit, std::string_view mediaType) const;
+
+    const RecordRules rules;
     nal_access::NalUnit sps;
     nal_access::NalUnit pps;
 };

@@ -3,7 +3,6 @@
 
 #include "platform/posix/PosixPlatform.h"
 
-#include <dlfcn.h>
 #include <sys/stat.h>
 #include <sys/statvfs.h>
 
@@ -13,27 +12,11 @@
 #include <limits>
 
 #include "platform/Directories.h"
+#include "platform/SharePath.h"
+#include "platform/posix/PinLibrary.h"
+#include "platform/posix/ShareAccess.h"
 
 namespace clipfileModule {
-
-namespace {
-
-/// Its address tells which library this code is part of.
-const char kAnchor = 0;
-
-/// Keeps this library in memory until the process ends. Fails in a program that has the code linked in, which
-/// is never unloaded anyway.
-void pinLibrary() {
-    Dl_info info = {};
-    if (dladdr(&kAnchor, &info) != 0 && info.dli_fname != nullptr) {
-        // The handle is not kept: what counts is the flag that the loader sets.
-        if (void* const handle = dlopen(info.dli_fname, RTLD_NOW | RTLD_NOLOAD | RTLD_NODELETE)) {
-            dlclose(handle);
-        }
-    }
-}
-
-}  // namespace
 
 std::chrono::system_clock::time_point PosixPlatform::Now() const {
     return std::chrono::system_clock::now();
@@ -46,6 +29,7 @@ LocalTime PosixPlatform::ToLocalTime(std::chrono::system_clock::time_point time)
     return {parts.tm_year + 1900, parts.tm_mon + 1, parts.tm_mday, parts.tm_hour, parts.tm_min, parts.tm_sec};
 }
 
+// Contract: backslash-is-a-slash. A name that holds one cannot be used.
 std::string PosixPlatform::NativePath(const std::string& path) const {
     std::string native = path;
     std::replace(native.begin(), native.end(), '\\', '/');
@@ -53,6 +37,9 @@ std::string PosixPlatform::NativePath(const std::string& path) const {
 }
 
 int PosixPlatform::AvailableSpace(const std::string& path, std::uint64_t& bytes) const {
+    if (IsSharePath(path)) {
+        return share_access::AvailableSpace(path, bytes);
+    }
     const std::string native = NativePath(path);
     struct statvfs status = {};
     int result = 0;
@@ -73,31 +60,50 @@ std::uint64_t PosixPlatform::ToBytes(std::uint64_t blocks, std::uint64_t blockSi
 }
 
 int PosixPlatform::TestExistence(const std::string& path) const {
+    if (IsSharePath(path)) {
+        return share_access::TestExistence(path);
+    }
     struct stat status = {};
     return stat(NativePath(path).c_str(), &status) == 0 ? 0 : errno;
 }
 
 bool PosixPlatform::Exists(const std::string& path) const {
-    return PathExists(NativePath(path));
+    return IsSharePath(path) ? share_access::TestExistence(path) == 0 : PathExists(NativePath(path));
 }
 
 bool PosixPlatform::CreateDirectories(const std::string& path, boost::system::error_code& error) const {
-    return MakeDirectories(NativePath(path), error);
+    if (!IsSharePath(path)) {
+        return MakeDirectories(NativePath(path), error);
+    }
+    const int result = share_access::CreateDirectories(path);
+    error.assign(result == EEXIST ? 0 : result, boost::system::system_category());
+    return result == 0;
 }
 
-int PosixPlatform::Logon(const std::string& /*userName*/, const std::string& /*domain*/,
-                         const std::string& /*password*/, LogonToken& /*token*/) const {
-    return ENOTSUP;
+int PosixPlatform::ShareSupport(std::string& reason) const {
+    return share_access::Support(reason);
 }
 
-int PosixPlatform::Impersonate(LogonToken /*token*/) const {
-    return ENOTSUP;
+std::FILE* PosixPlatform::OpenOnShare(const std::string& path) const {
+    return share_access::OpenFile(path);
 }
 
-void PosixPlatform::CloseLogon(LogonToken /*token*/) const {}
+int PosixPlatform::Logon(const std::string& userName, const std::string& domain, const std::string& password,
+                         LogonToken& token) const {
+    return share_access::Logon(userName, domain, password, token);
+}
 
+int PosixPlatform::Impersonate(LogonToken token) const {
+    return share_access::Impersonate(token);
+}
+
+void PosixPlatform::CloseLogon(LogonToken token) const {
+    share_access::CloseLogon(token);
+}
+
+// Contract: writer-given-up. Its code stays loaded.
 void PosixPlatform::GiveUp(std::thread& thread) const {
-    pinLibrary();
+    PinLibrary();
     thread.detach();
 }
 

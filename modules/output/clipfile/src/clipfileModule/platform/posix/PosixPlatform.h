@@ -18,7 +18,9 @@ class PosixPlatform : public PlatformInterface {
     int TestExistence(const std::string& path) const override;
     bool Exists(const std::string& path) const override;
     bool CreateDirectories(const std::string& path, boost::system::error_code& error) const override;
-    /// Always ENOTSUP: shares are mounted by the system here, with credentials of its own.
+    int ShareSupport(std::string& reason) const override;
+    std::FILE* OpenOnShare(const std::string& path) const override;
+    /// The credentials are verified: the server is asked at once.
     int Logon(const std::string& userName, const std::string& domain, const std::string& password,
               LogonToken& token) const override;
     int Impersonate(LogonToken token) const override;

@@ -1,0 +1,105 @@
+// The chunk thread with exact rules: a record begins with all media in step and ends on its frame.
+
+#include <algorithm>
+
+#include "buffer/ChunkTimeline.h"
+#include "buffer/StartInStep.h"
+#include "buffer/StreamBuffer.h"
+#include "common/Log.h"
+
+namespace clipfileModule {
+
+PassResult StreamBuffer::makeExactPass() {
+    // More than one chunk may be complete: what comes while the thread works wakes nobody.
+    while (!videoBuffer.empty()) {
+        const bool inStep = startInStep();
+        const std::uint64_t end = findEnd();
+        const std::size_t pictures = countBefore(videoBuffer, end);
+        const bool reachesEnd = pictures < videoBuffer.size();
+        if (pictures == 0) {
+            return kRecordEnded;
+        }
+        if (!inStep || !hasTimeline() || (!reachesEnd && pictures < kMinimumVideoUnits)) {
+            return kGoOn;
+        }
+        const std::optional<ChunkCounts> counts =
+            findChunk(std::min<std::size_t>(chunkFrames, pictures), end);
+        if (!counts) {
+            return kGoOn;
+        }
+        const PassResult result = pushChunk(*counts, end);
+        if (result != kGoOn) {
+            return result;
+        }
+    }
+    return kGoOn;
+}
+
+void StreamBuffer::cutRest() {
+    const std::uint64_t end = findEnd();
+    while (!videoBuffer.empty() && hasTimeline() && startInStep()) {
+        std::size_t pictures = std::min<std::size_t>(chunkFrames, countBefore(videoBuffer, end));
+        std::optional<ChunkCounts> counts;
+        for (; pictures > 0 && !counts; --pictures) {
+            counts = findCompleteChunk(pictures, end);
+        }
+        // The file output may be behind already; it gets no more than any recording may leave with it.
+        if (!counts || pushChunk(*counts, end) != kGoOn) {
+            return;
+        }
+    }
+}
+
+bool StreamBuffer::hasTimeline() const {
+    return streamInfo.video_sample_duration != 0;
+}
+
+std::uint64_t StreamBuffer::findEnd() const {
+    const std::int64_t end = endTimestamp;
+    // Unsigned: an open end of -1 lies above every timestamp.
+    return static_cast<std::uint64_t>(end != -1 ? end : stopTimestamp.load());
+}
+
+bool StreamBuffer::startInStep() {
+    if (chunkedVideo != 0) {
+        return true;
+    }
+    const auto first = std::find(videoBuffer.begin(), videoBuffer.end(), firstPicture);
+    removeFront(videoBuffer, static_cast<std::size_t>(first - videoBuffer.begin()));
+    const bool audioInStep = startInStep(audioBuffer, audioRtpRate);
+    return startInStep(metaBuffer, videoRtpRate) && audioInStep;
+}
+
+bool StreamBuffer::startInStep(UnitList& cache, std::uint32_t clock) {
+    const std::uint64_t frame =
+        kCommonTicks * streamInfo.audio_sample_duration / streamInfo.audio_track_timescale;
+    const StartInStep start =
+        FindStart(cache, clock, {*firstPicture, videoRtpRate}, static_cast<std::int64_t>(frame / 2));
+    removeFront(cache, start.early);
+    return start.settled;
+}
+
+void StreamBuffer::removeFront(UnitList& cache, std::size_t count) {
+    const auto end = cache.begin() + static_cast<std::ptrdiff_t>(count);
+    for (auto it = cache.begin(); it != end; ++it) {
+        CLIPFILE_LOG_PLAIN(LOG_PRIORITY_TRACE, "ST: remove\t%llu\t%llu",
+                           static_cast<unsigned long long>((*it)->timestamp),
+                           static_cast<unsigned long long>((*it)->rtp_timestamp));
+    }
+    cache.erase(cache.begin(), end);
+}
+
+std::optional<StreamBuffer::ChunkCounts> StreamBuffer::findCompleteChunk(std::size_t pictures,
+                                                                         std::uint64_t end) {
+    const ChunkEnd chunkEnd = findChunkEnd(pictures);
+    const int audioCount =
+        CountUpTo(chunkEnd.audio, chunkedAudio, streamInfo.audio_sample_duration, audioBuffer.size());
+    const int metaCount = CountUpTo(chunkEnd.video, chunkedMeta, streamInfo.video_sample_duration,
+                                    countBefore(metaBuffer, end));
+    if (audioCount == -1 || metaCount == -1 || metaBuffer.empty()) {
+        return std::nullopt;
+    }
+    return ChunkCounts{pictures, static_cast<std::size_t>(audioCount), static_cast<std::size_t>(metaCount)};
+}
+
+}  // namespace clipfileModule

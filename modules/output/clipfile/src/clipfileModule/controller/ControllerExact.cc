@@ -1,0 +1,105 @@
+// What exact rules add to the record commands of `Controller`: recordings end on the frame of their command,
+// and begin with all media in step whatever the queue threads have let go by.
+
+#include <algorithm>
+
+#include "controller/Controller.h"
+
+namespace clipfileModule {
+
+namespace {
+
+/// Ticks of the clock of start and stop timestamps in a millisecond.
+constexpr std::int64_t kTicksPerMilliSec = 90;
+/// An audio frame of 1024 samples at 48 kHz in milliseconds, rounded up.
+constexpr std::uint64_t kAudioFrame = 22;
+/// No unit of the same clock comes so late behind those of other media: a queue holds some two seconds.
+constexpr std::uint64_t kLargestLag = 5000;
+
+}  // namespace
+
+void Controller::followCommand(const StreamData& unit) {
+    if (isExact) {
+        MutexLock lock(streamBuffersMutex);
+        preRoll.Follow(Medium::kMeta, unit.timestamp);
+    }
+}
+
+void Controller::endRecordings(std::int64_t end) {
+    if (!isExact) {
+        return;
+    }
+    MutexLock lock(streamBuffersMutex);
+    for (const Recording& recording : streamBuffers) {
+        if (recording.IsOpen()) {
+            recording.buffer->SetEndTimestamp(end);
+        }
+    }
+}
+
+void Controller::replayInto(const Recording& recording, std::int64_t start) {
+    if (!isExact) {
+        return;
+    }
+    StreamBuffer& buffer = *recording.buffer;
+    for (const PreRoll::Entry& entry : preRoll.From(static_cast<std::uint64_t>(start / kTicksPerMilliSec))) {
+        pushTo(buffer, entry.medium, entry.unit);
+    }
+}
+
+bool Controller::keepsStop(const Recording& recording) const {
+    return isExact && !recording.IsOpen();
+}
+
+void Controller::startBehindStream(Recording& recording) {
+    const std::optional<std::uint64_t> newest = isExact ? preRoll.Newest() : std::nullopt;
+    if (!newest || !recording.IsOpen()) {
+        return;
+    }
+    // Of what has gone by or was flushed each medium lacks something else. Behind it all nothing lacks, also
+    // not the audio frame that begins in front of a picture.
+    const auto start = static_cast<std::int64_t>(*newest + kAudioFrame);
+    recording.buffer->SetStartTimestamp(start * kTicksPerMilliSec);
+    recording.startsBehind = true;
+}
+
+void Controller::keepUnit(Medium medium, const std::shared_ptr<StreamData>& unit) {
+    if (!isExact) {
+        return;
+    }
+    if (isSync) {
+        preRoll.Add(medium, unit);
+    } else {
+        preRoll.Follow(medium, unit->timestamp);
+    }
+    for (Recording& recording : streamBuffers) {
+        const auto start =
+            static_cast<std::uint64_t>(recording.buffer->GetStartTimestamp() / kTicksPerMilliSec);
+        if (recording.startsBehind && unit->timestamp + kLargestLag < start) {
+            // The clock was set back: the instant that the recording waits for may never come.
+            recording.buffer->SetStartTimestamp(0);
+            recording.startsBehind = false;
+        }
+    }
+}
+
+void Controller::noteFlushed(Medium medium, const std::shared_ptr<StreamData>& unit) {
+    if (unit == nullptr) {
+        return;
+    }
+    std::atomic<std::uint64_t>& latest = flushedUntil[static_cast<std::size_t>(medium)];
+    std::uint64_t seen = latest;
+    while (unit->timestamp > seen && !latest.compare_exchange_weak(seen, unit->timestamp)) {
+    }
+}
+
+void Controller::forgetPreRoll() {
+    for (std::size_t i = 0; i < flushedUntil.size(); ++i) {
+        if (const std::uint64_t latest = flushedUntil[i].exchange(0); latest != 0) {
+            preRoll.Skip(static_cast<Medium>(i), latest);
+        }
+    }
+    preRoll.Clear();
+}
+
+}  // namespace clipfileModule

@@ -1,0 +1,63 @@
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "platform/posix/SmbClient.h"
+#include "platform/posix/TimedWorker.h"
+
+namespace clipfileModule {
+
+class SmbStream;
+
+/// The connection of one writing thread to a share, whose operations all return within `kOperationLimit`.
+/// Behind it a thread of its own drives the client. Once an operation has passed the limit every later one
+/// fails with ETIMEDOUT at once, and that thread frees the connection when it can.
+///
+/// One thread at a time uses a session and its streams. Operations return an error number, 0 for success.
+class SmbSession {
+ public:
+    /// A writer that is told to stop in the middle of an operation still ends within the time that it is
+    /// given.
+    static constexpr std::chrono::milliseconds kOperationLimit{3000};
+    /// For the farewell to the server.
+    static constexpr std::chrono::milliseconds kEndLimit{300};
+
+    /// Connects; `ConnectResult` tells how that went. Throws `std::system_error` when no thread can be
+    /// started.
+    SmbSession(const SmbLibrary& library, const SharePath& share, const SmbCredentials& credentials);
+    SmbSession(const SmbSession&) = delete;
+    SmbSession& operator=(const SmbSession&) = delete;
+
+    /// As `SmbClient::Connect`. Every operation returns it when it is not 0.
+    int ConnectResult() const { return connectResult_; }
+    bool IsOf(const SharePath& share) const { return share.ShareUrl() == share_.ShareUrl(); }
+    const SmbCredentials& Credentials() const { return credentials_; }
+
+    int TestExistence(const std::string& url);
+    int CreateDirectories(const std::string& url);
+    /// What the streams of this session hold back is sent first.
+    int AvailableSpace(const std::string& url, std::uint64_t& bytes);
+    int Open(const std::string& url, SMBCFILE*& file);
+    /// Leaves `data` alone afterwards, unless the time-out has passed.
+    int Write(SMBCFILE* file, std::int64_t offset, const std::shared_ptr<const std::vector<char>>& data);
+    /// `data` gets fewer octets than `size` at the end of the file alone.
+    int Read(SMBCFILE* file, std::int64_t offset, std::size_t size, std::vector<char>& data);
+    int Close(SMBCFILE* file);
+
+    void AddStream(SmbStream& stream) { streams_.push_back(&stream); }
+    void RemoveStream(SmbStream& stream);
+
+ private:
+    const SharePath share_;
+    const SmbCredentials credentials_;
+    /// Not owned.
+    std::vector<SmbStream*> streams_;
+    TimedWorker<SmbClient> worker_;
+    int connectResult_ = 0;
+};
+
+}  // namespace clipfileModule

@@ -1,0 +1,164 @@
+#include "platform/posix/SmbClient.h"
+
+#include <gtest/gtest.h>
+
+#include <cerrno>
+#include <cstdint>
+#include <filesystem>
+#include <fstream>
+#include <iterator>
+#include <memory>
+#include <string>
+
+#include "support/SambaServer.h"
+
+namespace clipfileModule {
+namespace {
+
+const SmbLibrary& library() {
+    std::string reason;
+    return *SmbLibrary::Get(reason);
+}
+
+SharePath parsed(const std::string& path) {
+    SharePath share;
+    EXPECT_TRUE(SharePath::Parse(path, share)) << path;
+    return share;
+}
+
+std::string textOf(const std::filesystem::path& path) {
+    std::ifstream in(path, std::ios::binary);
+    return {std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>()};
+}
+
+TEST(SmbCredentials, TakeTheDomainFromEitherForm) {
+    const auto fields = [](const std::string& userName) {
+        const SmbCredentials credentials = SmbCredentials::Of(userName, "p");
+        return credentials.domain + "|" + credentials.user + "|" + credentials.password;
+    };
+    EXPECT_EQ(fields("user"), "|user|p");
+    EXPECT_EQ(fields("DOMAIN\\user"), "DOMAIN|user|p");
+    EXPECT_EQ(fields("user@domain.example"), "domain.example|user|p");
+    EXPECT_EQ(fields("DOMAIN\\user@x"), "DOMAIN|user@x|p");
+    EXPECT_EQ(fields(""), "||p");
+}
+
+class SmbClientTest : public ::testing::Test {
+ protected:
+    std::unique_ptr<SmbClient> connect(const std::string& path) {
+        auto client = std::make_unique<SmbClient>(
+            library(), parsed(path), SmbCredentials::Of(SambaServer::kUser, SambaServer::kPassword));
+        EXPECT_EQ(client->Connect(), 0);
+        return client;
+    }
+    std::string url(const std::string& name) const { return parsed(server.Path() + "\\" + name).Url(); }
+    std::string shareUrl() const { return parsed(server.Path()).Url(); }
+
+    SambaServer server;
+};
+
+TEST_F(SmbClientTest, FailsWithoutAConnection) {
+    SmbClient client(library(), parsed(server.Path()), {});
+    std::uint64_t bytes = 0;
+    SMBCFILE* file = nullptr;
+    EXPECT_EQ(client.TestExistence(url("a")), ENOTCONN);
+    EXPECT_EQ(client.CreateDirectories(shareUrl(), url("a")), ENOTCONN);
+    EXPECT_EQ(client.AvailableSpace(url(""), nullptr, bytes), ENOTCONN);
+    EXPECT_EQ(client.Open(url("a"), file), ENOTCONN);
+    EXPECT_TRUE(std::filesystem::is_empty(server.Folder()));
+}
+
+TEST_F(SmbClientTest, RefusesCredentialsThatTheLibraryWouldCutShort) {
+    SmbClient client(library(), parsed(server.Path()), {"", "user", std::string(256, 'x')});
+    EXPECT_EQ(client.Connect(), EINVAL);
+}
+
+TEST_F(SmbClientTest, TellsWhatExists) {
+    std::ofstream(server.Folder() / "a b\xC3\xA4(2)") << "x";
+    const auto client = connect(server.Path());
+    EXPECT_EQ(client->TestExistence(shareUrl()), 0);
+    EXPECT_EQ(client->TestExistence(url("a b\xC3\xA4(2)")), 0);
+    EXPECT_EQ(client->TestExistence(url("none")), ENOENT);
+    EXPECT_EQ(client->TestExistence(url("none\\none")), ENOENT);
+}
+
+TEST_F(SmbClientTest, MakesDirectoriesWithAllMissingLevels) {
+    const auto client = connect(server.Path());
+    EXPECT_EQ(client->CreateDirectories(shareUrl(), url("a\\b c\\d")), 0);
+    EXPECT_TRUE(std::filesystem::is_directory(server.Folder() / "a" / "b c" / "d"));
+    EXPECT_EQ(client->CreateDirectories(shareUrl(), url("a\\b c\\d")), EEXIST);
+    EXPECT_EQ(client->CreateDirectories(shareUrl(), url("a\\b c\\e")), 0);
+    EXPECT_EQ(client->CreateDirectories(shareUrl(), shareUrl()), EEXIST);
+    std::ofstream(server.Folder() / "file") << "x";
+    EXPECT_NE(client->CreateDirectories(shareUrl(), url("file\\f")), 0);
+}
+
+TEST_F(SmbClientTest, TellsTheSpaceOfTheFileSystemBehindTheShare) {
+    const auto client = connect(server.Path());
+    SMBCFILE* file = nullptr;
+    ASSERT_EQ(client->Open(url("file"), file), 0);
+    // Other programs write meanwhile, and smbd counts in units of its own.
+    constexpr std::uint64_t kTolerance = std::uint64_t{64} << 20U;
+    for (SMBCFILE* const asked : {static_cast<SMBCFILE*>(nullptr), file}) {
+        std::uint64_t bytes = 0;
+        ASSERT_EQ(client->AvailableSpace(shareUrl(), asked, bytes), 0);
+        const std::uint64_t expected = std::filesystem::space(server.Folder()).available;
+        EXPECT_LT(bytes, expected + kTolerance);
+        EXPECT_GT(bytes + kTolerance, expected);
+    }
+    std::uint64_t bytes = 42;
+    EXPECT_EQ(client->AvailableSpace(url("none"), nullptr, bytes), ENOENT);
+    EXPECT_EQ(bytes, 42U);
+}
+
+TEST_F(SmbClientTest, TruncatesAFileAndKeepsOtherWritersOff) {
+    std::ofstream(server.Folder() / "file") << "was here";
+    const auto client = connect(server.Path());
+    const auto other = connect(server.Path());
+    SMBCFILE* file = nullptr;
+    SMBCFILE* second = nullptr;
+    ASSERT_EQ(client->Open(url("file"), file), 0);
+    EXPECT_EQ(client->Write(file, 0, "ab", 2), 0);
+    EXPECT_EQ(textOf(server.Folder() / "file"), "ab");
+    EXPECT_EQ(other->Open(url("file"), second), EBUSY);
+    EXPECT_EQ(textOf(server.Folder() / "file"), "ab");
+    EXPECT_EQ(client->Close(file), 0);
+    EXPECT_EQ(other->Open(url("file"), second), 0);
+    EXPECT_EQ(textOf(server.Folder() / "file"), "");
+}
+
+TEST_F(SmbClientTest, WritesAndReadsAtAnyPosition) {
+    const auto client = connect(server.Path());
+    SMBCFILE* file = nullptr;
+    ASSERT_EQ(client->Open(url("file"), file), 0);
+    constexpr std::int64_t kFar = (std::int64_t{5} << 30U) + 1;
+    EXPECT_EQ(client->Write(file, kFar, "end", 3), 0);
+    EXPECT_EQ(client->Write(file, 0, "begin", 5), 0);
+    EXPECT_EQ(std::filesystem::file_size(server.Folder() / "file"), static_cast<std::uint64_t>(kFar) + 3);
+    char text[8] = {};
+    std::size_t count = 0;
+    EXPECT_EQ(client->Read(file, kFar, text, sizeof text, count), 0);
+    EXPECT_EQ(std::string(text, count), "end");
+}
+
+TEST_F(SmbClientTest, DoesNotConnectAgainByItself) {
+    const auto client = connect(server.Path());
+    EXPECT_EQ(client->TestExistence(shareUrl()), 0);
+    server.Kill();
+    server.Start();
+    EXPECT_NE(client->TestExistence(shareUrl()), 0);
+    EXPECT_NE(client->TestExistence(shareUrl()), 0);
+    EXPECT_EQ(connect(server.Path())->TestExistence(shareUrl()), 0);
+}
+
+TEST_F(SmbClientTest, ClosesWhatIsStillOpenAtItsEnd) {
+    auto client = connect(server.Path());
+    SMBCFILE* file = nullptr;
+    ASSERT_EQ(client->Open(url("file"), file), 0);
+    client.reset();
+    const auto other = connect(server.Path());
+    EXPECT_EQ(other->Open(url("file"), file), 0);
+}
+
+}  // namespace
+}  // namespace clipfileModule
