@@ -6,8 +6,10 @@
 #include <chrono>
 #include <exception>
 #include <filesystem>
+#include <memory>
 #include <optional>
 #include <utility>
+#include <vector>
 
 #include "OutputFolder.h"
 #include "QxRegistry.h"
@@ -196,6 +198,8 @@ class Running final : public SourceListenerInterface {
     std::uint64_t faults_ = 0;
     std::uint64_t lateStops_ = 0;
     ModuleStatus told_;
+    /// The source has become another one.
+    bool changed_ = false;
     std::optional<Clock::time_point> finishSince_;
     Clock::time_point shown_{};
     Clock::time_point spaceRead_{};
@@ -219,16 +223,21 @@ ExitCode Running::Record(const SourceOpener& open) {
         display_.Finish({});
         return ExitCode::kSuccess;
     }
-    const SourceDescription& description = source->Description();
-    display_.Notice("source: " + description.summary);
-    CheckTimecode(options_, description.frameRate);
-    const Recorder::Settings recorderSettings = RecorderSettings(options_, description.frameRate);
+    display_.Notice("source: " + source->Description().summary);
+    CheckTimecode(options_, source->Description().frameRate);
+    Recorder::Settings recorderSettings = RecorderSettings(options_, source->Description().frameRate);
 
-    Host host(ParametersOf(options_, output.parameter, description));
-    host_ = &host;
+    // Each lives as long as the module, which may still hold one that a hanging disk has kept.
+    std::vector<std::unique_ptr<Host>> hosts;
     std::optional<ReceiverError> failure;
-    {
-        ModuleSession session(library.Module(), host);
+    // One session for each of what the source is: the module learns rate and size when it starts.
+    do {
+        changed_ = false;
+        recorderSettings.frameRate = source->Description().frameRate;
+        hosts.push_back(
+            std::make_unique<Host>(ParametersOf(options_, output.parameter, source->Description())));
+        host_ = hosts.back().get();
+        ModuleSession session(library.Module(), *host_);
         if (options_.mode == OutputMode::kSync) {
             session.GoOnline();
         }
@@ -238,15 +247,17 @@ ExitCode Running::Record(const SourceOpener& open) {
         } catch (const ReceiverError& error) {
             failure = error;
         }
-        if (!host.Failed()) {
+        if (!host_->Failed()) {
             recorder.Close();
         }
         TellLateStops(recorder);
         TakeStatuses(false);
         session.End();
-    }
-    TakeModuleEvents();
-    TakeStatuses(true);
+        TakeModuleEvents();
+        TakeStatuses(true);
+        recorderSettings.past = recorder.Past();
+        plan_.Interrupt();
+    } while (changed_ && !host_->Failed());
 
     Summary summary = Summarise(*source);
     if (failure) {
@@ -272,6 +283,11 @@ void Running::Loop(SourceInterface& source, Recorder& recorder) {
         }
         if (result == SourceInterface::Result::kIdle && source.Counts().away) {
             recorder.Interrupt();
+        }
+        if (result == SourceInterface::Result::kChanged) {
+            display_.Notice("source: " + source.Description().summary);
+            changed_ = !recorder.Finishing();
+            return;
         }
         TellLateStops(recorder);
         TakeCommands(recorder);
@@ -445,7 +461,8 @@ Summary Running::Summarise(const SourceInterface& source) const {
     summary.lost = Lost(source);
     if (host_->Failed()) {
         summary.exitCode = ExitCode::kRecordingFailed;
-    } else if (summary.lost != 0 || faults_ != 0 || lateStops_ != 0 || source.Counts().reconnections != 0) {
+    } else if (summary.lost != 0 || faults_ != 0 || lateStops_ != 0 || source.Counts().reconnections != 0 ||
+               source.Counts().changes != 0) {
         summary.exitCode = ExitCode::kLost;
     }
     return summary;

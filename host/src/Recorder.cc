@@ -31,7 +31,44 @@ constexpr std::size_t kFragmentChunks = 32;
 /// module itself gives a writer 3.5 s to end.
 constexpr std::chrono::seconds kDiskPatience{30};
 
+std::int64_t Period(const FrameRate& rate) {
+    return kVideoClock * rate.denominator / rate.numerator;
+}
+
+/// The same moment in another count of frames.
+Timecode AtRate(Timecode timecode, const FrameRate& from, const FrameRate& to, bool dropFrame) {
+    timecode.frames = static_cast<std::uint8_t>(timecode.frames * to.timecodeFrames / from.timecodeFrames);
+    timecode.dropFrame = dropFrame;
+    while (!IsValid(timecode, to.timecodeFrames)) {
+        ++timecode.frames;
+    }
+    return timecode;
+}
+
 }  // namespace
+
+Recorder::Recorder(const Settings& settings, ModuleSession& session, const ModuleLog& log, RecordPlan& plan)
+    : settings_(settings), session_(session), log_(log), plan_(plan), feed_(session.Stream()) {
+    if (!settings_.past) {
+        return;
+    }
+    const Progress& past = *settings_.past;
+    firstFrame_ = past.firstFrame;
+    lastFrame_ = past.lastFrame;
+    lateStops_ = past.lateStops;
+    timecode_ = past.timecode;
+    if (past.timecode) {
+        // The present rate's frame in front of the one that would have come next.
+        const FrameRate& from = past.frameRate;
+        const FrameRate& to = settings_.frameRate;
+        const Timecode due = TimecodeOf(FrameNumberOf(*past.timecode, from.timecodeFrames) + 1,
+                                        from.timecodeFrames, past.timecode->dropFrame);
+        const Timecode next = AtRate(due, from, to, to.dropFrame && settings_.dropFrame);
+        counter_.emplace(
+            to, TimecodeOf(FrameNumberOf(next, to.timecodeFrames) - 1, to.timecodeFrames, next.dropFrame));
+        counter_->Next(lastFrame_ + Period(from) - Period(to), std::nullopt);
+    }
+}
 
 void Recorder::Put(SourceUnit unit) {
     interleaver_.Put(std::move(unit));

@@ -31,6 +31,16 @@ class Recorder {
     /// The event thread of the module needs far less, unless it hangs or the module has failed.
     static constexpr std::chrono::milliseconds kStopPatience{1000};
 
+    /// How far a run has come.
+    struct Progress {
+        std::optional<std::int64_t> firstFrame;
+        std::int64_t lastFrame = 0;
+        /// Of the last frame, at `frameRate`.
+        std::optional<Timecode> timecode;
+        FrameRate frameRate;
+        std::uint64_t lateStops = 0;
+    };
+
     struct Settings {
         OutputMode mode = OutputMode::kSync;
         FrameRate frameRate;
@@ -43,11 +53,12 @@ class Recorder {
         bool followDisk = false;
         /// Files are fragmented.
         bool fragments = false;
+        /// Of an earlier recorder of the run, whose source has become another one.
+        std::optional<Progress> past;
     };
 
     /// All references must outlive the recorder.
-    Recorder(const Settings& settings, ModuleSession& session, const ModuleLog& log, RecordPlan& plan)
-        : settings_(settings), session_(session), log_(log), plan_(plan), feed_(session.Stream()) {}
+    Recorder(const Settings& settings, ModuleSession& session, const ModuleLog& log, RecordPlan& plan);
 
     void Put(SourceUnit unit);
 
@@ -72,6 +83,7 @@ class Recorder {
     const std::optional<Timecode>& LastTimecode() const { return timecode_; }
     /// The first frame with the record flag that the last one has.
     const std::optional<Timecode>& Since() const { return since_; }
+    Progress Past() const { return {firstFrame_, lastFrame_, timecode_, settings_.frameRate, lateStops_}; }
     /// Stream time of the last frame since the first one, in ticks of 90000 a second.
     std::int64_t Elapsed() const;
 

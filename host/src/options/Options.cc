@@ -147,7 +147,14 @@ void AddSourceOptions(CLI::App& app, Options& options, Texts& texts) {
         ->type_name("SECONDS")
         ->capture_default_str()
         ->group(group);
-    app.add_flag("--no-reconnect", texts.noReconnect, "End when the source is lost instead of trying again")
+    const auto addChoice = [&](const char* name, std::optional<std::uint32_t>& number, const char* what) {
+        app.add_option(name, number, what)->check(CLI::Range(1u, 65535u))->type_name("N")->group(group);
+    };
+    addChoice("--program", options.source.program, "Number of the program, of a source that carries several");
+    addChoice("--video", options.source.video, "Which of several videos, from 1");
+    addChoice("--audio", options.source.audio, "Which of several sounds, from 1");
+    app.add_flag("--no-reconnect", texts.noReconnect,
+                 "End when the source is not there or is lost instead of waiting for it")
         ->group(group);
     app.add_flag("--transcode", options.source.transcode,
                  "Convert video that cannot be recorded as it is: reordered pictures, another codec or rate")
@@ -258,10 +265,6 @@ void AddProgramOptions(CLI::App& app, Options& options) {
 }
 
 }  // namespace
-
-bool IsLive(const std::string& url) {
-    return url.ends_with(".sdp") || (url.find("://") != std::string::npos && !url.starts_with("file://"));
-}
 
 std::optional<Options> ParseOptions(int argc, const char* const* argv, std::string& text) {
     Options options;

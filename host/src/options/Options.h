@@ -7,6 +7,7 @@
 
 #include "common/Timecode.h"
 #include "operator/RecordPlan.h"
+#include "source/Address.h"
 #include "source/SourceInterface.h"
 
 namespace receiver {
@@ -42,9 +43,6 @@ struct Options {
     std::optional<unsigned int> logPriority;
     bool json = false;
 };
-
-/// True for addresses whose stream goes on whether or not it is read: not for files and "test:", which wait.
-bool IsLive(const std::string& url);
 
 /// Reads a command line. Throws `ReceiverError` with `kUsage` and a sentence that names the option when
 /// something is wrong with it. Gives nothing, and the text to print in `text`, when that is all that was

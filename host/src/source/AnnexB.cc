@@ -2,6 +2,8 @@
 
 #include <algorithm>
 
+#include "AnnexBReader.h"
+
 namespace receiver {
 namespace {
 
@@ -38,25 +40,18 @@ void Append(const std::map<std::uint32_t, std::string>& sets, std::string& text)
 }  // namespace
 
 std::vector<NalUnit> NalUnits(std::span<const unsigned char> stream) {
+    constexpr std::size_t kStartCode = 3;
     std::vector<NalUnit> units;
-    std::size_t zeros = 0;
-    for (std::size_t at = 0; at < stream.size(); ++at) {
-        if (stream[at] == 1 && zeros >= 2 && at + 1 < stream.size()) {
-            const std::size_t begin = at - zeros;
-            if (!units.empty()) {
-                units.back().end = begin;
-            }
-            units.push_back({stream[at + 1] & 0x1FU, begin, stream.size(), stream.subspan(at + 1)});
+    nal_access::AnnexBReader reader(stream);
+    for (std::span<const unsigned char> bytes; reader.Next(bytes);) {
+        std::size_t begin = static_cast<std::size_t>(bytes.data() - stream.data()) - kStartCode;
+        while (begin > 0 && stream[begin - 1] == 0) {
+            --begin;
         }
-        zeros = stream[at] == 0 ? zeros + 1 : 0;
-    }
-    for (NalUnit& unit : units) {
-        const auto first = static_cast<std::size_t>(unit.bytes.data() - stream.data());
-        std::size_t end = unit.end;
-        while (end > first && stream[end - 1] == 0) {
-            --end;
+        if (!units.empty()) {
+            units.back().end = begin;
         }
-        unit.bytes = stream.subspan(first, end - first);
+        units.push_back({bytes[0] & 0x1FU, begin, stream.size(), bytes});
     }
     return units;
 }

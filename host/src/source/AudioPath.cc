@@ -4,6 +4,7 @@
 #include <array>
 #include <cstdio>
 #include <new>
+#include <utility>
 #include <vector>
 
 extern "C" {
@@ -12,6 +13,7 @@ extern "C" {
 }
 
 #include "common/ReceiverError.h"
+#include "source/FormatWatch.h"
 
 namespace receiver {
 namespace {
@@ -36,6 +38,11 @@ bool IsRecordedConfig(const std::uint8_t* config, int size) {
     // audioObjectType 2, samplingFrequencyIndex 3, channelConfiguration 2, frameLengthFlag 0
     return bits >> 11 == 2 && (bits >> 7 & 0x0F) == 3 && (bits >> 3 & 0x0F) == 2 && (bits & 0x04) == 0;
 }
+
+constexpr const char* kAudioChanged = "the audio is no longer AAC LC 48 kHz stereo";
+/// Frames in a row, of another format or undecodable, that are more than damage.
+constexpr std::uint64_t kForeign = 3;
+constexpr int kUndecodable = 50;
 
 /// Samples that the time of a frame may differ from the count and still be jitter.
 constexpr std::int64_t kJitter = 1024;
@@ -66,14 +73,28 @@ bool CanPass(const AVCodecParameters& parameters, const AVPacket* first) {
     return IsRecordedConfig(parameters.extradata, parameters.extradata_size);
 }
 
+bool AudioPass::IsForeign(const AVPacket& packet) {
+    const bool header = HasAdtsHeader(packet);
+    headers_ = headers_.value_or(header);
+    return header != *headers_ || (header && !IsRecordedFormat(packet));
+}
+
 void AudioPass::Push(const AVPacket& packet, const AudioSink& sink) {
+    std::size_t told = 0;
+    const std::uint8_t* const config = av_packet_get_side_data(&packet, AV_PKT_DATA_NEW_EXTRADATA, &told);
+    if (config != nullptr && !IsRecordedConfig(config, static_cast<int>(told))) {
+        throw FormatChanged(kAudioChanged);
+    }
+    if (IsForeign(packet)) {
+        if (++foreign_ >= kForeign) {
+            throw FormatChanged(kAudioChanged);
+        }
+        return;
+    }
+    damaged_ += std::exchange(foreign_, 0);
     const auto size = static_cast<std::size_t>(packet.size);
     const std::int64_t time = av_rescale(packet.pts, kAudioRate, 90000);
-    if (HasAdtsHeader(packet)) {
-        if (!IsRecordedFormat(packet)) {
-            ++damaged_;
-            return;
-        }
+    if (*headers_) {
         sink({libav::Share(packet), size, time});
     } else if (size > 0) {
         sink({WithAdtsHeader(packet.data, size), size + kAdtsHeader, time});
@@ -104,8 +125,12 @@ AudioConverter::AudioConverter(const AVCodecParameters& parameters) : frame_(lib
 void AudioConverter::Push(const AVPacket& packet, const AudioSink& sink) {
     if (avcodec_send_packet(decoder_.get(), &packet) < 0) {
         ++damaged_;
+        if (++failures_ >= kUndecodable) {
+            throw FormatChanged("the audio is no longer the one that it was");
+        }
         return;
     }
+    failures_ = 0;
     Receive(sink);
 }
 

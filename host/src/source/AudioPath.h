@@ -2,6 +2,7 @@
 
 #include <cstdint>
 #include <memory>
+#include <optional>
 #include <string>
 
 #include "source/AudioEncoder.h"
@@ -15,6 +16,7 @@ namespace receiver {
 class AudioPathInterface {
  public:
     virtual ~AudioPathInterface() = default;
+    /// Throws `FormatChanged`.
     virtual void Push(const AVPacket& packet, const AudioSink& sink) = 0;
     /// The source is over.
     virtual void Finish(const AudioSink& sink) = 0;
@@ -35,6 +37,12 @@ class AudioPass final : public AudioPathInterface {
     std::uint64_t Damaged() const override { return damaged_; }
 
  private:
+    bool IsForeign(const AVPacket& packet);
+
+    /// Frames have ADTS headers, as the first one did.
+    std::optional<bool> headers_;
+    /// Frames in a row that are none of the format.
+    std::uint64_t foreign_ = 0;
     std::uint64_t damaged_ = 0;
 };
 
@@ -70,6 +78,8 @@ class AudioConverter final : public AudioPathInterface {
     std::int64_t fifoTime_ = 0;
     bool begun_ = false;
     std::uint64_t damaged_ = 0;
+    /// Packets in a row that could not be decoded.
+    int failures_ = 0;
 };
 
 }  // namespace receiver

@@ -2,14 +2,16 @@
 
 #include <algorithm>
 #include <cmath>
-#include <cstdlib>
 #include <utility>
 
 #include "common/Credentials.h"
+#include "source/RtpStamps.h"
+#include "source/StreamChoice.h"
 #include "source/Summary.h"
 #include "source/VideoCheck.h"
 #include "source/VideoConverter.h"
 #include "source/VideoPass.h"
+#include "timing/Saturating.h"
 
 namespace receiver {
 namespace {
@@ -21,8 +23,14 @@ constexpr std::size_t kLookAhead = 25;
 constexpr std::size_t kLongestWait = 4000;
 /// Pictures without an IDR frame among them after which the operator is told.
 constexpr std::uint64_t kWithoutStart = 300;
-/// How far behind the expected time audio may stand, and reordered pictures.
-constexpr std::int64_t kBack = 90000;
+/// How far behind the expected time reordered pictures may stand.
+constexpr std::int64_t kBackReordered = 90000;
+/// And what comes in the order of time, whose stamps merely jitter: this, or three units.
+constexpr std::int64_t kBack = 13500;
+/// How long the sender's first report is waited for, which RTP's senders give every five seconds or so.
+constexpr std::chrono::seconds kReportPatience{6};
+/// The timecode of a file is counted on from its first picture to the first IDR frame no further than this.
+constexpr std::int64_t kLongestCount = std::int64_t{3600} * 90000;
 
 /// The length of the audio frame in a packet of `size` bytes, in ticks.
 std::int64_t AudioDuration(const AVStream& stream, int size) {
@@ -32,27 +40,33 @@ std::int64_t AudioDuration(const AVStream& stream, int size) {
                : av_rescale(kAudioFrame, kTicks.den, kAudioRate);
 }
 
+/// How far behind the expected time a unit of `usual` ticks may stand.
+std::int64_t Back(std::int64_t usual) {
+    return std::max(3 * usual, kBack);
+}
+
 }  // namespace
 
 Connection::Connection(std::unique_ptr<Input> input, const SourceOptions& options,
                        const SourceDescription* before)
     : input_(std::move(input)), packet_(libav::NewPacket()) {
-    Choose();
+    Choose(options);
     LookAhead();
     DecideVideo(options, before);
     DecideAudio();
     ReadTimecodeTag();
+    connected_ = Clock::now();
     description_.summary += klv_.empty() ? "" : ", KLV";
 }
 
-void Connection::Choose() {
+void Connection::Choose(const SourceOptions& options) {
     AVFormatContext& format = input_->Format();
-    const int video = av_find_best_stream(&format, AVMEDIA_TYPE_VIDEO, -1, -1, nullptr, 0);
-    if (video < 0 || (format.streams[video]->disposition & AV_DISPOSITION_ATTACHED_PIC) != 0) {
-        throw ReceiverError(ExitCode::kSourceUnsuitable, "'" + WithoutCredentials(format.url) +
-                                                             "' carries no video: a recording needs one");
+    const StreamChoice choice = ChooseStreams(format, options);
+    if (!choice.notice.empty()) {
+        notices_.push_back(choice.notice);
     }
-    const int audio = av_find_best_stream(&format, AVMEDIA_TYPE_AUDIO, -1, video, nullptr, 0);
+    const int video = choice.video;
+    const int audio = choice.audio;
     for (unsigned int index = 0; index < format.nb_streams; ++index) {
         AVStream* const stream = format.streams[index];
         if (static_cast<int>(index) == video) {
@@ -61,15 +75,27 @@ void Connection::Choose() {
             audio_ = Stream{stream, {}, 0, {}};
         } else if (stream->codecpar->codec_id == AV_CODEC_ID_SMPTE_KLV) {
             klv_.push_back({stream, {}, 0, {}});
-        } else {
+        } else if (audio >= 0 || stream->codecpar->codec_type != AVMEDIA_TYPE_AUDIO) {
             stream->discard = AVDISCARD_ALL;
         }
     }
 }
 
+void Connection::CheckOther(const AVPacket& packet) {
+    const AVStream& stream = *input_->Format().streams[packet.stream_index];
+    if (!audio_ && stream.codecpar->codec_type == AVMEDIA_TYPE_AUDIO &&
+        avcodec_find_decoder(stream.codecpar->codec_id) != nullptr && input_->AskFor(stream.id)) {
+        throw FormatChanged("audio has begun");
+    }
+}
+
 void Connection::LookAhead() {
     std::size_t pictures = 0;
-    while (pictures < kLookAhead && ahead_.size() < kLongestWait) {
+    const auto begun = Clock::now();
+    const auto waits = [&] {
+        return input_->Rtp() && audio_ && !Reported() && Clock::now() - begun < kReportPatience;
+    };
+    while ((pictures < kLookAhead || waits()) && ahead_.size() < kLongestWait) {
         libav::Owner<AVPacket> packet = libav::NewPacket();
         if (!input_->Read(*packet)) {
             break;
@@ -89,27 +115,22 @@ void Connection::LookAhead() {
     }
     const AVStream& video = *video_.stream;
     if (const double spacing = PictureSpacing(video, ahead_); spacing > 0) {
-        MendStamps(video, std::llround(spacing / av_q2d(video.time_base)));
+        MendStamps(video, std::llround(spacing / av_q2d(video.time_base)), ahead_);
     }
     if (audio_) {
         const AVStream& audio = *audio_->stream;
-        MendStamps(audio, av_rescale_q(AudioDuration(audio, 0), kTicks, audio.time_base));
+        MendStamps(audio, av_rescale_q(AudioDuration(audio, 0), kTicks, audio.time_base), ahead_);
     }
 }
 
-void Connection::MendStamps(const AVStream& stream, std::int64_t step) {
-    const AVPacket* next = nullptr;
-    for (auto packet = ahead_.rbegin(); packet != ahead_.rend(); ++packet) {
-        if ((*packet)->stream_index != stream.index ||
-            (next == nullptr && (*packet)->pts == AV_NOPTS_VALUE)) {
-            continue;
-        }
-        if (next != nullptr &&
-            ((*packet)->pts == AV_NOPTS_VALUE || std::abs(next->pts - (*packet)->pts - step) > step / 2)) {
-            (*packet)->pts = next->pts - step;
-        }
-        next = packet->get();
-    }
+bool Connection::Reported() const {
+    const auto reported = [this](const AVStream& stream) {
+        const auto last = std::find_if(ahead_.rbegin(), ahead_.rend(), [&stream](const auto& packet) {
+            return packet->stream_index == stream.index;
+        });
+        return last == ahead_.rend() || IsTied(**last);
+    };
+    return reported(*video_.stream) && reported(*audio_->stream);
 }
 
 void Connection::DecideVideo(const SourceOptions& options, const SourceDescription* before) {
@@ -145,6 +166,10 @@ void Connection::DecideVideo(const SourceOptions& options, const SourceDescripti
     passes_ = reason.empty() && (!converted || (encoding.frameRate == description_.frameRate &&
                                                 encoding.width == description_.width &&
                                                 encoding.height == description_.height));
+    if (findings.interlaced) {
+        notices_.emplace_back(passes_ ? "the video is interlaced and is recorded as such"
+                                      : "the video is interlaced and becomes progressive");
+    }
     if (passes_) {
         videoPath_ = std::make_unique<VideoPass>(parameters);
     } else {
@@ -162,11 +187,7 @@ void Connection::DecideVideo(const SourceOptions& options, const SourceDescripti
         notices_.push_back("video is converted: " + from + " to " + VideoSummary(codec, description_));
     }
     description_.summary = VideoSummary(codec, description_);
-    if (before != nullptr && (before->width != description_.width || before->height != description_.height ||
-                              before->frameRate != description_.frameRate)) {
-        throw SourceChanged("the source came back as " + description_.summary + " and was " +
-                            before->summary + ": start again to record it as it is now");
-    }
+    watch_.emplace(parameters.codec_id, description_.frameRate, passes_);
 }
 
 void Connection::DecideAudio() {
@@ -233,13 +254,19 @@ bool Connection::Pump() {
     if (packet_->stream_index == video_.stream->index) {
         input_->Alive();
     }
+    position_ = packet_->pos;
     Handle(*packet_);
     return true;
+}
+
+std::unique_ptr<Input> Connection::End(std::unique_ptr<Connection> connection) {
+    return std::move(connection->input_);
 }
 
 void Connection::Handle(AVPacket& packet) {
     const Stream* const stream = StreamOf(packet);
     if (stream == nullptr) {
+        CheckOther(packet);
         return;
     }
     if (stream == &video_) {
@@ -287,6 +314,13 @@ std::optional<std::int64_t> Connection::StampOf(Stream& stream, const AVPacket& 
     return stamp;
 }
 
+std::optional<std::int64_t> Connection::DelayOf(const AVPacket& packet) const {
+    if (input_->Rtp() || packet.pts == AV_NOPTS_VALUE || packet.dts == AV_NOPTS_VALUE) {
+        return std::nullopt;
+    }
+    return av_rescale_q(packet.pts - packet.dts, video_.stream->time_base, kTicks);
+}
+
 std::int64_t Connection::Elapsed(Stream& stream, std::int64_t usual) {
     const auto now = Clock::now();
     const auto since = std::exchange(stream.arrived, now);
@@ -312,6 +346,7 @@ void Connection::HandleVideo(AVPacket& packet) {
     if (stamp && !firstVideoStamp_) {
         firstVideoStamp_ = stamp;
     }
+    watch_->Look({packet.data, static_cast<std::size_t>(packet.size)}, stamp, DelayOf(packet));
     const std::int64_t period = assembler_->Grid().Period();
     if (!line_.Anchored()) {
         if (!stamp || !videoPath_->IsStart(packet)) {
@@ -328,36 +363,66 @@ void Connection::HandleVideo(AVPacket& packet) {
         if (audio_) {
             audio_->expected = begin_;
         }
-        if (tag_ && begin_ == 0) {
+        const std::int64_t passed = *stamp - *firstVideoStamp_;
+        if (tag_ && begin_ == 0 && passed >= 0 && passed < kLongestCount) {
             const FrameRate& rate = description_.frameRate;
             const std::int64_t first = FrameNumberOf(*tag_, rate.timecodeFrames);
-            assembler_->SetTimecode(
-                TimecodeOf(first + assembler_->Grid().FramesIn(*stamp - *firstVideoStamp_),
-                           rate.timecodeFrames, tag_->dropFrame));
+            assembler_->SetTimecode(TimecodeOf(first + assembler_->Grid().FramesIn(passed),
+                                               rate.timecodeFrames, tag_->dropFrame));
         }
     }
     packet.pts =
-        stamp ? TimeOf(video_, *stamp, period, passes_ ? std::max<std::int64_t>(3 * period, 13500) : kBack)
-              : video_.expected;
+        stamp ? TimeOf(video_, *stamp, period, passes_ ? Back(period) : kBackReordered) : video_.expected;
     packet.dts = AV_NOPTS_VALUE;
     video_.expected = packet.pts + period;
     videoPath_->Push(packet, ToPictures());
-    for (auto waiting = std::exchange(early_, {}); const auto& early : waiting) {
+    ReplayEarly();
+}
+
+void Connection::ReplayEarly() {
+    replaying_ = true;
+    auto waiting = std::exchange(early_, {});
+    // With its first sound a picture is complete, and what belongs to it has to be there by then.
+    std::stable_partition(waiting.begin(), waiting.end(), [this](const auto& early) {
+        const Stream* const stream = StreamOf(*early);
+        return stream != nullptr && (!audio_ || stream != &*audio_);
+    });
+    for (const auto& early : waiting) {
         Handle(*early);
     }
+    replaying_ = false;
 }
 
 void Connection::HandleAudio(AVPacket& packet) {
     // Of several frames behind one stamp each further one begins where the one before ends.
     const std::int64_t usual = AudioDuration(*audio_->stream, packet.size);
     const auto stamp = StampOf(*audio_, packet);
-    packet.pts = stamp ? TimeOf(*audio_, *stamp, usual, kBack) : audio_->expected;
+    packet.pts = stamp ? AudioTime(*stamp, usual) : audio_->expected;
     packet.dts = AV_NOPTS_VALUE;
     audio_->expected = packet.pts + usual;
     // Sound that ends in front of this connection's pictures goes nowhere.
     if (packet.pts >= begin_ - AudioDuration(*audio_->stream, 0) / 2) {
         audioPath_->Push(packet, ToAudio());
     }
+}
+
+std::int64_t Connection::AudioTime(std::int64_t stamp, std::int64_t usual) {
+    if (!audio_->joined) {
+        const std::int64_t time = line_.Nearest(stamp, begin_);
+        const bool near = Distance(time, begin_) <= static_cast<std::uint64_t>(Timeline::kLongestGap);
+        // The sound of pictures in front of the first IDR frame, however many these were. On another clock
+        // than that of the IDR frame it belongs to pictures before it as well.
+        const bool before = time < begin_ - usual / 2;
+        if (replaying_ ? before || !near : before && near) {
+            return std::min(time, begin_ - usual);
+        }
+        audio_->joined = true;
+        // Audio may begin at any time of the pictures.
+        if (Distance(time, video_.expected) <= static_cast<std::uint64_t>(Timeline::kLongestGap)) {
+            audio_->expected = time;
+        }
+    }
+    return TimeOf(*audio_, stamp, usual, Back(usual));
 }
 
 void Connection::HandleKlv(const AVPacket& packet) {

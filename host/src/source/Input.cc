@@ -1,23 +1,25 @@
 #include "source/Input.h"
 
+#include <algorithm>
 #include <array>
 #include <cerrno>
 #include <cstdio>
+#include <string_view>
 #include <utility>
 
 #include "common/Credentials.h"
 #include "common/ReceiverError.h"
+#include "source/Address.h"
 
 namespace receiver {
 namespace {
 
 /// What finding out may take beyond the time-out: the libraries look at up to 7 seconds of a stream.
 constexpr double kAnalysis = 10;
-
-std::string SchemeOf(const std::string& url) {
-    const std::size_t end = url.find("://");
-    return end == std::string::npos ? "" : url.substr(0, end);
-}
+/// Packets that may come when a wait is over.
+constexpr int kLongestDrain = 100;
+/// Bytes in front of a picture in which its program's tables stand: ten packets of a transport stream.
+constexpr std::int64_t kTables = 1880;
 
 bool EndsWith(const std::string& text, const std::string& end) {
     return text.size() >= end.size() && text.compare(text.size() - end.size(), end.size(), end) == 0;
@@ -33,6 +35,8 @@ void SetOptions(const std::string& url, libav::Options& options) {
         options.Set("buffer_size", "4194304");
     } else if (scheme == "rtsp" || scheme == "rtsps") {
         options.Set("rtsp_flags", "prefer_tcp");
+    } else if (IsRtmpListener(url)) {
+        options.Set("listen", "1");
     } else if (EndsWith(url, ".sdp")) {
         options.Set("protocol_whitelist", "file,http,https,tcp,tls,udp,rtp,srtp,crypto,data");
         options.Set("buffer_size", "4194304");
@@ -46,6 +50,28 @@ std::string Seconds(double seconds) {
     return text.data();
 }
 
+/// Stamps that no clock shows are none: so far from the ends of 64 bits, in the stream's time base and in
+/// ticks of 90000, stamps can be told apart and scaled without a thought.
+void ForgetWildStamps(AVPacket& packet, AVRational base) {
+    constexpr std::int64_t kFurthest = std::int64_t{1} << 60;
+    for (std::int64_t* const stamp : {&packet.pts, &packet.dts}) {
+        const auto wild = [](std::int64_t value) { return value < -kFurthest || value > kFurthest; };
+        if (wild(*stamp) || wild(av_rescale_q(*stamp, base, {1, 90000}))) {
+            *stamp = AV_NOPTS_VALUE;
+        }
+    }
+}
+
+/// False for what no sender mends: an address that is written wrongly or cannot be had, and a refusal.
+bool MayPass(int result) {
+    constexpr std::array<int, 9> kFinal{AVERROR(ENOENT),          AVERROR(EACCES),
+                                        AVERROR(EISDIR),          AVERROR(EADDRINUSE),
+                                        AVERROR(EADDRNOTAVAIL),   AVERROR_HTTP_UNAUTHORIZED,
+                                        AVERROR_HTTP_FORBIDDEN,   AVERROR_PROTOCOL_NOT_FOUND,
+                                        AVERROR_DEMUXER_NOT_FOUND};
+    return std::find(kFinal.begin(), kFinal.end(), result) == kFinal.end();
+}
+
 /// Adds what the libraries said, which often tells more than their error number.
 std::string Reason(int result) {
     const std::string text = libav::ErrorText(result);
@@ -55,8 +81,9 @@ std::string Reason(int result) {
 
 }  // namespace
 
-Input::Input(const std::string& url, double timeout, std::shared_ptr<Interrupt> interrupt, bool (*stop)())
-    : url_(url), timeout_(timeout), interrupt_(std::move(interrupt)), stop_(stop) {
+Input::Input(const std::string& url, double timeout, double patience, std::shared_ptr<Interrupt> interrupt,
+             bool (*stop)())
+    : url_(url), timeout_(timeout), patience_(patience), interrupt_(std::move(interrupt)), stop_(stop) {
     Open();
     stop_ = nullptr;
     const bool seekable = format_->pb != nullptr && (format_->pb->seekable & AVIO_SEEKABLE_NORMAL) != 0;
@@ -87,8 +114,8 @@ bool Input::Expired() {
     return timedOut_;
 }
 
-void Input::Open() {
-    AVFormatContext* format = avformat_alloc_context();
+AVFormatContext* Input::NewFormat() {
+    AVFormatContext* const format = avformat_alloc_context();
     if (format == nullptr) {
         throw std::bad_alloc();
     }
@@ -97,24 +124,69 @@ void Input::Open() {
     format->correct_ts_overflow = 0;
     // High bit rates: as many bytes as the time that is looked at may hold.
     format->probesize = std::int64_t{64} << 20;
+    return format;
+}
+
+void Input::Open() {
+    AVFormatContext* format = NewFormat();
     libav::Options options;
     SetOptions(url_, options);
     libav::ForgetErrors();
-    Expect(timeout_);
+    Expect(patience_);
     // Frees the context when it fails.
-    int result = avformat_open_input(&format, url_.c_str(), nullptr, options.Get());
+    const int result = avformat_open_input(&format, url_.c_str(), nullptr, options.Get());
     if (result < 0) {
         FailOpening(result);
     }
     format_.reset(format);
-    Expect(timeout_ + kAnalysis);
-    result = avformat_find_stream_info(format, nullptr);
+    opened_ = std::chrono::steady_clock::now();
+    FindStreams();
+}
+
+void Input::FindStreams() {
+    Expect(patience_ + kAnalysis);
+    const int result = avformat_find_stream_info(format_.get(), nullptr);
     if (result < 0) {
         FailOpening(result);
     }
     if (Expired() || interrupt_->Stopped() || (stop_ != nullptr && stop_())) {
         FailOpening(AVERROR_EXIT);
     }
+}
+
+bool Input::Renew(std::int64_t position) {
+    if (format_->pb != nullptr && std::string_view(format_->iformat->name) == "mpegts") {
+        CarryOn(position);
+    } else if (recorded_) {
+        return false;
+    } else {
+        format_.reset();
+        Open();
+    }
+    Alive();
+    return true;
+}
+
+void Input::CarryOn(std::int64_t position) {
+    const AVInputFormat* const kind = format_->iformat;
+    if (!connection_) {
+        connection_.reset(std::exchange(format_->pb, nullptr));
+    }
+    format_.reset();
+    if (position >= 0) {
+        // The tables stand right in front of the picture. A live source has only what is still in memory.
+        avio_seek(connection_.get(), std::max<std::int64_t>(0, position - kTables), SEEK_SET);
+    }
+    AVFormatContext* format = NewFormat();
+    format->pb = connection_.get();
+    libav::ForgetErrors();
+    Expect(timeout_);
+    const int result = avformat_open_input(&format, url_.c_str(), kind, nullptr);
+    if (result < 0) {
+        FailOpening(result);
+    }
+    format_.reset(format);
+    FindStreams();
 }
 
 void Input::FailOpening(int result) {
@@ -125,7 +197,7 @@ void Input::FailOpening(int result) {
     const std::string said = WithoutCredentials(libav::LastError());
     std::string sentence;
     if (Expired() || result == AVERROR(ETIMEDOUT)) {
-        sentence = "nothing came from " + shown + " within " + Seconds(timeout_) +
+        sentence = "nothing came from " + shown + " within " + Seconds(patience_) +
                    ": check that it sends, and that no firewall stands between";
     } else if (result == AVERROR(ENOENT)) {
         sentence = "there is no file " + shown;
@@ -147,9 +219,9 @@ void Input::FailOpening(int result) {
     } else if (result == AVERROR_INVALIDDATA) {
         sentence = shown + " carries nothing that is known as audio and video: " + Reason(result);
     } else if (result == AVERROR_PROTOCOL_NOT_FOUND || result == AVERROR_DEMUXER_NOT_FOUND) {
-        sentence =
-            shown +
-            " begins with a scheme that is not known: udp, srt, rtsp, http and https are, and .sdp files";
+        sentence = shown +
+                   " begins with a scheme that is not known: udp, srt, rtsp, rtmp, http and https are, and "
+                   ".sdp files";
     } else if (said.find("resolve") != std::string::npos || said.find("getaddrinfo") != std::string::npos) {
         sentence = "there is no host with the name in " + shown + ": " + said;
     } else if (SchemeOf(url_) == "srt" && result == AVERROR(EIO)) {
@@ -160,16 +232,22 @@ void Input::FailOpening(int result) {
     } else {
         sentence = shown + " cannot be opened: " + Reason(result);
     }
+    if (IsLive(url_) && MayPass(result)) {
+        throw SourceAbsent(sentence);
+    }
     throw ReceiverError(ExitCode::kSourceUnavailable, sentence);
 }
 
 bool Input::Read(AVPacket& packet) {
     libav::ForgetErrors();
-    const int result = Expired() ? AVERROR_EXIT : av_read_frame(format_.get(), &packet);
+    // What the libraries still hold when a wait is over comes out before they tell.
+    const bool over = Expired() && ++drained_ > kLongestDrain;
+    const int result = over ? AVERROR_EXIT : av_read_frame(format_.get(), &packet);
     if (interrupt_->Stopped() || (stop_ != nullptr && stop_())) {
         throw Stopped();
     }
     if (result >= 0) {
+        ForgetWildStamps(packet, format_->streams[packet.stream_index]->time_base);
         return true;
     }
     if (Expired()) {

@@ -3,9 +3,11 @@
 #include <atomic>
 #include <chrono>
 #include <memory>
+#include <set>
 #include <stdexcept>
 #include <string>
 
+#include "common/ReceiverError.h"
 #include "source/Interrupt.h"
 #include "source/Libav.h"
 
@@ -17,6 +19,13 @@ class SourceLost : public std::runtime_error {
     using std::runtime_error::runtime_error;
 };
 
+/// A live source is not there, and may be later.
+class SourceAbsent : public ReceiverError {
+ public:
+    explicit SourceAbsent(const std::string& sentence)
+        : ReceiverError(ExitCode::kSourceUnavailable, sentence) {}
+};
+
 /// The wait for the source was ended from outside.
 class Stopped : public std::runtime_error {
  public:
@@ -26,12 +35,21 @@ class Stopped : public std::runtime_error {
 /// An opened address: what libavformat knows of it, and its packets.
 class Input {
  public:
-    /// Opens `url` and finds out what it carries. `timeout`: seconds that it may take to answer, and later
-    /// seconds that may pass between two calls of `Alive`. `stop` may be null; it is asked until this
-    /// returns. Throws `ReceiverError` (`kSourceUnavailable`), and `Stopped`.
-    Input(const std::string& url, double timeout, std::shared_ptr<Interrupt> interrupt, bool (*stop)());
+    /// Opens `url` and finds out what it carries. `patience`: seconds that it may take to answer. `timeout`:
+    /// seconds that may pass later between two calls of `Alive`. `stop` may be null; it is asked until this
+    /// returns. Throws `ReceiverError` (`kSourceUnavailable`), of it `SourceAbsent` where a later attempt may
+    /// succeed, and `Stopped`.
+    Input(const std::string& url, double timeout, double patience, std::shared_ptr<Interrupt> interrupt,
+          bool (*stop)());
 
     AVFormatContext& Format() { return *format_; }
+    /// Finds out anew what the source carries, from byte `position` of the connection on where that can still
+    /// be had (-1: where it is). Streams and packets of before are gone. False for a file that would begin
+    /// again with its first byte. Throws like the constructor, and `SourceLost`.
+    bool Renew(std::int64_t position);
+    /// True the first time that somebody asks for the stream with that number of the container, also after
+    /// `Renew`: what is still not understood then never will be.
+    bool AskFor(int stream) { return asked_.insert(stream).second; }
     /// The next packet. False at the end, also when the other side closed the connection. Throws
     /// `SourceLost`, also when the time without `Alive` is over, and `Stopped`.
     bool Read(AVPacket& packet);
@@ -39,20 +57,32 @@ class Input {
     void Alive() { Expect(timeout_); }
     /// A file, here or on a server, that is paced when it is read; else the source sets the pace.
     bool Recorded() const { return recorded_; }
+    /// A wait was over: what `Read` still gives came before.
+    bool TimedOut() const { return timedOut_; }
+    /// When the address answered.
+    std::chrono::steady_clock::time_point Opened() const { return opened_; }
     /// Packets come by RTP, which stamps pictures with the time when they are shown and nothing else.
     bool Rtp() const { return rtp_; }
 
  private:
+    struct CloseConnection {
+        void operator()(AVIOContext* connection) const { avio_closep(&connection); }
+    };
+
     /// Asked by the libraries while they wait. Not 0 ends the wait.
     static int OnWait(void* input);
     void Expect(double seconds);
     bool Expired();
+    AVFormatContext* NewFormat();
     void Open();
+    void FindStreams();
+    void CarryOn(std::int64_t position);
     /// Throws what `result` of opening means.
     [[noreturn]] void FailOpening(int result);
 
     const std::string url_;
     const double timeout_;
+    const double patience_;
     const std::shared_ptr<Interrupt> interrupt_;
     /// Null once the source is open.
     bool (*stop_)();
@@ -60,8 +90,13 @@ class Input {
     std::atomic<std::chrono::steady_clock::rep> deadline_{0};
     /// A wait was over. The libraries may give out what they still hold before they tell.
     std::atomic<bool> timedOut_{false};
+    int drained_ = 0;
+    std::chrono::steady_clock::time_point opened_;
+    std::set<int> asked_;
     bool recorded_ = false;
     bool rtp_ = false;
+    /// Of a connection that has been taken over from an earlier context.
+    std::unique_ptr<AVIOContext, CloseConnection> connection_;
     libav::Owner<AVFormatContext> format_;
 };
 

@@ -5,6 +5,7 @@
 #include <utility>
 
 #include "common/ReceiverError.h"
+#include "source/Address.h"
 
 namespace receiver {
 namespace {
@@ -14,24 +15,33 @@ constexpr std::array<int, 5> kPauses{1, 2, 4, 8, 15};
 /// A connection that has held so long was a good one, and the pauses begin anew behind it.
 constexpr std::chrono::seconds kGood{30};
 
-std::unique_ptr<Connection> Connect(const SourceOptions& options, const std::shared_ptr<Interrupt>& interrupt,
-                                    bool (*stop)(), const SourceDescription* before) {
+std::unique_ptr<Connection> Connect(const SourceOptions& options, double patience,
+                                    const std::shared_ptr<Interrupt>& interrupt, bool (*stop)(),
+                                    const SourceDescription* before) {
     try {
         return std::make_unique<Connection>(
-            std::make_unique<Input>(options.url, options.timeout, interrupt, stop), options, before);
+            std::make_unique<Input>(options.url, options.timeout, patience, interrupt, stop), options,
+            before);
     } catch (const SourceLost& loss) {
-        throw ReceiverError(ExitCode::kSourceUnavailable,
-                            "the source was opened and lost at once: " + std::string(loss.what()));
+        const std::string sentence = "the source was opened and lost at once: " + std::string(loss.what());
+        if (IsLive(options.url)) {
+            throw SourceAbsent(sentence);
+        }
+        throw ReceiverError(ExitCode::kSourceUnavailable, sentence);
     }
+}
+
+std::int64_t Ticks(std::chrono::steady_clock::duration time) {
+    return std::chrono::duration_cast<std::chrono::microseconds>(time).count() * 9 / 100;
 }
 
 }  // namespace
 
-InputProducer::InputProducer(const SourceOptions& options, std::shared_ptr<Interrupt> interrupt,
-                             bool (*stop)())
+InputProducer::InputProducer(const SourceOptions& options, double patience,
+                             std::shared_ptr<Interrupt> interrupt, bool (*stop)())
     : options_(options),
       interrupt_(std::move(interrupt)),
-      connection_(Connect(options_, interrupt_, stop, nullptr)),
+      connection_(Connect(options_, patience, interrupt_, stop, nullptr)),
       description_(connection_->Description()),
       recorded_(connection_->Recorded()),
       assembler_(description_.frameRate),
@@ -53,13 +63,23 @@ bool InputProducer::Produce(Batch& batch) {
         } else {
             const std::int64_t before = assembler_.LastPicture();
             more = connection_->Pump();
-            if (assembler_.LastPicture() != before) {
-                lastPicture_ = Clock::now();
+            const std::int64_t last = assembler_.LastPicture();
+            if (last != before) {
+                // What the libraries held back came with the picture before.
+                lastPicture_ = connection_->Flushing() && before >= 0
+                                   ? lastPicture_ + std::chrono::microseconds((last - before) * 100 / 9)
+                                   : Clock::now();
             }
             if (!more && !recorded_) {
                 Lose("the connection has ended");
                 more = options_.reconnect;
             }
+        }
+    } catch (const FormatChanged& change) {
+        try {
+            Change(change.what());
+        } catch (const Stopped&) {
+            more = false;
         }
     } catch (const SourceLost& loss) {
         Lose(loss.what());
@@ -82,8 +102,8 @@ void InputProducer::Lose(const std::string& reason) {
     }
     assembler_.Finish();
     if (options_.reconnect && !recorded_) {
-        assembler_.AddNotice("the source was lost: " + reason + "; trying again in " +
-                             std::to_string(kPauses[attempts_]) + " s");
+        assembler_.AddNotice("the source was lost: " + reason + NextAttempt());
+        told_ = now;
     }
     damagedBefore_ += connection_->Damaged();
     connection_.reset();
@@ -91,17 +111,22 @@ void InputProducer::Lose(const std::string& reason) {
 }
 
 void InputProducer::TryAgain() {
-    if (interrupt_->Wait(std::chrono::seconds(kPauses[attempts_]))) {
+    // Where the sender comes to us nothing is left out while nobody listens; only what fails at once is not
+    // tried in a hurry.
+    const bool listens = Listens(options_.url);
+    const bool hurried = Clock::now() - tried_ < std::chrono::seconds(kPauses[0]);
+    const int pause = !listens ? kPauses[attempts_] : hurried ? kPauses[0] : 0;
+    if (interrupt_->Wait(std::chrono::seconds(pause))) {
         throw Stopped();
     }
     attempts_ = std::min(attempts_ + 1, kPauses.size() - 1);
+    tried_ = Clock::now();
+    std::unique_ptr<Connection> connection;
     try {
-        connection_ = Connect(options_, interrupt_, nullptr, &description_);
-    } catch (const SourceChanged&) {
-        throw;
+        connection = Connect(options_, listens ? kListeningPatience : options_.timeout, interrupt_, nullptr,
+                             &description_);
     } catch (const ReceiverError& error) {
-        assembler_.AddNotice(std::string(error.what()) + "; trying again in " +
-                             std::to_string(kPauses[attempts_]) + " s");
+        TellFailure(error);
         return;
     }
     connected_ = Clock::now();
@@ -109,9 +134,75 @@ void InputProducer::TryAgain() {
     using std::chrono::duration_cast;
     const auto away = duration_cast<std::chrono::seconds>(connected_ - lost_).count();
     assembler_.AddNotice("the source is back after " + std::to_string(away) + " s");
-    // Time went on while the source was away.
-    const auto passed = duration_cast<std::chrono::microseconds>(connected_ - lastPicture_).count() * 9 / 100;
-    connection_->Begin(assembler_, std::max(assembler_.End(), assembler_.LastPicture() + passed));
+    const std::int64_t passed = Ticks(connection->Opened() - lastPicture_);
+    GoOn(std::move(connection), passed, false);
+}
+
+void InputProducer::Change(const std::string& reason) {
+    assembler_.Finish();
+    ++changes_;
+    damagedBefore_ += connection_->Damaged();
+    const std::int64_t position = connection_->Position();
+    const std::int64_t passed = recorded_ ? 0 : Ticks(Clock::now() - lastPicture_);
+    std::unique_ptr<Input> input = Connection::End(std::move(connection_));
+    lost_ = Clock::now();
+    try {
+        if (!input->Renew(position)) {
+            throw ReceiverError(ExitCode::kSourceUnsuitable,
+                                reason + ": what follows in this file is left out");
+        }
+        auto connection = std::make_unique<Connection>(std::move(input), options_, nullptr);
+        assembler_.AddNotice(reason + ": the recording goes on in a new file");
+        GoOn(std::move(connection), passed, true);
+    } catch (const SourceLost& loss) {
+        EndWith(ReceiverError(ExitCode::kSourceUnavailable,
+                              reason + ", and the source was lost: " + loss.what()));
+    } catch (const ReceiverError& error) {
+        EndWith(error);
+    }
+}
+
+void InputProducer::EndWith(const ReceiverError& error) {
+    if (recorded_ || !options_.reconnect) {
+        end_ = error;
+        return;
+    }
+    TellFailure(error);
+}
+
+std::string InputProducer::NextAttempt() const {
+    return Listens(options_.url) ? "; waiting for it"
+                                 : "; trying again in " + std::to_string(kPauses[attempts_]) + " s";
+}
+
+void InputProducer::TellFailure(const ReceiverError& error) {
+    const auto now = Clock::now();
+    if (!Listens(options_.url) || now - told_ >= kTellEvery) {
+        assembler_.AddNotice(error.what() + NextAttempt());
+        told_ = now;
+    }
+}
+
+void InputProducer::GoOn(std::unique_ptr<Connection> connection, std::int64_t passed, bool changed) {
+    connection_ = std::move(connection);
+    // Time went on while the source was away. On the grid, so that picture and sound are moved alike.
+    const std::int64_t begin = assembler_.Grid().PlaceOf(assembler_.LastPicture() + passed);
+    const SourceDescription& now = connection_->Description();
+    const bool other = now.width != description_.width || now.height != description_.height ||
+                       now.frameRate != description_.frameRate;
+    if (other && !changed) {
+        assembler_.AddNotice("the source came back as " + now.summary + " and was " + description_.summary +
+                             ": the recording goes on in a new file");
+        ++changes_;
+    }
+    if (now.frameRate != description_.frameRate) {
+        assembler_.SetRate(now.frameRate, begin);
+    }
+    description_ = now;
+    if (other || changed) {
+        assembler_.AddChange(description_);
+    }
+    connection_->Begin(assembler_, begin);
 }
 
 void InputProducer::Publish() {
@@ -120,7 +211,7 @@ void InputProducer::Publish() {
 }
 
 SourceCounts InputProducer::Counts() const {
-    return {lostFrames_, damaged_, reconnections_, away_};
+    return {lostFrames_, damaged_, reconnections_, changes_, away_};
 }
 
 }  // namespace receiver

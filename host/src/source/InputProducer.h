@@ -12,12 +12,20 @@
 
 namespace receiver {
 
+/// How often it is told that a source is still waited for.
+inline constexpr std::chrono::seconds kTellEvery{60};
+/// Seconds that an attempt listens for a sender.
+inline constexpr double kListeningPatience = 60;
+
 /// The units of an address: of one connection after the other, since a live source that was lost is tried
 /// again, after pauses that grow, until it is back or somebody stops.
 class InputProducer final : public ProducerInterface {
  public:
-    /// Opens the source. `stop` may be null; asked until this returns. Throws `ReceiverError`, and `Stopped`.
-    InputProducer(const SourceOptions& options, std::shared_ptr<Interrupt> interrupt, bool (*stop)());
+    /// Opens the source, which may take `patience` seconds to answer. `stop` may be null; asked until this
+    /// returns. Throws `ReceiverError`, of it `SourceAbsent` where a later attempt may succeed, and
+    /// `Stopped`.
+    InputProducer(const SourceOptions& options, double patience, std::shared_ptr<Interrupt> interrupt,
+                  bool (*stop)());
 
     const SourceDescription& Description() const override { return description_; }
     bool Produce(Batch& batch) override;
@@ -30,6 +38,14 @@ class InputProducer final : public ProducerInterface {
 
     void Lose(const std::string& reason);
     void TryAgain();
+    /// Tells why an attempt failed.
+    void TellFailure(const ReceiverError& error);
+    std::string NextAttempt() const;
+    void Change(const std::string& reason);
+    /// Goes on with `connection`, `passed` ticks after the last picture. `changed`: as another source, even
+    /// if it looks the same.
+    void GoOn(std::unique_ptr<Connection> connection, std::int64_t passed, bool changed);
+    void EndWith(const ReceiverError& error);
     void Publish();
 
     const SourceOptions options_;
@@ -44,6 +60,9 @@ class InputProducer final : public ProducerInterface {
     Clock::time_point lost_;
     /// Which pause comes next.
     std::size_t attempts_ = 0;
+    /// When the last attempt began and when one was told of; where a sender is waited for.
+    Clock::time_point tried_;
+    Clock::time_point told_;
     std::uint64_t damagedBefore_ = 0;
     /// Ends the source when all that came before it has been handed over.
     std::optional<ReceiverError> end_;
@@ -51,6 +70,7 @@ class InputProducer final : public ProducerInterface {
     std::atomic<std::uint64_t> lostFrames_{0};
     std::atomic<std::uint64_t> damaged_{0};
     std::atomic<std::uint64_t> reconnections_{0};
+    std::atomic<std::uint64_t> changes_{0};
     std::atomic<bool> away_{false};
 };
 

@@ -8,8 +8,9 @@
 
 namespace receiver {
 
-/// Units and sentences for the operator, in the order in which they came to be.
-using Batch = std::deque<std::variant<SourceUnit, std::string>>;
+/// Units, sentences for the operator, and what the source is from there on, in the order in which they came
+/// to be.
+using Batch = std::deque<std::variant<SourceUnit, std::string, SourceDescription>>;
 
 /// Makes units as fast as it can, on a thread of its own.
 class ProducerInterface {

@@ -25,6 +25,7 @@ QueuedSource::QueuedSource(std::unique_ptr<ProducerInterface> producer, std::sha
       capacity_(capacity),
       listener_(listener),
       pacer_(pacer),
+      description_(producer_->Description()),
       thread_([this] { Run(); }) {}
 
 QueuedSource::~QueuedSource() {
@@ -88,6 +89,11 @@ SourceInterface::Result QueuedSource::Read(SourceUnit& unit) {
             listener_.OnNotice(sentence);
             lock.lock();
             continue;
+        }
+        if (auto* const description = std::get_if<SourceDescription>(&queue_.front())) {
+            description_ = std::move(*description);
+            queue_.pop_front();
+            return Result::kChanged;
         }
         SourceUnit& front = std::get<SourceUnit>(queue_.front());
         const Pacer::Duration time = TimeOf(front);

@@ -25,7 +25,8 @@ class QueuedSource final : public SourceInterface {
     QueuedSource& operator=(const QueuedSource&) = delete;
     ~QueuedSource() override;
 
-    const SourceDescription& Description() const override { return producer_->Description(); }
+    /// For the reading thread.
+    const SourceDescription& Description() const override { return description_; }
     Result Read(SourceUnit& unit) override;
     SourceCounts Counts() const override { return producer_->Counts(); }
     void Stop() override;
@@ -39,6 +40,7 @@ class QueuedSource final : public SourceInterface {
     SourceListenerInterface& listener_;
     /// Of the reading thread alone.
     Pacer pacer_;
+    SourceDescription description_;
 
     /// Guards what follows.
     std::mutex mutex_;

@@ -35,7 +35,7 @@ struct SourceUnit {
     std::optional<Timecode> timecode;
 };
 
-/// What a source is. Constant from the opening on.
+/// What a source is.
 struct SourceDescription {
     FrameRate frameRate;
     std::uint32_t width = 0;
@@ -53,6 +53,8 @@ struct SourceCounts {
     /// Packets that arrived damaged and were not passed on.
     std::uint64_t damagedPackets = 0;
     std::uint64_t reconnections = 0;
+    /// How often the source became another one.
+    std::uint64_t changes = 0;
     /// The source is lost and not back yet.
     bool away = false;
 };
@@ -77,6 +79,10 @@ class SourceInterface {
         kEnd,
         /// `Stop` was called.
         kStopped,
+        /// The source is another one from here on: `Description` tells what. Times go on. What came before
+        /// and
+        /// what follows cannot share a file.
+        kChanged,
         /// Nothing came for about 100 ms, or a reconnection goes on. The caller looks after its other
         /// business and
         /// reads again.
@@ -88,8 +94,7 @@ class SourceInterface {
     /// The next unit, in the order of time across media but for what the source itself delivers late. Files
     /// and the test picture come at their own speed (times the speed that was asked for): the call waits
     /// until the unit is due. Throws `ReceiverError` when the source turned out to be one that cannot be
-    /// recorded after all, for instance because it came back with another frame rate or picture size after a
-    /// reconnection.
+    /// recorded after all.
     virtual Result Read(SourceUnit& unit) = 0;
     virtual SourceCounts Counts() const = 0;
     /// Makes the present and every later `Read` return `kStopped` soon, also in the middle of a connection
@@ -105,7 +110,7 @@ struct SourceOptions {
     double speed = 1.0;
     /// Converts video that cannot be recorded as it is.
     bool transcode = false;
-    /// Goes on trying when a network source is lost.
+    /// Goes on trying while a network source is not there yet, and when it is lost.
     bool reconnect = true;
     /// "test:" and conversions. A rate and a size that are not set are 25 and 1280x720 for "test:" and those
     /// of the source for a conversion.
@@ -116,13 +121,18 @@ struct SourceOptions {
     std::uint32_t bitrate = 8000;
     /// Frames from one IDR frame to the next; 0 is the number of frames in a second.
     std::uint32_t pictureGroup = 0;
+    /// Of several programs or streams: the program's number, and which of its videos and audios, from 1.
+    std::optional<std::uint32_t> program;
+    std::optional<std::uint32_t> video;
+    std::optional<std::uint32_t> audio;
     /// Seconds without a unit after which a network source counts as lost.
     double timeout = 5.0;
 };
 
-/// Opens a source. Throws `ReceiverError` with `kSourceUnavailable` or `kSourceUnsuitable`. `listener` must
-/// live as long as the source. `stop` may be null; while the source is being opened, it is asked from time to
-/// time, and true ends the attempt with a null pointer.
+/// Opens a source. A live one that is not there yet is waited for, told once and then every minute, unless
+/// `reconnect` is off. Throws `ReceiverError` with `kSourceUnavailable` or `kSourceUnsuitable`. `listener`
+/// must live as long as the source. `stop` may be null; while the source is being opened, it is asked from
+/// time to time, and true ends the attempt with a null pointer.
 std::unique_ptr<SourceInterface> OpenSource(const SourceOptions& options, SourceListenerInterface& listener,
                                             bool (*stop)());
 

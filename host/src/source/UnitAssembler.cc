@@ -35,9 +35,21 @@ UnitAssembler::UnitAssembler(const FrameRate& rate) : rate_(rate), grid_(rate), 
 void UnitAssembler::Begin(bool audio) {
     audio_ = audio;
     resumed_ = true;
+    audioGrid_.Rejoin();
     // What still waits was sent for pictures that do not come any more.
     heldAudio_.clear();
     heldKlv_.clear();
+}
+
+void UnitAssembler::SetRate(const FrameRate& rate, std::int64_t begin) {
+    const std::int64_t end = grid_.End();
+    if (begin > end) {
+        audioGrid_.AddVideoGap(ToAudio(end), ToAudio(begin) - ToAudio(end));
+    }
+    rate_ = rate;
+    grid_ = FrameGrid(rate, begin);
+    // An address counts frames of the rate before.
+    addressedFrame_.reset();
 }
 
 void UnitAssembler::SetTimecode(const Timecode& timecode) {

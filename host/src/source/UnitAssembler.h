@@ -21,6 +21,10 @@ class UnitAssembler {
     /// A connection begins; `audio` tells whether it carries audio. A gap before its first picture is no loss
     /// of frames, since nobody knows what was sent.
     void Begin(bool audio);
+    /// From the next picture on, which stands at `begin`, `rate` is the rate. What came before is complete.
+    void SetRate(const FrameRate& rate, std::int64_t begin);
+    /// The source is another one from here on.
+    void AddChange(const SourceDescription& description) { batch_.emplace_back(description); }
     /// The address of the next picture, unless the picture knows better.
     void SetTimecode(const Timecode& timecode);
     void AddPicture(const CodedPicture& picture);
@@ -55,7 +59,7 @@ class UnitAssembler {
     std::optional<Timecode> TimecodeOfFrame(std::int64_t index, const CodedPicture& picture);
     void Report();
 
-    const FrameRate rate_;
+    FrameRate rate_;
     FrameGrid grid_;
     AudioGrid audioGrid_;
     const CodedAudio silence_;

@@ -90,7 +90,9 @@ VideoFindings CheckVideo(AVFormatContext& format, AVStream& stream,
         PictureParser parser(*stream.codecpar);
         for (const auto& packet : packets) {
             if (packet->stream_index == stream.index) {
-                findings.fields |= parser.Parse({packet->data, static_cast<std::size_t>(packet->size)}).field;
+                const auto picture = parser.Parse({packet->data, static_cast<std::size_t>(packet->size)});
+                findings.fields |= picture.field;
+                findings.interlaced |= picture.interlaced;
             }
         }
         pictureRate = parser.FrameRate();

@@ -17,6 +17,8 @@ struct VideoFindings {
     AVRational toldRate{0, 1};
     /// Pictures are sent in another order than they are shown in.
     bool reordered = false;
+    /// Pictures are interlaced frames.
+    bool interlaced = false;
     /// Packets hold single fields.
     bool fields = false;
 };

@@ -1,14 +1,32 @@
 #include "source/VideoPass.h"
 
+#include <algorithm>
 #include <cstring>
 
 #include "common/ReceiverError.h"
+#include "source/FormatWatch.h"
 
 namespace receiver {
 namespace {
 
 std::span<const unsigned char> BytesOf(const AVPacket& packet) {
     return {packet.data, static_cast<std::size_t>(packet.size)};
+}
+
+/// A movie file tells the size of a parameter set in 16 bits (ISO/IEC 14496-15 5.3.3.1).
+constexpr std::size_t kLargestParameterSet = 65535;
+
+/// Throws `ReceiverError` (`kSourceUnsuitable`).
+void CheckParameterSets(const std::vector<NalUnit>& units) {
+    for (const NalUnit& unit : units) {
+        const bool isSet = unit.type == kNalSequenceParameterSet || unit.type == kNalPictureParameterSet;
+        if (isSet && unit.bytes.size() > kLargestParameterSet) {
+            throw ReceiverError(ExitCode::kSourceUnsuitable,
+                                "the video has a parameter set of " + std::to_string(unit.bytes.size()) +
+                                    " bytes, and a file holds none above 65535: set the encoder to parameter "
+                                    "sets without padding");
+        }
+    }
 }
 
 }  // namespace
@@ -25,7 +43,9 @@ VideoPass::VideoPass(const AVCodecParameters& parameters)
     libav::Check(av_bsf_init(filter_.get()), "read the parameter sets of the video");
     const AVCodecParameters& stream = *filter_->par_out;
     if (stream.extradata != nullptr) {
-        sets_.Learn(NalUnits({stream.extradata, static_cast<std::size_t>(stream.extradata_size)}));
+        const auto units = NalUnits({stream.extradata, static_cast<std::size_t>(stream.extradata_size)});
+        CheckParameterSets(units);
+        sets_.Learn(units);
     }
     parser_ = std::make_unique<PictureParser>(stream);
     timecodes_ = std::make_unique<TimecodeReader>(stream);
@@ -49,18 +69,33 @@ bool VideoPass::IsStart(const AVPacket& packet) {
     return Contains(NalUnits(BytesOf(stream)), kNalIdr);
 }
 
-void VideoPass::CheckSize(const AVPacket& stream) {
+void VideoPass::CheckFormat(const AVPacket& stream) {
     const PictureParser::Picture picture = parser_->Parse(BytesOf(stream));
     if (picture.width != 0 && (picture.width != width_ || picture.height != height_)) {
-        throw ReceiverError(ExitCode::kSourceUnsuitable,
-                            "the picture changed from " + std::to_string(width_) + "x" +
-                                std::to_string(height_) + " to " + std::to_string(picture.width) + "x" +
-                                std::to_string(picture.height) +
-                                " while it was recorded: start again to record the new size");
+        throw FormatChanged("the picture changed from " + std::to_string(width_) + "x" +
+                            std::to_string(height_) + " to " + std::to_string(picture.width) + "x" +
+                            std::to_string(picture.height));
+    }
+    const AVRational rate = parser_->FrameRate();
+    if (rate_ && rate_->num > 0 && rate.num > 0 && av_cmp_q(*rate_, rate) != 0) {
+        // Whether it counts frames or fields, nobody knows.
+        throw FormatChanged(kRateChanged);
+    }
+    rate_ = rate;
+}
+
+void VideoPass::CheckParameters(const AVPacket& packet) const {
+    std::size_t size = 0;
+    const std::uint8_t* const told = av_packet_get_side_data(&packet, AV_PKT_DATA_NEW_EXTRADATA, &size);
+    const AVCodecParameters& known = *filter_->par_in;
+    if (told != nullptr && !std::equal(told, told + size, known.extradata,
+                                       known.extradata + std::max(0, known.extradata_size))) {
+        throw FormatChanged("the parameter sets of the video changed");
     }
 }
 
 void VideoPass::Push(const AVPacket& packet, const PictureSink& sink) {
+    CheckParameters(packet);
     const AVPacket& stream = Filter(packet);
     if (stream.size == 0) {
         ++damaged_;
@@ -71,9 +106,10 @@ void VideoPass::Push(const AVPacket& packet, const PictureSink& sink) {
     CodedPicture picture;
     picture.time = packet.pts;
     picture.keyFrame = Contains(units, kNalIdr);
+    CheckParameterSets(units);
     sets_.Learn(units);
     if (picture.keyFrame) {
-        CheckSize(stream);
+        CheckFormat(stream);
     }
     if (const auto completed = sets_.Complete(bytes, units)) {
         picture.size = completed->size();

@@ -13,6 +13,7 @@ namespace receiver {
 /// already is so is not changed by a byte, and not copied.
 class VideoPass final : public VideoPathInterface {
  public:
+    /// Throws `ReceiverError` (`kSourceUnsuitable`) for parameter sets that no file can hold, as `Push` does.
     explicit VideoPass(const AVCodecParameters& parameters);
 
     bool IsStart(const AVPacket& packet) override;
@@ -23,7 +24,10 @@ class VideoPass final : public VideoPathInterface {
  private:
     /// The packet as byte stream.
     AVPacket& Filter(const AVPacket& packet);
-    void CheckSize(const AVPacket& stream);
+    /// Throws `FormatChanged`.
+    void CheckFormat(const AVPacket& stream);
+    /// Parameter sets out of band that are not those of the beginning. Throws `FormatChanged`.
+    void CheckParameters(const AVPacket& packet) const;
 
     libav::Owner<AVBSFContext> filter_;
     libav::Owner<AVPacket> packet_;
@@ -32,6 +36,8 @@ class VideoPass final : public VideoPathInterface {
     std::unique_ptr<TimecodeReader> timecodes_;
     std::uint32_t width_ = 0;
     std::uint32_t height_ = 0;
+    /// As the first IDR frame tells; 0/1 when it does not.
+    std::optional<AVRational> rate_;
     std::uint64_t damaged_ = 0;
 };
 

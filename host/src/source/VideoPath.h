@@ -14,7 +14,7 @@ class VideoPathInterface {
     virtual ~VideoPathInterface() = default;
     /// True for a picture that decoding can begin with.
     virtual bool IsStart(const AVPacket& packet) = 0;
-    /// Throws `ReceiverError` when the video has changed to what cannot be recorded.
+    /// Throws `FormatChanged`.
     virtual void Push(const AVPacket& packet, const PictureSink& sink) = 0;
     /// The source is over.
     virtual void Finish(const PictureSink& sink) = 0;

@@ -43,12 +43,17 @@ AudioGrid::Place AudioGrid::Next(std::int64_t time) {
         next_ = time - Frames(time) * kFrame;
     }
     const std::int64_t end = End();
-    if (time < kEarliest || time < end - kTolerance) {
+    const std::int64_t tolerance = rejoining_ ? kFrame / 2 : kTolerance;
+    if (time < kEarliest || time < end - tolerance) {
         const bool passedOver = time >= 0 && time < passedUntil_;
         return {passedOver ? Action::kVideoMissing : Action::kOverlap, time};
     }
     next_ += kFrame;
-    return {time > end + kTolerance ? Action::kFill : Action::kAccept, end};
+    if (time > end + tolerance) {
+        return {Action::kFill, end};
+    }
+    rejoining_ = false;
+    return {Action::kAccept, end};
 }
 
 }  // namespace receiver

@@ -44,6 +44,9 @@ class AudioGrid {
     /// and silence leads up to it from the frame on that is nearest to 0.
     Place Next(std::int64_t time);
 
+    /// The source begins anew: its next frame stands at the place nearest to its time.
+    void Rejoin() { rejoining_ = true; }
+
     /// Where the next frame would stand, the audio of missing video passed over.
     std::int64_t End();
     /// Enters a frame of silence at `End` that no frame of the source asked for, and gives its time.
@@ -62,6 +65,7 @@ class AudioGrid {
     /// End of the time that was passed over last.
     std::int64_t passedUntil_ = 0;
     bool begun_ = false;
+    bool rejoining_ = false;
 };
 
 }  // namespace receiver

@@ -16,7 +16,7 @@ std::int64_t DivideToNearest(std::int64_t dividend, std::int64_t divisor) {
 
 }  // namespace
 
-FrameGrid::FrameGrid(const FrameRate& rate) : rate_(rate) {}
+FrameGrid::FrameGrid(const FrameRate& rate, std::int64_t origin) : rate_(rate), shift_(origin) {}
 
 std::int64_t FrameGrid::TimeOf(std::int64_t index) const {
     return shift_ + DivideToNearest(index * kClock * rate_.denominator, rate_.numerator);
@@ -30,10 +30,14 @@ std::int64_t FrameGrid::Period() const {
     return (kClock * rate_.denominator + rate_.numerator - 1) / rate_.numerator;
 }
 
+std::int64_t FrameGrid::PlaceOf(std::int64_t time) const {
+    return index_ < 0 ? shift_ : TimeOf(index_ + std::max<std::int64_t>(1, FramesIn(time - TimeOf(index_))));
+}
+
 FrameGrid::Place FrameGrid::Next(std::int64_t time) {
     if (index_ < 0) {
         index_ = 0;
-        return {0, 0, 0};
+        return {shift_, 0, 0};
     }
     const std::int64_t steps = std::max<std::int64_t>(1, FramesIn(time - TimeOf(index_)));
     index_ += steps;

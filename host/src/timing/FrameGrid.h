@@ -12,7 +12,8 @@ namespace receiver {
 /// followed smoothly, one tick a frame. Ticks of 90000 a second. Not for several threads.
 class FrameGrid {
  public:
-    explicit FrameGrid(const FrameRate& rate);
+    /// The first frame stands at `origin`.
+    explicit FrameGrid(const FrameRate& rate, std::int64_t origin = 0);
 
     struct Place {
         std::int64_t time = 0;
@@ -21,11 +22,13 @@ class FrameGrid {
         /// Frames that should have stood between the one before and this one.
         std::int64_t lost = 0;
     };
-    /// The place of the next frame, which the source stamps with `time`. The first frame's is 0, whatever its
-    /// time; each further one stands at least one place later.
+    /// The place of the next frame, which the source stamps with `time`. The first frame's is the origin,
+    /// whatever its time; each further one stands at least one place later.
     Place Next(std::int64_t time);
 
-    /// Where the next frame is expected. 0 before the first.
+    /// The place at which a next frame that is stamped with `time` would stand.
+    std::int64_t PlaceOf(std::int64_t time) const;
+    /// Where the next frame is expected. The origin before the first.
     std::int64_t End() const { return TimeOf(index_ + 1); }
     /// Where frame `index` stands.
     std::int64_t TimeOf(std::int64_t index) const;
@@ -37,8 +40,8 @@ class FrameGrid {
  private:
     FrameRate rate_;
     std::int64_t index_ = -1;
-    /// What the line of places was moved by to follow the source.
-    std::int64_t shift_ = 0;
+    /// The origin, and what the line of places was moved by to follow the source.
+    std::int64_t shift_;
     /// How far the source's stamps stand behind their places, a mean over some 32 frames, in 1/32 ticks.
     std::int64_t behind_ = 0;
 };

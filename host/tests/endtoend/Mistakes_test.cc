@@ -108,10 +108,13 @@ INSTANTIATE_TEST_SUITE_P(
         Mistake{"NoSuchSourceFile", {"--input", "/no/such/file.ts"}, kSourceUnavailable, "/no/such/file.ts"},
         Mistake{"NoSuchProtocol", {"--input", "carrier-pigeon://loft"}, kSourceUnavailable, "carrier-pigeon"},
         Mistake{"NoSuchHost",
-                {"--input", "http://no.such.host.invalid/a.ts"},
+                {"--input", "http://no.such.host.invalid/a.ts", "--no-reconnect"},
                 kSourceUnavailable,
                 "no.such.host"},
-        Mistake{"NobodyListens", {"--input", "http://127.0.0.1:9/a.ts"}, kSourceUnavailable, "127.0.0.1"}),
+        Mistake{"NobodyListens",
+                {"--input", "http://127.0.0.1:9/a.ts", "--no-reconnect"},
+                kSourceUnavailable,
+                "127.0.0.1"}),
     ::testing::PrintToStringParamName());
 
 using MistakesTest = MistakesFixture;
@@ -185,7 +188,7 @@ TEST_F(MistakesTest, AWrongPassphrase) {
     const std::string address = "srt://127.0.0.1:" + std::to_string(ports.First());
     const auto sender = SendTransportStream(material, address + "?mode=listener&passphrase=the-right-one");
     ASSERT_TRUE(WaitUntilBound(ports.First())) << sender->AllText();
-    const Outcome outcome = RunReceiver({"--input", address + "?passphrase=the-wrong-one"});
+    const Outcome outcome = RunReceiver({"--input", address + "?passphrase=the-wrong-one", "--no-reconnect"});
     EXPECT_EQ(outcome.code, kSourceUnavailable);
     EXPECT_THAT(LastLine(outcome.errors), AllOf(StartsWith("receiver: "), HasSubstr("passphrase")));
     // It is a secret all the same.
@@ -230,7 +233,7 @@ TEST_F(MistakesTest, BackslashesInTheOutputFolderOfTheSettingsStore) {
 TEST_F(MistakesTest, APortOnWhichNothingArrives) {
     const FreePorts ports;
     const std::string address = "udp://127.0.0.1:" + std::to_string(ports.First());
-    ExpectRefused({"--input", address, "--timeout", "1"}, kSourceUnavailable, address);
+    ExpectRefused({"--input", address, "--timeout", "1", "--no-reconnect"}, kSourceUnavailable, address);
 }
 
 TEST_F(MistakesTest, HelpAndVersionAreNoMistakes) {

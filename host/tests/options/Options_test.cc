@@ -98,6 +98,10 @@ TEST(Options, EachOneReachesItsPlace) {
     EXPECT_EQ(options.logPriority, 13u);
     EXPECT_TRUE(options.json);
     EXPECT_EQ(Parsed({"--mode", "on"}).mode, OutputMode::kOn);
+    const Options choice = Parsed({"--input", "a.ts", "--program", "7", "--video", "2", "--audio", "3"});
+    EXPECT_EQ(choice.source.program, 7u);
+    EXPECT_EQ(choice.source.video, 2u);
+    EXPECT_EQ(choice.source.audio, 3u);
     EXPECT_FALSE(Parsed({"--no-drop-frame"}).dropFrame);
 }
 

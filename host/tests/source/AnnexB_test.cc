@@ -2,6 +2,8 @@
 
 #include <gtest/gtest.h>
 
+#include "AnnexBReader.h"
+
 namespace receiver {
 namespace {
 
@@ -59,6 +61,69 @@ TEST(NalUnits, NothingIsFoundInBytesWithoutStartCode) {
     EXPECT_TRUE(NalUnits(Bytes{}).empty());
     EXPECT_TRUE(NalUnits(Bytes{0, 0, 1}).empty());
     EXPECT_TRUE(NalUnits(Bytes{1, 2, 3, 4}).empty());
+}
+
+TEST(NalUnits, AStartCodeWithNothingBehindItEndsTheUnitBeforeIt) {
+    const Bytes stream = kPicture + Bytes{0, 0, 1};
+    const auto units = NalUnits(stream);
+    ASSERT_EQ(units.size(), 1u);
+    EXPECT_EQ(Bytes(units[0].bytes.begin(), units[0].bytes.end()), (Bytes{0x68, 0x80, 0x33}));
+}
+
+TEST(NalUnits, EmptyUnitsAreNone) {
+    const Bytes stream = Bytes{0, 0, 1, 0, 0, 0, 1} + kIdr;
+    const auto units = NalUnits(stream);
+    ASSERT_EQ(units.size(), 1u);
+    EXPECT_EQ(units[0].type, 5u);
+}
+
+/// The definition (ITU-T H.264 B.1.1) word for word: what stands between 00 00 01 and the next one or the
+/// end, without zero bytes behind it.
+std::vector<Bytes> Defined(const Bytes& stream) {
+    std::vector<Bytes> units;
+    std::optional<Bytes> unit;
+    const auto finish = [&] {
+        while (unit && !unit->empty() && unit->back() == 0) {
+            unit->pop_back();
+        }
+        if (unit && !unit->empty()) {
+            units.push_back(*unit);
+        }
+    };
+    for (std::size_t at = 0; at < stream.size(); ++at) {
+        if (at + 2 < stream.size() && stream[at] == 0 && stream[at + 1] == 0 && stream[at + 2] == 1) {
+            finish();
+            unit = Bytes();
+            at += 2;
+        } else if (unit) {
+            unit->push_back(stream[at]);
+        }
+    }
+    finish();
+    return units;
+}
+
+TEST(NalUnits, OfEveryShortStreamAreThoseOfTheDefinitionAndOfTheAnalyser) {
+    constexpr unsigned int kLength = 9;
+    constexpr unsigned char kAlphabet[] = {0x00, 0x01, 0x65, 0x67};
+    for (unsigned int number = 0; number < 1U << 2 * kLength; ++number) {
+        Bytes stream;
+        for (unsigned int at = 0; at < kLength; ++at) {
+            stream.push_back(kAlphabet[number >> 2 * at & 3U]);
+        }
+        std::vector<Bytes> own;
+        for (const NalUnit& unit : NalUnits(stream)) {
+            own.emplace_back(unit.bytes.begin(), unit.bytes.end());
+        }
+        std::vector<Bytes> analysed;
+        nal_access::AnnexBReader reader(stream);
+        for (nal_access::Bytes unit; reader.Next(unit);) {
+            analysed.emplace_back(unit.begin(), unit.end());
+        }
+        const std::vector<Bytes> defined = Defined(stream);
+        ASSERT_EQ(own, defined) << testing::PrintToString(stream);
+        ASSERT_EQ(analysed, defined) << testing::PrintToString(stream);
+    }
 }
 
 TEST(ParameterSets, AnIdrFrameThatHasBothStaysAsItIs) {

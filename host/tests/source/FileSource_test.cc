@@ -256,6 +256,34 @@ TEST_F(FileSource, OtherFrameRatesAreRefused) {
         "or use --transcode");
 }
 
+TEST_F(FileSource, ParameterSetsThatNoFileCanHoldAreRefused) {
+    Ffmpeg(string(kPicture) + kPlainH264 + "a.h264");
+    const string plain = FileBytes(Path("a.h264"));
+    const std::size_t idr = plain.find(string("\0\0\1\x65", 4));
+    ASSERT_NE(idr, string::npos);
+    for (const std::size_t size : {65535U, 65536U}) {
+        // A picture parameter set with the number 2 that nobody refers to.
+        const string padded = string("\0\0\1\x68\x6F", 5) + string(size - 2, '\x55');
+        std::FILE* const file = std::fopen(Path("large.h264").c_str(), "wb");
+        for (const string& part : {plain.substr(0, idr), padded, plain.substr(idr)}) {
+            std::fwrite(part.data(), 1, part.size(), file);
+        }
+        ASSERT_EQ(std::fclose(file), 0);
+        Ffmpeg("-r 25 -i large.h264 -c copy large.ts");
+        string refusal;
+        try {
+            ReadFile("large.ts");
+        } catch (const ReceiverError& error) {
+            EXPECT_EQ(error.Code(), ExitCode::kSourceUnsuitable);
+            refusal = error.what();
+        }
+        EXPECT_EQ(refusal, size == 65535U
+                               ? ""
+                               : "the video has a parameter set of 65536 bytes, and a file holds none "
+                                 "above 65535: set the encoder to parameter sets without padding");
+    }
+}
+
 TEST_F(FileSource, AFileWithoutVideoIsRefused) {
     Ffmpeg(string(kTone) + kPlainAac + "a.ts");
     const auto error = Refusal(Fast("a.ts"));
@@ -389,6 +417,14 @@ TEST_F(FileSource, AClockThatBeginsAgainIsContinued) {
     EXPECT_EQ(source->Counts().lostFrames, 0u);
     ExpectGapless(Of(Medium::kAudio, units));
     EXPECT_EQ(notices_.CountOf("the source's clock jumped by"), 1u);
+}
+
+TEST_F(FileSource, AClockThatLeapsToTheEndOf64BitsIsContinued) {
+    Ffmpeg(string(kPicture) + kPlainH264 + "a.ts");
+    for (const string leap : {"9000000000000000000", "1000000000000000000"}) {
+        Ffmpeg("-i a.ts -c copy -bsf:v 'setts=ts=if(gte(N\\,12)\\,PTS+" + leap + "\\,PTS)' a.nut");
+        ExpectFrames(Of(Medium::kVideo, ReadFile("a.nut")), 25, 3600);
+    }
 }
 
 TEST_F(FileSource, KlvComesByteForByteAtItsTimes) {

@@ -76,7 +76,8 @@ std::vector<SourceUnit> SourceTest::ReadFile(const std::string& name) {
     return ReadAll(*OpenSource(Fast(name), notices_, nullptr));
 }
 
-ReceiverError SourceTest::Refusal(const SourceOptions& options) {
+ReceiverError SourceTest::Refusal(SourceOptions options) {
+    options.reconnect = false;
     try {
         OpenSource(options, notices_, nullptr);
     } catch (const ReceiverError& error) {

@@ -39,8 +39,8 @@ class SourceTest : public testing::Test {
     std::vector<SourceUnit> ReadAll(SourceInterface& source, std::size_t enough = 0) const;
     /// Opens a file and reads it to its end.
     std::vector<SourceUnit> ReadFile(const std::string& name);
-    /// What `OpenSource` refuses with. Fails when it does not.
-    ReceiverError Refusal(const SourceOptions& options);
+    /// What `OpenSource` refuses with, without waiting for the source. Fails when it does not.
+    ReceiverError Refusal(SourceOptions options);
 
     Notices notices_;
 

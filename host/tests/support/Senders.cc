@@ -1,5 +1,11 @@
 #include "support/Senders.h"
 
+#include <arpa/inet.h>
+#include <netinet/in.h>
+#include <poll.h>
+#include <sys/socket.h>
+#include <unistd.h>
+
 #include <array>
 #include <chrono>
 #include <cstdio>
@@ -114,6 +120,23 @@ bool WaitUntilListening(std::uint16_t port) {
 
 bool WaitUntilBound(std::uint16_t port) {
     return waitForSocket({"/proc/net/udp", "/proc/net/udp6"}, hexadecimal(port));
+}
+
+bool TakePackets(std::uint16_t port, int count) {
+    const int file = socket(AF_INET, SOCK_DGRAM | SOCK_CLOEXEC, 0);
+    sockaddr_in address{};
+    address.sin_family = AF_INET;
+    address.sin_port = htons(port);
+    address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
+    const auto patience = std::chrono::duration_cast<std::chrono::milliseconds>(kPatience);
+    const bool bound = bind(file, reinterpret_cast<const sockaddr*>(&address), sizeof address) == 0;
+    std::array<char, 2048> packet{};
+    pollfd wait{file, POLLIN, 0};
+    while (bound && count > 0 && poll(&wait, 1, static_cast<int>(patience.count())) == 1) {
+        count -= recv(file, packet.data(), packet.size(), 0) > 0 ? 1 : 0;
+    }
+    close(file);
+    return count == 0;
 }
 
 }  // namespace endtoend

@@ -36,4 +36,8 @@ bool WaitUntilListening(std::uint16_t port);
 /// does.
 bool WaitUntilBound(std::uint16_t port);
 
+/// Takes packets that come to that UDP port of this machine, which must be free, and gives it back when there
+/// were so many. False when they do not come.
+bool TakePackets(std::uint16_t port, int count);
+
 }  // namespace endtoend

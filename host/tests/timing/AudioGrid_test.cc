@@ -131,5 +131,23 @@ TEST(AudioGrid, SilenceCanBeMadeWithoutASource) {
     EXPECT_EQ(grid.Next(4096 + 5), (Place{Action::kAccept, 4096}));
 }
 
+TEST(AudioGrid, ASourceThatBeginsAnewStandsAtTheNearestPlace) {
+    for (const std::int64_t offset : {-512, -300, 0, 300, 512}) {
+        AudioGrid grid;
+        ASSERT_EQ(grid.Next(0).action, AudioGrid::Action::kAccept);
+        grid.Rejoin();
+        EXPECT_EQ(grid.Next(1024 + offset).action, AudioGrid::Action::kAccept) << offset;
+    }
+    AudioGrid grid;
+    ASSERT_EQ(grid.Next(0).action, AudioGrid::Action::kAccept);
+    grid.Rejoin();
+    EXPECT_EQ(grid.Next(1024 + 513).action, AudioGrid::Action::kFill);
+    const AudioGrid::Place place = grid.Next(1024 + 513);
+    EXPECT_EQ(place.action, AudioGrid::Action::kAccept);
+    EXPECT_EQ(place.time, 2048);
+    // From there on stamps may wander.
+    EXPECT_EQ(grid.Next(3072 + 700).action, AudioGrid::Action::kAccept);
+}
+
 }  // namespace
 }  // namespace receiver

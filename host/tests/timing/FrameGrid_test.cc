@@ -86,5 +86,17 @@ TEST(FrameGrid, CountsFramesToTheNearest) {
     EXPECT_EQ(FrameGrid(k5994).Period(), 1502);
 }
 
+TEST(FrameGrid, ANextFrameIsToldItsPlaceBeforeItComes) {
+    FrameGrid grid(k25, 7000);
+    EXPECT_EQ(grid.End(), 7000);
+    EXPECT_EQ(grid.PlaceOf(123456), 7000);
+    EXPECT_EQ(grid.Next(123456).time, 7000);
+    EXPECT_EQ(grid.PlaceOf(0), 7000 + 3600);
+    for (const std::int64_t time : {7000 + 5 * 3600 - 1700, 7000 + 9 * 3600 + 1700}) {
+        const std::int64_t place = grid.PlaceOf(time);
+        EXPECT_EQ(grid.Next(time).time, place);
+    }
+}
+
 }  // namespace
 }  // namespace receiver

@@ -2,6 +2,10 @@
 
 #include <gtest/gtest.h>
 
+#include <limits>
+
+#include "timing/Saturating.h"
+
 namespace receiver {
 namespace {
 
@@ -97,6 +101,48 @@ TEST(Timeline, AnchoringAgainForgetsWhatWas) {
     line.Anchor(0, 0);
     line.Anchor(500, 90 * kSecond);
     EXPECT_EQ(line.TimeOf(500 + 3600, 90 * kSecond + 3600, 0, 0).time, 90 * kSecond + 3600);
+}
+
+TEST(Timeline, ALateArrivalOfAFewTenthsIsNotCountedIntoAJump) {
+    Timeline line;
+    line.Anchor(0, 0);
+    EXPECT_EQ(line.TimeOf(1000 * kSecond, 20 * kSecond, kSecond / 3, 0).time, 20 * kSecond);
+}
+
+/// Whatever a source stamps, times stay near what is expected, and no sum leaves 64 bits.
+TEST(Timeline, StampsNearTheEndsOf64BitsAreJumps) {
+    constexpr std::int64_t kLowest = std::numeric_limits<std::int64_t>::min();
+    constexpr std::int64_t kHighest = std::numeric_limits<std::int64_t>::max();
+    for (const std::int64_t first : {kLowest, kLowest + 1, std::int64_t{-1}, std::int64_t{0}, kHighest}) {
+        for (const std::int64_t second : {kLowest, kLowest + 1, std::int64_t{0}, kHighest - 1, kHighest}) {
+            Timeline line;
+            line.Anchor(first, 0);
+            for (const std::int64_t stamp : {second, first, second}) {
+                const auto place = line.TimeOf(stamp, kSecond, 0, kSecond);
+                EXPECT_GE(place.time, 0) << first << ' ' << second;
+                EXPECT_LE(place.time, kSecond + Timeline::kLongestGap) << first << ' ' << second;
+                line.Nearest(stamp, kHighest);
+                line.Nearest(stamp, kLowest);
+            }
+            line.Anchor(first, kLowest);
+            line.TimeOf(second, kHighest, kHighest, kHighest);
+            line.TimeOf(first, kLowest, 0, kHighest);
+        }
+    }
+}
+
+TEST(UnwrapNear, StaysWithin64Bits) {
+    constexpr std::int64_t kLowest = std::numeric_limits<std::int64_t>::min();
+    constexpr std::int64_t kHighest = std::numeric_limits<std::int64_t>::max();
+    for (const int bits : {32, 33, 62}) {
+        const std::int64_t span = std::int64_t{1} << bits;
+        for (const std::int64_t stamp : {kLowest, std::int64_t{0}, kHighest}) {
+            for (const std::int64_t reference : {kLowest, std::int64_t{0}, kHighest}) {
+                const std::int64_t value = UnwrapNear(stamp, bits, reference);
+                EXPECT_LE(Distance(value, reference), static_cast<std::uint64_t>(span / 2));
+            }
+        }
+    }
 }
 
 }  // namespace

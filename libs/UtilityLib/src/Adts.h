@@ -1,6 +1,6 @@
 #pragma once
 
-#include "AnnexB.h"
+#include "AnnexBReader.h"
 
 namespace nal_access {
 

@@ -3,7 +3,7 @@
 #include <cstdint>
 #include <optional>
 
-#include "AnnexB.h"
+#include "AnnexBReader.h"
 
 namespace nal_access {
 

@@ -2,7 +2,7 @@
 
 #include <vector>
 
-#include "AnnexB.h"
+#include "AnnexBReader.h"
 
 namespace nal_access {
 

@@ -2,7 +2,7 @@
 
 #include <optional>
 
-#include "AnnexB.h"
+#include "AnnexBReader.h"
 #include "Timecode.h"
 
 namespace nal_access {

@@ -7,7 +7,7 @@
 #include <utility>
 
 #include "Adts.h"
-#include "AnnexB.h"
+#include "AnnexBReader.h"
 #include "Klv.h"
 #include "Logger.h"
 #include "NalSyntax.h"

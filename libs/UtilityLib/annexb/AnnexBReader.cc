@@ -1,4 +1,4 @@
-#include "AnnexB.h"
+#include "AnnexBReader.h"
 
 namespace nal_access {
 

@@ -1,0 +1,95 @@
+#include "source/FormatWatch.h"
+
+#include <algorithm>
+#include <array>
+#include <cstdlib>
+#include <string>
+#include <vector>
+
+#include "source/AnnexB.h"
+
+namespace receiver {
+namespace {
+
+/// Distances in a row that make another rate. Every second picture may be lost for a while.
+constexpr int kFasterSteps = 12;
+constexpr int kSlowerSteps = 25;
+/// Steps back, with no more pictures between them, that a clock which is set does not take.
+constexpr int kStepsBack = 3;
+constexpr int kReorderDepth = 16;
+
+/// First bytes of the parameter sets of HEVC (ITU-T H.265 7.3.1.2, types 32, 33 and 34). In H.264 they would
+/// be an unspecified type and data partitions.
+constexpr std::array<unsigned char, 3> kHevcSets{0x40, 0x42, 0x44};
+
+/// The codec of which a byte stream holds both or all kinds of parameter sets.
+AVCodecID CodecOf(std::span<const unsigned char> picture) {
+    const auto units = NalUnits(picture);
+    const bool hevc = std::all_of(kHevcSets.begin(), kHevcSets.end(), [&units](unsigned char header) {
+        return std::any_of(units.begin(), units.end(), [header](const NalUnit& unit) {
+            // nuh_layer_id 0, nuh_temporal_id_plus1 1
+            return unit.bytes.size() > 2 && unit.bytes[0] == header && unit.bytes[1] == 0x01;
+        });
+    });
+    if (hevc) {
+        return AV_CODEC_ID_HEVC;
+    }
+    const bool h264 = Contains(units, kNalSequenceParameterSet) && Contains(units, kNalPictureParameterSet) &&
+                      Contains(units, kNalIdr);
+    return h264 ? AV_CODEC_ID_H264 : AV_CODEC_ID_NONE;
+}
+
+}  // namespace
+
+FormatWatch::FormatWatch(AVCodecID codec, const FrameRate& rate, bool untouched)
+    : codec_(codec),
+      untouched_(untouched),
+      period_(std::int64_t{90000} * rate.denominator / std::max<std::int64_t>(1, rate.numerator)) {}
+
+void FormatWatch::Look(std::span<const unsigned char> picture, std::optional<std::int64_t> stamp,
+                       std::optional<std::int64_t> delay) {
+    if (codec_ == AV_CODEC_ID_H264 || codec_ == AV_CODEC_ID_HEVC) {
+        const AVCodecID now = CodecOf(picture);
+        if (now != AV_CODEC_ID_NONE && now != codec_) {
+            throw FormatChanged(std::string("the video changed from ") + avcodec_get_name(codec_) + " to " +
+                                avcodec_get_name(now));
+        }
+    }
+    if (!untouched_ || !stamp) {
+        return;
+    }
+    if (stamp_) {
+        LookAtOrder(*stamp - *stamp_, delay);
+        LookAtRate(*stamp - *stamp_);
+    }
+    stamp_ = stamp;
+    delay_ = delay;
+}
+
+void FormatWatch::LookAtOrder(std::int64_t step, std::optional<std::int64_t> delay) {
+    const bool delayed = delay && delay_ && std::abs(*delay - *delay_) > period_ / 2;
+    if (step < 0 && step > -period_ * kReorderDepth) {
+        backward_ = forward_ <= kReorderDepth ? backward_ + 1 : 1;
+        forward_ = 0;
+    } else {
+        ++forward_;
+    }
+    if (delayed || backward_ >= kStepsBack) {
+        throw FormatChanged("the video begins to send its pictures reordered (B frames)");
+    }
+}
+
+void FormatWatch::LookAtRate(std::int64_t step) {
+    const bool usual = std::abs(step - period_) <= period_ / 4;
+    if (usual || step <= 0 || step > 90000) {
+        steps_ = 0;
+    } else {
+        steps_ = std::abs(step - step_) <= period_ / 10 ? steps_ + 1 : 1;
+    }
+    step_ = step;
+    if (steps_ >= (step < period_ ? kFasterSteps : kSlowerSteps)) {
+        throw FormatChanged(kRateChanged);
+    }
+}
+
+}  // namespace receiver

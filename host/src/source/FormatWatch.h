@@ -1,0 +1,54 @@
+#pragma once
+
+#include <cstdint>
+#include <optional>
+#include <span>
+#include <stdexcept>
+
+#include "common/FrameRate.h"
+#include "source/Libav.h"
+
+namespace receiver {
+
+/// A source goes on as something else than it was found to be. `what()` is half a sentence: "the picture
+/// changed from 1280x720 to 1920x1080".
+class FormatChanged : public std::runtime_error {
+ public:
+    using std::runtime_error::runtime_error;
+};
+
+inline constexpr const char* kRateChanged = "the frame rate of the video changed";
+
+/// Watches the video of a connection for what neither its container nor its decoder tells: another codec,
+/// another frame rate, pictures that begin to be sent in another order than they are shown in.
+class FormatWatch {
+ public:
+    /// `rate` is the present one. `untouched`: the pictures are recorded as they come, so that rate and order
+    /// matter.
+    FormatWatch(AVCodecID codec, const FrameRate& rate, bool untouched);
+
+    /// A picture with its stamp, in ticks of 90000, and with how much later it is shown than decoded, where
+    /// these are known. Throws `FormatChanged`.
+    void Look(std::span<const unsigned char> picture, std::optional<std::int64_t> stamp,
+              std::optional<std::int64_t> delay);
+
+ private:
+    void LookAtOrder(std::int64_t step, std::optional<std::int64_t> delay);
+    void LookAtRate(std::int64_t step);
+
+    const AVCodecID codec_;
+    const bool untouched_;
+    /// Ticks of a picture.
+    const std::int64_t period_;
+    std::optional<std::int64_t> stamp_;
+    std::optional<std::int64_t> delay_;
+    /// Pictures since the last one that was stamped in front of another, and how many such came close
+    /// together.
+    int forward_ = 0;
+    int backward_ = 0;
+    /// How many distances in a row were the same and not the rate's.
+    std::int64_t step_ = 0;
+    int steps_ = 0;
+};
+
+}  // namespace receiver

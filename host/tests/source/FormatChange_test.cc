@@ -1,0 +1,152 @@
+#include "SourceTesting.h"
+#include "StreamServer.h"
+
+namespace receiver {
+namespace {
+
+using std::string;
+
+struct Change {
+    const char* name;
+    /// Arguments of ffmpeg for what comes first and what follows, without its end.
+    string before;
+    string after;
+    const char* notice;
+    /// What the source is then, and how many pictures come behind the change in a file: from the IDR frame on
+    /// that tells of it, or from the next one on.
+    const char* summary;
+    std::size_t pictures;
+    bool transcode = false;
+};
+void PrintTo(const Change& change, std::ostream* out) {
+    *out << change.name;
+}
+
+string Picture(const string& size, const string& rate) {
+    return " -f lavfi -i testsrc2=size=" + size + ":rate=" + rate + ":duration=1 ";
+}
+string Tone(int rate) {
+    return " -f lavfi -i sine=frequency=500:sample_rate=" + std::to_string(rate) + ":duration=1 ";
+}
+string H264(const string& more = "-bf 0") {
+    return " -pix_fmt yuv420p -c:v libx264 -preset ultrafast -g 12 -sc_threshold 0 " + more + " ";
+}
+string Plain(const string& size, const string& rate) {
+    return Picture(size, rate) + Tone(48000) + H264() + kPlainAac;
+}
+
+class FormatChange : public SourceTest, public testing::WithParamInterface<Change> {
+ protected:
+    /// The second part goes on where the first one ends, in the same programme.
+    void Make() {
+        Ffmpeg(GetParam().before + " -muxdelay 0 a.ts");
+        Ffmpeg(GetParam().after +
+               " -muxdelay 0 -output_ts_offset 1 -mpegts_flags +initial_discontinuity b.ts");
+        Shell("cat a.ts b.ts > ab.ts");
+    }
+    struct Read {
+        std::vector<SourceUnit> before;
+        std::vector<SourceUnit> after;
+        string summary;
+        int changes = 0;
+    };
+    static Read ReadAround(SourceInterface& source) {
+        Read read;
+        for (;;) {
+            SourceUnit unit;
+            const auto result = source.Read(unit);
+            if (result == SourceInterface::Result::kUnit) {
+                (read.changes == 0 ? read.before : read.after).push_back(unit);
+            } else if (result == SourceInterface::Result::kChanged) {
+                ++read.changes;
+                read.summary = source.Description().summary;
+            } else if (result != SourceInterface::Result::kIdle) {
+                return read;
+            }
+        }
+    }
+    void Expect(const Read& read, const SourceInterface& source, std::size_t pictures) const {
+        EXPECT_EQ(read.changes, 1);
+        EXPECT_EQ(source.Counts().changes, 1u);
+        EXPECT_EQ(read.summary, GetParam().summary);
+        EXPECT_EQ(notices_.CountOf(string(GetParam().notice) + ": the recording goes on in a new file"), 1u)
+            << testing::PrintToString(notices_.sentences);
+        const auto before = Of(Medium::kVideo, read.before);
+        const auto after = Of(Medium::kVideo, read.after);
+        EXPECT_GE(before.size(), 24u);
+        ASSERT_EQ(after.size(), pictures);
+        EXPECT_TRUE(after.front().keyFrame);
+        EXPECT_GT(after.front().time, before.back().time);
+        const auto period = 90000.0 / source.Description().frameRate.timecodeFrames;
+        for (std::size_t at = 1; at < after.size(); ++at) {
+            EXPECT_NEAR(static_cast<double>(after[at].time - after[at - 1].time), period, 1);
+        }
+        const auto audio = Of(Medium::kAudio, read.after);
+        // Seconds, times frames of 1024 samples at 48 kHz, less one that overlaps at each end and the
+        // priming.
+        ASSERT_GE(static_cast<double>(audio.size()),
+                  static_cast<double>(after.size()) * period / 90000 * 46.875 - 3);
+        EXPECT_LE(std::abs(audio.front().time * 15 / 8 - after.front().time), 1920 + 960);
+        for (std::size_t at = 1; at < audio.size(); ++at) {
+            EXPECT_EQ(audio[at].time - audio[at - 1].time, 1024);
+        }
+    }
+};
+
+TEST_P(FormatChange, OfAFileIsToldAndEverythingBehindItComes) {
+    Make();
+    SourceOptions options = Fast("ab.ts");
+    options.transcode = GetParam().transcode;
+    const auto source = OpenSource(options, notices_, nullptr);
+    Expect(ReadAround(*source), *source, GetParam().pictures);
+}
+
+TEST_P(FormatChange, OfALiveStreamIsToldAndItGoesOnWithAnIdrFrame) {
+    Make();
+    StreamServer server({HttpStream(FileBytes(Path("ab.ts")))});
+    SourceOptions options = Fast(server.Http());
+    options.reconnect = false;
+    options.transcode = GetParam().transcode;
+    const auto source = OpenSource(options, notices_, nullptr);
+    const Read read = ReadAround(*source);
+    EXPECT_EQ(read.changes, 1);
+    EXPECT_EQ(read.summary, GetParam().summary);
+    EXPECT_EQ(notices_.CountOf(string(GetParam().notice) + ": the recording goes on in a new file"), 1u)
+        << testing::PrintToString(notices_.sentences);
+    ASSERT_FALSE(Of(Medium::kVideo, read.after).empty());
+    EXPECT_TRUE(Of(Medium::kVideo, read.after).front().keyFrame);
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    All, FormatChange,
+    testing::Values(Change{"audio rate", Plain("128x96", "25"),
+                           Picture("128x96", "25") + Tone(44100) + H264() + "-c:a aac -ar 44100 -ac 2 ",
+                           "the audio is no longer AAC LC 48 kHz stereo",
+                           "H.264 Constrained Baseline 128x96 25 fps, AAC LC 48 kHz stereo", 13},
+                    Change{"audio channels", Plain("128x96", "25"),
+                           Picture("128x96", "25") + Tone(48000) + H264() + "-c:a aac -ar 48000 -ac 1 ",
+                           "the audio is no longer AAC LC 48 kHz stereo",
+                           "H.264 Constrained Baseline 128x96 25 fps, AAC LC 48 kHz stereo", 13},
+                    Change{"audio begins", Picture("128x96", "25") + H264(), Plain("128x96", "25"),
+                           "audio has begun",
+                           "H.264 Constrained Baseline 128x96 25 fps, AAC LC 48 kHz stereo", 13},
+                    Change{"rate", Plain("128x96", "25"), Plain("128x96", "50"),
+                           "the frame rate of the video changed",
+                           "H.264 Constrained Baseline 128x96 50 fps, AAC LC 48 kHz stereo", 50},
+                    Change{"size", Plain("128x96", "25"), Plain("160x112", "25"),
+                           "the picture changed from 128x96 to 160x112",
+                           "H.264 Constrained Baseline 160x112 25 fps, AAC LC 48 kHz stereo", 25},
+                    Change{"reordered", Plain("128x96", "25"),
+                           Picture("128x96", "25") + Tone(48000) + H264("-bf 2") + kPlainAac,
+                           "the video begins to send its pictures reordered (B frames)",
+                           "H.264 128x96 25 fps, AAC LC 48 kHz stereo", 25, true},
+                    Change{"HEVC", Plain("128x96", "25"),
+                           Picture("128x96", "25") + Tone(48000) +
+                               "-pix_fmt yuv420p -c:v libx265 -preset ultrafast -x265-params "
+                               "log-level=none:bframes=0:keyint=12 " +
+                               kPlainAac,
+                           "the video changed from h264 to hevc", "H.264 128x96 25 fps, AAC LC 48 kHz stereo",
+                           25, true}));
+
+}  // namespace
+}  // namespace receiver

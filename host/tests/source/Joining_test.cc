@@ -1,0 +1,153 @@
+#include <future>
+
+#include "SentMedia.h"
+#include "SourceTesting.h"
+#include "StreamServer.h"
+#include "support/FreePorts.h"
+#include "support/Senders.h"
+
+namespace receiver {
+namespace {
+
+using std::string;
+
+/// Sources that are found in the middle of a group of pictures: 1.8 seconds of audio and of pictures that
+/// cannot be decoded come before the first IDR frame.
+class Joining : public SourceTest {
+ protected:
+    /// Groups of two seconds; noise, so that no two audio frames are alike.
+    void Make(const string& name, const string& seconds, const string& options = "") const {
+        Ffmpeg("-f lavfi -i testsrc2=size=128x96:rate=25:duration=" + seconds +
+               " -f lavfi -i anoisesrc=sample_rate=48000:seed=7:duration=" + seconds + kPlainH264 +
+               "-g 50 -x264-params repeat-headers=1" + kPlainAac + options + " " + name);
+    }
+    /// The same without its first 0.2 seconds.
+    void MakeCut(const string& whole, const string& cut) const {
+        Ffmpeg("-i " + whole +
+               " -c copy -copyts -bsf:v 'noise=drop=lt(n\\,5)' -bsf:a 'noise=drop=lt(n\\,9)' " + cut);
+    }
+    std::vector<SourceUnit> ReadPictures(SourceInterface& source, std::size_t count) const {
+        std::vector<SourceUnit> units;
+        const auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(30);
+        while (count > 0 && std::chrono::steady_clock::now() < deadline) {
+            SourceUnit unit;
+            const auto result = source.Read(unit);
+            if (result == SourceInterface::Result::kUnit) {
+                units.push_back(unit);
+                count -= unit.medium == Medium::kVideo ? 1 : 0;
+            } else if (result != SourceInterface::Result::kIdle) {
+                break;
+            }
+        }
+        EXPECT_EQ(count, 0u) << "pictures are missing";
+        return units;
+    }
+    static SourceOptions Live(const string& url) {
+        SourceOptions options;
+        options.url = url;
+        return options;
+    }
+    void ExpectNothingTold() const {
+        EXPECT_EQ(notices_.CountOf("jumped"), 0u);
+        EXPECT_EQ(notices_.CountOf("gaps"), 0u);
+    }
+
+    endtoend::FreePorts ports_;
+    std::unique_ptr<endtoend::Process> sender_;
+};
+
+TEST_F(Joining, ALiveStreamIsInStepFromItsFirstIdrFrameOn) {
+    Make("a.ts", "4");
+    MakeCut("a.ts", "cut.ts");
+    StreamServer server({HttpStream(FileBytes(Path("cut.ts")))});
+    SourceOptions options = Live(server.Http());
+    options.reconnect = false;
+    const auto source = OpenSource(options, notices_, nullptr);
+    const SentMedia sent(Path("a.ts"));
+    ExpectInStep(sent, ReadAll(*source), 50);
+    EXPECT_EQ(source->Counts().lostFrames, 0u);
+    ExpectNothingTold();
+}
+
+TEST_F(Joining, AStreamOverUdpIsInStepFromItsFirstIdrFrameOn) {
+    Make("a.ts", "4");
+    MakeCut("a.ts", "cut.ts");
+    const string url = "udp://127.0.0.1:" + std::to_string(ports_.First());
+    auto opened = std::async(std::launch::async, [&] { return OpenSource(Live(url), notices_, nullptr); });
+    ASSERT_TRUE(endtoend::WaitUntilBound(ports_.First()));
+    sender_ = endtoend::SendTransportStream(Path("cut.ts"), url + "?pkt_size=1316");
+    const auto source = opened.get();
+    ExpectInStep(SentMedia(Path("a.ts")), ReadPictures(*source, 40), 50);
+    EXPECT_EQ(source->Counts().lostFrames, 0u);
+    ExpectNothingTold();
+}
+
+TEST_F(Joining, ASourceThatComesBackIsInStepFromItsFirstIdrFrameOn) {
+    Make("a.ts", "1");
+    Make("b.ts", "4");
+    MakeCut("b.ts", "cut.ts");
+    StreamServer server({HttpStream(FileBytes(Path("a.ts"))), HttpStream(FileBytes(Path("cut.ts")))});
+    const auto source = OpenSource(Live(server.Http()), notices_, nullptr);
+    auto units = ReadPictures(*source, 25 + 50);
+    const auto back = std::find_if(units.begin() + 1, units.end(), [](const SourceUnit& unit) {
+        return unit.medium == Medium::kVideo && unit.keyFrame && unit.time > 90000;
+    });
+    ASSERT_NE(back, units.end());
+    // The audio in front of the picture is not the source's.
+    units.erase(units.begin(), back);
+    ExpectInStep(SentMedia(Path("b.ts")), units, 50);
+    EXPECT_EQ(source->Counts().lostFrames, 0u);
+    ExpectNothingTold();
+}
+
+/// The sender's clocks of picture and sound are tied to each other by reports, five seconds apart.
+TEST_F(Joining, RtpThatIsFoundBetweenTwoReportsIsInStepFromItsFirstIdrFrameOn) {
+    Make("a.ts", "9");
+    Ffmpeg("-i a.ts -c copy -bsf:a aac_adtstoasc a.mp4");
+    endtoend::WriteSessionDescription(Path("a.mp4"), ports_, Path("a.sdp"));
+    sender_ = endtoend::SendRtp(Path("a.mp4"), ports_);
+    // What the sender has sent before is gone.
+    ASSERT_TRUE(endtoend::TakePackets(ports_.First(), 30));
+    const auto source = OpenSource(Live(Path("a.sdp")), notices_, nullptr);
+    const auto units = ReadPictures(*source, 100);
+    const SentMedia sent(Path("a.ts"));
+    const auto pictures = sent.Find(Medium::kVideo, units);
+    ASSERT_FALSE(pictures.empty());
+    // The next group of pictures, or one behind it where the machine is busy.
+    EXPECT_GT(pictures.front().number, 0u);
+    EXPECT_EQ(pictures.front().number % 50, 0u);
+    ExpectInStep(sent, units, pictures.front().number);
+    EXPECT_EQ(source->Counts().lostFrames, 0u);
+    ExpectNothingTold();
+}
+
+/// How many audio frames come before the step: before, with and after the picture of the same moment.
+class ClockStep : public Joining, public testing::WithParamInterface<int> {};
+
+TEST_P(ClockStep, BackByHalfASecondLosesNothingAndLeavesSoundAndPictureInStep) {
+    Make("whole.ts", "4");
+    const string sounds = std::to_string(GetParam());
+    Ffmpeg("-copyts -i whole.ts -c copy -bsf:v 'noise=drop=gte(n\\,50)' -bsf:a 'noise=drop=gte(n\\," +
+           sounds + ")' -muxdelay 0 a.ts");
+    Ffmpeg("-copyts -i whole.ts -c copy -bsf:v 'noise=drop=lt(n\\,50)' -bsf:a 'noise=drop=lt(n\\," + sounds +
+           ")' -muxdelay 0 -output_ts_offset -0.5 -mpegts_flags +initial_discontinuity b.ts");
+    Shell("cat a.ts b.ts > ab.ts");
+    StreamServer server({HttpStream(FileBytes(Path("ab.ts")))});
+    SourceOptions options = Live(server.Http());
+    options.reconnect = false;
+    const auto source = OpenSource(options, notices_, nullptr);
+    const auto units = ReadAll(*source);
+    const SentMedia sent(Path("whole.ts"));
+    ExpectInStep(sent, units, 0);
+    EXPECT_EQ(Of(Medium::kVideo, units).size(), 100u);
+    EXPECT_GE(sent.Find(Medium::kAudio, units).size(), sent.Sounds() - 3);
+    EXPECT_EQ(source->Counts().lostFrames, 0u);
+    EXPECT_EQ(notices_.CountOf("the source's clock jumped by -500 ms"), 1u)
+        << testing::PrintToString(notices_.sentences);
+    EXPECT_EQ(notices_.CountOf("gaps"), 0u);
+}
+
+INSTANTIATE_TEST_SUITE_P(All, ClockStep, testing::Values(82, 95, 105));
+
+}  // namespace
+}  // namespace receiver
