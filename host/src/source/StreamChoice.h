@@ -16,7 +16,8 @@ struct StreamChoice {
     std::string notice;
 };
 
-/// Chooses what `options` ask for, else the largest video and the first audio of its program. Throws `ReceiverError`
+/// Chooses what `options` ask for, else the largest video and the first audio of its program. Throws
+/// `ReceiverError`
 /// (`kSourceUnsuitable`) when there is no video, or not what was asked for.
 StreamChoice ChooseStreams(AVFormatContext& format, const SourceOptions& options);
 
