@@ -126,7 +126,7 @@ TEST_F(ShareRecording, AServerThatIsFrozenFromTheStartFailsTheLogonWithinItsTime
 TEST_F(ShareRecording, AFullShareEndsWithCause23AndAClosedFile) {
     constexpr std::uint64_t kMinFreeSpace = 157286400;
     constexpr std::uint64_t kRoom = 1U << 20U;
-    SambaServer server(SambaServer::Shares{{"rec", {}}}, {}, [this](const std::filesystem::path& folder) {
+    SambaServer server(SambaServer::Shares{{"rec", {}}}, {}, [](const std::filesystem::path& folder) {
         ASSERT_TRUE(UsePrivateMounts()) << "this test has to mount a file system";
         const std::string size = "size=" + std::to_string(kMinFreeSpace + kRoom);
         ASSERT_EQ(mount("tmpfs", folder.c_str(), "tmpfs", 0, size.c_str()), 0);

@@ -22,7 +22,6 @@ namespace clipfileModule {
 namespace {
 
 using ::testing::Contains;
-using ::testing::Each;
 using ::testing::IsEmpty;
 using ::testing::Key;
 
