@@ -30,6 +30,7 @@ class OutputTargetTest : public FileOutputTest {
     }
     /// The paths that the logon calls got, and what it answers.
     void SetLogon(int logonError, int impersonateError) {
+        platform.ServeSharesFromDisk();
         platform.Set([=, this](FakePlatform::Hooks& hooks) {
             hooks.logon = [=, this](const std::string& userName, const std::string& domain,
                                     const std::string& password, LogonToken& token) {
@@ -38,10 +39,6 @@ class OutputTargetTest : public FileOutputTest {
                     token = 77;
                 }
                 return logonError;
-            };
-            // The share is a folder of this disk.
-            hooks.realPath = [](const std::string& path) {
-                return path.compare(0, 2, "\\\\") == 0 ? path.substr(1) : path;
             };
             hooks.impersonate = [=, this](LogonToken token) {
                 logons.push_back("impersonate " + std::to_string(token));

@@ -70,6 +70,12 @@ TEST_P(RecordedFaultsTest, Cause21LetsTheWriterGoOn) {
     settings.outputPath = "\\" + dir.ModulePath();
     settings.userName = "user";
     settings.password = "secret";
+    platform.ServeSharesFromDisk();
+    platform.Set([](FakePlatform::Hooks& hooks) {
+        hooks.logon = [](const std::string&, const std::string&, const std::string&, LogonToken&) {
+            return EACCES;
+        };
+    });
     Start();
     Push(0);
     Finish();

@@ -3,6 +3,7 @@
 #include <mutex>
 #include <utility>
 
+#include "platform/SharePath.h"
 #include "platform/posix/PosixPlatform.h"
 
 using clipfileModule::LocalTime;
@@ -129,6 +130,14 @@ void FakePlatform::SetAvailableSpace(std::uint64_t bytes) {
 void FakePlatform::SetAvailableSpaceError(int error) {
     Set([&](Hooks& hooks) {
         hooks.availableSpace = [error](const std::string&, std::uint64_t&) { return error; };
+    });
+}
+
+void FakePlatform::ServeSharesFromDisk() {
+    Set([](Hooks& hooks) {
+        hooks.realPath = [](const std::string& path) {
+            return clipfileModule::IsSharePath(path) ? path.substr(1) : path;
+        };
     });
 }
 

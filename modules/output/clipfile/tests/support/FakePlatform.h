@@ -49,6 +49,8 @@ class FakePlatform {
     void SetLocalTime(const clipfileModule::LocalTime& time);
     void SetAvailableSpace(std::uint64_t bytes);
     void SetAvailableSpaceError(int error);
+    /// Shares are folders of this disk: `\\folder\name` is `\folder\name`.
+    void ServeSharesFromDisk();
 
     /// The real system.
     static const clipfileModule::PlatformInterface& Real();
