@@ -35,6 +35,7 @@ TEST_F(SmbShareAccessTest, CredentialsCountForTheThreadThatTakesThemUntilTheyAre
         LogonToken token = kNoLogon;
         ASSERT_EQ(logon("rec", token), 0);
         EXPECT_EQ(look("rec"), EACCES) << "a logon alone changes nothing";
+        share_access::CloseLogon(token);
     }).join();
     std::thread([this] {
         LogonToken token = kNoLogon;
@@ -44,6 +45,8 @@ TEST_F(SmbShareAccessTest, CredentialsCountForTheThreadThatTakesThemUntilTheyAre
         EXPECT_EQ(look("open"), 0);
         std::thread([this] { EXPECT_EQ(look("rec"), EACCES); }).join();
         EXPECT_EQ(look("rec"), 0);
+        share_access::CloseLogon(token);
+        EXPECT_EQ(look("open"), 0);
     }).join();
 }
 
