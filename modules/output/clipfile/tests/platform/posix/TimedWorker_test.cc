@@ -104,6 +104,20 @@ TEST_F(TimedWorkerTest, LeavesAJobThatPassesTheLimitAndFailsEveryLaterOneAtOnce)
     EXPECT_TRUE(waitUntil([&] { return IsDestroyed(); }));
 }
 
+TEST_F(TimedWorkerTest, TakesATimeOutOfTheJobItselfForItsOwn) {
+    auto worker = make(seconds(30), seconds(30));
+    EXPECT_EQ(worker->Run([](Traced&) { return ETIMEDOUT; }), ETIMEDOUT);
+    const auto ran = std::make_shared<bool>(false);
+    EXPECT_EQ(worker->Run([ran](Traced&) {
+        *ran = true;
+        return 0;
+    }),
+              ETIMEDOUT);
+    EXPECT_FALSE(*ran);
+    worker.reset();
+    EXPECT_TRUE(waitUntil([&] { return IsDestroyed(); }));
+}
+
 TEST_F(TimedWorkerTest, WaitsForAnEndThatTakesLongUpToItsLimit) {
     struct Slow {
         explicit Slow(std::shared_future<void> until) : answered(std::move(until)) {}

@@ -19,7 +19,9 @@ struct ThreadRights {
     int refused = 0;
 };
 
-thread_local ThreadRights rights;
+/// In the block that a thread has from its start. One that comes with its first use is freed by whichever
+/// thread gets the stack next, which the thread sanitizer cannot follow for a thread that was given up.
+[[gnu::tls_model("initial-exec")]] thread_local ThreadRights rights;
 
 /// What a token points to.
 struct AcceptedLogon {

@@ -19,9 +19,9 @@ namespace clipfileModule {
 /// limit. For libraries whose calls wait for a network as long as they like. The thread makes the resource,
 /// uses it and destroys it; no signal of the process is handled on it.
 ///
-/// A job that passes the limit is left to the thread, with the resource: every later one fails at once, and
-/// the thread cleans up and ends when the job returns at last. So a job owns all that it uses. The code must
-/// stay in memory until then.
+/// A job that passes the limit, or returns ETIMEDOUT by itself, is the last: every later one fails at once,
+/// and the thread is left with the resource, which it cleans up when that job has returned. So a job owns all
+/// that it uses. The code must stay in memory until then.
 ///
 /// One thread at a time calls the operations.
 template <typename Resource>
@@ -78,7 +78,7 @@ class TimedWorker {
         const auto deadline = std::chrono::steady_clock::now() + jobLimit_;
         while (state_->job && lock.WaitUntil(state_->changed, deadline)) {
         }
-        timedOut_ = static_cast<bool>(state_->job);
+        timedOut_ = state_->job || state_->result == ETIMEDOUT;
         return timedOut_ ? ETIMEDOUT : state_->result;
     }
 
