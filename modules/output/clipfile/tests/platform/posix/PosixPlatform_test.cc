@@ -146,23 +146,6 @@ TEST(PosixPlatform, MakesDirectoriesByPathsOfTheModule) {
     EXPECT_TRUE(fs::is_directory(dir.Path() / "20261120" / "Cam"));
 }
 
-TEST(PosixPlatform, NeverTakesAPathOnAShareForALocalOne) {
-    const PosixPlatform platform;
-    const TempDir dir;
-    // Two backslashes before the path of a folder that is there: its first part is a server, which listens
-    // nowhere.
-    const std::string path = "\\\\127.0.0.1:1" + dir.ModulePath();
-    std::uint64_t bytes = 42;
-    boost::system::error_code error;
-    EXPECT_NE(platform.AvailableSpace(path, bytes), 0);
-    EXPECT_NE(platform.TestExistence(path), 0);
-    EXPECT_FALSE(platform.Exists(path));
-    EXPECT_FALSE(platform.CreateDirectories(path, error));
-    EXPECT_TRUE(error);
-    EXPECT_EQ(platform.OpenOnShare(path + "\\file"), nullptr);
-    EXPECT_EQ(bytes, 42u);
-}
-
 TEST(PosixPlatform, ALogonToNoShareFails) {
     const PosixPlatform platform;
     clipfileModule::LogonToken token = clipfileModule::kNoLogon;
