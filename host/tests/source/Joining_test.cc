@@ -3,6 +3,7 @@
 #include "SentMedia.h"
 #include "SourceTesting.h"
 #include "StreamServer.h"
+#include "support/CodedMedia.h"
 #include "support/FreePorts.h"
 #include "support/Senders.h"
 
@@ -67,6 +68,29 @@ TEST_F(Joining, ALiveStreamIsInStepFromItsFirstIdrFrameOn) {
     ExpectInStep(sent, ReadAll(*source), 50);
     EXPECT_EQ(source->Counts().lostFrames, 0u);
     ExpectNothingTold();
+}
+
+/// With its first sound a picture is complete for the recorder.
+TEST_F(Joining, MetadataOfTheFirstPictureComesBeforeItsSound) {
+    Make("a.ts", "4");
+    endtoend::AddKlvStream(Path("a.ts"), Path("klv.ts"), 1);
+    Ffmpeg(
+        "-i klv.ts -map 0 -c copy -copyts -bsf:v 'noise=drop=lt(n\\,5)' -bsf:a 'noise=drop=lt(n\\,9)' "
+        "cut.ts");
+    StreamServer server({HttpStream(FileBytes(Path("cut.ts")))});
+    SourceOptions options = Live(server.Http());
+    options.reconnect = false;
+    const auto units = ReadAll(*OpenSource(options, notices_, nullptr));
+    const auto first = [&units](Medium medium) {
+        return std::find_if(units.begin(), units.end(),
+                            [medium](const SourceUnit& unit) { return unit.medium == medium; });
+    };
+    const auto klv = first(Medium::kKlv);
+    ASSERT_NE(klv, units.end());
+    EXPECT_EQ(klv->time, first(Medium::kVideo)->time);
+    EXPECT_LT(klv, first(Medium::kAudio));
+    const auto packet = endtoend::MakeKlvPacket(50);
+    EXPECT_EQ(BytesOf(*klv), string(packet.begin(), packet.end()));
 }
 
 TEST_F(Joining, AStreamOverUdpIsInStepFromItsFirstIdrFrameOn) {
