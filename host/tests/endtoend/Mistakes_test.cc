@@ -230,6 +230,20 @@ TEST_F(MistakesTest, BackslashesInTheOutputFolderOfTheSettingsStore) {
     EXPECT_EQ(RecordingsIn(place).size(), 1U);
 }
 
+// The store of a run with --max-minutes is a copy.
+TEST_F(MistakesTest, ASettingsStoreIsReadAlikeWithAndWithoutALengthOfFiles) {
+    const auto place = folder.Path() / "from the store";
+    std::ofstream(folder.Path() / "settings.ini")
+        << "[ Qx/Other/MP4FileOut ] ; this machine\nMP4OutputPath = " << place.string() << "\n";
+    for (const std::string minutes : {"--json", "--max-minutes=5"}) {
+        const Outcome outcome = RunProgram(
+            {RECEIVER_PROGRAM, "--module", CLIPFILE_MODULE, "--size", "320x180", "--seconds", "1", minutes},
+            environment);
+        EXPECT_EQ(outcome.code, 0) << outcome.errors;
+    }
+    EXPECT_EQ(RecordingsIn(place).size(), 2U);
+}
+
 TEST_F(MistakesTest, APortOnWhichNothingArrives) {
     const FreePorts ports;
     const std::string address = "udp://127.0.0.1:" + std::to_string(ports.First());
