@@ -78,6 +78,16 @@ Output OutputOf(const Options& options) {
     return {folder, folder};
 }
 
+void CheckUser(const Options& options, const std::string& folder) {
+    if (options.user && !folder.starts_with("//")) {
+        throw ReceiverError(
+            ExitCode::kUsage,
+            "--user goes with a folder on a network share, such as //server/share/folder, and "
+            "the output folder '" +
+                folder + "' is none.");
+    }
+}
+
 void SetUpLog(const Options& options, const std::string& output) {
     const char* const set = getenv("QX_LOG");
     if (options.log) {
@@ -226,6 +236,7 @@ ExitCode Running::Record(const SourceOpener& open) {
     }
     const SettingsFile settings(options_.settings, options_.maxMinutes);
     const Output output = OutputOf(options_);
+    CheckUser(options_, output.folder);
     output_ = output.folder;
     if (PrepareOutputFolder(output_)) {
         display_.Notice("made the output folder " + output_);
@@ -507,6 +518,8 @@ Summary Running::Summarise(const SourceInterface& source, const Recorder::Progre
     run.oneRecording = options_.mode == OutputMode::kOn;
     run.length = run.anyFrame ? past.lastFrame - *past.firstFrame : 0;
     run.unreached = plan_.Unreached();
+    const SourceCounts counts = source.Counts();
+    run.silentFrames = counts.silentFrames;
     for (const WrittenFile& file : files_) {
         // One that could not be made was announced and has told why.
         if (file.closed || std::filesystem::exists(file.path)) {
@@ -521,7 +534,6 @@ Summary Running::Summarise(const SourceInterface& source, const Recorder::Progre
     Summary summary;
     summary.files = std::move(run.files);
     summary.lost = Lost(source);
-    const SourceCounts counts = source.Counts();
     if (host_->Failed()) {
         summary.exitCode = ExitCode::kRecordingFailed;
     } else if (summary.lost != 0 || faults_ != 0 || lateStops_ != 0 || missed_ || !shortfalls.empty() ||

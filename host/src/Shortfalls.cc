@@ -33,7 +33,7 @@ std::string DescribeUnreadable(const RecordedFile& file) {
 std::vector<std::string> ShortfallsOf(const RunRecord& run) {
     std::vector<std::string> sentences;
     if (!run.anyFrame && !run.endedByOperator) {
-        sentences.emplace_back("nothing was recorded: the source has sent no picture");
+        sentences.emplace_back("nothing was recorded: the source has sent no IDR frame");
     }
     if (run.oneRecording && run.anyFrame && run.recordedFrames == 0) {
         sentences.emplace_back("nothing was recorded: no IDR frame came");
@@ -43,7 +43,7 @@ std::vector<std::string> ShortfallsOf(const RunRecord& run) {
     }
     if (run.silentFrames != 0) {
         sentences.push_back(Counted(run.silentFrames, "audio frame") +
-                            " of the source missing: silence was recorded instead");
+                            " of the source did not come: silence was recorded instead");
     }
     for (const RecordedFile& file : run.files) {
         if (!file.problem.empty()) {

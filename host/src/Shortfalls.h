@@ -14,7 +14,7 @@ namespace receiver {
 struct RunRecord {
     /// The operator ended the run: what had not begun by then was not to be recorded any more.
     bool endedByOperator = false;
-    /// Frames that came, and those of them that belong to recordings.
+    /// Frames that came, from the first IDR frame of the source on, and those that belong to recordings.
     bool anyFrame = false;
     std::uint64_t recordedFrames = 0;
     /// The whole run was one recording.

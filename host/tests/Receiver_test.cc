@@ -319,6 +319,14 @@ TEST_F(ReceiverTest, WhatTheSourceLostIsALoss) {
     }
 }
 
+TEST_F(ReceiverTest, SilenceInThePlaceOfMissingAudioIsToldAndIsALoss) {
+    auto source = std::make_unique<FakeSource>(60);
+    source->ChangeCounts().silentFrames = 5;
+    EXPECT_EQ(Record(std::move(source)), ExitCode::kLost);
+    EXPECT_THAT(display_.notices, Contains(HasSubstr("5 audio frames of the source did not come")));
+    EXPECT_EQ(display_.summary.lost, 0u);
+}
+
 TEST_F(ReceiverTest, GoingOfflineAtTheEndIsNoFault) {
     setenv("FAKE_MODULE", "", 1);
     options_.module = FAKE_MODULE;
@@ -416,6 +424,13 @@ TEST_F(ReceiverTest, ATimecodeThatDropFrameLeavesOutIsAUsageError) {
     EXPECT_THAT(display_.failure, HasSubstr("drop-frame rule"));
     options_.dropFrame = false;
     EXPECT_EQ(record(), ExitCode::kSuccess);
+}
+
+TEST_F(ReceiverTest, AUserWithoutAShareIsAUsageError) {
+    options_.user = "joe";
+    EXPECT_EQ(Record(10), ExitCode::kUsage);
+    EXPECT_THAT(display_.failure, HasSubstr("--user goes with a folder on a network share"));
+    EXPECT_THAT(display_.failure, HasSubstr(folder_));
 }
 
 TEST_F(ReceiverTest, ASettingsFileThatIsMissingIsAUsageError) {

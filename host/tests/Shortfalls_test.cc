@@ -25,9 +25,9 @@ TEST(Shortfalls, ARunWithEverythingHasNone) {
     EXPECT_THAT(ShortfallsOf(WholeRun()), IsEmpty());
 }
 
-TEST(Shortfalls, ASourceWithoutAPictureIsToldUnlessTheOperatorEndedTheRun) {
+TEST(Shortfalls, ASourceWithoutAnythingToBeginWithIsToldUnlessTheOperatorEndedTheRun) {
     RunRecord run;
-    EXPECT_THAT(ShortfallsOf(run), ElementsAre("nothing was recorded: the source has sent no picture"));
+    EXPECT_THAT(ShortfallsOf(run), ElementsAre("nothing was recorded: the source has sent no IDR frame"));
     run.endedByOperator = true;
     EXPECT_THAT(ShortfallsOf(run), IsEmpty());
 }
@@ -53,7 +53,7 @@ TEST(Shortfalls, SilenceInThePlaceOfMissingAudioIsTold) {
     RunRecord run = WholeRun();
     run.silentFrames = 1;
     EXPECT_THAT(ShortfallsOf(run),
-                ElementsAre("1 audio frame of the source missing: silence was recorded instead"));
+                ElementsAre("1 audio frame of the source did not come: silence was recorded instead"));
 }
 
 TEST(Shortfalls, AFileThatIsGoneOrCannotBeReadIsNamed) {

@@ -207,11 +207,12 @@ void InputProducer::GoOn(std::unique_ptr<Connection> connection, std::int64_t pa
 
 void InputProducer::Publish() {
     lostFrames_ = assembler_.LostFrames();
+    silentFrames_ = assembler_.SilentFrames();
     damaged_ = damagedBefore_ + (connection_ ? connection_->Damaged() : 0);
 }
 
 SourceCounts InputProducer::Counts() const {
-    return {lostFrames_, damaged_, reconnections_, changes_, away_};
+    return {lostFrames_, damaged_, reconnections_, changes_, away_, silentFrames_};
 }
 
 }  // namespace receiver

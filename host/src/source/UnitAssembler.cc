@@ -127,7 +127,9 @@ void UnitAssembler::PlaceAudio(const CodedAudio& audio) {
             case AudioGrid::Action::kFill:
                 EmitSilence(place.time);
                 // That audio begins behind the picture is no gap.
-                tally_.filled += audioBegun_ ? 1 : 0;
+                if (audioBegun_) {
+                    CountSilence();
+                }
                 continue;
             case AudioGrid::Action::kAccept:
                 audioBegun_ = true;
@@ -148,11 +150,18 @@ void UnitAssembler::EmitSilence(std::int64_t time) {
     batch_.emplace_back(SourceUnit{Medium::kAudio, time, silence_.data, silence_.size, false, std::nullopt});
 }
 
+void UnitAssembler::CountSilence() {
+    ++tally_.filled;
+    ++silentFrames_;
+}
+
 void UnitAssembler::MakeSilence(std::int64_t time) {
     const std::int64_t limit = ToAudio(audio_ ? time - kLongestLag : time);
     while (heldAudio_.empty() && audioGrid_.End() <= limit) {
         EmitSilence(audioGrid_.Append());
-        tally_.filled += audio_ ? 1 : 0;
+        if (audio_) {
+            CountSilence();
+        }
     }
 }
 

@@ -44,6 +44,8 @@ class UnitAssembler {
     std::int64_t LastPicture() const { return lastPicture_; }
     const FrameGrid& Grid() const { return grid_; }
     std::uint64_t LostFrames() const { return lostFrames_; }
+    /// Audio frames that did not come and are silence.
+    std::uint64_t SilentFrames() const { return silentFrames_; }
 
  private:
     struct Klv {
@@ -55,6 +57,7 @@ class UnitAssembler {
     void PlaceAudio(const CodedAudio& audio);
     void EmitKlv(const Klv& klv);
     void EmitSilence(std::int64_t time);
+    void CountSilence();
     void MakeSilence(std::int64_t time);
     std::optional<Timecode> TimecodeOfFrame(std::int64_t index, const CodedPicture& picture);
     void Report();
@@ -80,6 +83,7 @@ class UnitAssembler {
     bool dropFrame_ = false;
 
     std::uint64_t lostFrames_ = 0;
+    std::uint64_t silentFrames_ = 0;
     /// What the next sentence tells of.
     struct Tally {
         std::uint64_t lost = 0;

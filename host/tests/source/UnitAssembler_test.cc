@@ -81,6 +81,7 @@ TEST_F(UnitAssemblerTest, SilenceStandsInForAudioThatStaysAway) {
     Picture(75 * 3600);
     EXPECT_EQ(Made().substr(0, 3), "s0 ");
     EXPECT_EQ(notice_, "the source has gaps: 1 audio frame missing and filled with silence");
+    EXPECT_EQ(assembler_.SilentFrames(), 1u);
 }
 
 TEST_F(UnitAssemblerTest, AudioOfALostPictureIsLeftOut) {
