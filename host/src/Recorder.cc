@@ -11,10 +11,6 @@
 namespace receiver {
 namespace {
 
-/// Where frames lie further apart than this, in ticks, something is missing. The module does not notice: it
-/// counts units, so its media would drift apart and the timecode of the file would be wrong behind the gap.
-constexpr std::int64_t kGap = kVideoClock / 2;
-
 constexpr std::int64_t kAudioFrame = 1024;
 
 /// An access unit delimiter (ISO/IEC 14496-10 7.3.2.4): a unit that holds no picture.
@@ -114,7 +110,9 @@ void Recorder::PushAudio(const SourceUnit& unit) {
 void Recorder::PushFrame(const SourceUnit& unit) {
     if (!firstFrame_) {
         firstFrame_ = unit.time;
-    } else if (unit.time - lastFrame_ > kGap) {
+    } else if (unit.time - lastFrame_ > kLongestStep) {
+        // The module does not notice what is missing: it counts units, so its media would drift apart and the
+        // timecode of the file would be wrong behind the gap.
         EndBeforeGap();
     }
     lastFrame_ = unit.time;

@@ -244,7 +244,6 @@ bool Connection::NextPacket() {
 
 bool Connection::Pump() {
     if (!NextPacket()) {
-        Finish();
         return false;
     }
     if ((packet_->flags & AV_PKT_FLAG_CORRUPT) != 0) {
@@ -375,21 +374,19 @@ void Connection::HandleVideo(AVPacket& packet) {
         stamp ? TimeOf(video_, *stamp, period, passes_ ? Back(period) : kBackReordered) : video_.expected;
     packet.dts = AV_NOPTS_VALUE;
     video_.expected = packet.pts + period;
+    // What belongs to the first picture has to be there before it and its sound complete each other.
+    auto waiting = std::exchange(early_, {});
+    const auto sound = std::stable_partition(waiting.begin(), waiting.end(), [this](const auto& early) {
+        return !audio_ || StreamOf(*early) != &*audio_;
+    });
+    Replay(waiting.begin(), sound);
     videoPath_->Push(packet, ToPictures());
-    ReplayEarly();
+    Replay(sound, waiting.end());
 }
 
-void Connection::ReplayEarly() {
+void Connection::Replay(Packets::iterator begin, Packets::iterator end) {
     replaying_ = true;
-    auto waiting = std::exchange(early_, {});
-    // With its first sound a picture is complete, and what belongs to it has to be there by then.
-    std::stable_partition(waiting.begin(), waiting.end(), [this](const auto& early) {
-        const Stream* const stream = StreamOf(*early);
-        return stream != nullptr && (!audio_ || stream != &*audio_);
-    });
-    for (const auto& early : waiting) {
-        Handle(*early);
-    }
+    std::for_each(begin, end, [this](const auto& packet) { Handle(*packet); });
     replaying_ = false;
 }
 
@@ -427,7 +424,8 @@ std::int64_t Connection::AudioTime(std::int64_t stamp, std::int64_t usual) {
 
 void Connection::HandleKlv(const AVPacket& packet) {
     Stream& stream = *StreamOf(packet);
-    const std::int64_t last = assembler_->LastPicture();
+    // Behind an outage the last picture is that of the connection before.
+    const std::int64_t last = std::max(assembler_->LastPicture(), begin_);
     std::optional<std::int64_t> time;
     if (const auto stamp = StampOf(stream, packet)) {
         time = line_.Nearest(*stamp, last);

@@ -37,9 +37,12 @@ class Connection {
     /// From here on what the source carries goes to `assembler`; its first IDR frame stands at `begin`.
     /// `assembler` must outlive this.
     void Begin(UnitAssembler& assembler, std::int64_t begin);
-    /// Passes one packet on. False at the end of the source, after everything was given out. Throws like
-    /// `Input`, and `FormatChanged`: then the connection is over, and its input may be asked anew.
+    /// Passes one packet on. False at the end of the source. Throws like `Input`, and `FormatChanged`. In all
+    /// these cases the connection is over.
     bool Pump();
+    /// Gives out what is still on its way. Once, when the connection is over; then its input may be asked
+    /// anew.
+    void Finish();
     /// Ends the connection, all but the input, and gives that away.
     static std::unique_ptr<Input> End(std::unique_ptr<Connection> connection);
     /// The wait for the source is over: what still comes was held by the libraries.
@@ -53,6 +56,8 @@ class Connection {
     std::uint64_t Damaged() const;
 
  private:
+    using Packets = std::deque<libav::Owner<AVPacket>>;
+
     /// A stream of the input that is used.
     struct Stream {
         const AVStream* stream = nullptr;
@@ -79,7 +84,6 @@ class Connection {
     void HandleVideo(AVPacket& packet);
     void HandleAudio(AVPacket& packet);
     void HandleKlv(const AVPacket& packet);
-    void Finish();
     Stream* StreamOf(const AVPacket& packet);
     /// The packet's stamp, unwrapped, in ticks of 90000. Nothing when it has none.
     std::optional<std::int64_t> StampOf(Stream& stream, const AVPacket& packet);
@@ -88,7 +92,7 @@ class Connection {
     std::int64_t Elapsed(Stream& stream, std::int64_t usual);
     std::int64_t TimeOf(Stream& stream, std::int64_t stamp, std::int64_t usual, std::int64_t back);
     std::int64_t AudioTime(std::int64_t stamp, std::int64_t usual);
-    void ReplayEarly();
+    void Replay(Packets::iterator begin, Packets::iterator end);
     PictureSink ToPictures();
     AudioSink ToAudio();
 
@@ -105,8 +109,8 @@ class Connection {
     KlvPackets klvPackets_;
     libav::Owner<AVPacket> packet_;
     /// Packets that were read to look at them, then those that wait for the first IDR frame.
-    std::deque<libav::Owner<AVPacket>> ahead_;
-    std::deque<libav::Owner<AVPacket>> early_;
+    Packets ahead_;
+    Packets early_;
 
     UnitAssembler* assembler_ = nullptr;
     std::int64_t begin_ = 0;

@@ -70,7 +70,9 @@ bool InputProducer::Produce(Batch& batch) {
                                    ? lastPicture_ + std::chrono::microseconds((last - before) * 100 / 9)
                                    : Clock::now();
             }
-            if (!more && !recorded_) {
+            if (!more && recorded_) {
+                connection_->Finish();
+            } else if (!more) {
                 Lose("the connection has ended");
                 more = options_.reconnect;
             }
@@ -100,7 +102,7 @@ void InputProducer::Lose(const std::string& reason) {
     if (now - connected_ > kGood) {
         attempts_ = 0;
     }
-    assembler_.Finish();
+    connection_->Finish();
     if (options_.reconnect && !recorded_) {
         assembler_.AddNotice("the source was lost: " + reason + NextAttempt());
         told_ = now;
@@ -139,7 +141,7 @@ void InputProducer::TryAgain() {
 }
 
 void InputProducer::Change(const std::string& reason) {
-    assembler_.Finish();
+    connection_->Finish();
     ++changes_;
     damagedBefore_ += connection_->Damaged();
     const std::int64_t position = connection_->Position();

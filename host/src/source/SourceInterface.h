@@ -16,6 +16,9 @@ enum class Medium { kVideo, kAudio, kKlv };
 inline constexpr std::int64_t kVideoClock = 90000;
 inline constexpr std::int64_t kAudioClock = 48000;
 
+/// Where pictures lie further apart than this, in ticks of 90000, a recording ends, and another one begins.
+inline constexpr std::int64_t kLongestStep = kVideoClock / 2;
+
 /// One unit of a source, ready for the module.
 struct SourceUnit {
     Medium medium = Medium::kVideo;

@@ -79,7 +79,8 @@ void UnitAssembler::AddPicture(const CodedPicture& picture) {
     const std::int64_t expected = grid_.End();
     const FrameGrid::Place place = grid_.Next(picture.time);
     if (place.lost > 0) {
-        audioGrid_.AddVideoGap(ToAudio(expected), ToAudio(place.time) - ToAudio(expected));
+        audioGrid_.AddVideoGap(ToAudio(expected), ToAudio(place.time) - ToAudio(expected),
+                               place.time - lastPicture_ > kLongestStep);
         if (!resumed_) {
             lostFrames_ += static_cast<std::uint64_t>(place.lost);
             tally_.lost += static_cast<std::uint64_t>(place.lost);

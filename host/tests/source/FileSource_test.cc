@@ -164,6 +164,26 @@ TEST_F(FileSource, AGapInTheAudioIsFilledAndTold) {
     EXPECT_EQ(notices_.CountOf("5 audio frames missing and filled with silence"), 1u);
 }
 
+TEST_F(FileSource, AnAudioFrameThatIsCutShortIsNotRecorded) {
+    Ffmpeg(string(kPicture) + kTone + kPlainH264 + kPlainAac + "a.ts");
+    // The stream breaks off within the last frame: its last packet but the stuffing is audio.
+    Ffmpeg("-i a.ts -map 0:v -c copy v.ts");
+    Ffmpeg("-i a.ts -map 0:a -c copy whole.aac");
+    const string whole = FileBytes(Path("whole.aac"));
+    std::FILE* const file = std::fopen(Path("short.aac").c_str(), "wb");
+    std::fwrite(whole.data(), 1, whole.size() - 40, file);
+    ASSERT_EQ(std::fclose(file), 0);
+    Ffmpeg("-i a.ts -i short.aac -map 0:v -map 1:a -c copy -flush_packets 1 short.nut");
+    const auto source = OpenSource(Fast("short.nut"), notices_, nullptr);
+    for (const SourceUnit& unit : Of(Medium::kAudio, ReadAll(*source))) {
+        // aac_frame_length
+        const std::size_t length =
+            (unit.data.get()[3] & 3U) << 11 | unit.data.get()[4] << 3U | unit.data.get()[5] >> 5U;
+        EXPECT_EQ(length, unit.size);
+    }
+    EXPECT_EQ(source->Counts().damagedPackets, 1u);
+}
+
 TEST_F(FileSource, LostPicturesAreCountedKeepTheirPlacesAndTakeTheirAudioAlong) {
     Ffmpeg(string(kPicture) + kTone + kPlainH264 + kPlainAac + "-bsf:v 'noise=drop=between(n\\,5\\,8)' a.ts");
     const auto source = OpenSource(Fast("a.ts"), notices_, nullptr);

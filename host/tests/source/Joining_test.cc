@@ -70,13 +70,15 @@ TEST_F(Joining, ALiveStreamIsInStepFromItsFirstIdrFrameOn) {
     ExpectNothingTold();
 }
 
-/// With its first sound a picture is complete for the recorder.
-TEST_F(Joining, MetadataOfTheFirstPictureComesBeforeItsSound) {
+/// Whether there is audio beside the pictures and their metadata.
+class FirstPicture : public Joining, public testing::WithParamInterface<bool> {};
+
+/// With its sound, which may be silence that is made, a picture is complete for the recorder.
+TEST_P(FirstPicture, CarriesItsOwnMetadata) {
     Make("a.ts", "4");
     endtoend::AddKlvStream(Path("a.ts"), Path("klv.ts"), 1);
-    Ffmpeg(
-        "-i klv.ts -map 0 -c copy -copyts -bsf:v 'noise=drop=lt(n\\,5)' -bsf:a 'noise=drop=lt(n\\,9)' "
-        "cut.ts");
+    Ffmpeg(string("-i klv.ts -map 0 -c copy -copyts -bsf:v 'noise=drop=lt(n\\,5)' ") +
+           (GetParam() ? "-bsf:a 'noise=drop=lt(n\\,9)'" : "-an") + " cut.ts");
     StreamServer server({HttpStream(FileBytes(Path("cut.ts")))});
     SourceOptions options = Live(server.Http());
     options.reconnect = false;
@@ -88,7 +90,28 @@ TEST_F(Joining, MetadataOfTheFirstPictureComesBeforeItsSound) {
     const auto klv = first(Medium::kKlv);
     ASSERT_NE(klv, units.end());
     EXPECT_EQ(klv->time, first(Medium::kVideo)->time);
+    EXPECT_LT(klv, first(Medium::kVideo));
     EXPECT_LT(klv, first(Medium::kAudio));
+    const auto packet = endtoend::MakeKlvPacket(50);
+    EXPECT_EQ(BytesOf(*klv), string(packet.begin(), packet.end()));
+}
+
+INSTANTIATE_TEST_SUITE_P(WithAndWithoutAudio, FirstPicture, testing::Bool());
+
+TEST_F(Joining, MetadataOfTheFirstPictureBehindAnOutageIsItsOwn) {
+    Make("a.ts", "4");
+    endtoend::AddKlvStream(Path("a.ts"), Path("klv.ts"), 1);
+    Ffmpeg("-i klv.ts -map 0 -c copy -copyts -bsf:v 'noise=drop=lt(n\\,5)' cut.ts");
+    StreamServer server({HttpStream(FileBytes(Path("klv.ts"))), HttpStream(FileBytes(Path("cut.ts")))});
+    const auto source = OpenSource(Live(server.Http()), notices_, nullptr);
+    const auto units = ReadPictures(*source, 100 + 50);
+    const auto pictures = Of(Medium::kVideo, units);
+    ASSERT_EQ(pictures.size(), 150u);
+    const auto klv = std::find_if(units.begin(), units.end(), [&](const SourceUnit& unit) {
+        return unit.medium == Medium::kKlv && unit.time >= pictures[100].time;
+    });
+    ASSERT_NE(klv, units.end());
+    EXPECT_EQ(klv->time, pictures[100].time);
     const auto packet = endtoend::MakeKlvPacket(50);
     EXPECT_EQ(BytesOf(*klv), string(packet.begin(), packet.end()));
 }

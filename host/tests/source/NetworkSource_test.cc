@@ -220,6 +220,19 @@ TEST_F(NetworkSource, ASilentSourceIsLostAfterTheTimeout) {
     EXPECT_EQ(notices_.CountOf("the source was lost: no video came for 1 s; waiting for it"), 1u);
 }
 
+TEST_F(NetworkSource, PicturesThatADecoderHoldsWhenTheSourceFallsSilentAreNotLost) {
+    Ffmpeg(string("-f lavfi -i testsrc2=size=128x96:rate=25:duration=2") +
+           " -pix_fmt yuv420p -c:v libx264 -preset ultrafast -bf 3 -g 25 a.ts");
+    const string url = "udp://127.0.0.1:" + Port();
+    SourceOptions options = Live(url);
+    options.timeout = 1;
+    options.transcode = true;
+    const auto source = OpenAndSend(options, ports_.First(), [&] {
+        return endtoend::SendTransportStream(Path("a.ts"), url + "?pkt_size=1316");
+    });
+    ExpectSteady(Of(Medium::kVideo, ReadPictures(*source, 50)));
+}
+
 TEST_F(NetworkSource, TimeGoesOnWhileASilentSourceIsWaitedFor) {
     MakeMaterial();
     const string url = "udp://127.0.0.1:" + Port();
