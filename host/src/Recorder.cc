@@ -224,8 +224,9 @@ Timecode Recorder::NextTimecode(const SourceUnit& unit) {
     if (!counter_) {
         const FrameRate& rate = settings_.frameRate;
         const bool dropFrame = rate.dropFrame && settings_.dropFrame;
-        counter_.emplace(
-            rate, settings_.timecode ? *settings_.timecode : TimecodeOfDay(SecondsOfDay(), rate, dropFrame));
+        counter_.emplace(rate, settings_.timecode
+                                   ? *settings_.timecode
+                                   : TimecodeOfDay(SecondsOfDay(unit.arrived), rate, dropFrame));
     }
     return counter_->Next(unit.time, unit.timecode);
 }

@@ -136,7 +136,7 @@ void InputProducer::TryAgain() {
     using std::chrono::duration_cast;
     const auto away = duration_cast<std::chrono::seconds>(connected_ - lost_).count();
     assembler_.AddNotice("the source is back after " + std::to_string(away) + " s");
-    const std::int64_t passed = Ticks(connection->Opened() - lastPicture_);
+    const std::int64_t passed = Ticks(connection->Arrived() - lastPicture_);
     GoOn(std::move(connection), passed, false);
 }
 
@@ -187,8 +187,6 @@ void InputProducer::TellFailure(const ReceiverError& error) {
 
 void InputProducer::GoOn(std::unique_ptr<Connection> connection, std::int64_t passed, bool changed) {
     connection_ = std::move(connection);
-    // Time went on while the source was away. On the grid, so that picture and sound are moved alike.
-    const std::int64_t begin = assembler_.Grid().PlaceOf(assembler_.LastPicture() + passed);
     const SourceDescription& now = connection_->Description();
     const bool other = now.width != description_.width || now.height != description_.height ||
                        now.frameRate != description_.frameRate;
@@ -197,14 +195,12 @@ void InputProducer::GoOn(std::unique_ptr<Connection> connection, std::int64_t pa
                              ": the recording goes on in a new file");
         ++changes_;
     }
-    if (now.frameRate != description_.frameRate) {
-        assembler_.SetRate(now.frameRate, begin);
-    }
     description_ = now;
     if (other || changed) {
         assembler_.AddChange(description_);
     }
-    connection_->Begin(assembler_, begin);
+    // Time went on while the source was away.
+    connection_->Begin(assembler_, std::max<std::int64_t>(1, assembler_.LastPicture() + passed));
 }
 
 void InputProducer::Publish() {
