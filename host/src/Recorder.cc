@@ -11,10 +11,6 @@
 namespace receiver {
 namespace {
 
-/// Where frames lie further apart than this, in ticks, something is missing. The module does not notice: it
-/// counts units, so its media would drift apart and the timecode of the file would be wrong behind the gap.
-constexpr std::int64_t kGap = kVideoClock / 2;
-
 constexpr std::int64_t kAudioFrame = 1024;
 
 /// An access unit delimiter (ISO/IEC 14496-10 7.3.2.4): a unit that holds no picture.
@@ -131,7 +127,9 @@ void Recorder::PushAudio(const SourceUnit& unit) {
 void Recorder::PushFrame(const SourceUnit& unit) {
     if (!firstFrame_) {
         firstFrame_ = unit.time;
-    } else if (unit.time - lastFrame_ > kGap) {
+    } else if (unit.time - lastFrame_ > kLongestStep) {
+        // The module does not notice what is missing: it counts units, so its media would drift apart and the
+        // timecode of the file would be wrong behind the gap.
         EndBeforeGap();
     }
     lastFrame_ = unit.time;
@@ -275,8 +273,9 @@ Timecode Recorder::NextTimecode(const SourceUnit& unit) {
     if (!counter_) {
         const FrameRate& rate = settings_.frameRate;
         const bool dropFrame = rate.dropFrame && settings_.dropFrame;
-        counter_.emplace(
-            rate, settings_.timecode ? *settings_.timecode : TimecodeOfDay(SecondsOfDay(), rate, dropFrame));
+        counter_.emplace(rate, settings_.timecode
+                                   ? *settings_.timecode
+                                   : TimecodeOfDay(SecondsOfDay(unit.arrived), rate, dropFrame));
     }
     return counter_->Next(unit.time, unit.timecode);
 }

@@ -143,6 +143,21 @@ class RecorderTest : public ::testing::Test {
     std::optional<Recorder> recorder_;
 };
 
+TEST_F(RecorderTest, TimeOfDayIsThatAtWhichTheFirstFrameArrived) {
+    Recorder::Settings settings = Sync();
+    settings.timecode.reset();
+    Make(settings);
+    SourceUnit frame = MakeFrame(0, true, 0);
+    frame.arrived = SourceUnit::Clock::now() - std::chrono::minutes(7);
+    const double expected = SecondsOfDay(frame.arrived);
+    recorder_->Put(std::move(frame));
+    PutLateAudio();
+    ASSERT_TRUE(recorder_->LastTimecode());
+    const Timecode& timecode = *recorder_->LastTimecode();
+    EXPECT_NEAR(timecode.hours * 3600 + timecode.minutes * 60 + timecode.seconds + timecode.frames / 25.0,
+                expected, 0.1);
+}
+
 TEST_F(RecorderTest, EachFrameComesBehindItsMetadataAndAudioInItsPlace) {
     Make(Sync());
     PutFrame(0, true);

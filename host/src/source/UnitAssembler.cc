@@ -35,13 +35,18 @@ UnitAssembler::UnitAssembler(const FrameRate& rate) : rate_(rate), grid_(rate), 
 void UnitAssembler::Begin(bool audio) {
     audio_ = audio;
     resumed_ = true;
+    audioBegun_ = false;
     audioGrid_.Rejoin();
     // What still waits was sent for pictures that do not come any more.
     heldAudio_.clear();
     heldKlv_.clear();
 }
 
-void UnitAssembler::SetRate(const FrameRate& rate, std::int64_t begin) {
+std::int64_t UnitAssembler::Resume(const FrameRate& rate, std::int64_t time) {
+    const std::int64_t begin = grid_.PlaceOf(time);
+    if (rate == rate_) {
+        return begin;
+    }
     const std::int64_t end = grid_.End();
     if (begin > end) {
         audioGrid_.AddVideoGap(ToAudio(end), ToAudio(begin) - ToAudio(end));
@@ -50,6 +55,15 @@ void UnitAssembler::SetRate(const FrameRate& rate, std::int64_t begin) {
     grid_ = FrameGrid(rate, begin);
     // An address counts frames of the rate before.
     addressedFrame_.reset();
+    return begin;
+}
+
+void UnitAssembler::SetArrival(std::int64_t time, SourceUnit::Clock::time_point arrived) {
+    origin_ = arrived - std::chrono::microseconds(time * 100 / 9);
+}
+
+std::optional<SourceUnit::Clock::time_point> UnitAssembler::ArrivalOf(std::int64_t time) const {
+    return origin_ ? std::optional(*origin_ + std::chrono::microseconds(time * 100 / 9)) : std::nullopt;
 }
 
 void UnitAssembler::SetTimecode(const Timecode& timecode) {
@@ -79,7 +93,8 @@ void UnitAssembler::AddPicture(const CodedPicture& picture) {
     const std::int64_t expected = grid_.End();
     const FrameGrid::Place place = grid_.Next(picture.time);
     if (place.lost > 0) {
-        audioGrid_.AddVideoGap(ToAudio(expected), ToAudio(place.time) - ToAudio(expected));
+        audioGrid_.AddVideoGap(ToAudio(expected), ToAudio(place.time) - ToAudio(expected),
+                               place.time - lastPicture_ > kLongestStep);
         if (!resumed_) {
             lostFrames_ += static_cast<std::uint64_t>(place.lost);
             tally_.lost += static_cast<std::uint64_t>(place.lost);
@@ -90,7 +105,7 @@ void UnitAssembler::AddPicture(const CodedPicture& picture) {
     Release(place.time);
     MakeSilence(place.time);
     batch_.emplace_back(SourceUnit{Medium::kVideo, place.time, picture.data, picture.size, picture.keyFrame,
-                                   TimecodeOfFrame(place.index, picture)});
+                                   TimecodeOfFrame(place.index, picture), ArrivalOf(place.time)});
     Report();
 }
 
