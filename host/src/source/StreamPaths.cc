@@ -1,6 +1,7 @@
 #include "source/StreamPaths.h"
 
 #include <algorithm>
+#include <cmath>
 #include <utility>
 
 #include "common/Credentials.h"
@@ -79,6 +80,21 @@ bool RefreshesWithoutIdr(VideoPass& pass, const AVStream& stream, const Packets&
     return refreshes;
 }
 
+/// The file tells that it has another number of pictures than its rate asks for: where one was shown longer,
+/// none follows.
+bool RateVaries(const AVStream& stream, const FrameRate& rate) {
+    constexpr double kSlack = 0.02;
+    if (stream.nb_frames <= 1 || stream.duration <= 0) {
+        return false;
+    }
+    const double seconds = static_cast<double>(stream.duration) * av_q2d(stream.time_base);
+    const double expected =
+        seconds * static_cast<double>(rate.numerator) / static_cast<double>(rate.denominator);
+    // One picture more or less is a matter of rounding.
+    const double missing = std::abs(static_cast<double>(stream.nb_frames) - expected);
+    return missing > 1 && missing > kSlack * expected;
+}
+
 void DecideVideo(AVFormatContext& format, AVStream& stream, const Packets& ahead,
                  const SourceOptions& options, const SourceDescription* before, StreamPaths& paths) {
     const AVCodecParameters& parameters = *stream.codecpar;
@@ -97,7 +113,13 @@ void DecideVideo(AVFormatContext& format, AVStream& stream, const Packets& ahead
     if (paths.passes) {
         pass = std::make_unique<VideoPass>(parameters);
         buildsUp = options.transcode && RefreshesWithoutIdr(*pass, stream, ahead);
-        paths.passes = !buildsUp;
+        const bool varies = findings.rate && RateVaries(stream, *findings.rate);
+        if (varies && !options.transcode) {
+            paths.notices.emplace_back(
+                "the frame rate varies, and pictures that are not there count as lost: --transcode makes it "
+                "constant");
+        }
+        paths.passes = !buildsUp && !(varies && options.transcode);
     }
     if (findings.interlaced) {
         paths.notices.emplace_back(paths.passes ? "the video is interlaced and is recorded as such"
