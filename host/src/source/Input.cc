@@ -90,6 +90,7 @@ Input::Input(const std::string& url, double timeout, double patience, std::share
     const std::string format = format_->iformat->name;
     recorded_ = (seekable && format != "sdp") ||
                 (format == "hls" && format_->duration != AV_NOPTS_VALUE && format_->duration > 0);
+    transport_ = format == "mpegts" || format == "hls";
     rtp_ = format == "sdp" || format == "rtsp" || format == "rtp";
     Alive();
 }
@@ -163,6 +164,7 @@ bool Input::Renew(std::int64_t position) {
         format_.reset();
         Open();
     }
+    damagedNext_.clear();
     Alive();
     return true;
 }
@@ -238,16 +240,40 @@ void Input::FailOpening(int result) {
     throw ReceiverError(ExitCode::kSourceUnavailable, sentence);
 }
 
+int Input::ReadFrame(AVPacket& packet) {
+    int result = 0;
+    do {
+        // What the libraries still hold when a wait is over comes out before they tell.
+        const bool over = Expired() && ++drained_ > kLongestDrain;
+        result = over ? AVERROR_EXIT : av_read_frame(format_.get(), &packet);
+        // So they end a search in bytes that are no transport stream, and go on with it when they are asked.
+    } while (result == AVERROR(EAGAIN) && !interrupt_->Stopped() && (stop_ == nullptr || !stop_()));
+    return result;
+}
+
+void Input::MarkDamage(AVPacket& packet) {
+    const AVCodecParameters& parameters = *format_->streams[packet.stream_index]->codecpar;
+    if (!transport_ || parameters.codec_type != AVMEDIA_TYPE_VIDEO) {
+        return;
+    }
+    // Where a picture ends is found in the unit of the transport stream that holds the next one, and of that
+    // unit it has the mark.
+    const bool damaged = damagedNext_.erase(packet.stream_index) > 0;
+    if ((packet.flags & AV_PKT_FLAG_CORRUPT) != 0) {
+        damagedNext_.insert(packet.stream_index);
+    }
+    packet.flags = damaged ? packet.flags | AV_PKT_FLAG_CORRUPT : packet.flags & ~AV_PKT_FLAG_CORRUPT;
+}
+
 bool Input::Read(AVPacket& packet) {
     libav::ForgetErrors();
-    // What the libraries still hold when a wait is over comes out before they tell.
-    const bool over = Expired() && ++drained_ > kLongestDrain;
-    const int result = over ? AVERROR_EXIT : av_read_frame(format_.get(), &packet);
+    const int result = ReadFrame(packet);
     if (interrupt_->Stopped() || (stop_ != nullptr && stop_())) {
         throw Stopped();
     }
     if (result >= 0) {
         ForgetWildStamps(packet, format_->streams[packet.stream_index]->time_base);
+        MarkDamage(packet);
         return true;
     }
     if (Expired()) {

@@ -77,6 +77,9 @@ class Input {
     void Open();
     void FindStreams();
     void CarryOn(std::int64_t position);
+    int ReadFrame(AVPacket& packet);
+    /// Moves the mark of a damaged packet to the picture that it is for.
+    void MarkDamage(AVPacket& packet);
     /// Throws what `result` of opening means.
     [[noreturn]] void FailOpening(int result);
 
@@ -95,6 +98,10 @@ class Input {
     std::set<int> asked_;
     bool recorded_ = false;
     bool rtp_ = false;
+    /// Packets come by a transport stream.
+    bool transport_ = false;
+    /// Streams whose next picture is damaged.
+    std::set<int> damagedNext_;
     /// Of a connection that has been taken over from an earlier context.
     std::unique_ptr<AVIOContext, CloseConnection> connection_;
     libav::Owner<AVFormatContext> format_;
