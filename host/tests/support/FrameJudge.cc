@@ -41,22 +41,34 @@ struct Run {
     std::size_t Missing() const { return first ? last - *first + 1 - found : 0; }
 };
 
-/// Where a picture stands in a file, and by how much that is later than in what was sent.
-struct Shift {
+/// Where a picture stands in a file, and by how much that is later than in what was sent, if it was sent.
+struct Shown {
     double time = 0;
-    double shift = 0;
+    std::optional<double> shift;
 };
 
 /// How far an audio frame that stands at `time` is out of step: with the picture that is shown with it or,
-/// where a file closes up over a gap, with the one on the other side of the edge.
-double distanceFrom(const std::vector<Shift>& pictures, double time, double shift) {
-    const auto before = [](double at, const Shift& picture) { return at < picture.time; };
+/// where a file closes up over a gap, with the one on the other side of the edge. A picture that is not known
+/// hides on which side of an edge it stands, so that its neighbours count.
+double distanceFrom(const std::vector<Shown>& pictures, double time, double shift) {
+    const auto before = [](double at, const Shown& picture) { return at < picture.time; };
     auto first = std::upper_bound(pictures.begin(), pictures.end(), time - kFrame / 2, before);
-    const auto last = std::upper_bound(first, pictures.end(), time + kFrame * 3 / 2, before);
+    auto last = std::upper_bound(first, pictures.end(), time + kFrame * 3 / 2, before);
     first -= first != pictures.begin() ? 1 : 0;
+    last += first == last ? 1 : 0;
+    while (first != pictures.begin() && !first->shift) {
+        --first;
+    }
+    if (first == last || !first->shift) {
+        // In front of the first picture that is known.
+        return 0;
+    }
+    while (last != pictures.end() && !std::prev(last)->shift) {
+        ++last;
+    }
     double nearest = std::numeric_limits<double>::infinity();
     for (auto picture = first; picture != last; ++picture) {
-        nearest = std::min(nearest, std::abs(shift - picture->shift));
+        nearest = picture->shift ? std::min(nearest, std::abs(shift - *picture->shift)) : nearest;
     }
     return nearest;
 }
@@ -108,17 +120,20 @@ FrameJudge::Verdict FrameJudge::Judge(const std::filesystem::path& recording) {
     Verdict verdict;
     verdict.pictures = media.video.size();
     verdict.sounds = media.audio.size();
-    std::vector<Shift> shifts;
+    std::vector<Shown> shown;
     std::size_t number = 0;
     Run run;
     for (std::size_t at = 0; at < media.video.size(); ++at) {
+        const double time = media.videoTimes[at];
+        shown.push_back({time, std::nullopt});
         if (pictures_.Find(hashOf(media.video[at]), number)) {
             run.Add(number);
-            shifts.push_back({media.videoTimes[at], media.videoTimes[at] - pictures_.times[number]});
+            shown.back().shift = time - pictures_.times[number];
         } else {
             ++verdict.unknownPictures;
         }
     }
+    const bool comparable = run.found > 0;
     verdict.missingPictures = run.Missing();
     run = {};
     for (std::size_t at = 0; at < media.audio.size(); ++at) {
@@ -127,10 +142,10 @@ FrameJudge::Verdict FrameJudge::Judge(const std::filesystem::path& recording) {
             continue;
         }
         run.Add(number);
-        if (!shifts.empty()) {
+        if (comparable) {
             const double time = media.audioTimes[at];
             verdict.outOfStep =
-                std::max(verdict.outOfStep, distanceFrom(shifts, time, time - sounds_.times[number]));
+                std::max(verdict.outOfStep, distanceFrom(shown, time, time - sounds_.times[number]));
         }
     }
     verdict.missingSounds = run.Missing();
