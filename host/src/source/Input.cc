@@ -10,6 +10,7 @@
 #include "common/Credentials.h"
 #include "common/ReceiverError.h"
 #include "source/Address.h"
+#include "timing/Saturating.h"
 
 namespace receiver {
 namespace {
@@ -18,6 +19,8 @@ namespace {
 constexpr double kAnalysis = 10;
 /// Packets that may come when a wait is over.
 constexpr int kLongestDrain = 100;
+/// Seconds that a file may end before the length that its header tells.
+constexpr double kLongestShortfall = 1;
 /// Bytes in front of a picture in which its program's tables stand: ten packets of a transport stream.
 constexpr std::int64_t kTables = 1880;
 
@@ -265,6 +268,32 @@ void Input::MarkDamage(AVPacket& packet) {
     packet.flags = damaged ? packet.flags | AV_PKT_FLAG_CORRUPT : packet.flags & ~AV_PKT_FLAG_CORRUPT;
 }
 
+void Input::Reach(const AVPacket& packet) {
+    if (packet.pts != AV_NOPTS_VALUE) {
+        const AVRational base = format_->streams[packet.stream_index]->time_base;
+        const std::int64_t end = SaturatingAdd(packet.pts, packet.duration);
+        reached_ = std::max(reached_, av_rescale_q(end, base, AV_TIME_BASE_Q));
+    }
+}
+
+void Input::CheckLength() const {
+    // What the libraries have not read in a header is an estimate.
+    const bool announced = recorded_ && format_->duration_estimation_method == AVFMT_DURATION_FROM_STREAM &&
+                           format_->duration > 0 && format_->start_time != AV_NOPTS_VALUE;
+    if (!announced || transport_) {
+        return;
+    }
+    const double missing = static_cast<double>(SaturatingSubtract(
+                               SaturatingAdd(format_->start_time, format_->duration), reached_)) /
+                           AV_TIME_BASE;
+    if (missing > kLongestShortfall) {
+        std::array<char, 32> text{};
+        std::snprintf(text.data(), text.size(), "%.1f s", missing);
+        throw SourceLost(std::string("the file ends ") + text.data() +
+                         " before the length that it announces: it is cut or damaged");
+    }
+}
+
 bool Input::Read(AVPacket& packet) {
     libav::ForgetErrors();
     const int result = ReadFrame(packet);
@@ -274,6 +303,7 @@ bool Input::Read(AVPacket& packet) {
     if (result >= 0) {
         ForgetWildStamps(packet, format_->streams[packet.stream_index]->time_base);
         MarkDamage(packet);
+        Reach(packet);
         return true;
     }
     if (Expired()) {
@@ -281,6 +311,7 @@ bool Input::Read(AVPacket& packet) {
     }
     // A connection that the other side closes may look like this.
     if (result == AVERROR_EOF || (result == AVERROR(EIO) && !recorded_)) {
+        CheckLength();
         return false;
     }
     throw SourceLost(Reason(result));

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <filesystem>
+#include <optional>
 #include <ostream>
 #include <string>
 #include <vector>
@@ -19,8 +20,10 @@ inline constexpr int kLost = 8;
 /// What has to come of a damaged stream.
 struct Expectation {
     int code = kLost;
+    /// Or this one, where it depends on what exactly is hit.
+    std::optional<int> otherCode = std::nullopt;
     /// What the receiver says, among other things.
-    std::string sentence;
+    const char* sentence = "";
     /// Pictures that the files hold as they were sent, at least.
     std::size_t pictures = 170;
     /// Pictures that they hold and that were never sent: nobody can tell that they are damaged.
