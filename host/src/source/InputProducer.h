@@ -66,6 +66,7 @@ class InputProducer final : public ProducerInterface {
     std::optional<ReceiverError> end_;
 
     std::atomic<std::uint64_t> lostFrames_{0};
+    std::atomic<std::uint64_t> silentFrames_{0};
     std::atomic<std::uint64_t> damaged_{0};
     std::atomic<std::uint64_t> reconnections_{0};
     std::atomic<std::uint64_t> changes_{0};

@@ -37,13 +37,18 @@ UnitAssembler::UnitAssembler(const FrameRate& rate) : rate_(rate), grid_(rate), 
 void UnitAssembler::Begin(bool audio) {
     audio_ = audio;
     resumed_ = true;
+    audioBegun_ = false;
     audioGrid_.Rejoin();
     // What still waits was sent for pictures that do not come any more.
     heldAudio_.clear();
     heldKlv_.clear();
 }
 
-void UnitAssembler::SetRate(const FrameRate& rate, std::int64_t begin) {
+std::int64_t UnitAssembler::Resume(const FrameRate& rate, std::int64_t time) {
+    const std::int64_t begin = grid_.PlaceOf(time);
+    if (rate == rate_) {
+        return begin;
+    }
     const std::int64_t end = grid_.End();
     if (begin > end) {
         audioGrid_.AddVideoGap(ToAudio(end), ToAudio(begin) - ToAudio(end));
@@ -52,6 +57,15 @@ void UnitAssembler::SetRate(const FrameRate& rate, std::int64_t begin) {
     grid_ = FrameGrid(rate, begin);
     // An address counts frames of the rate before.
     addressedFrame_.reset();
+    return begin;
+}
+
+void UnitAssembler::SetArrival(std::int64_t time, SourceUnit::Clock::time_point arrived) {
+    origin_ = arrived - std::chrono::microseconds(time * 100 / 9);
+}
+
+std::optional<SourceUnit::Clock::time_point> UnitAssembler::ArrivalOf(std::int64_t time) const {
+    return origin_ ? std::optional(*origin_ + std::chrono::microseconds(time * 100 / 9)) : std::nullopt;
 }
 
 void UnitAssembler::SetTimecode(const Timecode& timecode) {
@@ -81,7 +95,8 @@ void UnitAssembler::AddPicture(const CodedPicture& picture) {
     const std::int64_t expected = grid_.End();
     const FrameGrid::Place place = grid_.Next(picture.time);
     if (place.lost > 0) {
-        audioGrid_.AddVideoGap(ToAudio(expected), ToAudio(place.time) - ToAudio(expected));
+        audioGrid_.AddVideoGap(ToAudio(expected), ToAudio(place.time) - ToAudio(expected),
+                               place.time - lastPicture_ > kLongestStep);
         if (!resumed_) {
             lostFrames_ += static_cast<std::uint64_t>(place.lost);
             tally_.lost += static_cast<std::uint64_t>(place.lost);
@@ -92,7 +107,7 @@ void UnitAssembler::AddPicture(const CodedPicture& picture) {
     Release(place.time);
     MakeSilence(place.time);
     batch_.emplace_back(SourceUnit{Medium::kVideo, place.time, picture.data, picture.size, picture.keyFrame,
-                                   TimecodeOfFrame(place.index, picture)});
+                                   TimecodeOfFrame(place.index, picture), ArrivalOf(place.time)});
     Report();
 }
 
@@ -129,7 +144,9 @@ void UnitAssembler::PlaceAudio(const CodedAudio& audio) {
             case AudioGrid::Action::kFill:
                 EmitSilence(place.time);
                 // That audio begins behind the picture is no gap.
-                tally_.filled += audioBegun_ ? 1 : 0;
+                if (audioBegun_) {
+                    CountSilence();
+                }
                 continue;
             case AudioGrid::Action::kAccept:
                 audioBegun_ = true;
@@ -150,11 +167,18 @@ void UnitAssembler::EmitSilence(std::int64_t time) {
     batch_.emplace_back(SourceUnit{Medium::kAudio, time, silence_.data, silence_.size, false, std::nullopt});
 }
 
+void UnitAssembler::CountSilence() {
+    ++tally_.filled;
+    ++silentFrames_;
+}
+
 void UnitAssembler::MakeSilence(std::int64_t time) {
     const std::int64_t limit = ToAudio(audio_ ? time - kLongestLag : time);
     while (heldAudio_.empty() && audioGrid_.End() <= limit) {
         EmitSilence(audioGrid_.Append());
-        tally_.filled += audio_ ? 1 : 0;
+        if (audio_) {
+            CountSilence();
+        }
     }
 }
 

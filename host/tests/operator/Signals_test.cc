@@ -1,5 +1,6 @@
 #include "operator/Signals.h"
 
+#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <unistd.h>
 
@@ -8,6 +9,8 @@
 
 namespace receiver {
 namespace {
+
+using ::testing::ElementsAre;
 
 void Nothing() {}
 
@@ -22,16 +25,51 @@ bool WaitUntil(const std::function<bool()>& condition) {
     return true;
 }
 
-TEST(Signals, UserSignalsAreRecordCommandsAndAreTakenOnce) {
+/// Waits for one command and gives what there is then.
+std::vector<RecordCommand> TakeRecord(Signals& signals) {
+    std::vector<RecordCommand> taken;
+    WaitUntil([&] {
+        taken = signals.Take().record;
+        return !taken.empty();
+    });
+    return taken;
+}
+
+TEST(Signals, RecordCommandsAreTakenOnceAndInTheirOrder) {
     Signals signals(Nothing);
     kill(getpid(), SIGUSR1);
-    EXPECT_TRUE(WaitUntil([&] { return signals.Take().start; }));
+    EXPECT_THAT(TakeRecord(signals), ElementsAre(RecordCommand::kStart));
     kill(getpid(), SIGUSR2);
-    EXPECT_TRUE(WaitUntil([&] { return signals.Take().stop; }));
+    EXPECT_THAT(TakeRecord(signals), ElementsAre(RecordCommand::kStop));
+    kill(getpid(), SIGRTMIN);
+    EXPECT_THAT(TakeRecord(signals), ElementsAre(RecordCommand::kSplit));
     const SignalCommands after = signals.Take();
-    EXPECT_FALSE(after.start);
-    EXPECT_FALSE(after.stop);
+    EXPECT_TRUE(after.record.empty());
     EXPECT_FALSE(after.quit);
+}
+
+// The system hands out the start first, whichever was sent first.
+TEST(Signals, AStopAndAStartThatComeTogetherAreAStopWithAStartBehindIt) {
+    sigset_t both;
+    sigemptyset(&both);
+    sigaddset(&both, SIGUSR1);
+    sigaddset(&both, SIGUSR2);
+    sigset_t before;
+    pthread_sigmask(SIG_BLOCK, &both, &before);
+    kill(getpid(), SIGUSR2);
+    kill(getpid(), SIGUSR1);
+    {
+        Signals signals(Nothing);
+        std::vector<RecordCommand> taken;
+        EXPECT_TRUE(WaitUntil([&] {
+            for (const RecordCommand command : signals.Take().record) {
+                taken.push_back(command);
+            }
+            return taken.size() == 2;
+        }));
+        EXPECT_THAT(taken, ElementsAre(RecordCommand::kStop, RecordCommand::kStart));
+    }
+    pthread_sigmask(SIG_SETMASK, &before, nullptr);
 }
 
 TEST(Signals, InterruptAndTerminationAskForTheEndAndStayAsked) {
@@ -56,7 +94,7 @@ TEST(Signals, ABrokenPipeHasNoEffect) {
     Signals signals(Nothing);
     kill(getpid(), SIGPIPE);
     kill(getpid(), SIGUSR1);
-    EXPECT_TRUE(WaitUntil([&] { return signals.Take().start; }));
+    EXPECT_THAT(TakeRecord(signals), ElementsAre(RecordCommand::kStart));
     // It is still pending; the process of a test shall not die of it when the mask is given back.
     sigset_t pipe;
     sigemptyset(&pipe);
@@ -72,7 +110,7 @@ TEST(Signals, TheMaskIsGivenBack) {
     { const Signals signals(Nothing); }
     sigset_t after;
     pthread_sigmask(SIG_SETMASK, nullptr, &after);
-    for (const int number : {SIGINT, SIGTERM, SIGHUP, SIGUSR1, SIGUSR2, SIGPIPE}) {
+    for (const int number : {SIGINT, SIGTERM, SIGHUP, SIGUSR1, SIGUSR2, SIGRTMIN, SIGPIPE}) {
         EXPECT_EQ(sigismember(&before, number), sigismember(&after, number)) << number;
     }
 }

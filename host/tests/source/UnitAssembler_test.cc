@@ -81,6 +81,7 @@ TEST_F(UnitAssemblerTest, SilenceStandsInForAudioThatStaysAway) {
     Picture(75 * 3600);
     EXPECT_EQ(Made().substr(0, 3), "s0 ");
     EXPECT_EQ(notice_, "the source has gaps: 1 audio frame missing and filled with silence");
+    EXPECT_EQ(assembler_.SilentFrames(), 1u);
 }
 
 TEST_F(UnitAssemblerTest, AudioOfALostPictureIsLeftOut) {
@@ -111,10 +112,10 @@ TEST_F(UnitAssemblerTest, TheGapBeforeANewConnectionIsNoLoss) {
     // Audio is filled up to the end of the picture in front of the gap, and nowhere else.
     EXPECT_EQ(Made(), "v0 s0 s1024 v900000 n");
     EXPECT_EQ(assembler_.LostFrames(), 0u);
-    // The gap was 478080 samples long, to the nearest 467 frames.
+    // The gap was 478080 samples long, to the nearest 467 frames. Sound and picture keep their distance.
     Audio(480300);
     Picture(903600);
-    EXPECT_EQ(Made(), "a480256 v903600");
+    EXPECT_EQ(Made(), "a480300 v903600");
 }
 
 TEST_F(UnitAssemblerTest, AudioThatEndsBeforeTheLastPictureIsFilledUpToItsEnd) {
