@@ -132,7 +132,8 @@ TEST_F(SmbStreamTest, AServerThatIsFrozenCostsOneTimeOutAndNoMore) {
     const auto before = std::chrono::steady_clock::now();
     std::uint64_t bytes = 0;
     EXPECT_EQ(made->AvailableSpace(parsed(server.Path()).Url(), bytes), ETIMEDOUT);
-    EXPECT_EQ(made->TestExistence(parsed(server.Path()).Url()), ETIMEDOUT);
+    SmbStatus status;
+    EXPECT_EQ(made->Look(parsed(server.Path()).Url(), status), ETIMEDOUT);
     EXPECT_EQ(std::fclose(stream), EOF);
     made.reset();
     const auto took = std::chrono::steady_clock::now() - before;
@@ -145,6 +146,23 @@ TEST_F(SmbStreamTest, AFileThatCannotBeOpenedSaysWhy) {
     const std::shared_ptr<SmbSession> made = session();
     errno = 0;
     EXPECT_EQ(SmbStream::OpenFile(made, parsed(server.Path() + "\\none\\file").Url()), nullptr);
+    EXPECT_EQ(errno, ENOENT);
+}
+
+TEST_F(SmbStreamTest, ReadsAFileThatIsThereWithoutChangingIt) {
+    std::ofstream(server.Folder() / "file") << "0123456789";
+    const auto made = session();
+    std::FILE* const stream = SmbStream::OpenForReading(made, parsed(server.Path() + "\\file").Url());
+    ASSERT_NE(stream, nullptr);
+    EXPECT_EQ(std::fseek(stream, -3, SEEK_END), 0);
+    EXPECT_EQ(std::ftell(stream), 7);
+    char text[8] = {};
+    EXPECT_EQ(std::fread(text, 1, sizeof text, stream), 3U);
+    EXPECT_EQ(std::string(text), "789");
+    EXPECT_EQ(std::fputc('x', stream), EOF);
+    EXPECT_EQ(std::fclose(stream), 0);
+    EXPECT_EQ(atServer(), "0123456789");
+    EXPECT_EQ(SmbStream::OpenForReading(made, parsed(server.Path() + "\\none").Url()), nullptr);
     EXPECT_EQ(errno, ENOENT);
 }
 

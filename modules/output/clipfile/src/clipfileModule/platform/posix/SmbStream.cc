@@ -45,9 +45,24 @@ std::FILE* SmbStream::OpenFile(const std::shared_ptr<SmbSession>& session, const
         errno = error;
         return nullptr;
     }
-    auto stream = std::make_unique<SmbStream>(session, file);
+    return wrap(session, file, 0, "w+b");
+}
+
+std::FILE* SmbStream::OpenForReading(const std::shared_ptr<SmbSession>& session, const std::string& url) {
+    SMBCFILE* file = nullptr;
+    std::uint64_t size = 0;
+    if (const int error = session->OpenForReading(url, file, size)) {
+        errno = error;
+        return nullptr;
+    }
+    return wrap(session, file, static_cast<std::int64_t>(size), "rb");
+}
+
+std::FILE* SmbStream::wrap(const std::shared_ptr<SmbSession>& session, SMBCFILE* file, std::int64_t length,
+                           const char* mode) {
+    auto stream = std::make_unique<SmbStream>(session, file, length);
     std::FILE* const opened =
-        fopencookie(stream.get(), "w+b", {readCookie, writeCookie, seekCookie, closeCookie});
+        fopencookie(stream.get(), mode, {readCookie, writeCookie, seekCookie, closeCookie});
     if (opened == nullptr) {
         const int error = errno;
         stream->Close();
@@ -59,8 +74,8 @@ std::FILE* SmbStream::OpenFile(const std::shared_ptr<SmbSession>& session, const
     return opened;
 }
 
-SmbStream::SmbStream(const std::shared_ptr<SmbSession>& session, SMBCFILE* file)
-    : session_(session), file_(file) {
+SmbStream::SmbStream(const std::shared_ptr<SmbSession>& session, SMBCFILE* file, std::int64_t length)
+    : session_(session), file_(file), length_(length) {
     pending_->reserve(kRequestSize);
     session_->AddStream(*this);
 }
