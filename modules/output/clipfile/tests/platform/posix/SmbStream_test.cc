@@ -149,22 +149,5 @@ TEST_F(SmbStreamTest, AFileThatCannotBeOpenedSaysWhy) {
     EXPECT_EQ(errno, ENOENT);
 }
 
-TEST_F(SmbStreamTest, ReadsAFileThatIsThereWithoutChangingIt) {
-    std::ofstream(server.Folder() / "file") << "0123456789";
-    const auto made = session();
-    std::FILE* const stream = SmbStream::OpenForReading(made, parsed(server.Path() + "\\file").Url());
-    ASSERT_NE(stream, nullptr);
-    EXPECT_EQ(std::fseek(stream, -3, SEEK_END), 0);
-    EXPECT_EQ(std::ftell(stream), 7);
-    char text[8] = {};
-    EXPECT_EQ(std::fread(text, 1, sizeof text, stream), 3U);
-    EXPECT_EQ(std::string(text), "789");
-    EXPECT_EQ(std::fputc('x', stream), EOF);
-    EXPECT_EQ(std::fclose(stream), 0);
-    EXPECT_EQ(atServer(), "0123456789");
-    EXPECT_EQ(SmbStream::OpenForReading(made, parsed(server.Path() + "\\none").Url()), nullptr);
-    EXPECT_EQ(errno, ENOENT);
-}
-
 }  // namespace
 }  // namespace clipfileModule

@@ -45,24 +45,9 @@ std::FILE* SmbStream::OpenFile(const std::shared_ptr<SmbSession>& session, const
         errno = error;
         return nullptr;
     }
-    return wrap(session, file, 0, "w+b");
-}
-
-std::FILE* SmbStream::OpenForReading(const std::shared_ptr<SmbSession>& session, const std::string& url) {
-    SMBCFILE* file = nullptr;
-    std::uint64_t size = 0;
-    if (const int error = session->OpenForReading(url, file, size)) {
-        errno = error;
-        return nullptr;
-    }
-    return wrap(session, file, static_cast<std::int64_t>(size), "rb");
-}
-
-std::FILE* SmbStream::wrap(const std::shared_ptr<SmbSession>& session, SMBCFILE* file, std::int64_t length,
-                           const char* mode) {
-    auto stream = std::make_unique<SmbStream>(session, file, length);
+    auto stream = std::make_unique<SmbStream>(session, file);
     std::FILE* const opened =
-        fopencookie(stream.get(), mode, {readCookie, writeCookie, seekCookie, closeCookie});
+        fopencookie(stream.get(), "w+b", {readCookie, writeCookie, seekCookie, closeCookie});
     if (opened == nullptr) {
         const int error = errno;
         stream->Close();
@@ -74,8 +59,8 @@ std::FILE* SmbStream::wrap(const std::shared_ptr<SmbSession>& session, SMBCFILE*
     return opened;
 }
 
-SmbStream::SmbStream(const std::shared_ptr<SmbSession>& session, SMBCFILE* file, std::int64_t length)
-    : session_(session), file_(file), length_(length) {
+SmbStream::SmbStream(const std::shared_ptr<SmbSession>& session, SMBCFILE* file)
+    : session_(session), file_(file) {
     pending_->reserve(kRequestSize);
     session_->AddStream(*this);
 }

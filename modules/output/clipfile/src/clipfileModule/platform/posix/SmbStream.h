@@ -25,11 +25,7 @@ class SmbStream {
     /// Creates or truncates `url`. Null, with `errno` set, when that fails. The stream keeps the session.
     static std::FILE* OpenFile(const std::shared_ptr<SmbSession>& session, const std::string& url);
 
-    /// A file that is there, for reading alone.
-    static std::FILE* OpenForReading(const std::shared_ptr<SmbSession>& session, const std::string& url);
-
-    /// `length` is that of the file, in bytes.
-    SmbStream(const std::shared_ptr<SmbSession>& session, SMBCFILE* file, std::int64_t length);
+    SmbStream(const std::shared_ptr<SmbSession>& session, SMBCFILE* file);
     ~SmbStream();
     SmbStream(const SmbStream&) = delete;
     SmbStream& operator=(const SmbStream&) = delete;
@@ -46,14 +42,11 @@ class SmbStream {
     bool Close();
 
  private:
-    static std::FILE* wrap(const std::shared_ptr<SmbSession>& session, SMBCFILE* file, std::int64_t length,
-                           const char* mode);
-
     const std::shared_ptr<SmbSession> session_;
     SMBCFILE* const file_;
     std::int64_t position_ = 0;
-    /// Nobody else writes to a file that is written, so that the server need not be asked.
-    std::int64_t length_;
+    /// Nobody else writes to the file, so that the server need not be asked.
+    std::int64_t length_ = 0;
     /// Written, not sent, from `pendingAt_` on.
     std::shared_ptr<std::vector<char>> pending_ = std::make_shared<std::vector<char>>();
     std::int64_t pendingAt_ = 0;
