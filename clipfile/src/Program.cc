@@ -2,6 +2,7 @@
 
 #include <CLI/CLI.hpp>
 #include <exception>
+#include <filesystem>
 #include <functional>
 #include <nlohmann/json.hpp>
 
@@ -9,6 +10,8 @@
 #include "inspect/Inspection.h"
 #include "inspect/JsonReport.h"
 #include "inspect/TextReport.h"
+#include "recover/Recovery.h"
+#include "recover/UnfinishedFiles.h"
 
 namespace clipfile {
 
@@ -22,6 +25,7 @@ struct Options {
     bool json = false;
     bool boxes = false;
     std::size_t rows = 4;
+    RecoveryOptions recovery;
 };
 
 /// Writes one JSON value on a line. Names of files need not be UTF-8.
@@ -69,6 +73,46 @@ ExitCode InspectFile(const std::string& path, const Options& options, std::ostre
     return ExitCode::kSuccess;
 }
 
+std::string Plural(std::uint64_t count, const std::string& word) {
+    return std::to_string(count) + " " + word + (count == 1 ? "" : "s");
+}
+
+ExitCode RecoverOne(const std::string& path, const Options& options, std::ostream& out) {
+    const RecoveryResult result = RecoverFile(path, options.recovery);
+    if (options.json) {
+        PrintJson(out, {{"file", path},
+                        {"recovered", result.isRecovered},
+                        {"written", result.written.string()},
+                        {"pictures", result.pictures},
+                        {"audio_frames", result.audioFrames},
+                        {"metadata_units", result.metadataUnits},
+                        {"bytes_left", result.bytesLeft},
+                        {"parameter_sets", result.parameterSets}});
+    } else if (!result.isRecovered) {
+        out << path << " is closed: nothing to recover.\n";
+    } else {
+        out << path << ": " << Plural(result.pictures, "picture") << ", "
+            << Plural(result.audioFrames, "audio frame") << " and " << Plural(result.metadataUnits, "unit")
+            << " of metadata are in " << result.written.string();
+        if (!result.parameterSets.empty()) {
+            out << ", with parameter sets from " << result.parameterSets;
+        }
+        out << "; " << Plural(result.bytesLeft, "byte") << " behind them belong to nothing whole.\n";
+    }
+    return ExitCode::kSuccess;
+}
+
+/// Files as they are, and of folders the recordings in them that are not closed.
+ExitCode Recover(const std::string& path, const Options& options, std::ostream& out, std::ostream& errors) {
+    if (!std::filesystem::is_directory(path)) {
+        return RecoverOne(path, options, out);
+    }
+    Options found = options;
+    found.files = UnfinishedIn(path);
+    return ForEachFile(found, out, errors,
+                       [&](const std::string& file) { return RecoverOne(file, options, out); });
+}
+
 void AddInspect(CLI::App& app, Options& options) {
     CLI::App* const command =
         app.add_subcommand("inspect", "Tell what is in recordings, closed or unfinished.");
@@ -81,6 +125,24 @@ void AddInspect(CLI::App& app, Options& options) {
     command->add_flag("--json", options.json, "One JSON object a file and line");
 }
 
+CLI::App* AddRecover(CLI::App& app, Options& options) {
+    CLI::App* const command = app.add_subcommand(
+        "recover", "Make whole files of recordings that were cut off. The originals stay as they are.");
+    command->add_option("FILE|DIR", options.files, "Recordings, or folders to search for unfinished ones")
+        ->required();
+    command->add_option("--like", options.recovery.like,
+                        "A closed recording of the same stream, for the parameter sets of a normal file");
+    CLI::Option* const output =
+        command->add_option("--output", options.recovery.output, "Folder for the recovered files")
+            ->check(CLI::ExistingDirectory);
+    command
+        ->add_flag("--in-place", options.recovery.inPlace,
+                   "Put each recovered file in the place of its original")
+        ->excludes(output);
+    command->add_flag("--json", options.json, "One JSON object a file and line");
+    return command;
+}
+
 }  // namespace
 
 ExitCode RunProgram(const std::vector<std::string>& arguments, std::ostream& out, std::ostream& errors) {
@@ -88,14 +150,16 @@ ExitCode RunProgram(const std::vector<std::string>& arguments, std::ostream& out
     CLI::App app("Looks into the recordings of the clipfile module.", "clipfile");
     app.require_subcommand(1);
     AddInspect(app, options);
+    const CLI::App* const recover = AddRecover(app, options);
     std::vector<std::string> reversed(arguments.rbegin(), arguments.rend() - 1);
     try {
         app.parse(reversed);
     } catch (const CLI::ParseError& error) {
         return app.exit(error, out, errors) == 0 ? ExitCode::kSuccess : ExitCode::kUsage;
     }
-    return ForEachFile(options, out, errors,
-                       [&](const std::string& path) { return InspectFile(path, options, out); });
+    return ForEachFile(options, out, errors, [&](const std::string& path) {
+        return recover->parsed() ? Recover(path, options, out, errors) : InspectFile(path, options, out);
+    });
 }
 
 }  // namespace clipfile

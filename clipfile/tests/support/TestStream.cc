@@ -90,7 +90,7 @@ Stream MakePlainStream(std::size_t chunks) {
             const bool sync = (number * kPicturesInChunk + i) % 16 == 0;
             const auto size = static_cast<unsigned char>(20 + 3 * i);
             Data picture = {0, 0, 0, size, static_cast<unsigned char>(sync ? 0x65 : 0x41), 0x88};
-            picture.resize(4U + size, static_cast<unsigned char>(number + i));
+            picture.resize(4U + size, static_cast<unsigned char>(0x80 + number + i));
             chunk->video.push_back(Sample(picture, sync));
         }
         stream.chunks.push_back(chunk);
