@@ -200,7 +200,10 @@ std::optional<DataChunks::Pictures> DataChunks::FindPictures(std::uint64_t offse
     }
     endsEarly = endsEarly || offset >= end_;
     const bool endsWell = endsEarly || isCut || IsKeyAt(offset) || end_ - offset == kTimecodeSize;
-    const bool lacksSlices = endsEarly && slices < slicesInPicture_;
+    // A file that ends between two NAL units ends with a chunk, which is one write, or by chance inside of a
+    // picture.
+    const bool endsChunk = pictures.whole.size() + 1 == units * fieldsInPicture_;
+    const bool lacksSlices = endsEarly && !endsChunk && slices < slicesInPicture_;
     if (!isCut && !lacksSlices) {
         endPicture(offset);
     }
