@@ -3,24 +3,12 @@
 #include <gtest/gtest.h>
 #include <unistd.h>
 
-#include <chrono>
-#include <functional>
+#include "support/WaitUntil.h"
 
 namespace receiver {
 namespace {
 
 void Nothing() {}
-
-bool WaitUntil(const std::function<bool()>& condition) {
-    const auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(30);
-    while (!condition()) {
-        if (std::chrono::steady_clock::now() > deadline) {
-            return false;
-        }
-        std::this_thread::yield();
-    }
-    return true;
-}
 
 TEST(Signals, UserSignalsAreRecordCommandsAndAreTakenOnce) {
     Signals signals(Nothing);
@@ -86,7 +74,9 @@ void LeaveATrace() {
 void EndAtOnce(int first, int second) {
     Signals signals(LeaveATrace);
     kill(getpid(), first);
-    WaitUntil([&] { return signals.QuitRequested(); });
+    if (!WaitUntil([&] { return signals.QuitRequested(); })) {
+        _exit(1);
+    }
     kill(getpid(), second);
     pause();
 }
