@@ -165,7 +165,8 @@ TEST_F(JudgedFragments, AudioAndMetadataThatBeginAfterTheFirstFragmentAreReadOpe
     EXPECT_EQ(ofFfprobe(path), open);
     EXPECT_EQ(ofGStreamer(path), open);
     recorded.Close();
-    const Samples closed = {kPictures, recorded.AudioBefore(kClosedChunks) - silent, 8 * (kClosedChunks - 48)};
+    const Samples closed = {kPictures, recorded.AudioBefore(kClosedChunks) - silent,
+                            8 * (kClosedChunks - 48)};
     EXPECT_EQ(ofFfprobe(recorded.Path()), closed);
     EXPECT_EQ(ofGStreamer(recorded.Path()), closed);
 }
