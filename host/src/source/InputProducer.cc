@@ -6,6 +6,7 @@
 
 #include "common/ReceiverError.h"
 #include "source/Address.h"
+#include "source/AwaitSource.h"
 
 namespace receiver {
 namespace {

@@ -12,8 +12,6 @@
 
 namespace receiver {
 
-/// How often it is told that a source is still waited for.
-inline constexpr std::chrono::seconds kTellEvery{60};
 /// Seconds that an attempt listens for a sender.
 inline constexpr double kListeningPatience = 60;
 

@@ -64,7 +64,11 @@ class UnitAssembler {
     void MakeSilence(std::int64_t time);
     std::optional<SourceUnit::Clock::time_point> ArrivalOf(std::int64_t time) const;
     std::optional<Timecode> TimecodeOfFrame(std::int64_t index, const CodedPicture& picture);
+    /// Counts pictures that should go with the sound behind `end`.
+    void CountMissingEnd(std::int64_t end);
+    /// Tells the gaps that were counted, from time to time.
     void Report();
+    void TellGaps();
 
     FrameRate rate_;
     FrameGrid grid_;
