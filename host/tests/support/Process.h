@@ -43,7 +43,6 @@ class Process {
     /// Standard output, then standard error.
     std::string AllText() const;
 
-    pid_t Id() const { return pid_; }
     void Signal(int number) const;
     /// The system's number of the process.
     pid_t Id() const { return pid_; }
