@@ -64,6 +64,7 @@ INSTANTIATE_TEST_SUITE_P(
         // A transport stream has no checksum of its media: what was flipped in a picture is recorded.
         Case{"Flipped", Flip(), {.code = kEverything, .otherCode = kLost, .damaged = 30}},
         Case{"FlippedVideo", Flip(kVideo), {.code = kEverything, .otherCode = kLost, .damaged = 30}},
+        Case{"FlippedAudio", Flip(kAudio), {.code = kEverything, .otherCode = kLost, .pictures = 200}},
         Case{"FlippedTables", Flip(kTables), kUnharmed}, Case{"FlippedHeaders", FlipHeaders(), kPicturesLost},
         Case{"FlippedHeadersOtherwise", FlipHeaders(), {.sentence = kGaps, .damaged = 1}, 2},
         // That nothing is missing behind a wrong counter, nobody can know.
@@ -88,6 +89,8 @@ INSTANTIATE_TEST_SUITE_P(
     Missing, DamagedStreamTest,
     ::testing::Values(
         Case{"AudioForAWhile", Remove(kAudio, 0.4, 0.6), kSoundsLost},
+        Case{"AudioForLong", Remove(kAudio, 0.2, 0.9), kSoundsLost},
+        Case{"AudioFromTheMiddleOn", Remove(kAudio, 0.5, 1), kSoundsLost},
         Case{"AudioAlways",
              Remove(kAudio),
              {.code = kEverything,
@@ -186,7 +189,9 @@ INSTANTIATE_TEST_SUITE_P(
         Case{"OfTwoClocks",
              JumpBy(600 * kSecond, 0, kAudio),
              {.code = kEverything, .sentence = kJumped, .pictures = 200, .outOfStep = 0.05}},
-        Case{"StandStillInTheVideo", StandStillAt(0.5, kVideo), kUnharmed}),
+        Case{"StandStill", StandStillAt(0.5), kUnharmed},
+        Case{"StandStillInTheVideo", StandStillAt(0.5, kVideo), kUnharmed},
+        Case{"StandStillInTheAudio", StandStillAt(0.5, kAudio), kUnharmed}),
     ::testing::PrintToStringParamName());
 
 }  // namespace
