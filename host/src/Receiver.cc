@@ -1,21 +1,19 @@
 #include "Receiver.h"
 
 #include <stdlib.h>
+#include <sys/stat.h>
 
 #include <chrono>
+#include <ctime>
 #include <exception>
-#include <filesystem>
 #include <memory>
 #include <optional>
 #include <utility>
 #include <vector>
 
-#include "OutputFolder.h"
-#include "QxRegistry.h"
 #include "Recorder.h"
 #include "Shortfalls.h"
 #include "StreamRates.h"
-#include "common/NativePath.h"
 #include "module/Host.h"
 #include "module/ModuleLibrary.h"
 #include "module/ModuleLog.h"
@@ -23,6 +21,10 @@
 #include "module/SettingsFile.h"
 #include "operator/CommandQueue.h"
 #include "operator/Keyboard.h"
+#include "output/FolderWatch.h"
+#include "output/ModuleLogFile.h"
+#include "output/OutputFolder.h"
+#include "output/OutputPlace.h"
 
 namespace receiver {
 namespace {
@@ -30,12 +32,8 @@ namespace {
 using Clock = std::chrono::steady_clock;
 
 constexpr std::chrono::milliseconds kDisplayInterval{250};
-constexpr std::chrono::seconds kFreeSpaceInterval{1};
 /// The run ends with the frame behind the last one; when the stream has dried up, nobody waits for it.
 constexpr std::chrono::seconds kFinishPatience{2};
-constexpr const char* kDefaultOutput = "recordings";
-/// What the module takes for an output path that is not set.
-constexpr const char* kFromStore = "none";
 
 /// A fault of the stream; the recording begins anew.
 constexpr int kStatusFault = 6;
@@ -49,33 +47,10 @@ std::string WithFullStop(std::string sentence) {
     return sentence.ends_with('.') ? sentence : sentence + ".";
 }
 
-/// Where files go.
-struct Output {
-    /// What the module is told: the folder, or that it is to take the one of the settings store.
-    std::string parameter;
-    std::string folder;
-};
-
-/// The module's rule, with an output of our own where it would refuse: start parameter, else settings store.
-Output OutputOf(const Options& options) {
-    std::string path;
-    const bool stored = !options.output &&
-                        QxRegistry::GetInstance()->getValue("Qx/Other/MP4FileOut", "MP4OutputPath", path) &&
-                        !path.empty();
-    if (!stored) {
-        path = options.output.value_or(kDefaultOutput);
-    }
-    std::string folder = NativePath(path);
-    while (folder.size() > 1 && folder.ends_with('/')) {
-        folder.pop_back();
-    }
-    if (stored) {
-        return {kFromStore, folder};
-    }
-    if (folder == kFromStore) {
-        folder = "./" + folder;
-    }
-    return {folder, folder};
+/// From now on the group may do with files and folders of this process what their owner may.
+void GiveToGroup() {
+    const mode_t mask = umask(0077);
+    umask(mask & ~static_cast<mode_t>(0070));
 }
 
 void CheckUser(const Options& options, const std::string& folder) {
@@ -88,22 +63,10 @@ void CheckUser(const Options& options, const std::string& folder) {
     }
 }
 
-void SetUpLog(const Options& options, const std::string& output) {
-    const char* const set = getenv("QX_LOG");
-    if (options.log) {
-        setenv("QX_LOG", *options.log == "-" ? "" : options.log->c_str(), 1);
-    } else if (set == nullptr || *set == '\0') {
-        setenv("QX_LOG", (output + "/receiver.log").c_str(), 1);
-    }
-    if (options.logPriority) {
-        setenv("QX_LOG_PRIORITY", std::to_string(*options.logPriority).c_str(), 1);
-    }
-}
-
-StartParameters ParametersOf(const Options& options, const std::string& output,
+StartParameters ParametersOf(const Options& options, const OutputPlace& place,
                              const SourceDescription& description) {
     StartParameters parameters;
-    parameters.texts = {{"-outputPath", output},
+    parameters.texts = {{"-outputPath", place.parameter},
                         {"-fileType", options.fileType},
                         {"-naluType", options.naluType},
                         {"-outputMode", options.mode == OutputMode::kOn ? "on" : "sync"},
@@ -177,7 +140,9 @@ class Running final : public SourceListenerInterface {
     ExitCode Record(const SourceOpener& open);
 
  private:
+    void PrepareOutput(const OutputPlace& place);
     void Loop(SourceInterface& source, Recorder& recorder);
+    void CheckFolder();
     void TakeCommands(Recorder& recorder);
     void TakeKeys();
     void TakeKey(char key);
@@ -205,7 +170,8 @@ class Running final : public SourceListenerInterface {
     Signals& signals_;
     DisplayInterface& display_;
     Keyboard keyboard_;
-    std::string output_;
+    std::unique_ptr<OutputFolder> folder_;
+    std::optional<FolderWatch> watch_;
     ModuleLog* log_ = nullptr;
     Host* host_ = nullptr;
     RecordPlan plan_{options_.record};
@@ -224,24 +190,31 @@ class Running final : public SourceListenerInterface {
     bool changed_ = false;
     std::optional<Clock::time_point> finishSince_;
     Clock::time_point shown_{};
-    Clock::time_point spaceRead_{};
-    std::optional<std::uint64_t> freeBytes_;
 };
 
 Running* Running::current = nullptr;
+
+void Running::PrepareOutput(const OutputPlace& place) {
+    if (options_.groupWrite) {
+        GiveToGroup();
+    }
+    folder_ = OpenOutputFolder(place);
+    if (folder_->Prepare()) {
+        display_.Notice("made the output folder " + place.folder);
+    }
+    ExpectDatedFolders(*folder_, place.prefix, std::time(nullptr));
+    SetUpLog(options_, place);
+    watch_.emplace(OpenOutputFolder(place), place.prefix);
+}
 
 ExitCode Running::Record(const SourceOpener& open) {
     if (options_.mode == OutputMode::kOn) {
         commands_.Close(kOneRecording);
     }
     const SettingsFile settings(options_.settings, options_.maxMinutes);
-    const Output output = OutputOf(options_);
-    CheckUser(options_, output.folder);
-    output_ = output.folder;
-    if (PrepareOutputFolder(output_)) {
-        display_.Notice("made the output folder " + output_);
-    }
-    SetUpLog(options_, output_);
+    const OutputPlace place = PlaceOf(options_);
+    CheckUser(options_, place.folder);
+    PrepareOutput(place);
     const ModuleLibrary library(options_.module.value_or(ModuleLibrary::DefaultFile()));
     ModuleLog log;
     log_ = &log;
@@ -262,8 +235,7 @@ ExitCode Running::Record(const SourceOpener& open) {
     do {
         changed_ = false;
         recorderSettings.frameRate = source->Description().frameRate;
-        hosts.push_back(
-            std::make_unique<Host>(ParametersOf(options_, output.parameter, source->Description())));
+        hosts.push_back(std::make_unique<Host>(ParametersOf(options_, place, source->Description())));
         host_ = hosts.back().get();
         ModuleSession session(library.Module(), *host_);
         if (options_.mode == OutputMode::kSync) {
@@ -323,6 +295,7 @@ void Running::Loop(SourceInterface& source, Recorder& recorder) {
             return;
         }
         TellLateStops(recorder);
+        CheckFolder();
         TakeCommands(recorder);
         TellChanges(recorder);
         TellMissed();
@@ -335,6 +308,16 @@ void Running::Loop(SourceInterface& source, Recorder& recorder) {
         if (Clock::now() - shown_ >= kDisplayInterval) {
             Show(source, recorder);
         }
+    }
+}
+
+void Running::CheckFolder() {
+    if (const std::optional<std::string> warning = watch_->TakeWarning()) {
+        display_.Notice("tomorrow nothing can be recorded: " + *warning);
+    }
+    const std::string obstacle = watch_->Obstacle();
+    if (!obstacle.empty()) {
+        throw ReceiverError(ExitCode::kOutput, obstacle);
     }
 }
 
@@ -482,10 +465,6 @@ void Running::FileClosed(const std::string& path) {
 
 void Running::Show(const SourceInterface& source, const Recorder& recorder) {
     shown_ = Clock::now();
-    if (shown_ - spaceRead_ >= kFreeSpaceInterval) {
-        spaceRead_ = shown_;
-        freeBytes_ = FreeBytes(output_);
-    }
     TakeModuleEvents();
     TakeStatuses(false);
     Snapshot snapshot;
@@ -500,7 +479,7 @@ void Running::Show(const SourceInterface& source, const Recorder& recorder) {
     snapshot.klvPackets = rates_.KlvPackets();
     snapshot.status = host_->Status();
     snapshot.file = openFile_;
-    snapshot.freeBytes = freeBytes_;
+    snapshot.freeBytes = watch_->FreeBytes();
     snapshot.lost = Lost(source);
     display_.Show(snapshot);
 }
@@ -522,8 +501,8 @@ Summary Running::Summarise(const SourceInterface& source, const Recorder::Progre
     run.silentFrames = counts.silentFrames;
     for (const WrittenFile& file : files_) {
         // One that could not be made was announced and has told why.
-        if (file.closed || std::filesystem::exists(file.path)) {
-            run.files.push_back(ReadBack(file.path));
+        if (file.closed || folder_->Exists(file.path)) {
+            run.files.push_back(folder_->ReadBackFile(file.path));
         }
     }
     const std::vector<std::string> shortfalls =

@@ -3,8 +3,6 @@
 #include <CLI/CLI.hpp>
 #include <charconv>
 #include <cstring>
-#include <fstream>
-#include <iomanip>
 #include <limits>
 #include <sstream>
 
@@ -12,6 +10,7 @@
 #include "common/ReceiverError.h"
 #include "options/AddressCheck.h"
 #include "options/OptionText.h"
+#include "options/Password.h"
 
 namespace receiver {
 namespace {
@@ -54,18 +53,6 @@ void ReadSize(const std::string& text, SourceOptions& source) {
     source.height = ParseDimension(x == std::string::npos ? std::string_view() : view.substr(x + 1), text);
 }
 
-std::string ReadPassword(const std::string& file) {
-    std::ifstream stream(file);
-    std::string line;
-    if (!std::getline(stream, line)) {
-        throw Wrong("--password-file " + file + " cannot be read, or is empty.");
-    }
-    if (line.ends_with('\r')) {
-        line.pop_back();
-    }
-    return line;
-}
-
 void Interpret(const Texts& texts, Options& options) {
     if (!texts.frameRate.empty()) {
         options.source.frameRate = ParseFrameRate(texts.frameRate);
@@ -96,7 +83,9 @@ void Interpret(const Texts& texts, Options& options) {
         }
     }
     if (!texts.passwordFile.empty()) {
-        options.password = ReadPassword(texts.passwordFile);
+        options.password = ReadPasswordFile("--password-file", texts.passwordFile);
+    } else if (!options.password) {
+        options.password = PasswordOfService();
     }
     options.mode = texts.mode == "on" ? OutputMode::kOn : OutputMode::kSync;
     options.dropFrame = !texts.noDropFrame;
@@ -210,7 +199,8 @@ void AddFileOptions(CLI::App& app, Options& options, Texts& texts) {
     const auto group = "Files";
     app.add_option(
            "-o,--output", options.output,
-           "Folder under which files appear; else MP4OutputPath of the settings store, else recordings")
+           "Folder under which files appear, //server/share/folder for one on a share; else MP4OutputPath of "
+           "the settings store, else recordings")
         ->type_name("DIR")
         ->group(group);
     app.add_option("--prefix", options.prefix,
@@ -228,12 +218,20 @@ void AddFileOptions(CLI::App& app, Options& options, Texts& texts) {
            "Minutes of video after which a new file begins; 0 is as often as possible, 120 when not given")
         ->type_name("N")
         ->group(group);
-    app.add_option("--user", options.user, "User name for a network share")->type_name("NAME")->group(group);
+    app.add_flag("--group-write", options.groupWrite,
+                 "Give files and folders to the group too: others may record to the same folder")
+        ->group(group);
+    app.add_option("--user", options.user, "User name for a network share: NAME, DOMAIN\\NAME or NAME@DOMAIN")
+        ->type_name("NAME")
+        ->group(group);
     CLI::Option* const password =
         app.add_option("--password", options.password, "Its password; others may see it, so rather:")
             ->type_name("TEXT")
             ->group(group);
-    app.add_option("--password-file", texts.passwordFile, "File whose first line is the password")
+    app.add_option(
+           "--password-file", texts.passwordFile,
+           "File whose first line is the password; else the credential receiver.password of the service, "
+           "else RECEIVER_PASSWORD of the environment")
         ->type_name("FILE")
         ->excludes(password)
         ->group(group);
@@ -329,6 +327,7 @@ std::optional<Options> ParseOptions(int argc, const char* const* argv, std::stri
 }
 
 void HideCredentials(int argc, char** argv) {
+    HidePasswordVariable();
     constexpr std::string_view kName = "--password";
     for (int i = 1; i < argc; ++i) {
         const std::string_view argument = argv[i];

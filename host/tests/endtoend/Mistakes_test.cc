@@ -108,6 +108,7 @@ INSTANTIATE_TEST_SUITE_P(
                 kUsage,
                 "--no-drop-frame"},
         Mistake{"PrefixWithAFolder", {"--prefix", "a/b"}, kUsage, "--prefix"},
+        Mistake{"ShareWithoutAName", {"--output", "//server"}, kUsage, "//server/share/folder"},
         Mistake{"PriorityBeyondTheScale", {"--log-priority", "14"}, kUsage, "--log-priority"},
         Mistake{"TimeoutOfZero", {"--timeout", "0"}, kUsage, "--timeout"},
         Mistake{"TwoPasswords", {"--password", "a", "--password-file", "b"}, kUsage, "--password"},
@@ -213,29 +214,6 @@ TEST_F(MistakesTest, AWrongPassphrase) {
     EXPECT_THAT(LastLine(outcome.errors), AllOf(StartsWith("receiver: "), HasSubstr("passphrase")));
     // It is a secret all the same.
     EXPECT_EQ(outcome.errors.find("the-wrong-one"), std::string::npos) << outcome.errors;
-}
-
-// The log of the module alone tells whose logon was refused, and with what password.
-TEST_F(MistakesTest, ACredentialOfAShareThatIsRefused) {
-    // Two slashes in front are a share to the module.
-    const std::string share = "/" + OutputFolder().string();
-    const auto passwordFile = folder.Path() / "password";
-    std::ofstream(passwordFile) << "open, sesame";
-    const std::vector<std::string> options = {
-        "--output", share,    "--user", "Ali, Baba\nand 40", "--password-file", passwordFile.string(),
-        "--size",   "320x180"};
-    for (const char* const form : {"--file-type=normal", "--json"}) {
-        auto all = options;
-        all.emplace_back(form);
-        const Outcome outcome = RunReceiver(all);
-        EXPECT_EQ(outcome.code, 7) << outcome.errors;
-        const std::string said = outcome.output + outcome.errors;
-        EXPECT_THAT(said, HasSubstr("LogonUser call failed. 0, "));
-        for (const char* const secret : {"Ali", "Baba", "and 40", "open", "sesame"}) {
-            EXPECT_EQ(said.find(secret), std::string::npos) << said;
-        }
-    }
-    EXPECT_THAT(Log(), HasSubstr("open, sesame"));
 }
 
 // The module reads the store too, and to it both kinds of slashes are one.

@@ -4,8 +4,7 @@
 #include <gtest/gtest.h>
 #include <unistd.h>
 
-#include <chrono>
-#include <functional>
+#include "support/WaitUntil.h"
 
 namespace receiver {
 namespace {
@@ -14,24 +13,13 @@ using ::testing::ElementsAre;
 
 void Nothing() {}
 
-bool WaitUntil(const std::function<bool()>& condition) {
-    const auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(30);
-    while (!condition()) {
-        if (std::chrono::steady_clock::now() > deadline) {
-            return false;
-        }
-        std::this_thread::yield();
-    }
-    return true;
-}
-
 /// Waits for one command and gives what there is then.
 std::vector<RecordCommand> TakeRecord(Signals& signals) {
     std::vector<RecordCommand> taken;
-    WaitUntil([&] {
+    EXPECT_TRUE(WaitUntil([&] {
         taken = signals.Take().record;
         return !taken.empty();
-    });
+    }));
     return taken;
 }
 
@@ -124,7 +112,9 @@ void LeaveATrace() {
 void EndAtOnce(int first, int second) {
     Signals signals(LeaveATrace);
     kill(getpid(), first);
-    WaitUntil([&] { return signals.QuitRequested(); });
+    if (!WaitUntil([&] { return signals.QuitRequested(); })) {
+        _exit(1);
+    }
     kill(getpid(), second);
     pause();
 }
