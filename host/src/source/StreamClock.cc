@@ -69,8 +69,15 @@ std::optional<std::int64_t> StreamClock::StampOf(Track& track, const AVPacket& p
 
 std::optional<std::int64_t> StreamClock::NewStampOf(Track& track, const AVPacket& packet) {
     const auto stamp = StampOf(track, packet);
-    if (!stamp || std::find(track.recent.begin(), track.recent.end(), *stamp) != track.recent.end()) {
+    const auto& recent = track.recent;
+    if (!stamp) {
         return std::nullopt;
+    }
+    // Two units with one stamp are what a damaged packet leaves.
+    const bool twice = !recent.empty() && recent.back() == *stamp && !track.stands;
+    track.stands = std::find(recent.begin(), recent.end(), *stamp) != recent.end();
+    if (track.stands) {
+        return twice ? stamp : std::nullopt;
     }
     track.recent.push_back(*stamp);
     if (track.recent.size() > kRecent) {

@@ -27,6 +27,8 @@ class StreamClock {
         std::chrono::steady_clock::time_point arrived = {};
         /// The last stamps, unwrapped, in ticks.
         std::deque<std::int64_t> recent = {};
+        /// The last unit had a stamp that came before.
+        bool stands = false;
     };
 
     /// `audio` may be null. `recorded`: what is read waits for us, so that its clock alone tells the time.
