@@ -21,14 +21,18 @@ Timecode TimecodeOfDay(double secondsOfDay, const FrameRate& rate, bool dropFram
     return timecode;
 }
 
-double SecondsOfDay() {
-    timespec now{};
-    clock_gettime(CLOCK_REALTIME, &now);
+double SecondsOfDay(const std::optional<std::chrono::steady_clock::time_point>& time) {
+    using std::chrono::system_clock;
+    const auto steady = std::chrono::steady_clock::now();
+    const auto moment = system_clock::now() -
+                        std::chrono::duration_cast<system_clock::duration>(steady - time.value_or(steady));
+    const auto whole = std::chrono::floor<std::chrono::seconds>(moment);
+    const std::time_t seconds = system_clock::to_time_t(whole);
     tm local{};
-    localtime_r(&now.tv_sec, &local);
+    localtime_r(&seconds, &local);
     // A leap second repeats the one before it.
     return local.tm_hour * 3600.0 + local.tm_min * 60.0 + std::min(local.tm_sec, 59) +
-           static_cast<double>(now.tv_nsec) / 1e9;
+           std::chrono::duration<double>(moment - whole).count();
 }
 
 Timecode TimecodeCounter::Next(std::int64_t time, const std::optional<Timecode>& ofSource) {

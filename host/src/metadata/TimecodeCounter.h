@@ -1,5 +1,6 @@
 #pragma once
 
+#include <chrono>
 #include <cstdint>
 #include <optional>
 
@@ -12,8 +13,8 @@ namespace receiver {
 /// address out, the next one that it has.
 Timecode TimecodeOfDay(double secondsOfDay, const FrameRate& rate, bool dropFrame);
 
-/// Seconds of local time since midnight, now.
-double SecondsOfDay();
+/// Seconds of local time since midnight, at `time` or now.
+double SecondsOfDay(const std::optional<std::chrono::steady_clock::time_point>& time = {});
 
 /// Gives each frame of a stream its address: the source's own where it has one, else the count of frames from
 /// the last one known. Counting goes by the timeline, so a gap in the stream is a gap in the addresses.

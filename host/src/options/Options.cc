@@ -4,9 +4,11 @@
 #include <charconv>
 #include <cstring>
 #include <limits>
+#include <sstream>
 
 #include "common/Credentials.h"
 #include "common/ReceiverError.h"
+#include "options/AddressCheck.h"
 #include "options/OptionText.h"
 #include "options/Password.h"
 
@@ -90,6 +92,32 @@ void Interpret(const Texts& texts, Options& options) {
     options.source.reconnect = !texts.noReconnect;
 }
 
+/// As `CLI::Range`, which lets pass what is no number.
+CLI::Validator NumberFrom(double low, double high) {
+    return {[low, high](std::string& text) {
+                double value = 0;
+                if (CLI::detail::lexical_cast(text, value) && value >= low && value <= high) {
+                    return std::string();
+                }
+                std::ostringstream reason;
+                reason << text << " is no number from " << low << " to " << std::fixed << std::setprecision(0)
+                       << high;
+                return reason.str();
+            },
+            ""};
+}
+
+/// An empty value is a slip, as of a variable of a script that is not set. A password alone may be empty.
+void CheckEmpty(const CLI::App& app) {
+    for (const CLI::Option* const option : app.get_options()) {
+        const auto& values = option->results();
+        if (option->get_name() != "--password" && option->get_expected_max() > 0 &&
+            std::find(values.begin(), values.end(), "") != values.end()) {
+            throw Wrong(option->get_name() + " is empty: give it a value, or leave it out.");
+        }
+    }
+}
+
 /// Options that are right by themselves and contradict each other.
 void CheckTogether(const CLI::App& app, const Options& options) {
     const bool encodes = options.source.url == "test:" || options.source.transcode;
@@ -127,13 +155,13 @@ void AddSourceOptions(CLI::App& app, Options& options, Texts& texts) {
         ->capture_default_str()
         ->group(group);
     app.add_option("--speed", options.source.speed, "Files and test: how many times real time")
-        ->check(CLI::Range(0.01, 100000.0))
+        ->check(NumberFrom(0.01, 100000.0))
         ->type_name("N")
         ->capture_default_str()
         ->group(group);
     app.add_option("--timeout", options.source.timeout,
                    "Seconds of silence after which a source counts as lost")
-        ->check(CLI::Range(0.1, 3600.0))
+        ->check(NumberFrom(0.1, 3600.0))
         ->type_name("SECONDS")
         ->capture_default_str()
         ->group(group);
@@ -223,7 +251,7 @@ void AddRecordOptions(CLI::App& app, Options& options, Texts& texts) {
         ->type_name("RANGES")
         ->group(group);
     app.add_option("--seconds", options.seconds, "End after so much stream")
-        ->check(CLI::Range(0.001, 366.0 * 86400))
+        ->check(NumberFrom(0.001, 366.0 * 86400))
         ->type_name("N")
         ->group(group);
     app.add_option("--timecode", texts.timecode,
@@ -288,6 +316,10 @@ std::optional<Options> ParseOptions(int argc, const char* const* argv, std::stri
         std::string reason = error.what();
         std::replace(reason.begin(), reason.end(), '\n', ' ');
         throw Wrong(reason + "; receiver --help lists the options.");
+    }
+    CheckEmpty(app);
+    if (const std::string mistake = AddressMistake(options.source.url); !mistake.empty()) {
+        throw Wrong("--input " + WithoutCredentials(options.source.url) + ": " + mistake + ".");
     }
     Interpret(texts, options);
     CheckTogether(app, options);

@@ -29,6 +29,12 @@ bool IsRecordedFormat(const AVPacket& packet) {
     return (packet.data[2] & 0xFD) == 0x4C && (packet.data[3] & 0xC0) == 0x80 && (packet.data[6] & 0x03) == 0;
 }
 
+/// aac_frame_length of an ADTS header (ISO/IEC 14496-3 1.A.2.2.1), which counts the header.
+std::size_t FrameLength(const AVPacket& packet) {
+    return (packet.data[3] & 0x03U) << 11 | static_cast<unsigned int>(packet.data[4]) << 3 |
+           static_cast<unsigned int>(packet.data[5]) >> 5;
+}
+
 /// AudioSpecificConfig (ISO/IEC 14496-3 1.6.2.1) of the same, with frames of 1024 samples.
 bool IsRecordedConfig(const std::uint8_t* config, int size) {
     if (size < 2) {
@@ -94,7 +100,10 @@ void AudioPass::Push(const AVPacket& packet, const AudioSink& sink) {
     damaged_ += std::exchange(foreign_, 0);
     const auto size = static_cast<std::size_t>(packet.size);
     const std::int64_t time = av_rescale(packet.pts, kAudioRate, 90000);
-    if (*headers_) {
+    if (*headers_ && size != FrameLength(packet)) {
+        // Cut short, as the last frame of a stream that breaks off is.
+        ++damaged_;
+    } else if (*headers_) {
         sink({libav::Share(packet), size, time});
     } else if (size > 0) {
         sink({WithAdtsHeader(packet.data, size), size + kAdtsHeader, time});

@@ -8,13 +8,13 @@
 #include <vector>
 
 #include "common/ReceiverError.h"
-#include "source/AudioPath.h"
 #include "source/FormatWatch.h"
 #include "source/Input.h"
 #include "source/KlvPackets.h"
+#include "source/LookAhead.h"
+#include "source/StreamClock.h"
+#include "source/StreamPaths.h"
 #include "source/UnitAssembler.h"
-#include "source/VideoPath.h"
-#include "timing/Timeline.h"
 
 namespace receiver {
 
@@ -28,24 +28,28 @@ class Connection {
     /// (`kSourceUnsuitable`) when it cannot be recorded, `SourceLost` and `Stopped`.
     Connection(std::unique_ptr<Input> input, const SourceOptions& options, const SourceDescription* before);
 
-    const SourceDescription& Description() const { return description_; }
+    const SourceDescription& Description() const { return paths_.description; }
     /// Files and servers of files.
     bool Recorded() const { return input_->Recorded(); }
     /// Sentences about what is converted.
     const std::vector<std::string>& Notices() const { return notices_; }
 
-    /// From here on what the source carries goes to `assembler`; its first IDR frame stands at `begin`.
-    /// `assembler` must outlive this.
+    /// From here on what the source carries goes to `assembler`, which must outlive this. Its first IDR frame
+    /// stands at 0, behind an earlier connection later than `begin` by as much as it comes behind the first
+    /// picture.
     void Begin(UnitAssembler& assembler, std::int64_t begin);
-    /// Passes one packet on. False at the end of the source, after everything was given out. Throws like
-    /// `Input`, and `FormatChanged`: then the connection is over, and its input may be asked anew.
+    /// Passes one packet on. False at the end of the source. Throws like `Input`, and `FormatChanged`. In all
+    /// these cases the connection is over.
     bool Pump();
+    /// Gives out what is still on its way. Once, when the connection is over; then its input may be asked
+    /// anew.
+    void Finish();
     /// Ends the connection, all but the input, and gives that away.
     static std::unique_ptr<Input> End(std::unique_ptr<Connection> connection);
     /// The wait for the source is over: what still comes was held by the libraries.
     bool Flushing() const { return input_->TimedOut(); }
-    /// When the input answered.
-    Clock::time_point Opened() const { return input_->Rtp() ? connected_ : input_->Opened(); }
+    /// When the first picture came.
+    Clock::time_point Arrived() const { return ahead_.arrived; }
     /// Byte at which the last packet stood in the input, -1 when not known.
     std::int64_t Position() const { return position_; }
 
@@ -53,74 +57,47 @@ class Connection {
     std::uint64_t Damaged() const;
 
  private:
-    /// A stream of the input that is used.
-    struct Stream {
-        const AVStream* stream = nullptr;
-        /// The last stamp, unwrapped, in the stream's own time base.
-        std::optional<std::int64_t> last;
-        /// Where the next packet would stand if nothing is missing, and when the last one came.
-        std::int64_t expected = 0;
-        Clock::time_point arrived;
-        /// It has got to the beginning of the line.
-        bool joined = false;
-    };
-
     void Choose(const SourceOptions& options);
-    void LookAhead();
-    /// True when each medium that came has been tied to the sender's clock.
-    bool Reported() const;
-    void DecideVideo(const SourceOptions& options, const SourceDescription* before);
-    void DecideAudio();
     void ReadTimecodeTag();
     /// Throws `FormatChanged` when it is of audio that was not there before.
     void CheckOther(const AVPacket& packet);
     bool NextPacket();
     void Handle(AVPacket& packet);
     void HandleVideo(AVPacket& packet);
-    void HandleAudio(AVPacket& packet);
+    /// False when the picture, stamped so, cannot be the first one of the line. Else it stands at `begin_`.
+    bool Start(const AVPacket& packet, std::optional<std::int64_t> stamp);
+    void HandleAudio(AVPacket& packet, bool waited);
     void HandleKlv(const AVPacket& packet);
-    void Finish();
-    Stream* StreamOf(const AVPacket& packet);
-    /// The packet's stamp, unwrapped, in ticks of 90000. Nothing when it has none.
-    std::optional<std::int64_t> StampOf(Stream& stream, const AVPacket& packet);
+    void KeepEarly(AVPacket& packet);
+    static bool IsOf(const AVPacket& packet, const AVStream* stream);
+    StreamClock::Track* KlvTrackOf(const AVPacket& packet);
     /// How much later a picture is shown than decoded, where the source itself tells.
     std::optional<std::int64_t> DelayOf(const AVPacket& packet) const;
-    std::int64_t Elapsed(Stream& stream, std::int64_t usual);
-    std::int64_t TimeOf(Stream& stream, std::int64_t stamp, std::int64_t usual, std::int64_t back);
-    std::int64_t AudioTime(std::int64_t stamp, std::int64_t usual);
-    void ReplayEarly();
     PictureSink ToPictures();
     AudioSink ToAudio();
 
     std::unique_ptr<Input> input_;
-    Clock::time_point connected_;
-    SourceDescription description_;
+    const AVStream* video_ = nullptr;
+    const AVStream* audio_ = nullptr;
+    std::deque<StreamClock::Track> klv_;
     std::vector<std::string> notices_;
-    Stream video_;
-    std::optional<Stream> audio_;
-    std::deque<Stream> klv_;
-    std::unique_ptr<VideoPathInterface> videoPath_;
+    /// Packets that were read to look at them, then those that wait for the first IDR frame.
+    Beginning ahead_;
+    Packets early_;
+    StreamPaths paths_;
     std::optional<FormatWatch> watch_;
-    std::unique_ptr<AudioPathInterface> audioPath_;
+    std::optional<StreamClock> clock_;
     KlvPackets klvPackets_;
     libav::Owner<AVPacket> packet_;
-    /// Packets that were read to look at them, then those that wait for the first IDR frame.
-    std::deque<libav::Owner<AVPacket>> ahead_;
-    std::deque<libav::Owner<AVPacket>> early_;
 
     UnitAssembler* assembler_ = nullptr;
     std::int64_t begin_ = 0;
-    Timeline line_;
-    /// The last stamp of any stream, in ticks of 90000, which tells the others how often the counter has
-    /// wrapped.
-    std::optional<std::int64_t> reference_;
     std::optional<std::int64_t> firstVideoStamp_;
+    /// Of the last picture of which it is known. Only where pictures are converted.
+    std::optional<std::int64_t> delay_;
     std::optional<Timecode> tag_;
     std::uint64_t damaged_ = 0;
     std::uint64_t withoutStart_ = 0;
-    /// Packets are handled that came before the first IDR frame.
-    bool replaying_ = false;
-    bool passes_ = true;
     std::int64_t position_ = -1;
 };
 

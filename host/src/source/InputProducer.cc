@@ -6,6 +6,7 @@
 
 #include "common/ReceiverError.h"
 #include "source/Address.h"
+#include "source/AwaitSource.h"
 
 namespace receiver {
 namespace {
@@ -70,7 +71,9 @@ bool InputProducer::Produce(Batch& batch) {
                                    ? lastPicture_ + std::chrono::microseconds((last - before) * 100 / 9)
                                    : Clock::now();
             }
-            if (!more && !recorded_) {
+            if (!more && recorded_) {
+                connection_->Finish();
+            } else if (!more) {
                 Lose("the connection has ended");
                 more = options_.reconnect;
             }
@@ -100,7 +103,7 @@ void InputProducer::Lose(const std::string& reason) {
     if (now - connected_ > kGood) {
         attempts_ = 0;
     }
-    assembler_.Finish();
+    connection_->Finish();
     if (options_.reconnect && !recorded_) {
         assembler_.AddNotice("the source was lost: " + reason + NextAttempt());
         told_ = now;
@@ -134,12 +137,12 @@ void InputProducer::TryAgain() {
     using std::chrono::duration_cast;
     const auto away = duration_cast<std::chrono::seconds>(connected_ - lost_).count();
     assembler_.AddNotice("the source is back after " + std::to_string(away) + " s");
-    const std::int64_t passed = Ticks(connection->Opened() - lastPicture_);
+    const std::int64_t passed = Ticks(connection->Arrived() - lastPicture_);
     GoOn(std::move(connection), passed, false);
 }
 
 void InputProducer::Change(const std::string& reason) {
-    assembler_.Finish();
+    connection_->Finish();
     ++changes_;
     damagedBefore_ += connection_->Damaged();
     const std::int64_t position = connection_->Position();
@@ -185,8 +188,6 @@ void InputProducer::TellFailure(const ReceiverError& error) {
 
 void InputProducer::GoOn(std::unique_ptr<Connection> connection, std::int64_t passed, bool changed) {
     connection_ = std::move(connection);
-    // Time went on while the source was away. On the grid, so that picture and sound are moved alike.
-    const std::int64_t begin = assembler_.Grid().PlaceOf(assembler_.LastPicture() + passed);
     const SourceDescription& now = connection_->Description();
     const bool other = now.width != description_.width || now.height != description_.height ||
                        now.frameRate != description_.frameRate;
@@ -195,23 +196,22 @@ void InputProducer::GoOn(std::unique_ptr<Connection> connection, std::int64_t pa
                              ": the recording goes on in a new file");
         ++changes_;
     }
-    if (now.frameRate != description_.frameRate) {
-        assembler_.SetRate(now.frameRate, begin);
-    }
     description_ = now;
     if (other || changed) {
         assembler_.AddChange(description_);
     }
-    connection_->Begin(assembler_, begin);
+    // Time went on while the source was away.
+    connection_->Begin(assembler_, std::max<std::int64_t>(1, assembler_.LastPicture() + passed));
 }
 
 void InputProducer::Publish() {
     lostFrames_ = assembler_.LostFrames();
+    silentFrames_ = assembler_.SilentFrames();
     damaged_ = damagedBefore_ + (connection_ ? connection_->Damaged() : 0);
 }
 
 SourceCounts InputProducer::Counts() const {
-    return {lostFrames_, damaged_, reconnections_, changes_, away_};
+    return {lostFrames_, damaged_, reconnections_, changes_, away_, silentFrames_};
 }
 
 }  // namespace receiver

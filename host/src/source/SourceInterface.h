@@ -1,5 +1,6 @@
 #pragma once
 
+#include <chrono>
 #include <cstdint>
 #include <memory>
 #include <optional>
@@ -16,8 +17,13 @@ enum class Medium { kVideo, kAudio, kKlv };
 inline constexpr std::int64_t kVideoClock = 90000;
 inline constexpr std::int64_t kAudioClock = 48000;
 
+/// Where pictures lie further apart than this, in ticks of 90000, a recording ends, and another one begins.
+inline constexpr std::int64_t kLongestStep = kVideoClock / 2;
+
 /// One unit of a source, ready for the module.
 struct SourceUnit {
+    using Clock = std::chrono::steady_clock;
+
     Medium medium = Medium::kVideo;
     /// When the unit is due, since the beginning of the source: 90000 ticks a second for video and KLV, 48000
     /// for audio. Never negative but for a first audio frame, which may begin half its length before the
@@ -33,6 +39,8 @@ struct SourceUnit {
     bool keyFrame = false;
     /// Video: the address that the source gives this frame.
     std::optional<Timecode> timecode;
+    /// Video of a live source: when the frame came, by its place in the stream.
+    std::optional<Clock::time_point> arrived = {};
 };
 
 /// What a source is.
@@ -57,6 +65,8 @@ struct SourceCounts {
     std::uint64_t changes = 0;
     /// The source is lost and not back yet.
     bool away = false;
+    /// Audio frames that are silence because those of the source did not come.
+    std::uint64_t silentFrames = 0;
 };
 
 /// Hears of what an operator should know, one sentence each ("the source was lost: ...; trying again in 4 s",

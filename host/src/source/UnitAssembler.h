@@ -21,8 +21,11 @@ class UnitAssembler {
     /// A connection begins; `audio` tells whether it carries audio. A gap before its first picture is no loss
     /// of frames, since nobody knows what was sent.
     void Begin(bool audio);
-    /// From the next picture on, which stands at `begin`, `rate` is the rate. What came before is complete.
-    void SetRate(const FrameRate& rate, std::int64_t begin);
+    /// From the next picture on `rate` is the rate. What came before is complete. Gives the place of that
+    /// picture, which comes at `time`: on the grid, so that picture and sound are moved alike.
+    std::int64_t Resume(const FrameRate& rate, std::int64_t time);
+    /// The picture at `time` came at `arrived`. Those behind it come in time.
+    void SetArrival(std::int64_t time, SourceUnit::Clock::time_point arrived);
     /// The source is another one from here on.
     void AddChange(const SourceDescription& description) { batch_.emplace_back(description); }
     /// The address of the next picture, unless the picture knows better.
@@ -44,6 +47,8 @@ class UnitAssembler {
     std::int64_t LastPicture() const { return lastPicture_; }
     const FrameGrid& Grid() const { return grid_; }
     std::uint64_t LostFrames() const { return lostFrames_; }
+    /// Audio frames that did not come and are silence.
+    std::uint64_t SilentFrames() const { return silentFrames_; }
 
  private:
     struct Klv {
@@ -55,9 +60,15 @@ class UnitAssembler {
     void PlaceAudio(const CodedAudio& audio);
     void EmitKlv(const Klv& klv);
     void EmitSilence(std::int64_t time);
+    void CountSilence();
     void MakeSilence(std::int64_t time);
+    std::optional<SourceUnit::Clock::time_point> ArrivalOf(std::int64_t time) const;
     std::optional<Timecode> TimecodeOfFrame(std::int64_t index, const CodedPicture& picture);
+    /// Counts pictures that should go with the sound behind `end`.
+    void CountMissingEnd(std::int64_t end);
+    /// Tells the gaps that were counted, from time to time.
     void Report();
+    void TellGaps();
 
     FrameRate rate_;
     FrameGrid grid_;
@@ -65,10 +76,13 @@ class UnitAssembler {
     const CodedAudio silence_;
     Batch batch_;
     bool audio_ = false;
+    /// Audio of the connection has come.
     bool audioBegun_ = false;
     bool resumed_ = true;
     std::int64_t lastPicture_ = -1;
     std::int64_t lastKlv_ = 0;
+    /// When a picture at 0 would have come.
+    std::optional<SourceUnit::Clock::time_point> origin_;
     /// What is ahead of the pictures.
     std::deque<CodedAudio> heldAudio_;
     std::deque<Klv> heldKlv_;
@@ -80,6 +94,7 @@ class UnitAssembler {
     bool dropFrame_ = false;
 
     std::uint64_t lostFrames_ = 0;
+    std::uint64_t silentFrames_ = 0;
     /// What the next sentence tells of.
     struct Tally {
         std::uint64_t lost = 0;

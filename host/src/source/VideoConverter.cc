@@ -24,6 +24,9 @@ VideoConverter::VideoConverter(const AVCodecParameters& parameters, const VideoE
                             "the video (" + std::string(avcodec_get_name(parameters.codec_id)) +
                                 ") cannot be decoded: set the encoder to H.264 without B frames");
     }
+    if (parameters.codec_id == AV_CODEC_ID_H264) {
+        timing_.emplace();
+    }
     decoder_ = libav::NewCodec(decoder);
     libav::Check(avcodec_parameters_to_context(decoder_.get(), &parameters),
                  "read the parameters of the video");
@@ -35,6 +38,9 @@ VideoConverter::VideoConverter(const AVCodecParameters& parameters, const VideoE
 }
 
 void VideoConverter::Push(const AVPacket& packet, const PictureSink& sink) {
+    if (timing_) {
+        timing_->Look(NalUnits({packet.data, static_cast<std::size_t>(packet.size)}));
+    }
     if (avcodec_send_packet(decoder_.get(), &packet) < 0) {
         ++damaged_;
         return;
@@ -98,8 +104,11 @@ void VideoConverter::Encode(const PictureSink& sink) {
         // Two chains of filters may overlap by a frame where the picture's size changed.
         if (picture->pts > lastFrame_) {
             lastFrame_ = picture->pts;
-            const std::optional<Timecode> timecode =
+            std::optional<Timecode> timecode =
                 sameRate ? TimecodeOf(*picture, sourceRate_) : std::optional<Timecode>();
+            if (timecode && timing_) {
+                timecode->dropFrame |= timing_->DropFrame();
+            }
             picture->pict_type = AV_PICTURE_TYPE_NONE;
             encoder_.Encode(picture.get(), [&](const CodedPicture& coded) {
                 CodedPicture withTimecode = coded;

@@ -46,6 +46,7 @@ VideoPass::VideoPass(const AVCodecParameters& parameters)
         const auto units = NalUnits({stream.extradata, static_cast<std::size_t>(stream.extradata_size)});
         CheckParameterSets(units);
         sets_.Learn(units);
+        timing_.Look(units);
     }
     parser_ = std::make_unique<PictureParser>(stream);
     timecodes_ = std::make_unique<TimecodeReader>(stream);
@@ -108,6 +109,7 @@ void VideoPass::Push(const AVPacket& packet, const PictureSink& sink) {
     picture.keyFrame = Contains(units, kNalIdr);
     CheckParameterSets(units);
     sets_.Learn(units);
+    timing_.Look(units);
     if (picture.keyFrame) {
         CheckFormat(stream);
     }
@@ -121,6 +123,9 @@ void VideoPass::Push(const AVPacket& packet, const PictureSink& sink) {
     }
     if (picture.keyFrame) {
         picture.timecode = timecodes_->Read({picture.data.get(), picture.size});
+        if (picture.timecode) {
+            picture.timecode->dropFrame = timing_.DropFrame();
+        }
     }
     sink(picture);
 }

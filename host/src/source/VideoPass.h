@@ -4,6 +4,7 @@
 
 #include "source/AnnexB.h"
 #include "source/PictureParser.h"
+#include "source/PictureTiming.h"
 #include "source/TimecodeReader.h"
 #include "source/VideoPath.h"
 
@@ -34,6 +35,7 @@ class VideoPass final : public VideoPathInterface {
     ParameterSets sets_;
     std::unique_ptr<PictureParser> parser_;
     std::unique_ptr<TimecodeReader> timecodes_;
+    PictureTiming timing_;
     std::uint32_t width_ = 0;
     std::uint32_t height_ = 0;
     /// As the first IDR frame tells; 0/1 when it does not.

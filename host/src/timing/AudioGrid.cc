@@ -1,5 +1,7 @@
 #include "timing/AudioGrid.h"
 
+#include <algorithm>
+
 namespace receiver {
 namespace {
 
@@ -14,13 +16,14 @@ constexpr std::int64_t Frames(std::int64_t samples) {
 
 }  // namespace
 
-void AudioGrid::AddVideoGap(std::int64_t begin, std::int64_t length) {
-    gaps_.push_back({begin, length});
+void AudioGrid::AddVideoGap(std::int64_t begin, std::int64_t length, bool rejoin) {
+    gaps_.push_back({begin, length, rejoin});
 }
 
 std::int64_t AudioGrid::End() {
     while (!gaps_.empty() && gaps_.front().begin <= next_ + kFrame / 2) {
         remainder_ += gaps_.front().length;
+        rejoining_ |= gaps_.front().rejoin;
         gaps_.pop_front();
         const std::int64_t frames = Frames(remainder_);
         remainder_ -= frames * kFrame;
@@ -42,18 +45,26 @@ AudioGrid::Place AudioGrid::Next(std::int64_t time) {
         begun_ = true;
         next_ = time - Frames(time) * kFrame;
     }
-    const std::int64_t end = End();
-    const std::int64_t tolerance = rejoining_ ? kFrame / 2 : kTolerance;
-    if (time < kEarliest || time < end - tolerance) {
+    End();
+    const std::int64_t earliest = rejoining_ ? next_ - joined_ - kFrame / 2 : next_ - kTolerance;
+    if (time < kEarliest || time < earliest) {
         const bool passedOver = time >= 0 && time < passedUntil_;
         return {passedOver ? Action::kVideoMissing : Action::kOverlap, time};
     }
-    next_ += kFrame;
-    if (time > end + tolerance) {
-        return {Action::kFill, end};
+    if (rejoining_) {
+        Join(time);
     }
+    const std::int64_t place = next_;
+    next_ += kFrame;
+    return {time > place + kTolerance ? Action::kFill : Action::kAccept, place};
+}
+
+void AudioGrid::Join(std::int64_t time) {
     rejoining_ = false;
-    return {Action::kAccept, end};
+    const std::int64_t counted = next_ - joined_;
+    const std::int64_t silent = std::max<std::int64_t>(0, Frames(time - counted));
+    next_ = time - silent * kFrame;
+    joined_ = next_ - counted;
 }
 
 }  // namespace receiver

@@ -23,8 +23,9 @@ class AudioGrid {
     /// earliest.
     static constexpr std::int64_t kEarliest = -kFrame / 2;
 
-    /// Video is missing from `begin` on for `length` samples.
-    void AddVideoGap(std::int64_t begin, std::int64_t length);
+    /// Video is missing from `begin` on for `length` samples. `rejoin`: what follows begins another
+    /// recording, and audio rejoins there.
+    void AddVideoGap(std::int64_t begin, std::int64_t length, bool rejoin = false);
 
     enum class Action {
         /// The frame stands at `time`.
@@ -44,7 +45,8 @@ class AudioGrid {
     /// and silence leads up to it from the frame on that is nearest to 0.
     Place Next(std::int64_t time);
 
-    /// The source begins anew: its next frame stands at the place nearest to its time.
+    /// The source begins anew: its next frame stands where it is, as the first one did, and the others in
+    /// line with it.
     void Rejoin() { rejoining_ = true; }
 
     /// Where the next frame would stand, the audio of missing video passed over.
@@ -56,12 +58,18 @@ class AudioGrid {
     struct Gap {
         std::int64_t begin = 0;
         std::int64_t length = 0;
+        bool rejoin = false;
     };
+
+    void Join(std::int64_t time);
 
     std::deque<Gap> gaps_;
     /// What gaps left over that is less than half a frame, or was taken too much.
     std::int64_t remainder_ = 0;
     std::int64_t next_ = 0;
+    /// How far frames stand behind a line of whole frames from the first one on, since they joined. At most
+    /// half a frame either way, however often they do, or the counts would drift apart.
+    std::int64_t joined_ = 0;
     /// End of the time that was passed over last.
     std::int64_t passedUntil_ = 0;
     bool begun_ = false;

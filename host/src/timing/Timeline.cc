@@ -48,6 +48,12 @@ Timeline::Place Timeline::TimeOf(std::int64_t stamp, std::int64_t expected, std:
     return {now, SaturatingSubtract(time, now)};
 }
 
+void Timeline::Step(std::int64_t ticks, std::int64_t time) {
+    previous_ = offset_;
+    offset_ = SaturatingSubtract(*offset_, ticks);
+    jumped_ = time;
+}
+
 std::int64_t Timeline::Nearest(std::int64_t stamp, std::int64_t expected) const {
     const std::int64_t time = SaturatingAdd(stamp, *offset_);
     if (previous_) {

@@ -36,6 +36,9 @@ class Timeline {
     /// evenly; `elapsed` is how much longer than that nothing has come (0 where the wall clock does not
     /// count); `back` is how far behind `expected` a stamp of this medium may stand. A line must be anchored.
     Place TimeOf(std::int64_t stamp, std::int64_t expected, std::int64_t elapsed, std::int64_t back);
+    /// The source's clock made a step by so many ticks (below 0: back) where its next unit is expected at
+    /// `time`.
+    void Step(std::int64_t ticks, std::int64_t time);
     /// Where `stamp` stands by the offset that brings it nearest to `expected`, for media that tell nothing
     /// of jumps. A line must be anchored.
     std::int64_t Nearest(std::int64_t stamp, std::int64_t expected) const;

@@ -85,6 +85,14 @@ TEST(TimecodeOfDay, PassesOverAddressesThatDropFrameLeavesOut) {
     EXPECT_EQ(ToString(TimecodeOfDay(600, Rate("29.97"), true)), "00:10:00;00");
 }
 
+TEST(SecondsOfDay, GoesBackByWhatHasPassed) {
+    constexpr double kDay = 86400;
+    const auto then = std::chrono::steady_clock::now() - std::chrono::milliseconds(90500);
+    const double passed = SecondsOfDay() - SecondsOfDay(then);
+    // Midnight may lie in between.
+    EXPECT_NEAR(passed < 0 ? passed + kDay : passed, 90.5, 0.2);
+}
+
 TEST(SecondsOfDay, IsWithinADay) {
     EXPECT_GE(SecondsOfDay(), 0);
     EXPECT_LT(SecondsOfDay(), 86400);

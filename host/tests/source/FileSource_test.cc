@@ -164,6 +164,26 @@ TEST_F(FileSource, AGapInTheAudioIsFilledAndTold) {
     EXPECT_EQ(notices_.CountOf("5 audio frames missing and filled with silence"), 1u);
 }
 
+TEST_F(FileSource, AnAudioFrameThatIsCutShortIsNotRecorded) {
+    Ffmpeg(string(kPicture) + kTone + kPlainH264 + kPlainAac + "a.ts");
+    // The stream breaks off within the last frame: its last packet but the stuffing is audio.
+    Ffmpeg("-i a.ts -map 0:v -c copy v.ts");
+    Ffmpeg("-i a.ts -map 0:a -c copy whole.aac");
+    const string whole = FileBytes(Path("whole.aac"));
+    std::FILE* const file = std::fopen(Path("short.aac").c_str(), "wb");
+    std::fwrite(whole.data(), 1, whole.size() - 40, file);
+    ASSERT_EQ(std::fclose(file), 0);
+    Ffmpeg("-i a.ts -i short.aac -map 0:v -map 1:a -c copy -flush_packets 1 short.nut");
+    const auto source = OpenSource(Fast("short.nut"), notices_, nullptr);
+    for (const SourceUnit& unit : Of(Medium::kAudio, ReadAll(*source))) {
+        // aac_frame_length
+        const std::size_t length =
+            (unit.data.get()[3] & 3U) << 11 | unit.data.get()[4] << 3U | unit.data.get()[5] >> 5U;
+        EXPECT_EQ(length, unit.size);
+    }
+    EXPECT_EQ(source->Counts().damagedPackets, 1u);
+}
+
 TEST_F(FileSource, LostPicturesAreCountedKeepTheirPlacesAndTakeTheirAudioAlong) {
     Ffmpeg(string(kPicture) + kTone + kPlainH264 + kPlainAac + "-bsf:v 'noise=drop=between(n\\,5\\,8)' a.ts");
     const auto source = OpenSource(Fast("a.ts"), notices_, nullptr);
@@ -467,74 +487,6 @@ TEST_F(FileSource, ADropFrameTagDropsFrames) {
     EXPECT_EQ(video[0].timecode, (Timecode{10, 0, 59, 20, true}));
     EXPECT_EQ(video[9].timecode, (Timecode{10, 0, 59, 29, true}));
     EXPECT_EQ(video[10].timecode, (Timecode{10, 1, 0, 2, true}));
-}
-
-/// The payload of a picture timing message (ITU-T H.264 D.1.3) without buffering delays: one clock timestamp.
-string PictureTiming(unsigned int hours, unsigned int minutes, unsigned int seconds, unsigned int frames) {
-    string bits;
-    const auto add = [&bits](unsigned int value, int width) {
-        for (int at = width - 1; at >= 0; --at) {
-            bits += (value >> at & 1U) != 0 ? '1' : '0';
-        }
-    };
-    add(0, 4);  // pic_struct: a frame
-    add(1, 1);  // clock_timestamp_flag
-    add(0, 2);  // ct_type
-    add(0, 1);  // nuit_field_based_flag
-    add(0, 5);  // counting_type
-    add(1, 1);  // full_timestamp_flag
-    add(0, 1);  // discontinuity_flag
-    add(0, 1);  // cnt_dropped_flag
-    add(frames, 8);
-    add(seconds, 6);
-    add(minutes, 6);
-    add(hours, 5);
-    add(0, 24);  // time_offset, which is so long where nothing else is told
-    add(1, 1);
-    bits.resize((bits.size() + 7) / 8 * 8, '0');
-    string bytes;
-    for (std::size_t at = 0; at < bits.size(); at += 8) {
-        bytes += static_cast<char>(std::stoi(bits.substr(at, 8), nullptr, 2));
-    }
-    return bytes;
-}
-
-TEST_F(FileSource, TimecodeOfPictureTimingMessagesIsRead) {
-    // A parameter set that announces the messages, without the encoder's own.
-    Ffmpeg(string(kPicture) + kPlainH264 +
-           "-x264-params pic-struct=1 -bsf:v filter_units=remove_types=6 a.h264");
-    const string plain = FileBytes(Path("a.h264"));
-    string timed;
-    std::size_t from = 0;
-    // One message in front of each IDR frame: 24 frames and 1 second apart at 12 frames.
-    for (unsigned int group = 0; group < 3; ++group) {
-        const std::size_t idr = plain.find(string("\0\0\1\x65", 4), from);
-        ASSERT_NE(idr, string::npos);
-        const unsigned int frame = 20 + group * 12;
-        string payload = PictureTiming(9, 8, 7 + frame / 25, frame % 25);
-        // Emulation prevention (7.4.1).
-        for (std::size_t at = 0; (at = payload.find(string("\0\0", 2), at)) != string::npos &&
-                                 at + 2 < payload.size() &&
-                                 static_cast<unsigned char>(payload[at + 2]) <= 3;) {
-            payload.insert(at + 2, 1, '\x03');
-            at += 3;
-        }
-        const string size(1, static_cast<char>(PictureTiming(0, 0, 0, 0).size() - 0));
-        timed += plain.substr(from, idr - from) + string("\0\0\1\x06\x01", 5) + size + payload + "\x80" +
-                 plain.substr(idr, 4);
-        from = idr + 4;
-    }
-    timed += plain.substr(from);
-    std::FILE* const file = std::fopen(Path("timed.h264").c_str(), "wb");
-    std::fwrite(timed.data(), 1, timed.size(), file);
-    ASSERT_EQ(std::fclose(file), 0);
-    Ffmpeg("-r 25 -i timed.h264 -c copy timed.ts");
-    const auto video = Of(Medium::kVideo, ReadFile("timed.ts"));
-    ASSERT_EQ(video.size(), 25u);
-    EXPECT_EQ(video[0].timecode, (Timecode{9, 8, 7, 20, false}));
-    EXPECT_EQ(video[4].timecode, (Timecode{9, 8, 7, 24, false}));
-    EXPECT_EQ(video[5].timecode, (Timecode{9, 8, 8, 0, false}));
-    EXPECT_EQ(video[24].timecode, (Timecode{9, 8, 8, 19, false}));
 }
 
 TEST_F(FileSource, ComesInRealTimeTimesItsSpeed) {

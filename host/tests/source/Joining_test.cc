@@ -50,7 +50,7 @@ class Joining : public SourceTest {
     }
     void ExpectNothingTold() const {
         EXPECT_EQ(notices_.CountOf("jumped"), 0u);
-        EXPECT_EQ(notices_.CountOf("gaps"), 0u);
+        EXPECT_EQ(notices_.CountOf("gaps"), 0u) << testing::PrintToString(notices_.sentences);
     }
 
     endtoend::FreePorts ports_;
@@ -70,13 +70,15 @@ TEST_F(Joining, ALiveStreamIsInStepFromItsFirstIdrFrameOn) {
     ExpectNothingTold();
 }
 
-/// With its first sound a picture is complete for the recorder.
-TEST_F(Joining, MetadataOfTheFirstPictureComesBeforeItsSound) {
+/// Whether there is audio beside the pictures and their metadata.
+class FirstPicture : public Joining, public testing::WithParamInterface<bool> {};
+
+/// With its sound, which may be silence that is made, a picture is complete for the recorder.
+TEST_P(FirstPicture, CarriesItsOwnMetadata) {
     Make("a.ts", "4");
     endtoend::AddKlvStream(Path("a.ts"), Path("klv.ts"), 1);
-    Ffmpeg(
-        "-i klv.ts -map 0 -c copy -copyts -bsf:v 'noise=drop=lt(n\\,5)' -bsf:a 'noise=drop=lt(n\\,9)' "
-        "cut.ts");
+    Ffmpeg(string("-i klv.ts -map 0 -c copy -copyts -bsf:v 'noise=drop=lt(n\\,5)' ") +
+           (GetParam() ? "-bsf:a 'noise=drop=lt(n\\,9)'" : "-an") + " cut.ts");
     StreamServer server({HttpStream(FileBytes(Path("cut.ts")))});
     SourceOptions options = Live(server.Http());
     options.reconnect = false;
@@ -88,7 +90,28 @@ TEST_F(Joining, MetadataOfTheFirstPictureComesBeforeItsSound) {
     const auto klv = first(Medium::kKlv);
     ASSERT_NE(klv, units.end());
     EXPECT_EQ(klv->time, first(Medium::kVideo)->time);
+    EXPECT_LT(klv, first(Medium::kVideo));
     EXPECT_LT(klv, first(Medium::kAudio));
+    const auto packet = endtoend::MakeKlvPacket(50);
+    EXPECT_EQ(BytesOf(*klv), string(packet.begin(), packet.end()));
+}
+
+INSTANTIATE_TEST_SUITE_P(WithAndWithoutAudio, FirstPicture, testing::Bool());
+
+TEST_F(Joining, MetadataOfTheFirstPictureBehindAnOutageIsItsOwn) {
+    Make("a.ts", "4");
+    endtoend::AddKlvStream(Path("a.ts"), Path("klv.ts"), 1);
+    Ffmpeg("-i klv.ts -map 0 -c copy -copyts -bsf:v 'noise=drop=lt(n\\,5)' cut.ts");
+    StreamServer server({HttpStream(FileBytes(Path("klv.ts"))), HttpStream(FileBytes(Path("cut.ts")))});
+    const auto source = OpenSource(Live(server.Http()), notices_, nullptr);
+    const auto units = ReadPictures(*source, 100 + 50);
+    const auto pictures = Of(Medium::kVideo, units);
+    ASSERT_EQ(pictures.size(), 150u);
+    const auto klv = std::find_if(units.begin(), units.end(), [&](const SourceUnit& unit) {
+        return unit.medium == Medium::kKlv && unit.time >= pictures[100].time;
+    });
+    ASSERT_NE(klv, units.end());
+    EXPECT_EQ(klv->time, pictures[100].time);
     const auto packet = endtoend::MakeKlvPacket(50);
     EXPECT_EQ(BytesOf(*klv), string(packet.begin(), packet.end()));
 }
@@ -145,33 +168,100 @@ TEST_F(Joining, RtpThatIsFoundBetweenTwoReportsIsInStepFromItsFirstIdrFrameOn) {
     ExpectNothingTold();
 }
 
-/// How many audio frames come before the step: before, with and after the picture of the same moment.
-class ClockStep : public Joining, public testing::WithParamInterface<int> {};
-
-TEST_P(ClockStep, BackByHalfASecondLosesNothingAndLeavesSoundAndPictureInStep) {
-    Make("whole.ts", "4");
-    const string sounds = std::to_string(GetParam());
-    Ffmpeg("-copyts -i whole.ts -c copy -bsf:v 'noise=drop=gte(n\\,50)' -bsf:a 'noise=drop=gte(n\\," +
-           sounds + ")' -muxdelay 0 a.ts");
-    Ffmpeg("-copyts -i whole.ts -c copy -bsf:v 'noise=drop=lt(n\\,50)' -bsf:a 'noise=drop=lt(n\\," + sounds +
-           ")' -muxdelay 0 -output_ts_offset -0.5 -mpegts_flags +initial_discontinuity b.ts");
-    Shell("cat a.ts b.ts > ab.ts");
-    StreamServer server({HttpStream(FileBytes(Path("ab.ts")))});
-    SourceOptions options = Live(server.Http());
-    options.reconnect = false;
-    const auto source = OpenSource(options, notices_, nullptr);
-    const auto units = ReadAll(*source);
-    const SentMedia sent(Path("whole.ts"));
-    ExpectInStep(sent, units, 0);
-    EXPECT_EQ(Of(Medium::kVideo, units).size(), 100u);
-    EXPECT_GE(sent.Find(Medium::kAudio, units).size(), sent.Sounds() - 3);
-    EXPECT_EQ(source->Counts().lostFrames, 0u);
-    EXPECT_EQ(notices_.CountOf("the source's clock jumped by -500 ms"), 1u)
-        << testing::PrintToString(notices_.sentences);
-    EXPECT_EQ(notices_.CountOf("gaps"), 0u);
+/// A step of the source's clock, and how many audio frames come before it: fewer than belong to the pictures
+/// in front of it, as many, and more.
+struct Step {
+    const char* seconds;
+    std::size_t sounds;
+};
+void PrintTo(const Step& step, std::ostream* out) {
+    *out << step.seconds << " behind " << step.sounds << " audio frames";
 }
 
-INSTANTIATE_TEST_SUITE_P(All, ClockStep, testing::Values(82, 95, 105));
+/// A step behind 50 pictures.
+class ClockStep : public Joining, public testing::WithParamInterface<Step> {
+ protected:
+    /// Reads the whole stream.
+    std::vector<SourceUnit> ReadStep() {
+        Make("whole.ts", "4");
+        const string sounds = std::to_string(GetParam().sounds);
+        Ffmpeg("-copyts -i whole.ts -c copy -bsf:v 'noise=drop=gte(n\\,50)' -bsf:a 'noise=drop=gte(n\\," +
+               sounds + ")' -muxdelay 0 a.ts");
+        Ffmpeg("-copyts -i whole.ts -c copy -bsf:v 'noise=drop=lt(n\\,50)' -bsf:a 'noise=drop=lt(n\\," +
+               sounds + ")' -muxdelay 0 -output_ts_offset " + GetParam().seconds +
+               " -mpegts_flags +initial_discontinuity b.ts");
+        Shell("cat a.ts b.ts > ab.ts");
+        StreamServer server({HttpStream(FileBytes(Path("ab.ts")))});
+        SourceOptions options = Live(server.Http());
+        options.reconnect = false;
+        source_ = OpenSource(options, notices_, nullptr);
+        return ReadAll(*source_);
+    }
+    std::unique_ptr<SourceInterface> source_;
+};
+
+class ClockStepBack : public ClockStep {};
+
+TEST_P(ClockStepBack, LosesNothingAndLeavesSoundAndPictureInStep) {
+    const auto units = ReadStep();
+    const SentMedia sent(Path("whole.ts"));
+    const auto pictures = sent.Find(Medium::kVideo, units);
+    ASSERT_EQ(pictures.size(), 100u);
+    for (std::size_t at = 0; at < pictures.size(); ++at) {
+        EXPECT_EQ(pictures[at].number, at);
+        // The grid follows by a tick a picture while only one medium has made the step.
+        EXPECT_NEAR(static_cast<double>(pictures[at].offset), static_cast<double>(pictures.front().offset),
+                    90);
+    }
+    const auto sounds = sent.Find(Medium::kAudio, units);
+    ASSERT_FALSE(sounds.empty());
+    for (const SentMedia::Arrival& sound : sounds) {
+        // Sound that steps before the picture is known to follow a step of the clock when the picture does.
+        if (sound.number < GetParam().sounds || sound.number >= 100) {
+            EXPECT_LE(std::abs(sound.offset - pictures.front().offset), 960) << sound.number;
+        }
+    }
+    EXPECT_GE(sounds.size(), sent.Sounds() - 4);
+    EXPECT_EQ(source_->Counts().lostFrames, 0u);
+    EXPECT_EQ(notices_.CountOf(string("the source's clock jumped by ") +
+                               (string(GetParam().seconds) == "-0.5"   ? "-500"
+                                : string(GetParam().seconds) == "-0.1" ? "-100"
+                                                                       : "-40") +
+                               " ms"),
+              1u)
+        << testing::PrintToString(notices_.sentences);
+}
+
+INSTANTIATE_TEST_SUITE_P(All, ClockStepBack,
+                         testing::Values(Step{"-0.5", 82}, Step{"-0.5", 95}, Step{"-0.5", 105},
+                                         Step{"-0.1", 95}, Step{"-0.1", 105}, Step{"-0.04", 82},
+                                         Step{"-0.04", 95}, Step{"-0.04", 105}));
+
+class ClockStepForward : public ClockStep {};
+
+/// As a loss of both media would: what stands behind it is the same, and nobody can tell.
+TEST_P(ClockStepForward, LeavesSoundAndPictureInStep) {
+    const auto units = ReadStep();
+    const SentMedia sent(Path("whole.ts"));
+    const auto pictures = sent.Find(Medium::kVideo, units);
+    ASSERT_EQ(pictures.size(), 100u);
+    const auto sounds = sent.Find(Medium::kAudio, units);
+    ASSERT_FALSE(sounds.empty());
+    for (const SentMedia::Arrival& sound : sounds) {
+        const bool before = sound.number < std::min<std::size_t>(GetParam().sounds, 93);
+        if (before || sound.number >= std::max<std::size_t>(GetParam().sounds, 100)) {
+            const std::int64_t offset = (before ? pictures.front() : pictures.back()).offset;
+            EXPECT_LE(std::abs(sound.offset - offset), 960) << sound.number;
+        }
+    }
+    const auto lost = static_cast<double>(source_->Counts().lostFrames);
+    EXPECT_NEAR(lost, std::stod(GetParam().seconds) * 25, 0.6);
+    EXPECT_NEAR(static_cast<double>(pictures.back().offset - pictures.front().offset), lost * 3600, 90);
+}
+
+INSTANTIATE_TEST_SUITE_P(All, ClockStepForward,
+                         testing::Values(Step{"0.5", 82}, Step{"0.5", 95}, Step{"0.5", 105},
+                                         Step{"0.04", 95}));
 
 }  // namespace
 }  // namespace receiver

@@ -88,6 +88,31 @@ TEST_F(NetworkSource, TransportStreamOverUdpComesWhole) {
     EXPECT_EQ(source->Counts().damagedPackets, 0u);
 }
 
+TEST_F(NetworkSource, APictureTellsWhenItArrivedHoweverLongTheSourceWasLookedAt) {
+    MakeMaterial("3");
+    for (const bool rtp : {false, true}) {
+        Ffmpeg("-i a.ts -c copy a.mp4");
+        endtoend::WriteSessionDescription(Path("a.mp4"), ports_, Path("a.sdp"));
+        const string url = "udp://127.0.0.1:" + Port();
+        steady_clock::time_point sent;
+        const auto source = OpenAndSend(Live(rtp ? Path("a.sdp") : url), ports_.First(), [&] {
+            sent = steady_clock::now();
+            return rtp ? endtoend::SendRtp(Path("a.mp4"), ports_)
+                       : endtoend::SendTransportStream(Path("a.ts"), url + "?pkt_size=1316");
+        });
+        const auto known = steady_clock::now();
+        const auto video = Of(Medium::kVideo, ReadPictures(*source, 2));
+        ASSERT_EQ(video.size(), 2u);
+        ASSERT_TRUE(video[0].arrived);
+        EXPECT_GT(*video[0].arrived, sent);
+        // 25 pictures were looked at, the last of which came 0.96 s behind the first one.
+        EXPECT_LT(*video[0].arrived, known - std::chrono::milliseconds(850));
+        EXPECT_NEAR(std::chrono::duration<double>(*video[1].arrived - *video[0].arrived).count(), 0.04,
+                    0.001);
+        EXPECT_EQ(sender_->Wait(), 0);
+    }
+}
+
 TEST_F(NetworkSource, SrtWithPassphraseComesWhole) {
     // A sender that ends takes along what it has not delivered by then.
     MakeMaterial("4");
@@ -218,6 +243,19 @@ TEST_F(NetworkSource, ASilentSourceIsLostAfterTheTimeout) {
         }
     }
     EXPECT_EQ(notices_.CountOf("the source was lost: no video came for 1 s; waiting for it"), 1u);
+}
+
+TEST_F(NetworkSource, PicturesThatADecoderHoldsWhenTheSourceFallsSilentAreNotLost) {
+    Ffmpeg(string("-f lavfi -i testsrc2=size=128x96:rate=25:duration=2") +
+           " -pix_fmt yuv420p -c:v libx264 -preset ultrafast -bf 3 -g 25 a.ts");
+    const string url = "udp://127.0.0.1:" + Port();
+    SourceOptions options = Live(url);
+    options.timeout = 1;
+    options.transcode = true;
+    const auto source = OpenAndSend(options, ports_.First(), [&] {
+        return endtoend::SendTransportStream(Path("a.ts"), url + "?pkt_size=1316");
+    });
+    ExpectSteady(Of(Medium::kVideo, ReadPictures(*source, 50)));
 }
 
 TEST_F(NetworkSource, TimeGoesOnWhileASilentSourceIsWaitedFor) {

@@ -45,6 +45,8 @@ class Process {
 
     pid_t Id() const { return pid_; }
     void Signal(int number) const;
+    /// The system's number of the process.
+    pid_t Id() const { return pid_; }
     /// On a pseudo terminal: presses keys.
     void Type(const std::string& keys) const;
     /// On a pseudo terminal: closes the window, so that the system hangs up. No more output is captured.

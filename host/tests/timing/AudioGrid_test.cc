@@ -131,22 +131,62 @@ TEST(AudioGrid, SilenceCanBeMadeWithoutASource) {
     EXPECT_EQ(grid.Next(4096 + 5), (Place{Action::kAccept, 4096}));
 }
 
-TEST(AudioGrid, ASourceThatBeginsAnewStandsAtTheNearestPlace) {
-    for (const std::int64_t offset : {-512, -300, 0, 300, 512}) {
+TEST(AudioGrid, ASourceThatBeginsAnewStandsWhereItIsAndSilenceLeadsUpToIt) {
+    for (const std::int64_t offset : {-512, -300, 0, 300, 511}) {
         AudioGrid grid;
-        ASSERT_EQ(grid.Next(0).action, AudioGrid::Action::kAccept);
+        grid.Next(0);
         grid.Rejoin();
-        EXPECT_EQ(grid.Next(1024 + offset).action, AudioGrid::Action::kAccept) << offset;
+        EXPECT_EQ(grid.Next(1024 + offset), (Place{Action::kAccept, 1024 + offset}));
+        EXPECT_EQ(grid.Next(2048 + offset), (Place{Action::kAccept, 2048 + offset}));
     }
     AudioGrid grid;
-    ASSERT_EQ(grid.Next(0).action, AudioGrid::Action::kAccept);
+    grid.Next(0);
     grid.Rejoin();
-    EXPECT_EQ(grid.Next(1024 + 513).action, AudioGrid::Action::kFill);
-    const AudioGrid::Place place = grid.Next(1024 + 513);
-    EXPECT_EQ(place.action, AudioGrid::Action::kAccept);
-    EXPECT_EQ(place.time, 2048);
+    EXPECT_EQ(grid.Next(1024 + 512), (Place{Action::kFill, 512}));
+    EXPECT_EQ(grid.Next(1024 + 512), (Place{Action::kAccept, 1536}));
     // From there on stamps may wander.
-    EXPECT_EQ(grid.Next(3072 + 700).action, AudioGrid::Action::kAccept);
+    EXPECT_EQ(grid.Next(2560 + 700), (Place{Action::kAccept, 2560}));
+}
+
+TEST(AudioGrid, WhatOverlapsAndWhatIsLeftOutDoesNotMoveASourceThatBeginsAnew) {
+    AudioGrid grid;
+    grid.Next(0);
+    grid.Rejoin();
+    EXPECT_EQ(grid.Next(511).action, Action::kOverlap);
+    EXPECT_EQ(grid.Next(1535), (Place{Action::kAccept, 1535}));
+}
+
+TEST(AudioGrid, CountsStayTogetherHoweverOftenASourceBeginsAnew) {
+    AudioGrid grid;
+    grid.Next(0);
+    std::int64_t frames = 1;
+    std::int64_t last = 0;
+    // Each time 0.4 frames late, 40 frames in all.
+    for (std::int64_t n = 1; n <= 100; ++n) {
+        const std::int64_t time = n * 1024 + n * 1024 * 2 / 5;
+        grid.Rejoin();
+        Place place = grid.Next(time);
+        for (; place.action == Action::kFill; place = grid.Next(time)) {
+            EXPECT_GT(place.time, last);
+            last = place.time;
+            ++frames;
+        }
+        EXPECT_EQ(place, (Place{Action::kAccept, time}));
+        EXPECT_GT(place.time, last);
+        last = place.time;
+        ++frames;
+    }
+    EXPECT_EQ(frames, 101 + 40);
+}
+
+TEST(AudioGrid, BehindAGapThatEndsARecordingFramesStandWhereTheyAre) {
+    AudioGrid grid;
+    grid.Next(0);
+    // 23.5 frames.
+    grid.AddVideoGap(1024, 24064, true);
+    EXPECT_EQ(grid.Next(1024).action, Action::kVideoMissing);
+    EXPECT_EQ(grid.Next(25088 + 100), (Place{Action::kAccept, 25188}));
+    EXPECT_EQ(grid.Next(26112 + 100), (Place{Action::kAccept, 26212}));
 }
 
 }  // namespace

@@ -1,0 +1,207 @@
+#include "source/PictureTiming.h"
+
+#include "SourceTesting.h"
+
+namespace receiver {
+namespace {
+
+using std::string;
+
+/// Writes syntax elements (ITU-T H.264 7.2).
+class BitWriter {
+ public:
+    /// u(n)
+    BitWriter& Number(std::uint64_t value, int width) {
+        for (int at = width - 1; at >= 0; --at) {
+            bits_ += (value >> at & 1U) != 0 ? '1' : '0';
+        }
+        return *this;
+    }
+    BitWriter& Flag(bool value) { return Number(value ? 1 : 0, 1); }
+    /// ue(v), 9.1
+    BitWriter& Exponential(std::uint32_t value) {
+        int width = 1;
+        while ((std::uint64_t{value} + 1) >> width != 0) {
+            ++width;
+        }
+        return Number(0, width - 1).Number(std::uint64_t{value} + 1, width);
+    }
+    /// Filled up with a bit 1 and zeros.
+    string Bytes() const {
+        string bits = bits_ + '1';
+        bits.resize((bits.size() + 7) / 8 * 8, '0');
+        string bytes;
+        for (std::size_t at = 0; at < bits.size(); at += 8) {
+            bytes += static_cast<char>(std::stoi(bits.substr(at, 8), nullptr, 2));
+        }
+        return bytes;
+    }
+
+ private:
+    string bits_;
+};
+
+/// A NAL unit with its start code and emulation prevention (7.4.1).
+string Unit(char header, const string& payload) {
+    string unit = string("\0\0\1", 3) + header;
+    int zeros = 0;
+    for (const char byte : payload) {
+        if (zeros >= 2 && static_cast<unsigned char>(byte) <= 3) {
+            unit += '\x03';
+            zeros = 0;
+        }
+        zeros = byte == 0 ? zeros + 1 : 0;
+        unit += byte;
+    }
+    return unit;
+}
+
+/// A picture timing message (D.1.3) with one clock timestamp, behind `delays` bits of buffering delays.
+string Message(const Timecode& timecode, unsigned int countingType, bool dropped = false, int delays = 0) {
+    const string payload = BitWriter()
+                               .Number(0, delays)
+                               .Number(0, 4)  // pic_struct: a frame
+                               .Flag(true)    // clock_timestamp_flag
+                               .Number(0, 3)  // ct_type, nuit_field_based_flag
+                               .Number(countingType, 5)
+                               .Flag(true)   // full_timestamp_flag
+                               .Flag(false)  // discontinuity_flag
+                               .Flag(dropped)
+                               .Number(timecode.frames, 8)
+                               .Number(timecode.seconds, 6)
+                               .Number(timecode.minutes, 6)
+                               .Number(timecode.hours, 5)
+                               .Number(0, 24)  // time_offset, which is so long where nothing else is told
+                               .Bytes();
+    return Unit('\x06', string("\x01", 1) + static_cast<char>(payload.size()) + payload + "\x80");
+}
+
+/// A sequence parameter set with everything that may stand in front of the decoder models' parameters, and
+/// these: delays of 16 and 10 bits.
+string FullParameterSet() {
+    BitWriter set;
+    set.Number(100, 8).Number(0, 8).Number(31, 8).Exponential(0);  // High, level 3.1, number 0
+    set.Exponential(1).Exponential(0).Exponential(0).Flag(false);  // 4:2:0, 8 bits
+    set.Flag(true).Flag(true);                                     // scaling matrix, its first list
+    set.Exponential(3).Exponential(15);                            // delta_scale 2, -8: the rest follows
+    set.Exponential(3);                                            // 2 + 10 - 8 - 4: next 4
+    for (int entry = 3; entry < 16; ++entry) {
+        set.Exponential(0);
+    }
+    set.Number(0, 7);    // the other lists
+    set.Exponential(0);  // log2_max_frame_num_minus4
+    set.Exponential(1);  // pic_order_cnt_type
+    set.Flag(false).Exponential(0).Exponential(0).Exponential(1).Exponential(2);
+    set.Exponential(1).Flag(false).Exponential(7).Exponential(5);
+    set.Flag(false).Flag(true).Flag(true);  // fields may be coded
+    set.Flag(true).Exponential(0).Exponential(0).Exponential(0).Exponential(4);
+    set.Flag(true);                               // vui_parameters_present_flag
+    set.Flag(true).Number(255, 8).Number(1, 32);  // aspect ratio
+    set.Flag(true).Flag(true);                    // overscan
+    set.Flag(true).Number(10, 4).Flag(true).Number(0x010101, 24);
+    set.Flag(true).Exponential(0).Exponential(0);  // chroma location
+    set.Flag(true).Number(1001, 32).Number(60000, 32).Flag(true);
+    set.Flag(true).Exponential(1).Number(0, 8);  // nal_hrd_parameters, two buffers
+    for (int buffer = 0; buffer < 2; ++buffer) {
+        set.Exponential(1000).Exponential(2000).Flag(false);
+    }
+    set.Number(23, 5).Number(15, 5).Number(9, 5).Number(24, 5);
+    set.Flag(false).Flag(false);  // vcl_hrd_parameters, low_delay_hrd_flag
+    set.Flag(true).Flag(false);   // pic_struct_present_flag, bitstream_restriction_flag
+    return Unit('\x67', set.Bytes());
+}
+
+bool DropFrameIn(const string& stream) {
+    PictureTiming timing;
+    timing.Look(NalUnits({reinterpret_cast<const unsigned char*>(stream.data()), stream.size()}));
+    return timing.DropFrame();
+}
+
+constexpr Timecode kTime{10, 20, 30, 4, false};
+/// Lengths of the delays of `FullParameterSet`.
+constexpr int kDelays = 16 + 10;
+
+TEST(PictureTiming, TheDropFrameRuleIsReadBehindAllThatMayStandInFrontOfIt) {
+    EXPECT_TRUE(DropFrameIn(FullParameterSet() + Message(kTime, 4, false, kDelays)));
+    EXPECT_FALSE(DropFrameIn(FullParameterSet() + Message(kTime, 1, false, kDelays)));
+    EXPECT_FALSE(DropFrameIn(FullParameterSet() + Message(kTime, 0, true, kDelays)));
+}
+
+TEST(PictureTiming, ADroppedNumberIsEnoughWithACountingTypeThatDrops) {
+    EXPECT_TRUE(DropFrameIn(FullParameterSet() + Message(kTime, 6, true, kDelays)));
+    EXPECT_FALSE(DropFrameIn(FullParameterSet() + Message(kTime, 6, false, kDelays)));
+}
+
+TEST(PictureTiming, MessagesWithoutAParameterSetAreNotUnderstood) {
+    EXPECT_FALSE(DropFrameIn(Message(kTime, 4)));
+}
+
+TEST(PictureTiming, WhatIsCutShortIsNotUnderstood) {
+    const string set = FullParameterSet();
+    const string message = Message(kTime, 4, false, kDelays);
+    for (std::size_t size = 0; size < set.size() - 4; ++size) {
+        DropFrameIn(set.substr(0, size) + message);
+    }
+    for (std::size_t size = 0; size < 10; ++size) {
+        EXPECT_FALSE(DropFrameIn(set + message.substr(0, size))) << size;
+    }
+}
+
+class PictureTimingOfFiles : public SourceTest {
+ protected:
+    /// A second of pictures whose IDR frames, every 12, have these timecodes.
+    void Make(const string& rate, const std::vector<Timecode>& timecodes, unsigned int countingType) const {
+        // A parameter set that announces the messages, without the encoder's own.
+        Ffmpeg("-f lavfi -i testsrc2=size=128x96:duration=1:rate=" + rate + kPlainH264 +
+               "-x264-params pic-struct=1 -bsf:v filter_units=remove_types=6 a.h264");
+        const string plain = FileBytes(Path("a.h264"));
+        string timed;
+        std::size_t from = 0;
+        for (const Timecode& timecode : timecodes) {
+            const std::size_t idr = plain.find(string("\0\0\1\x65", 4), from);
+            ASSERT_NE(idr, string::npos);
+            timed += plain.substr(from, idr - from) + Message(timecode, countingType) + plain.substr(idr, 4);
+            from = idr + 4;
+        }
+        timed += plain.substr(from);
+        std::FILE* const file = std::fopen(Path("timed.h264").c_str(), "wb");
+        std::fwrite(timed.data(), 1, timed.size(), file);
+        ASSERT_EQ(std::fclose(file), 0);
+        Ffmpeg("-r " + rate + " -i timed.h264 -c copy timed.ts");
+    }
+};
+
+TEST_F(PictureTimingOfFiles, TimecodesOfIdrFramesAreReadAndCountedOn) {
+    Make("25", {{9, 8, 7, 20, false}, {9, 8, 8, 7, false}, {9, 8, 8, 19, false}}, 0);
+    const auto video = Of(Medium::kVideo, ReadFile("timed.ts"));
+    ASSERT_EQ(video.size(), 25u);
+    EXPECT_EQ(video[0].timecode, (Timecode{9, 8, 7, 20, false}));
+    EXPECT_EQ(video[4].timecode, (Timecode{9, 8, 7, 24, false}));
+    EXPECT_EQ(video[5].timecode, (Timecode{9, 8, 8, 0, false}));
+    EXPECT_EQ(video[24].timecode, (Timecode{9, 8, 8, 19, false}));
+}
+
+TEST_F(PictureTimingOfFiles, TheCountingTypeTellsOfDropFrameWithoutADroppedNumber) {
+    Make("30000/1001", {{10, 0, 59, 20, false}, {10, 1, 0, 4, false}, {10, 1, 0, 16, false}}, 4);
+    for (const bool transcode : {false, true}) {
+        SourceOptions options = Fast("timed.ts");
+        options.transcode = transcode;
+        options.width = transcode ? std::optional<std::uint32_t>(64) : std::nullopt;
+        const auto video = Of(Medium::kVideo, ReadAll(*OpenSource(options, notices_, nullptr)));
+        ASSERT_GE(video.size(), 29u);
+        EXPECT_EQ(video[0].timecode, (Timecode{10, 0, 59, 20, true}));
+        EXPECT_EQ(video[9].timecode, (Timecode{10, 0, 59, 29, true}));
+        EXPECT_EQ(video[10].timecode, (Timecode{10, 1, 0, 2, true}));
+        EXPECT_EQ(video[28].timecode, (Timecode{10, 1, 0, 20, true}));
+    }
+}
+
+TEST_F(PictureTimingOfFiles, WithoutThatCountingTypeNoNumbersAreDropped) {
+    Make("30000/1001", {{10, 0, 59, 20, false}}, 1);
+    const auto video = Of(Medium::kVideo, ReadFile("timed.ts"));
+    ASSERT_GE(video.size(), 29u);
+    EXPECT_EQ(video[10].timecode, (Timecode{10, 1, 0, 0, false}));
+}
+
+}  // namespace
+}  // namespace receiver
