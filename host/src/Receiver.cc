@@ -53,13 +53,13 @@ void GiveToGroup() {
     umask(mask & ~static_cast<mode_t>(0070));
 }
 
-void CheckUser(const Options& options, const std::string& folder) {
-    if (options.user && !folder.starts_with("//")) {
+void CheckUser(const Options& options, const OutputPlace& place) {
+    if (options.user && !place.onShare) {
         throw ReceiverError(
             ExitCode::kUsage,
             "--user goes with a folder on a network share, such as //server/share/folder, and "
             "the output folder '" +
-                folder + "' is none.");
+                place.folder + "' is none.");
     }
 }
 
@@ -213,7 +213,7 @@ ExitCode Running::Record(const SourceOpener& open) {
     }
     const SettingsFile settings(options_.settings, options_.maxMinutes);
     const OutputPlace place = PlaceOf(options_);
-    CheckUser(options_, place.folder);
+    CheckUser(options_, place);
     PrepareOutput(place);
     const ModuleLibrary library(options_.module.value_or(ModuleLibrary::DefaultFile()));
     ModuleLog log;
