@@ -7,6 +7,7 @@
 #include <iterator>
 
 #include "endtoend/ReceiverFixture.h"
+#include "support/Judges.h"
 #include "support/Material.h"
 
 namespace endtoend {
@@ -43,8 +44,14 @@ TEST_F(IncompleteTest, AStreamWithoutAnIdrFrame) {
     MaterialOptions options;
     options.pictureGroup = 25;
     options.more = {"-x264-params", "intra-refresh=1:scenecut=0"};
-    ExpectIncomplete({"--input", Tail(MakeMaterial(folder, options)).string(), "--speed", "8"},
+    const std::string tail = Tail(MakeMaterial(folder, options)).string();
+    ExpectIncomplete({"--input", tail, "--speed", "8"},
                      "nothing was recorded: the source has sent no IDR frame", 0);
+    const Outcome converted = RunReceiver({"--input", tail, "--speed", "8", "--transcode"});
+    EXPECT_EQ(converted.code, 0) << converted.errors;
+    EXPECT_THAT(converted.errors, HasSubstr("video is converted"));
+    ASSERT_THAT(Recordings(), SizeIs(1));
+    EXPECT_EQ(DecodeVideo(Recordings().front()).messages, "");
 }
 
 TEST_F(IncompleteTest, ARangeThatIsShorterThanTheGroupOfPictures) {

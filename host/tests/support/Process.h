@@ -43,9 +43,9 @@ class Process {
     /// Standard output, then standard error.
     std::string AllText() const;
 
+    void Signal(int number) const;
     /// The system's number of the process.
     pid_t Id() const { return pid_; }
-    void Signal(int number) const;
     /// On a pseudo terminal: presses keys.
     void Type(const std::string& keys) const;
     /// On a pseudo terminal: closes the window, so that the system hangs up. No more output is captured.
