@@ -21,7 +21,6 @@ using ::testing::HasSubstr;
 using ::testing::IsEmpty;
 using ::testing::SizeIs;
 
-constexpr int kOutput = 6;
 constexpr uid_t kNobody = 65534;
 
 mode_t ModeOf(const std::filesystem::path& path) {
