@@ -1,10 +1,10 @@
-#include "recover/Decoders.h"
+#include "media/Decoders.h"
 
 #include <algorithm>
 #include <cstring>
 #include <new>
 
-#include "recover/NalUnits.h"
+#include "media/NalUnits.h"
 
 extern "C" {
 #include <libavcodec/avcodec.h>
