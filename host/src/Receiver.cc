@@ -11,6 +11,7 @@
 #include <utility>
 #include <vector>
 
+#include "GroupWatch.h"
 #include "OutputFolder.h"
 #include "QxRegistry.h"
 #include "Recorder.h"
@@ -119,6 +120,14 @@ StartParameters ParametersOf(const Options& options, const std::string& output,
     return parameters;
 }
 
+/// Minutes of a file, by the module's rule.
+std::int64_t FileLength() {
+    constexpr unsigned int kUsual = 120;
+    unsigned int minutes = 0;
+    const bool stored = QxRegistry::GetInstance()->getValue("Qx/Other/MP4FileOut", "MP4MaxFileSize", minutes);
+    return stored ? minutes : kUsual;
+}
+
 void CheckTimecode(const Options& options, const FrameRate& rate) {
     if (!options.timecode) {
         return;
@@ -193,6 +202,7 @@ class Running final : public SourceListenerInterface {
     Host* host_ = nullptr;
     RecordPlan plan_{options_.record};
     StreamRates rates_;
+    std::optional<GroupWatch> groups_;
     std::vector<WrittenFile> files_;
     std::string openFile_;
     std::uint64_t faults_ = 0;
@@ -242,6 +252,11 @@ ExitCode Running::Record(const SourceOpener& open) {
             session.GoOnline();
         }
         Recorder recorder(recorderSettings, session, log, plan_);
+        // A run that is shorter than a file has one only.
+        if (const std::int64_t minutes = FileLength();
+            !options_.seconds || *options_.seconds > static_cast<double>(minutes * 60)) {
+            groups_.emplace(recorderSettings.frameRate, minutes, options_.source.pictureGroup);
+        }
         try {
             Loop(*source, recorder);
         } catch (const ReceiverError& error) {
@@ -279,6 +294,9 @@ void Running::Loop(SourceInterface& source, Recorder& recorder) {
         }
         if (result == SourceInterface::Result::kUnit) {
             rates_.Count(unit);
+            if (const auto notice = groups_ ? groups_->Look(unit) : std::nullopt) {
+                display_.Notice(*notice);
+            }
             recorder.Put(std::move(unit));
         }
         if (result == SourceInterface::Result::kIdle && source.Counts().away) {
