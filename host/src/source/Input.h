@@ -36,9 +36,9 @@ class Stopped : public std::runtime_error {
 class Input {
  public:
     /// Opens `url` and finds out what it carries. `patience`: seconds that it may take to answer. `timeout`:
-    /// seconds that may pass later between two calls of `Alive`, 30 at the least for HLS. `stop` may be null; it is asked until this
-    /// returns. Throws `ReceiverError` (`kSourceUnavailable`), of it `SourceAbsent` where a later attempt may
-    /// succeed, and `Stopped`.
+    /// seconds that may pass later between two calls of `Alive`, 30 at the least for HLS. `stop` may be null;
+    /// it is asked until this returns. Throws `ReceiverError` (`kSourceUnavailable`), of it `SourceAbsent`
+    /// where a later attempt may succeed, and `Stopped`.
     Input(const std::string& url, double timeout, double patience, std::shared_ptr<Interrupt> interrupt,
           bool (*stop)());
 
