@@ -27,12 +27,14 @@ endif()
 target_link_options(clipfile_sanitizers INTERFACE ${_flags})
 
 # Log lines carry source paths; they are relative to the tree whatever folder it was built in. A compiler cache makes
-# them relative to the build folder, and another clone finds its objects only where no option names the tree.
+# the paths that it is given relative to the build folder, and another clone finds its objects only where no option names
+# the tree. A unity build names the tree in the sources that it makes.
 add_library(clipfile_paths INTERFACE)
 if(CLIPFILE_COMPILER_CACHE)
     file(RELATIVE_PATH _root "${CMAKE_BINARY_DIR}" "${PROJECT_SOURCE_DIR}")
     target_compile_options(clipfile_paths INTERFACE "-fmacro-prefix-map=${_root}=")
-else()
+endif()
+if(CMAKE_UNITY_BUILD OR NOT CLIPFILE_COMPILER_CACHE)
     target_compile_options(clipfile_paths INTERFACE "-fmacro-prefix-map=${PROJECT_SOURCE_DIR}/=")
 endif()
 

@@ -79,7 +79,7 @@ function(clipfile_add_test name)
 endfunction()
 
 function(clipfile_check_tests_registered)
-    set(roots libs modules host bench fuzz)
+    set(roots libs modules host clipfile bench fuzz)
     list(TRANSFORM roots PREPEND "${PROJECT_SOURCE_DIR}/")
     list(TRANSFORM roots APPEND "/*_test.cc" OUTPUT_VARIABLE patterns)
     file(GLOB_RECURSE found CONFIGURE_DEPENDS ${patterns})

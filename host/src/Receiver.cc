@@ -1,28 +1,36 @@
 #include "Receiver.h"
 
 #include <stdlib.h>
+#include <sys/stat.h>
 
-#include <atomic>
 #include <chrono>
+#include <ctime>
 #include <exception>
-#include <filesystem>
 #include <memory>
 #include <optional>
 #include <utility>
 #include <vector>
 
+<<<<<<< HEAD
 #include "GroupWatch.h"
 #include "OutputFolder.h"
 #include "QxRegistry.h"
+=======
+>>>>>>> ec6f36eb7a6d9e0f7eb4793bdd78337611b44474
 #include "Recorder.h"
+#include "Shortfalls.h"
 #include "StreamRates.h"
-#include "common/NativePath.h"
 #include "module/Host.h"
 #include "module/ModuleLibrary.h"
 #include "module/ModuleLog.h"
 #include "module/ModuleSession.h"
 #include "module/SettingsFile.h"
+#include "operator/CommandQueue.h"
 #include "operator/Keyboard.h"
+#include "output/FolderWatch.h"
+#include "output/ModuleLogFile.h"
+#include "output/OutputFolder.h"
+#include "output/OutputPlace.h"
 
 namespace receiver {
 namespace {
@@ -30,75 +38,41 @@ namespace {
 using Clock = std::chrono::steady_clock;
 
 constexpr std::chrono::milliseconds kDisplayInterval{250};
-constexpr std::chrono::seconds kFreeSpaceInterval{1};
 /// The run ends with the frame behind the last one; when the stream has dried up, nobody waits for it.
 constexpr std::chrono::seconds kFinishPatience{2};
-constexpr const char* kDefaultOutput = "recordings";
-/// What the module takes for an output path that is not set.
-constexpr const char* kFromStore = "none";
 
 /// A fault of the stream; the recording begins anew.
 constexpr int kStatusFault = 6;
 /// With it: the host went offline, which is how each run ends.
 constexpr int kCauseOffline = 26;
 
-/// The signals of the run, for the one callback that knows of no object.
-std::atomic<Signals*> currentSignals{nullptr};
-
-bool QuitRequested() {
-    Signals* const signals = currentSignals;
-    return signals != nullptr && signals->QuitRequested();
-}
+constexpr const char* kOneRecording =
+    "in mode on the whole run is one recording; --mode sync takes record commands";
 
 std::string WithFullStop(std::string sentence) {
     return sentence.ends_with('.') ? sentence : sentence + ".";
 }
 
-/// Where files go.
-struct Output {
-    /// What the module is told: the folder, or that it is to take the one of the settings store.
-    std::string parameter;
-    std::string folder;
-};
-
-/// The module's rule, with an output of our own where it would refuse: start parameter, else settings store.
-Output OutputOf(const Options& options) {
-    std::string path;
-    const bool stored = !options.output &&
-                        QxRegistry::GetInstance()->getValue("Qx/Other/MP4FileOut", "MP4OutputPath", path) &&
-                        !path.empty();
-    if (!stored) {
-        path = options.output.value_or(kDefaultOutput);
-    }
-    std::string folder = NativePath(path);
-    while (folder.size() > 1 && folder.ends_with('/')) {
-        folder.pop_back();
-    }
-    if (stored) {
-        return {kFromStore, folder};
-    }
-    if (folder == kFromStore) {
-        folder = "./" + folder;
-    }
-    return {folder, folder};
+/// From now on the group may do with files and folders of this process what their owner may.
+void GiveToGroup() {
+    const mode_t mask = umask(0077);
+    umask(mask & ~static_cast<mode_t>(0070));
 }
 
-void SetUpLog(const Options& options, const std::string& output) {
-    const char* const set = getenv("QX_LOG");
-    if (options.log) {
-        setenv("QX_LOG", *options.log == "-" ? "" : options.log->c_str(), 1);
-    } else if (set == nullptr || *set == '\0') {
-        setenv("QX_LOG", (output + "/receiver.log").c_str(), 1);
-    }
-    if (options.logPriority) {
-        setenv("QX_LOG_PRIORITY", std::to_string(*options.logPriority).c_str(), 1);
+void CheckUser(const Options& options, const std::string& folder) {
+    if (options.user && !folder.starts_with("//")) {
+        throw ReceiverError(
+            ExitCode::kUsage,
+            "--user goes with a folder on a network share, such as //server/share/folder, and "
+            "the output folder '" +
+                folder + "' is none.");
     }
 }
 
-StartParameters ParametersOf(const Options& options, const std::string& output,
+StartParameters ParametersOf(const Options& options, const OutputPlace& place,
                              const SourceDescription& description) {
     StartParameters parameters;
-    parameters.texts = {{"-outputPath", output},
+    parameters.texts = {{"-outputPath", place.parameter},
                         {"-fileType", options.fileType},
                         {"-naluType", options.naluType},
                         {"-outputMode", options.mode == OutputMode::kOn ? "on" : "sync"},
@@ -168,25 +142,38 @@ Recorder::Settings RecorderSettings(const Options& options, const FrameRate& rat
 class Running final : public SourceListenerInterface {
  public:
     Running(const Options& options, Signals& signals, DisplayInterface& display, int keyboard)
-        : options_(options), signals_(signals), display_(display), keyboard_(keyboard) {}
+        : options_(options), signals_(signals), display_(display), keyboard_(keyboard) {
+        current = this;
+    }
+    ~Running() { current = nullptr; }
+    Running(const Running&) = delete;
+    Running& operator=(const Running&) = delete;
 
     void OnNotice(const std::string& sentence) override { display_.Notice(sentence); }
 
     ExitCode Record(const SourceOpener& open);
 
  private:
+    void PrepareOutput(const OutputPlace& place);
     void Loop(SourceInterface& source, Recorder& recorder);
+    void CheckFolder();
     void TakeCommands(Recorder& recorder);
-    void TakeKey(char key, Recorder& recorder);
-    void StartRecording();
-    void StopRecording();
+    void TakeKeys();
+    void TakeKey(char key);
+    void Command(RecordCommand command);
+    void TellChanges(Recorder& recorder);
+    void TellMissed();
+    static bool QuitAsked();
     void TellLateStops(const Recorder& recorder);
     void TakeStatuses(bool ending);
     void TakeModuleEvents();
     void FileClosed(const std::string& path);
     void Show(const SourceInterface& source, const Recorder& recorder);
     std::uint64_t Lost(const SourceInterface& source) const;
-    Summary Summarise(const SourceInterface& source) const;
+    Summary Summarise(const SourceInterface& source, const Recorder::Progress& past);
+
+    /// The run, for the one callback that knows of no object. It comes on the thread of the run.
+    static Running* current;
 
     struct WrittenFile {
         std::string path;
@@ -197,38 +184,57 @@ class Running final : public SourceListenerInterface {
     Signals& signals_;
     DisplayInterface& display_;
     Keyboard keyboard_;
-    std::string output_;
+    std::unique_ptr<OutputFolder> folder_;
+    std::optional<FolderWatch> watch_;
     ModuleLog* log_ = nullptr;
     Host* host_ = nullptr;
     RecordPlan plan_{options_.record};
+    CommandQueue commands_;
+    /// The operator ends the run.
+    bool quit_ = false;
     StreamRates rates_;
     std::optional<GroupWatch> groups_;
     std::vector<WrittenFile> files_;
     std::string openFile_;
     std::uint64_t faults_ = 0;
     std::uint64_t lateStops_ = 0;
+    /// Recordings of which there is nothing.
+    bool missed_ = false;
     ModuleStatus told_;
     /// The source has become another one.
     bool changed_ = false;
     std::optional<Clock::time_point> finishSince_;
     Clock::time_point shown_{};
-    Clock::time_point spaceRead_{};
-    std::optional<std::uint64_t> freeBytes_;
 };
 
-ExitCode Running::Record(const SourceOpener& open) {
-    const SettingsFile settings(options_.settings, options_.maxMinutes);
-    const Output output = OutputOf(options_);
-    output_ = output.folder;
-    if (PrepareOutputFolder(output_)) {
-        display_.Notice("made the output folder " + output_);
+Running* Running::current = nullptr;
+
+void Running::PrepareOutput(const OutputPlace& place) {
+    if (options_.groupWrite) {
+        GiveToGroup();
     }
-    SetUpLog(options_, output_);
+    folder_ = OpenOutputFolder(place);
+    if (folder_->Prepare()) {
+        display_.Notice("made the output folder " + place.folder);
+    }
+    ExpectDatedFolders(*folder_, place.prefix, std::time(nullptr));
+    SetUpLog(options_, place);
+    watch_.emplace(OpenOutputFolder(place), place.prefix);
+}
+
+ExitCode Running::Record(const SourceOpener& open) {
+    if (options_.mode == OutputMode::kOn) {
+        commands_.Close(kOneRecording);
+    }
+    const SettingsFile settings(options_.settings, options_.maxMinutes);
+    const OutputPlace place = PlaceOf(options_);
+    CheckUser(options_, place.folder);
+    PrepareOutput(place);
     const ModuleLibrary library(options_.module.value_or(ModuleLibrary::DefaultFile()));
     ModuleLog log;
     log_ = &log;
 
-    const std::unique_ptr<SourceInterface> source = open(options_.source, *this, QuitRequested);
+    const std::unique_ptr<SourceInterface> source = open(options_.source, *this, QuitAsked);
     if (source == nullptr) {
         display_.Finish({});
         return ExitCode::kSuccess;
@@ -244,19 +250,22 @@ ExitCode Running::Record(const SourceOpener& open) {
     do {
         changed_ = false;
         recorderSettings.frameRate = source->Description().frameRate;
-        hosts.push_back(
-            std::make_unique<Host>(ParametersOf(options_, output.parameter, source->Description())));
+        hosts.push_back(std::make_unique<Host>(ParametersOf(options_, place, source->Description())));
         host_ = hosts.back().get();
         ModuleSession session(library.Module(), *host_);
         if (options_.mode == OutputMode::kSync) {
             session.GoOnline();
         }
+<<<<<<< HEAD
         Recorder recorder(recorderSettings, session, log, plan_);
         // A run that is shorter than a file has one only.
         if (const std::int64_t minutes = FileLength();
             !options_.seconds || *options_.seconds > static_cast<double>(minutes * 60)) {
             groups_.emplace(recorderSettings.frameRate, minutes, options_.source.pictureGroup);
         }
+=======
+        Recorder recorder(recorderSettings, session, log, plan_, commands_);
+>>>>>>> ec6f36eb7a6d9e0f7eb4793bdd78337611b44474
         try {
             Loop(*source, recorder);
         } catch (const ReceiverError& error) {
@@ -265,6 +274,8 @@ ExitCode Running::Record(const SourceOpener& open) {
         if (!host_->Failed()) {
             recorder.Close();
         }
+        recorder.NoteEnd();
+        TellChanges(recorder);
         TellLateStops(recorder);
         TakeStatuses(false);
         session.End();
@@ -274,7 +285,10 @@ ExitCode Running::Record(const SourceOpener& open) {
         plan_.Interrupt();
     } while (changed_ && !host_->Failed());
 
-    Summary summary = Summarise(*source);
+    commands_.Close("the run is over");
+    plan_.Finish();
+    TellMissed();
+    Summary summary = Summarise(*source, *recorderSettings.past);
     if (failure) {
         summary.exitCode = failure->Code();
     }
@@ -308,7 +322,10 @@ void Running::Loop(SourceInterface& source, Recorder& recorder) {
             return;
         }
         TellLateStops(recorder);
+        CheckFolder();
         TakeCommands(recorder);
+        TellChanges(recorder);
+        TellMissed();
         if (recorder.Finishing()) {
             finishSince_ = finishSince_.value_or(Clock::now());
             if (recorder.Done() || Clock::now() - *finishSince_ > kFinishPatience) {
@@ -321,58 +338,94 @@ void Running::Loop(SourceInterface& source, Recorder& recorder) {
     }
 }
 
+void Running::CheckFolder() {
+    if (const std::optional<std::string> warning = watch_->TakeWarning()) {
+        display_.Notice("tomorrow nothing can be recorded: " + *warning);
+    }
+    const std::string obstacle = watch_->Obstacle();
+    if (!obstacle.empty()) {
+        throw ReceiverError(ExitCode::kOutput, obstacle);
+    }
+}
+
 void Running::TakeCommands(Recorder& recorder) {
     const SignalCommands commands = signals_.Take();
-    if (commands.start) {
-        StartRecording();
-    }
-    if (commands.stop) {
-        StopRecording();
+    for (const RecordCommand command : commands.record) {
+        Command(command);
     }
     if (commands.hangup) {
         keyboard_.Abandon();
         display_.Notice("the terminal is gone; the run goes on until SIGTERM");
     }
+    TakeKeys();
     if (commands.quit && !recorder.Finishing()) {
         display_.Notice("ending in order; a second signal ends at once");
+    }
+    commands_.Apply(plan_);
+    if ((quit_ || commands.quit) && !recorder.Finishing()) {
+        quit_ = true;
         recorder.Finish();
     }
-    if (const std::optional<char> key = keyboard_.Take()) {
-        TakeKey(*key, recorder);
+}
+
+bool Running::QuitAsked() {
+    Running* const run = current;
+    if (run == nullptr) {
+        return false;
+    }
+    run->TakeKeys();
+    return run->quit_ || run->signals_.QuitRequested();
+}
+
+void Running::TakeKeys() {
+    while (const std::optional<char> key = keyboard_.Take()) {
+        TakeKey(*key);
     }
 }
 
-void Running::TakeKey(char key, Recorder& recorder) {
+void Running::TakeKey(char key) {
     switch (key) {
         case 'r':
-            StartRecording();
+            Command(RecordCommand::kStart);
             break;
         case 's':
-            StopRecording();
+            Command(RecordCommand::kStop);
+            break;
+        case 'n':
+            Command(RecordCommand::kSplit);
             break;
         case 'q':
-            recorder.Finish();
+            quit_ = true;
             break;
         default:
-            display_.Notice("keys: r records, s stops, q ends");
+            display_.Notice("keys: r records, s stops, n goes on in a new file, q ends");
             break;
     }
 }
 
-void Running::StartRecording() {
-    if (options_.mode == OutputMode::kOn) {
-        display_.Notice("in mode on the whole run is one recording; --mode sync takes record commands");
-        return;
-    }
-    plan_.Start();
+void Running::Command(RecordCommand command) {
+    commands_.Post(command, [this](const CommandResult& result) {
+        if (!result.reason.empty()) {
+            display_.Notice("no effect: " + result.reason);
+        }
+    });
 }
 
-void Running::StopRecording() {
-    if (options_.mode == OutputMode::kOn) {
-        display_.Notice("in mode on the whole run is one recording; --mode sync takes record commands");
-        return;
+void Running::TellChanges(Recorder& recorder) {
+    for (const Recorder::Change& change : recorder.TakeChanges()) {
+        if (change.begins) {
+            display_.RecordStarted(change.at);
+        } else {
+            display_.RecordStopped(change.at);
+        }
     }
-    plan_.Stop();
+}
+
+void Running::TellMissed() {
+    for (const MissedRecording& missed : plan_.TakeMissed()) {
+        missed_ = true;
+        display_.Notice(Describe(missed));
+    }
 }
 
 void Running::TellLateStops(const Recorder& recorder) {
@@ -439,10 +492,6 @@ void Running::FileClosed(const std::string& path) {
 
 void Running::Show(const SourceInterface& source, const Recorder& recorder) {
     shown_ = Clock::now();
-    if (shown_ - spaceRead_ >= kFreeSpaceInterval) {
-        spaceRead_ = shown_;
-        freeBytes_ = FreeBytes(output_);
-    }
     TakeModuleEvents();
     TakeStatuses(false);
     Snapshot snapshot;
@@ -451,14 +500,13 @@ void Running::Show(const SourceInterface& source, const Recorder& recorder) {
     snapshot.recording = options_.mode == OutputMode::kOn ? log_->OpenRecordings() > 0 : plan_.Recording();
     snapshot.waiting =
         recorder.LastTimecode() && options_.mode == OutputMode::kSync && plan_.Wanted() && !plan_.Recording();
-    snapshot.since = recorder.Since();
     snapshot.framesPerSecond = rates_.FramesPerSecond();
     snapshot.videoKilobits = rates_.VideoKilobits();
     snapshot.audioKilobits = rates_.AudioKilobits();
     snapshot.klvPackets = rates_.KlvPackets();
     snapshot.status = host_->Status();
     snapshot.file = openFile_;
-    snapshot.freeBytes = freeBytes_;
+    snapshot.freeBytes = watch_->FreeBytes();
     snapshot.lost = Lost(source);
     display_.Show(snapshot);
 }
@@ -468,19 +516,34 @@ std::uint64_t Running::Lost(const SourceInterface& source) const {
     return log_->Losses().Total() + counts.lostFrames + counts.damagedPackets;
 }
 
-Summary Running::Summarise(const SourceInterface& source) const {
-    Summary summary;
+Summary Running::Summarise(const SourceInterface& source, const Recorder::Progress& past) {
+    RunRecord run;
+    run.endedByOperator = quit_;
+    run.anyFrame = past.firstFrame.has_value();
+    run.recordedFrames = past.recorded;
+    run.oneRecording = options_.mode == OutputMode::kOn;
+    run.length = run.anyFrame ? past.lastFrame - *past.firstFrame : 0;
+    run.unreached = plan_.Unreached();
+    const SourceCounts counts = source.Counts();
+    run.silentFrames = counts.silentFrames;
     for (const WrittenFile& file : files_) {
         // One that could not be made was announced and has told why.
-        if (file.closed || std::filesystem::exists(file.path)) {
-            summary.files.push_back(ReadBack(file.path));
+        if (file.closed || folder_->Exists(file.path)) {
+            run.files.push_back(folder_->ReadBackFile(file.path));
         }
     }
+    const std::vector<std::string> shortfalls =
+        host_->Failed() ? std::vector<std::string>() : ShortfallsOf(run);
+    for (const std::string& shortfall : shortfalls) {
+        display_.Notice(shortfall);
+    }
+    Summary summary;
+    summary.files = std::move(run.files);
     summary.lost = Lost(source);
     if (host_->Failed()) {
         summary.exitCode = ExitCode::kRecordingFailed;
-    } else if (summary.lost != 0 || faults_ != 0 || lateStops_ != 0 || source.Counts().reconnections != 0 ||
-               source.Counts().changes != 0) {
+    } else if (summary.lost != 0 || faults_ != 0 || lateStops_ != 0 || missed_ || !shortfalls.empty() ||
+               counts.reconnections != 0 || counts.changes != 0) {
         summary.exitCode = ExitCode::kLost;
     }
     return summary;
@@ -490,7 +553,6 @@ Summary Running::Summarise(const SourceInterface& source) const {
 
 ExitCode RunReceiver(const Options& options, const SourceOpener& open, Signals& signals,
                      DisplayInterface& display, int keyboard) {
-    currentSignals = &signals;
     ExitCode code = ExitCode::kInternal;
     try {
         code = Running(options, signals, display, keyboard).Record(open);
@@ -500,7 +562,6 @@ ExitCode RunReceiver(const Options& options, const SourceOpener& open, Signals& 
     } catch (const std::exception& error) {
         display.Failure(code, WithFullStop(error.what()));
     }
-    currentSignals = nullptr;
     return code;
 }
 

@@ -31,6 +31,11 @@ std::int64_t Period(const FrameRate& rate) {
     return kVideoClock * rate.denominator / rate.numerator;
 }
 
+Timecode Following(const Timecode& timecode, const FrameRate& rate) {
+    return TimecodeOf(FrameNumberOf(timecode, rate.timecodeFrames) + 1, rate.timecodeFrames,
+                      timecode.dropFrame);
+}
+
 /// The same moment in another count of frames.
 Timecode AtRate(Timecode timecode, const FrameRate& from, const FrameRate& to, bool dropFrame) {
     timecode.frames = static_cast<std::uint8_t>(timecode.frames * to.timecodeFrames / from.timecodeFrames);
@@ -41,10 +46,22 @@ Timecode AtRate(Timecode timecode, const FrameRate& from, const FrameRate& to, b
     return timecode;
 }
 
+/// The last instant that the module tells from `time`: it looks at whole milliseconds.
+std::int64_t JustBefore(std::int64_t time) {
+    constexpr std::int64_t kMillisecond = kVideoClock / 1000;
+    return time / kMillisecond * kMillisecond - 1;
+}
+
 }  // namespace
 
-Recorder::Recorder(const Settings& settings, ModuleSession& session, const ModuleLog& log, RecordPlan& plan)
-    : settings_(settings), session_(session), log_(log), plan_(plan), feed_(session.Stream()) {
+Recorder::Recorder(const Settings& settings, ModuleSession& session, const ModuleLog& log, RecordPlan& plan,
+                   CommandQueue& commands)
+    : settings_(settings),
+      session_(session),
+      log_(log),
+      plan_(plan),
+      commands_(commands),
+      feed_(session.Stream()) {
     if (!settings_.past) {
         return;
     }
@@ -52,14 +69,14 @@ Recorder::Recorder(const Settings& settings, ModuleSession& session, const Modul
     firstFrame_ = past.firstFrame;
     lastFrame_ = past.lastFrame;
     lateStops_ = past.lateStops;
+    recorded_ = past.recorded;
     timecode_ = past.timecode;
     if (past.timecode) {
         // The present rate's frame in front of the one that would have come next.
         const FrameRate& from = past.frameRate;
         const FrameRate& to = settings_.frameRate;
-        const Timecode due = TimecodeOf(FrameNumberOf(*past.timecode, from.timecodeFrames) + 1,
-                                        from.timecodeFrames, past.timecode->dropFrame);
-        const Timecode next = AtRate(due, from, to, to.dropFrame && settings_.dropFrame);
+        const Timecode next =
+            AtRate(Following(*past.timecode, from), from, to, to.dropFrame && settings_.dropFrame);
         counter_.emplace(
             to, TimecodeOf(FrameNumberOf(next, to.timecodeFrames) - 1, to.timecodeFrames, next.dropFrame));
         counter_->Next(lastFrame_ + Period(from) - Period(to), std::nullopt);
@@ -134,29 +151,39 @@ void Recorder::PushFrame(const SourceUnit& unit) {
 
 bool Recorder::PushOnlineMeta(const SourceUnit& unit, const Timecode& timecode) {
     if (finishing_ || (!online_ && !unit.keyFrame)) {
+        NoteChange(false, timecode);
         return false;
     }
     if (!online_) {
         // With the first IDR frame and not before: what waits for one is limited in the module. Only the
         // audio that is nearest to the frame may begin before it.
         online_ = true;
-        since_ = timecode;
+        NoteChange(true, timecode);
         session_.GoOnline();
         if (lastAudio_) {
             feed_.PushAudio(lastAudio_->time, lastAudio_->data, lastAudio_->size);
         }
     }
+    ++recorded_;
     feed_.PushMeta(unit.time, BuildMetadata(true, timecode, packets_));
     return true;
 }
 
 bool Recorder::PushSyncMeta(const SourceUnit& unit, const Timecode& timecode) {
-    const bool before = plan_.Recording();
-    const bool record = plan_.Next(Elapsed(), unit.keyFrame);
-    if (record != before) {
-        since_ = timecode;
+    commands_.Apply(plan_);
+    const RecordDecision decision = plan_.Next(Elapsed(), unit.keyFrame);
+    if (decision.ended) {
+        NoteChange(false, timecode);
     }
-    PushFlag(unit.time, record, BuildMetadata(record, timecode, packets_));
+    if (decision.begun) {
+        NoteChange(true, timecode);
+    }
+    if (decision.ended && decision.begun) {
+        PushFlag(JustBefore(unit.time), false, BuildMetadata(false, std::nullopt, {}));
+    }
+    recorded_ += decision.record ? 1 : 0;
+    PushFlag(unit.time, decision.record, BuildMetadata(decision.record, timecode, packets_));
+    commands_.Settle(decision, timecode);
     return true;
 }
 
@@ -203,6 +230,7 @@ void Recorder::Interrupt() {
 void Recorder::EndBeforeGap() {
     if (settings_.mode == OutputMode::kSync && plan_.Recording()) {
         plan_.Interrupt();
+        NoteChange(false, NextAddress());
         PushFlag(FrameTime(lastFrame_, 1), false, BuildMetadata(false, std::nullopt, {}));
     }
 }
@@ -218,6 +246,27 @@ void Recorder::PushEndMarks() {
             std::max(lastAudio_->time + kAudioFrame, end * kAudioClock / kVideoClock + kAudioFrame);
         feed_.PushAudio(behind, lastAudio_->data, lastAudio_->size);
     }
+}
+
+void Recorder::NoteChange(bool begins, const Timecode& at) {
+    if (open_ != begins) {
+        open_ = begins;
+        changes_.push_back({begins, at});
+    }
+}
+
+void Recorder::NoteEnd() {
+    if (timecode_) {
+        NoteChange(false, NextAddress());
+    }
+}
+
+std::vector<Recorder::Change> Recorder::TakeChanges() {
+    return std::exchange(changes_, {});
+}
+
+Timecode Recorder::NextAddress() const {
+    return Following(*timecode_, settings_.frameRate);
 }
 
 Timecode Recorder::NextTimecode(const SourceUnit& unit) {

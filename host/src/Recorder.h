@@ -11,6 +11,7 @@
 #include "module/ModuleLog.h"
 #include "module/ModuleSession.h"
 #include "module/StreamFeed.h"
+#include "operator/CommandQueue.h"
 #include "operator/RecordPlan.h"
 #include "options/Options.h"
 
@@ -31,6 +32,14 @@ class Recorder {
     /// The event thread of the module needs far less, unless it hangs or the module has failed.
     static constexpr std::chrono::milliseconds kStopPatience{1000};
 
+    /// A recording begins with the frame `at`, or has ended in front of it.
+    struct Change {
+        bool begins = false;
+        Timecode at;
+
+        friend bool operator==(const Change&, const Change&) = default;
+    };
+
     /// How far a run has come.
     struct Progress {
         std::optional<std::int64_t> firstFrame;
@@ -39,6 +48,7 @@ class Recorder {
         std::optional<Timecode> timecode;
         FrameRate frameRate;
         std::uint64_t lateStops = 0;
+        std::uint64_t recorded = 0;
     };
 
     struct Settings {
@@ -58,7 +68,8 @@ class Recorder {
     };
 
     /// All references must outlive the recorder.
-    Recorder(const Settings& settings, ModuleSession& session, const ModuleLog& log, RecordPlan& plan);
+    Recorder(const Settings& settings, ModuleSession& session, const ModuleLog& log, RecordPlan& plan,
+             CommandQueue& commands);
 
     void Put(SourceUnit unit);
 
@@ -81,9 +92,15 @@ class Recorder {
 
     /// Of the last frame.
     const std::optional<Timecode>& LastTimecode() const { return timecode_; }
-    /// The first frame with the record flag that the last one has.
-    const std::optional<Timecode>& Since() const { return since_; }
-    Progress Past() const { return {firstFrame_, lastFrame_, timecode_, settings_.frameRate, lateStops_}; }
+    /// The beginnings and ends of recordings since the last call.
+    std::vector<Change> TakeChanges();
+    /// The last frame has come: a recording that is still open has ended behind it.
+    void NoteEnd();
+    /// Frames that belong to recordings.
+    std::uint64_t Recorded() const { return recorded_; }
+    Progress Past() const {
+        return {firstFrame_, lastFrame_, timecode_, settings_.frameRate, lateStops_, recorded_};
+    }
     /// Stream time of the last frame since the first one, in ticks of 90000 a second.
     std::int64_t Elapsed() const;
 
@@ -99,6 +116,9 @@ class Recorder {
     bool PushSyncMeta(const SourceUnit& unit, const Timecode& timecode);
     void PushFlag(std::int64_t time, bool record, const std::vector<unsigned char>& meta);
     void EndBeforeGap();
+    void NoteChange(bool begins, const Timecode& at);
+    /// The address behind that of the last frame.
+    Timecode NextAddress() const;
     /// A picture and audio behind the end of a recording. They are never written: the module ends a recording
     /// when each medium has reached its end, and while the source is away nothing else gets there.
     void PushEndMarks();
@@ -113,11 +133,15 @@ class Recorder {
     ModuleSession& session_;
     const ModuleLog& log_;
     RecordPlan& plan_;
+    CommandQueue& commands_;
     StreamFeed feed_;
     Interleaver interleaver_;
     std::optional<TimecodeCounter> counter_;
     std::optional<Timecode> timecode_;
-    std::optional<Timecode> since_;
+    std::vector<Change> changes_;
+    /// What the last change was.
+    bool open_ = false;
+    std::uint64_t recorded_ = 0;
     std::optional<std::int64_t> firstFrame_;
     std::int64_t lastFrame_ = 0;
     std::optional<SourceUnit> lastAudio_;

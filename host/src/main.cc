@@ -1,13 +1,19 @@
 #include <unistd.h>
 
-#include <cstdio>
+#include <algorithm>
+#include <chrono>
+#include <cstdlib>
+#include <cstring>
 #include <iostream>
 #include <memory>
+#include <optional>
 #include <string>
+#include <thread>
 
 #include "Receiver.h"
 #include "common/ReceiverError.h"
 #include "display/JsonDisplay.h"
+#include "display/OutputQueue.h"
 #include "display/TerminalDisplay.h"
 #include "display/TextDisplay.h"
 #include "operator/Keyboard.h"
@@ -16,14 +22,68 @@
 
 namespace {
 
-std::unique_ptr<receiver::DisplayInterface> MakeDisplay(const receiver::Options& options) {
-    if (options.json) {
-        return std::make_unique<receiver::JsonDisplay>(std::cout);
+using receiver::MessageStream;
+using receiver::OutputQueue;
+
+/// How long the end of a run waits for somebody who does not read.
+constexpr std::chrono::seconds kReaderPatience{1};
+
+/// Tells on a thread of its own: nobody who reads holds up a recording.
+class Outlet {
+ public:
+    explicit Outlet(bool json)
+        : queue_(json           ? receiver::JsonRemark
+                 : OnTerminal() ? receiver::TerminalRemark
+                                : receiver::TextRemark) {
+        if (json) {
+            display_ = std::make_unique<receiver::JsonDisplay>(results_);
+        } else if (OnTerminal()) {
+            display_ = std::make_unique<receiver::TerminalDisplay>(messages_, results_, STDERR_FILENO,
+                                                                   [this] { return queue_.Busy(); });
+        } else {
+            display_ = std::make_unique<receiver::TextDisplay>(messages_, results_);
+        }
     }
-    if (isatty(STDERR_FILENO) == 1) {
-        return std::make_unique<receiver::TerminalDisplay>(std::cerr, std::cout, STDERR_FILENO);
+
+    receiver::DisplayInterface& Display() { return *display_; }
+    bool Close() { return queue_.Close(kReaderPatience); }
+
+ private:
+    static bool OnTerminal() { return isatty(STDERR_FILENO) == 1; }
+
+    OutputQueue queue_;
+    MessageStream messages_{queue_, STDERR_FILENO};
+    MessageStream results_{queue_, STDOUT_FILENO};
+    std::unique_ptr<receiver::DisplayInterface> display_;
+};
+
+/// Whether a command line that cannot be read asks for JSON.
+bool AsksForJson(int argc, char** argv) {
+    return std::any_of(argv, argv + argc, [](const char* argument) {
+        return argument != nullptr && std::strcmp(argument, "--json") == 0;
+    });
+}
+
+int RefuseOptions(const receiver::ReceiverError& error, bool json) {
+    if (json) {
+        receiver::JsonDisplay(std::cout).Failure(error.Code(), error.what());
+    } else {
+        std::cerr << "receiver: " << error.what() << '\n';
     }
-    return std::make_unique<receiver::TextDisplay>(std::cerr, std::cout);
+    return static_cast<int>(error.Code());
+}
+
+bool LogsToStandardError() {
+    const char* const log = std::getenv("QX_LOG");
+    return log == nullptr || *log == '\0';
+}
+
+/// The end of the process writes what is left of the log, on standard error perhaps, which nobody may read.
+void EndSoon(int code) {
+    std::thread([code] {
+        std::this_thread::sleep_for(kReaderPatience);
+        _exit(code);
+    }).detach();
 }
 
 }  // namespace
@@ -38,12 +98,15 @@ int main(int argc, char** argv) {
             return static_cast<int>(receiver::ExitCode::kSuccess);
         }
     } catch (const receiver::ReceiverError& error) {
-        std::cerr << "receiver: " << error.what() << '\n';
-        return static_cast<int>(error.Code());
+        return RefuseOptions(error, AsksForJson(argc, argv));
     }
     receiver::HideCredentials(argc, argv);
     receiver::Signals signals(receiver::Keyboard::RestoreTerminal);
-    const std::unique_ptr<receiver::DisplayInterface> display = MakeDisplay(*options);
-    return static_cast<int>(
-        receiver::RunReceiver(*options, receiver::OpenSource, signals, *display, STDIN_FILENO));
+    Outlet outlet(options->json);
+    const auto code = static_cast<int>(
+        receiver::RunReceiver(*options, receiver::OpenSource, signals, outlet.Display(), STDIN_FILENO));
+    if (!outlet.Close() || LogsToStandardError()) {
+        EndSoon(code);
+    }
+    return code;
 }

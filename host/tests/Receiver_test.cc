@@ -51,6 +51,16 @@ class ReceiverTest : public ::testing::Test {
         return Record(60);
     }
 
+    /// Sends a signal to this process and waits until it has been seen.
+    static void Send(int number) {
+        kill(getpid(), number);
+        sigset_t pending;
+        do {
+            std::this_thread::sleep_for(std::chrono::milliseconds(1));
+            sigpending(&pending);
+        } while (sigismember(&pending, number) == 1);
+    }
+
     /// Frames of the files, in their order.
     std::vector<std::uint64_t> Frames() const {
         std::vector<std::uint64_t> frames;
@@ -149,21 +159,90 @@ TEST_F(ReceiverTest, SigtermEndsInOrderWithTheFileClosed) {
 
 TEST_F(ReceiverTest, UserSignalsStopAndStartARecording) {
     auto source = std::make_unique<FakeSource>(400);
-    std::size_t stoppedAt = 0;
-    source->Before([&stoppedAt](std::size_t read) {
-        // The signal thread needs a moment; both commands have 300 units to be seen.
+    source->Before([](std::size_t read) {
         if (read == 120) {
-            kill(getpid(), SIGUSR2);
-            stoppedAt = read;
+            Send(SIGUSR2);
         } else if (read == 420) {
-            kill(getpid(), SIGUSR1);
-        }
-        if (read % 100 == 21) {
-            std::this_thread::sleep_for(std::chrono::milliseconds(20));
+            Send(SIGUSR1);
         }
     });
     EXPECT_EQ(Record(std::move(source)), ExitCode::kSuccess);
     EXPECT_EQ(display_.summary.files.size(), 2u);
+    EXPECT_EQ(display_.started.size(), 2u);
+    EXPECT_EQ(display_.stopped.size(), 2u);
+}
+
+TEST_F(ReceiverTest, AStopWithAStartDirectlyBehindItBeginsAnotherFile) {
+    auto source = std::make_unique<FakeSource>(150);
+    source->Before([](std::size_t read) {
+        if (read == 120) {
+            kill(getpid(), SIGUSR2);
+            Send(SIGUSR1);
+        }
+    });
+    EXPECT_EQ(Record(std::move(source)), ExitCode::kSuccess);
+    ASSERT_EQ(Frames().size(), 2u);
+    // The second one from an IDR frame to the end.
+    EXPECT_EQ(Frames()[1] % 25, 0u);
+    EXPECT_LT(Frames()[0] + Frames()[1], 150u);
+    EXPECT_GE(Frames()[0] + Frames()[1], 125u);
+}
+
+TEST_F(ReceiverTest, ASplitLosesNoFrame) {
+    auto source = std::make_unique<FakeSource>(150);
+    source->Before([](std::size_t read) {
+        if (read == 120) {
+            Send(SIGRTMIN);
+        }
+    });
+    EXPECT_EQ(Record(std::move(source)), ExitCode::kSuccess);
+    ASSERT_EQ(Frames().size(), 2u);
+    EXPECT_EQ(Frames()[0] + Frames()[1], 150u);
+    EXPECT_EQ(Frames()[0] % 25, 0u);
+    EXPECT_EQ(display_.started[1], display_.stopped[0]);
+}
+
+TEST_F(ReceiverTest, AStreamWithoutAnIdrFrameIsToldAndIsALoss) {
+    for (const OutputMode mode : {OutputMode::kSync, OutputMode::kOn}) {
+        options_.mode = mode;
+        auto source = std::make_unique<FakeSource>(50);
+        for (SourceUnit& unit : source->Units()) {
+            unit.keyFrame = false;
+        }
+        EXPECT_EQ(Record(std::move(source)), ExitCode::kLost);
+        EXPECT_THAT(display_.notices, Contains(HasSubstr("no IDR frame came")));
+        EXPECT_THAT(display_.summary.files, IsEmpty());
+    }
+}
+
+TEST_F(ReceiverTest, ARangeWithoutAnIdrFrameIsToldAndIsALoss) {
+    // The only IDR frames are those of the whole seconds.
+    options_.record = {{90000 / 2, 90000 * 8 / 10}, {90000, 90000 * 2}};
+    EXPECT_EQ(Record(60), ExitCode::kLost);
+    EXPECT_THAT(Frames(), ElementsAre(25));
+    EXPECT_THAT(display_.notices, Contains("nothing was recorded from 00:00:00.500 to 00:00:00.800 of the "
+                                           "stream: no IDR frame came in between"));
+}
+
+TEST_F(ReceiverTest, ARangeBehindTheEndOfTheStreamIsToldAndIsALoss) {
+    options_.record = {{0, 90000}, {90000 * 10, 90000 * 20}};
+    EXPECT_EQ(Record(51), ExitCode::kLost);
+    EXPECT_THAT(display_.notices, Contains("nothing was recorded from 00:00:10.000 of the stream on: it has "
+                                           "ended at 00:00:02.000"));
+}
+
+TEST_F(ReceiverTest, AFileThatIsDeletedDuringTheRunIsToldAndIsALoss) {
+    options_.record = {{0, 90000}, {2 * 90000, 3 * 90000}};
+    auto source = std::make_unique<FakeSource>(150);
+    source->Before([this, deleted = false](std::size_t) mutable {
+        // The first file is complete, which takes the module a moment.
+        if (!deleted && !display_.closed.empty()) {
+            deleted = std::filesystem::remove(display_.closed.front());
+        }
+        std::this_thread::sleep_for(std::chrono::milliseconds(2));
+    });
+    EXPECT_EQ(Record(std::move(source)), ExitCode::kLost);
+    EXPECT_THAT(display_.notices, Contains(HasSubstr("is gone: it was deleted")));
 }
 
 TEST_F(ReceiverTest, ASourceThatDriesUpAtTheEndHoldsNobodyUp) {
@@ -192,7 +271,6 @@ TEST_F(ReceiverTest, SnapshotsTellOfTheRecording) {
     const Snapshot& last = display_.snapshots.back();
     EXPECT_TRUE(last.recording);
     EXPECT_EQ(last.status, (ModuleStatus{4, 0}));
-    EXPECT_EQ(last.since, (Timecode{10, 0, 0, 0, false}));
     EXPECT_EQ(last.framesPerSecond, 25);
     EXPECT_GT(last.freeBytes.value_or(0), 0u);
     EXPECT_EQ(last.lost, 0u);
@@ -241,12 +319,22 @@ TEST_F(ReceiverTest, WhatTheSourceLostIsALoss) {
     }
 }
 
+TEST_F(ReceiverTest, SilenceInThePlaceOfMissingAudioIsToldAndIsALoss) {
+    auto source = std::make_unique<FakeSource>(60);
+    source->ChangeCounts().silentFrames = 5;
+    EXPECT_EQ(Record(std::move(source)), ExitCode::kLost);
+    EXPECT_THAT(display_.notices, Contains(HasSubstr("5 audio frames of the source did not come")));
+    EXPECT_EQ(display_.summary.lost, 0u);
+}
+
 TEST_F(ReceiverTest, GoingOfflineAtTheEndIsNoFault) {
     setenv("FAKE_MODULE", "", 1);
     options_.module = FAKE_MODULE;
-    EXPECT_EQ(Record(60), ExitCode::kSuccess);
+    Record(60);
     EXPECT_THAT(display_.statuses, ElementsAre(ModuleStatus{4, 0}, ModuleStatus{3, 0}));
-    EXPECT_THAT(display_.summary.files, IsEmpty());
+    // All that is wrong with this module: it writes nothing.
+    EXPECT_THAT(display_.notices, Contains("60 frames that should have been recorded are in no file"));
+    EXPECT_EQ(display_.notices.size(), 2u);
 }
 
 TEST_F(ReceiverTest, AnOutputThatCannotBeUsedIsFoundBeforeAnythingElse) {
@@ -336,6 +424,13 @@ TEST_F(ReceiverTest, ATimecodeThatDropFrameLeavesOutIsAUsageError) {
     EXPECT_THAT(display_.failure, HasSubstr("drop-frame rule"));
     options_.dropFrame = false;
     EXPECT_EQ(record(), ExitCode::kSuccess);
+}
+
+TEST_F(ReceiverTest, AUserWithoutAShareIsAUsageError) {
+    options_.user = "joe";
+    EXPECT_EQ(Record(10), ExitCode::kUsage);
+    EXPECT_THAT(display_.failure, HasSubstr("--user goes with a folder on a network share"));
+    EXPECT_THAT(display_.failure, HasSubstr(folder_));
 }
 
 TEST_F(ReceiverTest, ASettingsFileThatIsMissingIsAUsageError) {

@@ -55,6 +55,7 @@ class ScriptedModule final : public QxModuleInterface,
         const bool flag = unit->payload[kFlagAt] == 1;
         Write(flag ? "M" : "m", *unit, 3600);
         metas.emplace_back(unit->payload, unit->payload + unit->size);
+        metaTimes.push_back(unit->rtp_timestamp);
         if (flag && !recording_) {
             Say("OP: REC START. 00:00:00:00. RTPTS = 0. -> -1");
         } else if (!flag && recording_ && !deaf) {
@@ -79,6 +80,7 @@ class ScriptedModule final : public QxModuleInterface,
     /// frame; "v-" and so on a mark.
     std::vector<std::string> calls;
     std::vector<std::vector<unsigned char>> metas;
+    std::vector<std::uint64_t> metaTimes;
 
     /// The calls but the marks.
     std::vector<std::string> Units() const {
@@ -108,7 +110,7 @@ class ScriptedModule final : public QxModuleInterface,
 class RecorderTest : public ::testing::Test {
  protected:
     Recorder& Make(const Recorder::Settings& settings) {
-        recorder_.emplace(settings, session_, log_, plan_);
+        recorder_.emplace(settings, session_, log_, plan_, commands_);
         return *recorder_;
     }
     static Recorder::Settings Sync() {
@@ -128,11 +130,16 @@ class RecorderTest : public ::testing::Test {
     /// Audio 1.9 s ahead, so that no frame waits for it; itself it comes after the frames of a test.
     void PutLateAudio() { recorder_->Put(MakeAudio(std::int64_t{1024} * 89)); }
 
+    /// A recording that begins with that frame, or ends in front of it.
+    static Recorder::Change Begin(std::uint8_t frame) { return {true, Timecode{10, 0, 0, frame, false}}; }
+    static Recorder::Change End(std::uint8_t frame) { return {false, Timecode{10, 0, 0, frame, false}}; }
+
     ScriptedModule module_;
     Host host_{{}};
     ModuleSession session_{module_, host_};
     ModuleLog log_;
     RecordPlan plan_{{}};
+    CommandQueue commands_;
     std::optional<Recorder> recorder_;
 };
 
@@ -171,7 +178,7 @@ TEST_F(RecorderTest, EverythingIsPushedAlsoWhileNothingIsRecorded) {
     PutFrame(0, false);
     PutFrame(1, true);
     EXPECT_THAT(module_.Units(), ElementsAre("a-100", "m0", "v0", "M1", "v1"));
-    EXPECT_EQ(recorder_->Since(), (Timecode{10, 0, 0, 1, false}));
+    EXPECT_THAT(recorder_->TakeChanges(), ElementsAre(Begin(1)));
 }
 
 TEST_F(RecorderTest, TheUnitOfAFrameHoldsItsTimecodeAndThePacketsSinceTheLastOne) {
@@ -211,6 +218,39 @@ TEST_F(RecorderTest, AGapEndsTheRecordingAndTheNextIdrFrameBeginsAnother) {
     // The first stop is that of the frame behind the last one.
     EXPECT_THAT(module_.Units(), ElementsAre("M0", "v0", "M1", "v1", "m2", "m20", "v20", "M25", "v25"));
     EXPECT_EQ(recorder_->LastTimecode(), (Timecode{10, 0, 1, 0, false}));
+    EXPECT_THAT(recorder_->TakeChanges(),
+                ElementsAre(Begin(0), End(2), Recorder::Change{true, Timecode{10, 0, 1, 0, false}}));
+    EXPECT_EQ(recorder_->Recorded(), 3u);
+}
+
+// The flag goes off between the two frames, so that no unit is in both recordings or in none.
+TEST_F(RecorderTest, ASplitEndsTheRecordingInFrontOfTheIdrFrameThatBeginsTheNext) {
+    Make(Sync());
+    PutLateAudio();
+    PutFrame(0, true);
+    std::future<CommandResult> split = commands_.Post(RecordCommand::kSplit);
+    PutFrame(1, false);
+    PutFrame(2, true);
+    PutFrame(3, false);
+    EXPECT_THAT(module_.Units(), ElementsAre("M0", "v0", "M1", "v1", "m1", "M2", "v2", "M3", "v3"));
+    EXPECT_EQ(module_.metaTimes[2], kOrigin + 2 * 3600 - 1);
+    EXPECT_EQ(split.get(), (CommandResult{Timecode{10, 0, 0, 2, false}, {}}));
+    recorder_->NoteEnd();
+    EXPECT_THAT(recorder_->TakeChanges(), ElementsAre(Begin(0), End(2), Begin(2), End(4)));
+    EXPECT_EQ(recorder_->Recorded(), 4u);
+}
+
+TEST_F(RecorderTest, CommandsTakeEffectWithTheVeryNextFrame) {
+    Make(Sync());
+    PutLateAudio();
+    PutFrame(0, true);
+    std::future<CommandResult> stop = commands_.Post(RecordCommand::kStop);
+    std::future<CommandResult> start = commands_.Post(RecordCommand::kStart);
+    PutFrame(1, false);
+    PutFrame(2, true);
+    EXPECT_THAT(module_.Units(), ElementsAre("M0", "v0", "m1", "v1", "M2", "v2"));
+    EXPECT_EQ(stop.get().at, (Timecode{10, 0, 0, 1, false}));
+    EXPECT_EQ(start.get().at, (Timecode{10, 0, 0, 2, false}));
 }
 
 TEST_F(RecorderTest, AStopThatTheModuleDoesNotCarryOutIsCountedAndHoldsNothingUp) {
@@ -247,6 +287,8 @@ TEST_F(RecorderTest, ASourceThatIsAwayEndsTheRecordingBehindItsLastFrame) {
     recorder_->Interrupt();
     // The pictures end at 80 ms; audio from 106.7 ms on lies behind that whatever its place was.
     EXPECT_THAT(module_.Units(), ElementsAre("M0", "v0", "a0", "a1", "M1", "v1", "m2", "v2", "a4"));
+    // The place where it stopped, which lies behind its last frame.
+    EXPECT_THAT(recorder_->TakeChanges(), ElementsAre(Begin(0), End(2)));
     recorder_->Interrupt();
     EXPECT_EQ(module_.Units().size(), 9u);
 }

@@ -25,8 +25,8 @@ enum class ExitCode {
     kOutput = 6,
     /// The module failed while it recorded (status 7).
     kRecordingFailed = 7,
-    /// The run ended as commanded, but units were lost on the way to the files, or the module took a command
-    /// too late.
+    /// The run ended as commanded, but something that came or was commanded is missing from the files, or the
+    /// module took a command too late.
     kLost = 8,
 };
 

@@ -22,8 +22,6 @@ struct Snapshot {
     /// frame.
     bool recording = false;
     bool waiting = false;
-    /// The first frame with the present record flag.
-    std::optional<Timecode> since;
     double framesPerSecond = 0;
     double videoKilobits = 0;
     double audioKilobits = 0;
@@ -55,6 +53,10 @@ class DisplayInterface {
     virtual void Status(const ModuleStatus& status) = 0;
     virtual void FileOpened(const std::string& path) = 0;
     virtual void FileClosed(const std::string& path) = 0;
+    /// A recording begins with the frame `at`.
+    virtual void RecordStarted(const Timecode& at) = 0;
+    /// A recording has ended in front of the frame `at`, which may never have come.
+    virtual void RecordStopped(const Timecode& at) = 0;
     /// Called several times a second.
     virtual void Show(const Snapshot& snapshot) = 0;
     virtual void Finish(const Summary& summary) = 0;

@@ -89,38 +89,69 @@ void ReadFragments(AVFormatContext& context, const AVStream& video, RecordedFile
     file.seconds = Seconds(begin + duration, video);
 }
 
-}  // namespace
+/// Octets of one question to the reader of a file.
+constexpr int kReadSize = 1 << 18;
 
-RecordedFile ReadBack(const std::string& path) {
-    RecordedFile file;
-    file.path = path;
-    std::error_code error;
-    const std::uintmax_t bytes = std::filesystem::file_size(path, error);
-    if (error) {
-        file.problem = error.message();
-        return file;
-    }
-    file.bytes = bytes;
+/// A file as FFmpeg's libraries read it.
+struct ReaderState {
+    const FileReader& read;
+    std::int64_t size;
+    std::int64_t position = 0;
+};
 
-    AVFormatContext* opened = avformat_alloc_context();
-    if (opened == nullptr) {
-        file.problem = Problem(AVERROR(ENOMEM));
-        return file;
+struct FreeReader {
+    void operator()(AVIOContext* reader) const {
+        av_freep(&reader->buffer);
+        avio_context_free(&reader);
     }
-    // What stands in the samples is of no interest here.
-    opened->flags |= AVFMT_FLAG_NOPARSE | AVFMT_FLAG_NOFILLIN;
-    // The prefix keeps a path with a colon from being taken for an address.
-    const int result = avformat_open_input(&opened, ("file:" + path).c_str(), nullptr, nullptr);
+};
+
+int ReadFrom(void* opaque, std::uint8_t* data, int size) {
+    auto& state = *static_cast<ReaderState*>(opaque);
+    const int count = state.read(state.position, data, size);
+    state.position += std::max(count, 0);
+    return count > 0 ? count : count == 0 ? AVERROR_EOF : AVERROR(EIO);
+}
+
+std::int64_t SeekIn(void* opaque, std::int64_t offset, int origin) {
+    auto& state = *static_cast<ReaderState*>(opaque);
+    switch (origin & ~AVSEEK_FORCE) {
+        case AVSEEK_SIZE:
+            return state.size;
+        case SEEK_SET:
+            return state.position = offset;
+        case SEEK_CUR:
+            return state.position += offset;
+        case SEEK_END:
+            return state.position = state.size + offset;
+        default:
+            return AVERROR(EINVAL);
+    }
+}
+
+AVFormatContext* NewContext() {
+    AVFormatContext* const context = avformat_alloc_context();
+    if (context != nullptr) {
+        // What stands in the samples is of no interest here.
+        context->flags |= AVFMT_FLAG_NOPARSE | AVFMT_FLAG_NOFILLIN;
+    }
+    return context;
+}
+
+/// Opens `name` with `opened`, which it takes over, and fills in `file`.
+void ReadOpened(AVFormatContext* opened, const std::string& name, RecordedFile& file) {
+    const int result =
+        opened == nullptr ? AVERROR(ENOMEM) : avformat_open_input(&opened, name.c_str(), nullptr, nullptr);
     if (result < 0) {
         file.problem = Problem(result);
-        return file;
+        return;
     }
     const std::unique_ptr<AVFormatContext, CloseInput> context(opened);
     const AVStream* const video = FindStream(
         *context, [](const AVCodecParameters& codec) { return codec.codec_type == AVMEDIA_TYPE_VIDEO; });
     if (video == nullptr) {
         file.problem = "there is no video in it";
-        return file;
+        return;
     }
     const AVStream* const timecode =
         FindStream(*context, [](const AVCodecParameters& codec) { return codec.codec_tag == kTimecodeTag; });
@@ -134,6 +165,41 @@ RecordedFile ReadBack(const std::string& path) {
     } else {
         ReadFragments(*context, *video, file);
     }
+}
+
+}  // namespace
+
+RecordedFile ReadBack(const std::string& path) {
+    RecordedFile file;
+    file.path = path;
+    std::error_code error;
+    const std::uintmax_t bytes = std::filesystem::file_size(path, error);
+    if (error) {
+        file.problem = error.message();
+        return file;
+    }
+    file.bytes = bytes;
+    // The prefix keeps a path with a colon from being taken for an address.
+    ReadOpened(NewContext(), "file:" + path, file);
+    return file;
+}
+
+RecordedFile ReadBack(const std::string& path, std::uint64_t bytes, const FileReader& reader) {
+    RecordedFile file;
+    file.path = path;
+    file.bytes = bytes;
+    ReaderState state{reader, static_cast<std::int64_t>(bytes)};
+    auto* const buffer = static_cast<unsigned char*>(av_malloc(kReadSize));
+    const std::unique_ptr<AVIOContext, FreeReader> input(
+        avio_alloc_context(buffer, kReadSize, 0, &state, ReadFrom, nullptr, SeekIn));
+    AVFormatContext* const context = NewContext();
+    if (buffer == nullptr || input == nullptr || context == nullptr) {
+        avformat_free_context(context);
+        file.problem = Problem(AVERROR(ENOMEM));
+        return file;
+    }
+    context->pb = input.get();
+    ReadOpened(context, path, file);
     return file;
 }
 

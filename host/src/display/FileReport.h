@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstdint>
+#include <functional>
 #include <ostream>
 #include <string>
 #include <vector>
@@ -21,6 +22,13 @@ struct RecordedFile {
 
 /// Opens a closed file with FFmpeg's libraries and reads what it holds.
 RecordedFile ReadBack(const std::string& path);
+
+/// Reads octets of a file from an offset on, and returns how many: 0 at the end of the file, a negative
+/// number on a failure.
+using FileReader = std::function<int(std::int64_t offset, unsigned char* data, int size)>;
+
+/// The same of a file that is no local one, of `bytes` octets.
+RecordedFile ReadBack(const std::string& path, std::uint64_t bytes, const FileReader& reader);
 
 /// One line a file under a headline. Nothing for no files.
 void PrintFiles(std::ostream& out, const std::vector<RecordedFile>& files);

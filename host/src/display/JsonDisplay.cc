@@ -1,8 +1,12 @@
 #include "display/JsonDisplay.h"
 
+#include <array>
+#include <cstdio>
+#include <ctime>
 #include <nlohmann/json.hpp>
 
 #include "display/StatusWords.h"
+#include "display/TextDisplay.h"
 
 namespace receiver {
 namespace {
@@ -11,9 +15,28 @@ using nlohmann::ordered_json;
 
 constexpr std::chrono::seconds kInterval{1};
 
-void Write(std::ostream& out, const ordered_json& object) {
+/// "2026-11-21T20:15:07.042Z"
+std::string IsoTime(std::chrono::system_clock::time_point moment) {
+    const auto milliseconds = std::chrono::floor<std::chrono::milliseconds>(moment.time_since_epoch());
+    const auto seconds = std::chrono::floor<std::chrono::seconds>(milliseconds);
+    const std::time_t time = seconds.count();
+    std::tm parts{};
+    gmtime_r(&time, &parts);
+    std::array<char, 32> date{};
+    std::strftime(date.data(), date.size(), "%FT%T", &parts);
+    std::array<char, 48> text{};
+    std::snprintf(text.data(), text.size(), "%s.%03dZ", date.data(),
+                  static_cast<int>((milliseconds - seconds).count()));
+    return text.data();
+}
+
+ordered_json Event(const char* name, std::chrono::system_clock::time_point moment) {
+    return {{"event", name}, {"time", IsoTime(moment)}};
+}
+
+std::string Line(const ordered_json& object) {
     // Paths and addresses may hold any bytes.
-    out << object.dump(-1, ' ', false, ordered_json::error_handler_t::replace) << std::endl;
+    return object.dump(-1, ' ', false, ordered_json::error_handler_t::replace) + '\n';
 }
 
 ordered_json TextOrNull(const std::string& text) {
@@ -22,27 +45,38 @@ ordered_json TextOrNull(const std::string& text) {
 
 }  // namespace
 
+void JsonDisplay::Write(const char* event, const ordered_json& members) {
+    ordered_json object = Event(event, clock_());
+    object.update(members);
+    out_ << Line(object) << std::flush;
+}
+
 void JsonDisplay::Notice(const std::string& sentence) {
-    Write(out_, {{"event", "notice"}, {"text", sentence}});
+    Write("notice", {{"text", sentence}});
 }
 
 void JsonDisplay::Failure(ExitCode code, const std::string& sentence) {
-    Write(out_, {{"event", "failure"}, {"exit_code", static_cast<int>(code)}, {"text", sentence}});
+    Write("failure", {{"exit_code", static_cast<int>(code)}, {"text", sentence}});
 }
 
 void JsonDisplay::Status(const ModuleStatus& status) {
-    Write(out_, {{"event", "status"},
-                 {"status", status.status},
-                 {"cause", status.cause},
-                 {"words", StatusWords(status)}});
+    Write("status", {{"status", status.status}, {"cause", status.cause}, {"words", StatusWords(status)}});
 }
 
 void JsonDisplay::FileOpened(const std::string& path) {
-    Write(out_, {{"event", "file_opened"}, {"path", path}});
+    Write("file_opened", {{"path", path}});
 }
 
 void JsonDisplay::FileClosed(const std::string& path) {
-    Write(out_, {{"event", "file_closed"}, {"path", path}});
+    Write("file_closed", {{"path", path}});
+}
+
+void JsonDisplay::RecordStarted(const Timecode& at) {
+    Write("record_started", {{"timecode", ToString(at)}});
+}
+
+void JsonDisplay::RecordStopped(const Timecode& at) {
+    Write("record_stopped", {{"timecode", ToString(at)}});
 }
 
 void JsonDisplay::Show(const Snapshot& snapshot) {
@@ -52,7 +86,7 @@ void JsonDisplay::Show(const Snapshot& snapshot) {
     }
     shown_ = now;
     recording_ = snapshot.recording;
-    ordered_json object{{"event", "progress"}};
+    ordered_json object;
     object["timecode"] =
         snapshot.timecode ? ordered_json(ToString(*snapshot.timecode)) : ordered_json(nullptr);
     object["seconds"] = snapshot.seconds;
@@ -67,7 +101,7 @@ void JsonDisplay::Show(const Snapshot& snapshot) {
     object["file"] = TextOrNull(snapshot.file);
     object["free_bytes"] = snapshot.freeBytes ? ordered_json(*snapshot.freeBytes) : ordered_json(nullptr);
     object["lost"] = snapshot.lost;
-    Write(out_, object);
+    Write("progress", object);
 }
 
 void JsonDisplay::Finish(const Summary& summary) {
@@ -80,10 +114,14 @@ void JsonDisplay::Finish(const Summary& summary) {
                          {"frames", file.frames},
                          {"problem", TextOrNull(file.problem)}});
     }
-    Write(out_, {{"event", "summary"},
-                 {"files", files},
-                 {"lost", summary.lost},
-                 {"exit_code", static_cast<int>(summary.exitCode)}});
+    Write("summary",
+          {{"files", files}, {"lost", summary.lost}, {"exit_code", static_cast<int>(summary.exitCode)}});
+}
+
+std::string JsonRemark(std::uint64_t count) {
+    ordered_json object = Event("notice", std::chrono::system_clock::now());
+    object["text"] = Unshown(count);
+    return Line(object);
 }
 
 }  // namespace receiver

@@ -56,6 +56,10 @@ std::string StatusLine(const Snapshot& snapshot, std::size_t width) {
     return line;
 }
 
+std::string TerminalRemark(std::uint64_t count) {
+    return kClear + TextRemark(count);
+}
+
 void TerminalDisplay::Draw(const std::string& text) {
     Messages() << kClear << text << std::flush;
 }
@@ -66,6 +70,9 @@ void TerminalDisplay::Line(const std::string& text) {
 
 void TerminalDisplay::Show(const Snapshot& snapshot) {
     TextDisplay::Show(snapshot);
+    if (busy_ && busy_()) {
+        return;
+    }
     // The last column stays free: a terminal would begin a new line there.
     const std::string line = StatusLine(snapshot, WidthOf(descriptor_) - 1);
     if (line != line_) {

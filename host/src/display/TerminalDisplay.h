@@ -1,6 +1,8 @@
 #pragma once
 
 #include <cstddef>
+#include <functional>
+#include <utility>
 
 #include "display/TextDisplay.h"
 
@@ -13,9 +15,11 @@ std::string StatusLine(const Snapshot& snapshot, std::size_t width);
 /// over and over.
 class TerminalDisplay final : public TextDisplay {
  public:
-    /// `descriptor` is the terminal behind `messages`; its width is asked for at each drawing.
-    TerminalDisplay(std::ostream& messages, std::ostream& results, int descriptor)
-        : TextDisplay(messages, results), descriptor_(descriptor) {}
+    /// `descriptor` is the terminal behind `messages`; its width is asked for at each drawing. While `busy`
+    /// says that something waits for the terminal, the status line is left as it is.
+    TerminalDisplay(std::ostream& messages, std::ostream& results, int descriptor,
+                    std::function<bool()> busy = {})
+        : TextDisplay(messages, results), descriptor_(descriptor), busy_(std::move(busy)) {}
 
     void Show(const Snapshot& snapshot) override;
     void Finish(const Summary& summary) override;
@@ -27,7 +31,11 @@ class TerminalDisplay final : public TextDisplay {
     void Draw(const std::string& text);
 
     const int descriptor_;
+    const std::function<bool()> busy_;
     std::string line_;
 };
+
+/// The line in the place of `count` messages that nobody has read, above the status line.
+std::string TerminalRemark(std::uint64_t count);
 
 }  // namespace receiver

@@ -5,14 +5,20 @@
 namespace receiver {
 namespace {
 
-std::string At(const std::optional<Timecode>& timecode) {
-    return timecode ? " at " + ToString(*timecode) : "";
-}
+constexpr std::chrono::seconds kLossInterval{5};
 
 }  // namespace
 
 std::string Counted(std::uint64_t count, const std::string& noun) {
     return std::to_string(count) + " " + noun + (count == 1 ? "" : "s");
+}
+
+std::string Unshown(std::uint64_t count) {
+    return Counted(count, "message") + " could not be shown";
+}
+
+std::string TextRemark(std::uint64_t count) {
+    return Unshown(count) + "\n";
 }
 
 void TextDisplay::Line(const std::string& text) {
@@ -43,19 +49,29 @@ void TextDisplay::FileClosed(const std::string& path) {
     Line("closed  " + path);
 }
 
+void TextDisplay::RecordStarted(const Timecode& at) {
+    Line("recording at " + ToString(at));
+}
+
+void TextDisplay::RecordStopped(const Timecode& at) {
+    Line("not recording at " + ToString(at));
+}
+
 void TextDisplay::Show(const Snapshot& snapshot) {
     if (snapshot.waiting && !waiting_) {
         Line("recording begins with the next IDR frame");
     }
-    if (snapshot.recording != recording_) {
-        Line((snapshot.recording ? "recording" : "not recording") + At(snapshot.since));
-    }
-    if (snapshot.lost != lost_) {
-        Line("lost: " + Counted(snapshot.lost, "unit") + " so far" + At(snapshot.timecode));
-    }
     waiting_ = snapshot.waiting;
-    recording_ = snapshot.recording;
-    lost_ = snapshot.lost;
+    if (snapshot.lost == lost_) {
+        return;
+    }
+    const auto now = clock_();
+    if (!lossTold_ || now - *lossTold_ >= kLossInterval) {
+        lossTold_ = now;
+        lost_ = snapshot.lost;
+        Line("lost: " + Counted(lost_, "unit") + " so far" +
+             (snapshot.timecode ? " at " + ToString(*snapshot.timecode) : ""));
+    }
 }
 
 void TextDisplay::Finish(const Summary& summary) {

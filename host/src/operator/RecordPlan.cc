@@ -2,6 +2,7 @@
 
 #include <charconv>
 #include <cmath>
+#include <utility>
 
 #include "source/SourceInterface.h"
 
@@ -70,18 +71,80 @@ RecordPlan::RecordPlan(std::vector<RecordRange> ranges) : wanted_(ranges.empty()
     }
 }
 
-bool RecordPlan::Next(std::int64_t elapsed, bool keyFrame) {
-    bool ended = false;
+RecordDecision RecordPlan::Next(std::int64_t elapsed, bool keyFrame) {
+    bool ends = std::exchange(stopped_, false);
     for (; passed_ < borders_.size() && borders_[passed_].time <= elapsed; ++passed_) {
-        wanted_ = borders_[passed_].record && !finished_;
-        ended = ended || !wanted_;
+        const Border& border = borders_[passed_];
+        if (!border.record) {
+            Unwant(border.time);
+            ends = true;
+        } else if (!finished_) {
+            Want(border.time);
+        }
     }
-    // An end that the next beginning follows within a frame still takes a frame without the flag, or the two
-    // ranges would be one recording.
-    const bool goesOn = recording_ && !ended;
-    const bool begins = !recording_ && keyFrame;
-    recording_ = wanted_ && (goesOn || begins);
-    return recording_;
+    elapsed_ = elapsed;
+    RecordDecision decision;
+    decision.ended = recording_ && (ends || !wanted_ || (split_ && keyFrame));
+    decision.begun = wanted_ && keyFrame && (!recording_ || decision.ended);
+    decision.record = decision.begun || (recording_ && !decision.ended);
+    recording_ = decision.record;
+    if (decision.begun) {
+        begun_ = true;
+        split_ = false;
+        waitingSince_.reset();
+    } else if (wanted_ && !begun_ && !waitingSince_) {
+        waitingSince_ = elapsed;
+    }
+    return decision;
+}
+
+void RecordPlan::Start() {
+    if (!finished_ && !wanted_) {
+        wanted_ = true;
+        begun_ = false;
+    }
+}
+
+void RecordPlan::Stop() {
+    Unwant(elapsed_.value_or(0));
+    stopped_ = true;
+}
+
+void RecordPlan::Finish() {
+    Unwant(elapsed_.value_or(0));
+    finished_ = true;
+}
+
+void RecordPlan::Want(std::int64_t since) {
+    if (!wanted_) {
+        wanted_ = true;
+        begun_ = false;
+        waitingSince_ = since;
+    }
+}
+
+void RecordPlan::Unwant(std::int64_t end) {
+    if (wanted_ && waitingSince_) {
+        missed_.push_back({*waitingSince_, end});
+    }
+    wanted_ = false;
+    split_ = false;
+    waitingSince_.reset();
+}
+
+std::vector<MissedRecording> RecordPlan::TakeMissed() {
+    return std::exchange(missed_, {});
+}
+
+std::optional<RecordRange> RecordPlan::Unreached() const {
+    for (std::size_t i = passed_; i < borders_.size(); ++i) {
+        if (borders_[i].record) {
+            const bool closed = i + 1 < borders_.size();
+            return RecordRange{borders_[i].time,
+                               closed ? std::optional<std::int64_t>(borders_[i + 1].time) : std::nullopt};
+        }
+    }
+    return std::nullopt;
 }
 
 }  // namespace receiver

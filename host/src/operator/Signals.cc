@@ -4,6 +4,7 @@
 #include <unistd.h>
 
 #include <array>
+#include <utility>
 
 namespace receiver {
 namespace {
@@ -15,11 +16,20 @@ constexpr int kExitBySignal = 128;
 /// nobody reads any more goes on.
 constexpr std::array<int, 3> kIgnored{SIGPIPE, SIGTTIN, SIGTTOU};
 
+/// Takes a signal that waits for the process, without waiting for one.
+bool TakeWaiting(int number) {
+    sigset_t wanted;
+    sigemptyset(&wanted);
+    sigaddset(&wanted, number);
+    const timespec now{};
+    return sigtimedwait(&wanted, nullptr, &now) == number;
+}
+
 }  // namespace
 
 Signals::Signals(void (*beforeExit)()) : beforeExit_(beforeExit) {
     sigemptyset(&received_);
-    for (const int number : {SIGINT, SIGTERM, SIGHUP, SIGUSR1, SIGUSR2, kWake}) {
+    for (const int number : {SIGINT, SIGTERM, SIGHUP, SIGUSR1, SIGUSR2, SIGRTMIN, kWake}) {
         sigaddset(&received_, number);
     }
     sigset_t blocked = received_;
@@ -48,7 +58,13 @@ Signals::~Signals() {
 }
 
 SignalCommands Signals::Take() {
-    return {start_.exchange(false), stop_.exchange(false), QuitRequested(), hangup_.exchange(false)};
+    const std::lock_guard lock(mutex_);
+    return {std::exchange(commands_, {}), QuitRequested(), hangup_.exchange(false)};
+}
+
+void Signals::Add(RecordCommand command) {
+    const std::lock_guard lock(mutex_);
+    commands_.push_back(command);
 }
 
 void Signals::Receive() {
@@ -59,10 +75,13 @@ void Signals::Receive() {
         }
         switch (number) {
             case SIGUSR1:
-                start_ = true;
+                if (TakeWaiting(SIGUSR2)) {
+                    Add(RecordCommand::kStop);
+                }
+                Add(RecordCommand::kStart);
                 break;
             case SIGUSR2:
-                stop_ = true;
+                Add(RecordCommand::kStop);
                 break;
             case SIGHUP:
                 hangup_ = true;
@@ -75,6 +94,10 @@ void Signals::Receive() {
                 }
                 break;
             default:
+                // No constant.
+                if (number == SIGRTMIN) {
+                    Add(RecordCommand::kSplit);
+                }
                 break;
         }
     }

@@ -11,6 +11,7 @@ const char* const kHelpIntroduction =
 const char* const kHelpFooter =
     "Keys on a terminal and signals\n"
     "  r, SIGUSR1          begin a recording        s, SIGUSR2   end it\n"
+    "  n, SIGRTMIN         split it: go on in a new file from the next IDR frame on\n"
     "  q, Ctrl-C, SIGTERM  end in order, with every file closed; a second signal ends at once\n"
     "  SIGHUP              the terminal is gone: recording goes on\n"
     "\n"
@@ -29,7 +30,7 @@ const char* const kHelpFooter =
     "  5  the module cannot be loaded or refuses to start\n"
     "  6  nothing can be written to the output folder\n"
     "  7  the module failed while it recorded\n"
-    "  8  the run ended as commanded, but something was lost on the way, or the module took a\n"
-    "     stop command too late\n";
+    "  8  the run ended as commanded, but something is missing from the files, or the module took\n"
+    "     a stop command too late\n";
 
 }  // namespace receiver

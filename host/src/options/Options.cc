@@ -3,12 +3,14 @@
 #include <CLI/CLI.hpp>
 #include <charconv>
 #include <cstring>
-#include <fstream>
 #include <limits>
+#include <sstream>
 
 #include "common/Credentials.h"
 #include "common/ReceiverError.h"
+#include "options/AddressCheck.h"
 #include "options/OptionText.h"
+#include "options/Password.h"
 
 namespace receiver {
 namespace {
@@ -51,18 +53,6 @@ void ReadSize(const std::string& text, SourceOptions& source) {
     source.height = ParseDimension(x == std::string::npos ? std::string_view() : view.substr(x + 1), text);
 }
 
-std::string ReadPassword(const std::string& file) {
-    std::ifstream stream(file);
-    std::string line;
-    if (!std::getline(stream, line)) {
-        throw Wrong("--password-file " + file + " cannot be read, or is empty.");
-    }
-    if (line.ends_with('\r')) {
-        line.pop_back();
-    }
-    return line;
-}
-
 void Interpret(const Texts& texts, Options& options) {
     if (!texts.frameRate.empty()) {
         options.source.frameRate = ParseFrameRate(texts.frameRate);
@@ -93,11 +83,39 @@ void Interpret(const Texts& texts, Options& options) {
         }
     }
     if (!texts.passwordFile.empty()) {
-        options.password = ReadPassword(texts.passwordFile);
+        options.password = ReadPasswordFile("--password-file", texts.passwordFile);
+    } else if (!options.password) {
+        options.password = PasswordOfService();
     }
     options.mode = texts.mode == "on" ? OutputMode::kOn : OutputMode::kSync;
     options.dropFrame = !texts.noDropFrame;
     options.source.reconnect = !texts.noReconnect;
+}
+
+/// As `CLI::Range`, which lets pass what is no number.
+CLI::Validator NumberFrom(double low, double high) {
+    return {[low, high](std::string& text) {
+                double value = 0;
+                if (CLI::detail::lexical_cast(text, value) && value >= low && value <= high) {
+                    return std::string();
+                }
+                std::ostringstream reason;
+                reason << text << " is no number from " << low << " to " << std::fixed << std::setprecision(0)
+                       << high;
+                return reason.str();
+            },
+            ""};
+}
+
+/// An empty value is a slip, as of a variable of a script that is not set. A password alone may be empty.
+void CheckEmpty(const CLI::App& app) {
+    for (const CLI::Option* const option : app.get_options()) {
+        const auto& values = option->results();
+        if (option->get_name() != "--password" && option->get_expected_max() > 0 &&
+            std::find(values.begin(), values.end(), "") != values.end()) {
+            throw Wrong(option->get_name() + " is empty: give it a value, or leave it out.");
+        }
+    }
 }
 
 /// Options that are right by themselves and contradict each other.
@@ -137,13 +155,13 @@ void AddSourceOptions(CLI::App& app, Options& options, Texts& texts) {
         ->capture_default_str()
         ->group(group);
     app.add_option("--speed", options.source.speed, "Files and test: how many times real time")
-        ->check(CLI::Range(0.01, 100000.0))
+        ->check(NumberFrom(0.01, 100000.0))
         ->type_name("N")
         ->capture_default_str()
         ->group(group);
     app.add_option("--timeout", options.source.timeout,
                    "Seconds of silence after which a source counts as lost")
-        ->check(CLI::Range(0.1, 3600.0))
+        ->check(NumberFrom(0.1, 3600.0))
         ->type_name("SECONDS")
         ->capture_default_str()
         ->group(group);
@@ -183,7 +201,8 @@ void AddFileOptions(CLI::App& app, Options& options, Texts& texts) {
     const auto group = "Files";
     app.add_option(
            "-o,--output", options.output,
-           "Folder under which files appear; else MP4OutputPath of the settings store, else recordings")
+           "Folder under which files appear, //server/share/folder for one on a share; else MP4OutputPath of "
+           "the settings store, else recordings")
         ->type_name("DIR")
         ->group(group);
     app.add_option("--prefix", options.prefix,
@@ -201,12 +220,20 @@ void AddFileOptions(CLI::App& app, Options& options, Texts& texts) {
            "Minutes of video after which a new file begins; 0 is as often as possible, 120 when not given")
         ->type_name("N")
         ->group(group);
-    app.add_option("--user", options.user, "User name for a network share")->type_name("NAME")->group(group);
+    app.add_flag("--group-write", options.groupWrite,
+                 "Give files and folders to the group too: others may record to the same folder")
+        ->group(group);
+    app.add_option("--user", options.user, "User name for a network share: NAME, DOMAIN\\NAME or NAME@DOMAIN")
+        ->type_name("NAME")
+        ->group(group);
     CLI::Option* const password =
         app.add_option("--password", options.password, "Its password; others may see it, so rather:")
             ->type_name("TEXT")
             ->group(group);
-    app.add_option("--password-file", texts.passwordFile, "File whose first line is the password")
+    app.add_option(
+           "--password-file", texts.passwordFile,
+           "File whose first line is the password; else the credential receiver.password of the service, "
+           "else RECEIVER_PASSWORD of the environment")
         ->type_name("FILE")
         ->excludes(password)
         ->group(group);
@@ -226,7 +253,7 @@ void AddRecordOptions(CLI::App& app, Options& options, Texts& texts) {
         ->type_name("RANGES")
         ->group(group);
     app.add_option("--seconds", options.seconds, "End after so much stream")
-        ->check(CLI::Range(0.001, 366.0 * 86400))
+        ->check(NumberFrom(0.001, 366.0 * 86400))
         ->type_name("N")
         ->group(group);
     app.add_option("--timecode", texts.timecode,
@@ -292,12 +319,17 @@ std::optional<Options> ParseOptions(int argc, const char* const* argv, std::stri
         std::replace(reason.begin(), reason.end(), '\n', ' ');
         throw Wrong(reason + "; receiver --help lists the options.");
     }
+    CheckEmpty(app);
+    if (const std::string mistake = AddressMistake(options.source.url); !mistake.empty()) {
+        throw Wrong("--input " + WithoutCredentials(options.source.url) + ": " + mistake + ".");
+    }
     Interpret(texts, options);
     CheckTogether(app, options);
     return options;
 }
 
 void HideCredentials(int argc, char** argv) {
+    HidePasswordVariable();
     constexpr std::string_view kName = "--password";
     for (int i = 1; i < argc; ++i) {
         const std::string_view argument = argv[i];

@@ -22,7 +22,10 @@ struct Options {
 
     std::optional<std::string> output;
     std::optional<std::string> prefix;
+    /// Files and folders belong to the group as much as to their owner.
+    bool groupWrite = false;
     std::optional<std::string> user;
+    /// From wherever it was taken.
     std::optional<std::string> password;
     std::string fileType = "normal";
     std::string naluType = "normal";
@@ -49,8 +52,8 @@ struct Options {
 /// asked for (`--help`, `--version`).
 std::optional<Options> ParseOptions(int argc, const char* const* argv, std::string& text);
 
-/// Overwrites the value of `--password`, and the credentials in addresses, in the arguments of the process,
-/// so that they no longer stand in the list of processes.
+/// Overwrites the value of `--password`, the credentials in addresses, and the variable with a password, in
+/// the arguments and the environment of the process, so that they no longer stand in the list of processes.
 void HideCredentials(int argc, char** argv);
 
 }  // namespace receiver

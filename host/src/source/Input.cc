@@ -10,6 +10,7 @@
 #include "common/Credentials.h"
 #include "common/ReceiverError.h"
 #include "source/Address.h"
+#include "timing/Saturating.h"
 
 namespace receiver {
 namespace {
@@ -20,6 +21,8 @@ constexpr double kAnalysis = 10;
 constexpr double kSegments = 30;
 /// Packets that may come when a wait is over.
 constexpr int kLongestDrain = 100;
+/// Seconds that a file may end before the length that its header tells.
+constexpr double kLongestShortfall = 1;
 /// Bytes in front of a picture in which its program's tables stand: ten packets of a transport stream.
 constexpr std::int64_t kTables = 1880;
 
@@ -88,6 +91,15 @@ Input::Input(const std::string& url, double timeout, double patience, std::share
     : url_(url), timeout_(timeout), patience_(patience), interrupt_(std::move(interrupt)), stop_(stop) {
     Open();
     stop_ = nullptr;
+<<<<<<< HEAD
+=======
+    const bool seekable = format_->pb != nullptr && (format_->pb->seekable & AVIO_SEEKABLE_NORMAL) != 0;
+    const std::string format = format_->iformat->name;
+    recorded_ = (seekable && format != "sdp") ||
+                (format == "hls" && format_->duration != AV_NOPTS_VALUE && format_->duration > 0);
+    transport_ = format == "mpegts" || format == "hls";
+    rtp_ = format == "sdp" || format == "rtsp" || format == "rtp";
+>>>>>>> ec6f36eb7a6d9e0f7eb4793bdd78337611b44474
     Alive();
 }
 
@@ -174,6 +186,7 @@ bool Input::Renew(std::int64_t position) {
         format_.reset();
         Open();
     }
+    damagedNext_.clear();
     Alive();
     return true;
 }
@@ -249,16 +262,67 @@ void Input::FailOpening(int result) {
     throw ReceiverError(ExitCode::kSourceUnavailable, sentence);
 }
 
+int Input::ReadFrame(AVPacket& packet) {
+    int result = 0;
+    do {
+        // What the libraries still hold when a wait is over comes out before they tell.
+        const bool over = Expired() && ++drained_ > kLongestDrain;
+        result = over ? AVERROR_EXIT : av_read_frame(format_.get(), &packet);
+        // So they end a search in bytes that are no transport stream, and go on with it when they are asked.
+    } while (result == AVERROR(EAGAIN) && !interrupt_->Stopped() && (stop_ == nullptr || !stop_()));
+    return result;
+}
+
+void Input::MarkDamage(AVPacket& packet) {
+    const AVCodecParameters& parameters = *format_->streams[packet.stream_index]->codecpar;
+    if (!transport_ || parameters.codec_type != AVMEDIA_TYPE_VIDEO) {
+        return;
+    }
+    // Where a picture ends is found in the unit of the transport stream that holds the next one, and of that
+    // unit it has the mark.
+    const bool damaged = damagedNext_.erase(packet.stream_index) > 0;
+    if ((packet.flags & AV_PKT_FLAG_CORRUPT) != 0) {
+        damagedNext_.insert(packet.stream_index);
+    }
+    packet.flags = damaged ? packet.flags | AV_PKT_FLAG_CORRUPT : packet.flags & ~AV_PKT_FLAG_CORRUPT;
+}
+
+void Input::Reach(const AVPacket& packet) {
+    if (packet.pts != AV_NOPTS_VALUE) {
+        const AVRational base = format_->streams[packet.stream_index]->time_base;
+        const std::int64_t end = SaturatingAdd(packet.pts, packet.duration);
+        reached_ = std::max(reached_, av_rescale_q(end, base, AV_TIME_BASE_Q));
+    }
+}
+
+void Input::CheckLength() const {
+    // What the libraries have not read in a header is an estimate.
+    const bool announced = recorded_ && format_->duration_estimation_method == AVFMT_DURATION_FROM_STREAM &&
+                           format_->duration > 0 && format_->start_time != AV_NOPTS_VALUE;
+    if (!announced || transport_) {
+        return;
+    }
+    const double missing = static_cast<double>(SaturatingSubtract(
+                               SaturatingAdd(format_->start_time, format_->duration), reached_)) /
+                           AV_TIME_BASE;
+    if (missing > kLongestShortfall) {
+        std::array<char, 32> text{};
+        std::snprintf(text.data(), text.size(), "%.1f s", missing);
+        throw SourceLost(std::string("the file ends ") + text.data() +
+                         " before the length that it announces: it is cut or damaged");
+    }
+}
+
 bool Input::Read(AVPacket& packet) {
     libav::ForgetErrors();
-    // What the libraries still hold when a wait is over comes out before they tell.
-    const bool over = Expired() && ++drained_ > kLongestDrain;
-    const int result = over ? AVERROR_EXIT : av_read_frame(format_.get(), &packet);
+    const int result = ReadFrame(packet);
     if (interrupt_->Stopped() || (stop_ != nullptr && stop_())) {
         throw Stopped();
     }
     if (result >= 0) {
         ForgetWildStamps(packet, format_->streams[packet.stream_index]->time_base);
+        MarkDamage(packet);
+        Reach(packet);
         return true;
     }
     if (Expired()) {
@@ -266,6 +330,7 @@ bool Input::Read(AVPacket& packet) {
     }
     // A connection that the other side closes may look like this.
     if (result == AVERROR_EOF || (result == AVERROR(EIO) && !recorded_)) {
+        CheckLength();
         return false;
     }
     throw SourceLost(Reason(result));

@@ -2,6 +2,7 @@
 
 #include <atomic>
 #include <chrono>
+#include <limits>
 #include <memory>
 #include <set>
 #include <stdexcept>
@@ -79,6 +80,12 @@ class Input {
     void Classify();
     void FindStreams();
     void CarryOn(std::int64_t position);
+    int ReadFrame(AVPacket& packet);
+    /// Moves the mark of a damaged packet to the picture that it is for.
+    void MarkDamage(AVPacket& packet);
+    void Reach(const AVPacket& packet);
+    /// Throws `SourceLost` where a file has ended too early.
+    void CheckLength() const;
     /// Throws what `result` of opening means.
     [[noreturn]] void FailOpening(int result);
 
@@ -97,6 +104,12 @@ class Input {
     std::set<int> asked_;
     bool recorded_ = false;
     bool rtp_ = false;
+    /// Packets come by a transport stream.
+    bool transport_ = false;
+    /// Streams whose next picture is damaged.
+    std::set<int> damagedNext_;
+    /// Where the last unit of any stream ends, in microseconds.
+    std::int64_t reached_ = std::numeric_limits<std::int64_t>::min();
     /// Of a connection that has been taken over from an earlier context.
     std::unique_ptr<AVIOContext, CloseConnection> connection_;
     libav::Owner<AVFormatContext> format_;

@@ -6,6 +6,7 @@
 
 #include "common/ReceiverError.h"
 #include "source/Address.h"
+#include "source/AwaitSource.h"
 
 namespace receiver {
 namespace {
@@ -205,11 +206,12 @@ void InputProducer::GoOn(std::unique_ptr<Connection> connection, std::int64_t pa
 
 void InputProducer::Publish() {
     lostFrames_ = assembler_.LostFrames();
+    silentFrames_ = assembler_.SilentFrames();
     damaged_ = damagedBefore_ + (connection_ ? connection_->Damaged() : 0);
 }
 
 SourceCounts InputProducer::Counts() const {
-    return {lostFrames_, damaged_, reconnections_, changes_, away_};
+    return {lostFrames_, damaged_, reconnections_, changes_, away_, silentFrames_};
 }
 
 }  // namespace receiver

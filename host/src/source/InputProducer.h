@@ -12,8 +12,6 @@
 
 namespace receiver {
 
-/// How often it is told that a source is still waited for.
-inline constexpr std::chrono::seconds kTellEvery{60};
 /// Seconds that an attempt listens for a sender.
 inline constexpr double kListeningPatience = 60;
 
@@ -68,6 +66,7 @@ class InputProducer final : public ProducerInterface {
     std::optional<ReceiverError> end_;
 
     std::atomic<std::uint64_t> lostFrames_{0};
+    std::atomic<std::uint64_t> silentFrames_{0};
     std::atomic<std::uint64_t> damaged_{0};
     std::atomic<std::uint64_t> reconnections_{0};
     std::atomic<std::uint64_t> changes_{0};

@@ -1,9 +1,8 @@
-#include <chrono>
-#include <optional>
-#include <thread>
+#include <memory>
 #include <utility>
 
 #include "source/Address.h"
+#include "source/AwaitSource.h"
 #include "source/InputProducer.h"
 #include "source/QueuedSource.h"
 #include "source/TestPicture.h"
@@ -19,46 +18,22 @@ constexpr std::size_t kLiveAhead = 2000;
 /// for the module's queues of 50 units.
 constexpr double kBurst = 8;
 
-/// Between two attempts at a source that is called.
-constexpr std::chrono::seconds kPause{2};
-/// How often `stop` is asked meanwhile.
-constexpr std::chrono::milliseconds kAsk{50};
-
-using Clock = std::chrono::steady_clock;
-
-/// Throws `Stopped`.
-void WaitUntil(Clock::time_point time, bool (*stop)()) {
-    while (Clock::now() < time) {
-        if (stop != nullptr && stop()) {
-            throw Stopped();
-        }
-        std::this_thread::sleep_for(kAsk);
-    }
-}
-
-/// Opens the source, and waits for a live one until it is there.
-std::unique_ptr<InputProducer> Await(const SourceOptions& options,
-                                     const std::shared_ptr<Interrupt>& interrupt,
-                                     SourceListenerInterface& listener, bool (*stop)()) {
+/// Opens the source, and waits for a live one until it is there, unless that is not wanted.
+std::unique_ptr<InputProducer> Open(const SourceOptions& options, const std::shared_ptr<Interrupt>& interrupt,
+                                    SourceListenerInterface& listener, bool (*stop)()) {
     const bool listens = Listens(options.url);
-    std::optional<Clock::time_point> told;
-    for (;;) {
-        const auto tried = Clock::now();
-        try {
-            return std::make_unique<InputProducer>(
-                options, told && listens ? kListeningPatience : options.timeout, interrupt, stop);
-        } catch (const SourceAbsent& absence) {
-            if (!options.reconnect) {
-                throw;
-            }
-            const auto now = Clock::now();
-            if (!told || now - *told >= kTellEvery) {
-                listener.OnNotice(std::string(absence.what()) + "; waiting for it");
-                told = now;
-            }
-        }
-        WaitUntil(listens ? tried + kPause : Clock::now() + kPause, stop);
+    std::unique_ptr<InputProducer> producer;
+    const auto attempt = [&](bool told) {
+        producer = std::make_unique<InputProducer>(
+            options, told && listens ? kListeningPatience : options.timeout, interrupt, stop);
+    };
+    if (options.reconnect) {
+        SteadyWaitClock clock(stop);
+        AwaitSource(listens, attempt, listener, clock);
+    } else {
+        attempt(false);
     }
+    return producer;
 }
 
 }  // namespace
@@ -72,7 +47,7 @@ std::unique_ptr<SourceInterface> OpenSource(const SourceOptions& options, Source
                                               Pacer::ForFile(options.speed), kFileAhead, listener);
     }
     try {
-        auto producer = Await(options, interrupt, listener, stop);
+        auto producer = Open(options, interrupt, listener, stop);
         const bool recorded = producer->Recorded();
         return std::make_unique<QueuedSource>(
             std::move(producer), std::move(interrupt),

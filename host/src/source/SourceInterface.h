@@ -65,6 +65,8 @@ struct SourceCounts {
     std::uint64_t changes = 0;
     /// The source is lost and not back yet.
     bool away = false;
+    /// Audio frames that are silence because those of the source did not come.
+    std::uint64_t silentFrames = 0;
 };
 
 /// Hears of what an operator should know, one sentence each ("the source was lost: ...; trying again in 4 s",

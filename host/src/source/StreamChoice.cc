@@ -1,8 +1,10 @@
 #include "source/StreamChoice.h"
 
 #include <algorithm>
+#include <array>
 #include <iterator>
 #include <optional>
+#include <string_view>
 #include <vector>
 
 #include "common/Credentials.h"
@@ -123,6 +125,12 @@ std::string NoticeOf(const AVFormatContext& format, const Indices& videos, const
     return left.empty() ? "" : "recorded: " + List(taken) + "; left out: " + List(left);
 }
 
+/// What FFmpeg's libraries read without a container.
+bool IsBare(const AVInputFormat& format) {
+    constexpr std::array<std::string_view, 5> kBare{"h264", "hevc", "m4v", "mpegvideo", "vc1"};
+    return std::find(kBare.begin(), kBare.end(), format.name) != kBare.end();
+}
+
 }  // namespace
 
 StreamChoice ChooseStreams(AVFormatContext& format, const SourceOptions& options) {
@@ -133,6 +141,13 @@ StreamChoice ChooseStreams(AVFormatContext& format, const SourceOptions& options
     choice.video = Choose(format, videos, options.video, LargestVideo(format, videos), "video");
     if (choice.video < 0) {
         throw Unsuitable(format, "carries no video: a recording needs one");
+    }
+    if (IsBare(*format.iformat)) {
+        throw Unsuitable(
+            format,
+            "is a bare video stream: without time stamps nobody knows when a picture is due, and it "
+            "has no audio; put it into a container first, such as ffmpeg -framerate 25 -i FILE "
+            "-c copy FILE.mp4");
     }
     choice.audio = Choose(format, audios, options.audio, FirstAudio(format, audios, choice.video), "audio");
     choice.notice = NoticeOf(format, videos, audios, choice);

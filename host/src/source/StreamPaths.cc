@@ -1,6 +1,8 @@
 #include "source/StreamPaths.h"
 
 #include <algorithm>
+#include <cmath>
+#include <utility>
 
 #include "common/Credentials.h"
 #include "common/ReceiverError.h"
@@ -48,19 +50,49 @@ std::string H264With(const AVCodecParameters& parameters) {
 
 /// Replaces the description by that of what the video is converted to.
 void Convert(const AVCodecParameters& parameters, const VideoEncoding& encoding,
-             const VideoFindings& findings, const SourceOptions& options, StreamPaths& paths) {
+             const VideoFindings& findings, const SourceOptions& options, bool buildsUp, StreamPaths& paths) {
     if (!findings.rate && !options.frameRate) {
         throw ReceiverError(
             ExitCode::kSourceUnsuitable,
             "the frame rate of the source is none that can be recorded: tell --transcode which "
             "one to make of it with --fps");
     }
-    paths.video = std::make_unique<VideoConverter>(parameters, encoding, findings.toldRate);
+    paths.video = std::make_unique<VideoConverter>(parameters, encoding, findings.toldRate, buildsUp);
     paths.description = {encoding.frameRate, encoding.width, encoding.height, encoding.bitrate, {}};
     paths.description.summary = VideoSummary("H.264", paths.description);
     paths.notices.push_back("video is converted: " + std::string(avcodec_get_name(parameters.codec_id)) +
                             " " + std::to_string(parameters.width) + "x" + std::to_string(parameters.height) +
                             " to " + paths.description.summary);
+}
+
+/// The pictures with which a decoder can begin are no IDR frames, as from an encoder that refreshes its
+/// pictures bit by bit: a recording might wait for one for ever.
+bool RefreshesWithoutIdr(VideoPass& pass, const AVStream& stream, const Packets& ahead) {
+    bool refreshes = false;
+    for (const auto& packet : ahead) {
+        if (packet->stream_index == stream.index && (packet->flags & AV_PKT_FLAG_KEY) != 0) {
+            if (pass.IsStart(*packet)) {
+                return false;
+            }
+            refreshes = true;
+        }
+    }
+    return refreshes;
+}
+
+/// The file tells that it has another number of pictures than its rate asks for: where one was shown longer,
+/// none follows.
+bool RateVaries(const AVStream& stream, const FrameRate& rate) {
+    constexpr double kSlack = 0.02;
+    if (stream.nb_frames <= 1 || stream.duration <= 0) {
+        return false;
+    }
+    const double seconds = static_cast<double>(stream.duration) * av_q2d(stream.time_base);
+    const double expected =
+        seconds * static_cast<double>(rate.numerator) / static_cast<double>(rate.denominator);
+    // One picture more or less is a matter of rounding.
+    const double missing = std::abs(static_cast<double>(stream.nb_frames) - expected);
+    return missing > 1 && missing > kSlack * expected;
 }
 
 void DecideVideo(AVFormatContext& format, AVStream& stream, const Packets& ahead,
@@ -76,15 +108,28 @@ void DecideVideo(AVFormatContext& format, AVStream& stream, const Packets& ahead
     paths.passes = reason.empty() && (!options.transcode || (encoding.frameRate == description.frameRate &&
                                                              encoding.width == description.width &&
                                                              encoding.height == description.height));
+    std::unique_ptr<VideoPass> pass;
+    bool buildsUp = false;
+    if (paths.passes) {
+        pass = std::make_unique<VideoPass>(parameters);
+        buildsUp = options.transcode && RefreshesWithoutIdr(*pass, stream, ahead);
+        const bool varies = findings.rate && RateVaries(stream, *findings.rate);
+        if (varies && !options.transcode) {
+            paths.notices.emplace_back(
+                "the frame rate varies, and pictures that are not there count as lost: --transcode makes it "
+                "constant");
+        }
+        paths.passes = !buildsUp && !(varies && options.transcode);
+    }
     if (findings.interlaced) {
         paths.notices.emplace_back(paths.passes ? "the video is interlaced and is recorded as such"
                                                 : "the video is interlaced and becomes progressive");
     }
     if (paths.passes) {
-        paths.video = std::make_unique<VideoPass>(parameters);
+        paths.video = std::move(pass);
         description.summary = VideoSummary(H264With(parameters), description);
     } else {
-        Convert(parameters, encoding, findings, options, paths);
+        Convert(parameters, encoding, findings, options, buildsUp, paths);
     }
 }
 

@@ -14,6 +14,8 @@ namespace {
 constexpr std::int64_t kLongestLag = std::int64_t{3} * 90000;
 /// Units that may wait for a picture.
 constexpr std::size_t kLongestHold = 2000;
+/// Frames of silence at the end of a stream that are no gap: half a second.
+constexpr std::uint64_t kLongestSilentEnd = 24;
 /// Losses are told not more often than this, in ticks.
 constexpr std::int64_t kReportEvery = std::int64_t{10} * 90000;
 
@@ -142,7 +144,9 @@ void UnitAssembler::PlaceAudio(const CodedAudio& audio) {
             case AudioGrid::Action::kFill:
                 EmitSilence(place.time);
                 // That audio begins behind the picture is no gap.
-                tally_.filled += audioBegun_ ? 1 : 0;
+                if (audioBegun_) {
+                    CountSilence();
+                }
                 continue;
             case AudioGrid::Action::kAccept:
                 audioBegun_ = true;
@@ -163,11 +167,18 @@ void UnitAssembler::EmitSilence(std::int64_t time) {
     batch_.emplace_back(SourceUnit{Medium::kAudio, time, silence_.data, silence_.size, false, std::nullopt});
 }
 
+void UnitAssembler::CountSilence() {
+    ++tally_.filled;
+    ++silentFrames_;
+}
+
 void UnitAssembler::MakeSilence(std::int64_t time) {
     const std::int64_t limit = ToAudio(audio_ ? time - kLongestLag : time);
     while (heldAudio_.empty() && audioGrid_.End() <= limit) {
         EmitSilence(audioGrid_.Append());
-        tally_.filled += audio_ ? 1 : 0;
+        if (audio_) {
+            CountSilence();
+        }
     }
 }
 
@@ -197,14 +208,37 @@ void UnitAssembler::Finish() {
     const std::int64_t end = grid_.End();
     Release(end);
     // A picture whose audio is missing would not be recorded.
-    while (lastPicture_ >= 0 && audioGrid_.End() <= ToAudio(end)) {
+    std::uint64_t silent = 0;
+    for (; lastPicture_ >= 0 && audioGrid_.End() <= ToAudio(end); ++silent) {
         EmitSilence(audioGrid_.Append());
     }
+    // The last sound of a stream often ends a little before its last picture.
+    if (audioBegun_ && silent > kLongestSilentEnd) {
+        tally_.filled += silent;
+    }
+    CountMissingEnd(end);
+    TellGaps();
+}
+
+void UnitAssembler::CountMissingEnd(std::int64_t end) {
+    const std::int64_t left = heldAudio_.empty() ? 0 : FromAudio(heldAudio_.back().time) - end;
+    if (lastPicture_ < 0 || left < kLongestLag) {
+        return;
+    }
+    const auto frames = static_cast<std::uint64_t>(grid_.FramesIn(left));
+    lostFrames_ += frames;
+    AddNotice("the pictures ended " + std::to_string((left + kVideoClock / 2) / kVideoClock) +
+              " s before the sound, which is left out: " + Count(frames, "video frame") + " lost");
 }
 
 void UnitAssembler::Report() {
-    const bool something = tally_.lost + tally_.filled + tally_.overlapping + tally_.leftOut > 0;
-    if (!something || (lastReport_ && lastPicture_ - *lastReport_ < kReportEvery)) {
+    if (!lastReport_ || lastPicture_ - *lastReport_ >= kReportEvery) {
+        TellGaps();
+    }
+}
+
+void UnitAssembler::TellGaps() {
+    if (tally_.lost + tally_.filled + tally_.overlapping + tally_.leftOut == 0) {
         return;
     }
     std::string sentence;

@@ -47,6 +47,8 @@ class UnitAssembler {
     std::int64_t LastPicture() const { return lastPicture_; }
     const FrameGrid& Grid() const { return grid_; }
     std::uint64_t LostFrames() const { return lostFrames_; }
+    /// Audio frames that did not come and are silence.
+    std::uint64_t SilentFrames() const { return silentFrames_; }
 
  private:
     struct Klv {
@@ -58,10 +60,15 @@ class UnitAssembler {
     void PlaceAudio(const CodedAudio& audio);
     void EmitKlv(const Klv& klv);
     void EmitSilence(std::int64_t time);
+    void CountSilence();
     void MakeSilence(std::int64_t time);
     std::optional<SourceUnit::Clock::time_point> ArrivalOf(std::int64_t time) const;
     std::optional<Timecode> TimecodeOfFrame(std::int64_t index, const CodedPicture& picture);
+    /// Counts pictures that should go with the sound behind `end`.
+    void CountMissingEnd(std::int64_t end);
+    /// Tells the gaps that were counted, from time to time.
     void Report();
+    void TellGaps();
 
     FrameRate rate_;
     FrameGrid grid_;
@@ -87,6 +94,7 @@ class UnitAssembler {
     bool dropFrame_ = false;
 
     std::uint64_t lostFrames_ = 0;
+    std::uint64_t silentFrames_ = 0;
     /// What the next sentence tells of.
     struct Tally {
         std::uint64_t lost = 0;

@@ -6,6 +6,8 @@
 #include <cstdio>
 #include <vector>
 
+#include "common/ReceiverError.h"
+#include "source/Input.h"
 #include "source/PictureParser.h"
 
 namespace receiver {
@@ -19,12 +21,32 @@ struct Stamps {
 std::vector<Stamps> StampsOf(const AVStream& stream, const std::deque<libav::Owner<AVPacket>>& packets) {
     std::vector<Stamps> stamps;
     for (const auto& packet : packets) {
-        if (packet->stream_index == stream.index && packet->pts != AV_NOPTS_VALUE) {
+        // What is damaged may have the stamps of another picture.
+        const bool whole = (packet->flags & AV_PKT_FLAG_CORRUPT) == 0;
+        if (packet->stream_index == stream.index && packet->pts != AV_NOPTS_VALUE && whole) {
             stamps.push_back(
                 {packet->pts, packet->dts == AV_NOPTS_VALUE ? std::optional<std::int64_t>() : packet->dts});
         }
     }
     return stamps;
+}
+
+struct PictureCounts {
+    std::size_t all = 0;
+    std::size_t damaged = 0;
+    std::size_t stamped = 0;
+};
+
+PictureCounts CountPictures(const AVStream& stream, const std::deque<libav::Owner<AVPacket>>& packets) {
+    PictureCounts counts;
+    for (const auto& packet : packets) {
+        if (packet->stream_index == stream.index) {
+            ++counts.all;
+            counts.damaged += (packet->flags & AV_PKT_FLAG_CORRUPT) != 0 ? 1 : 0;
+            counts.stamped += packet->pts != AV_NOPTS_VALUE || packet->dts != AV_NOPTS_VALUE ? 1 : 0;
+        }
+    }
+    return counts;
 }
 
 bool Reordered(const AVStream& stream, const std::vector<Stamps>& stamps) {
@@ -82,6 +104,12 @@ double PictureSpacing(const AVStream& stream, const std::deque<libav::Owner<AVPa
 
 VideoFindings CheckVideo(AVFormatContext& format, AVStream& stream,
                          const std::deque<libav::Owner<AVPacket>>& packets, const FrameRate* expected) {
+    const PictureCounts pictures = CountPictures(stream, packets);
+    if (pictures.all > 0 && pictures.stamped == 0) {
+        throw ReceiverError(ExitCode::kSourceUnsuitable,
+                            "the video has no time stamps, as a raw byte stream has none: send a transport "
+                            "stream, or put it into a container with its frame rate");
+    }
     VideoFindings findings;
     const std::vector<Stamps> stamps = StampsOf(stream, packets);
     findings.reordered = Reordered(stream, stamps);
@@ -123,6 +151,12 @@ VideoFindings CheckVideo(AVFormatContext& format, AVStream& stream,
             findings.rate = NearestFrameRate(findings.toldRate.num, findings.toldRate.den);
         }
     }
+    if ((findings.reordered || !findings.rate) && pictures.damaged * 2 > pictures.all) {
+        // What is left of the pictures is no witness against the encoder.
+        throw SourceLost(std::to_string(pictures.damaged) + " of " + std::to_string(pictures.all) +
+                         " pictures arrived damaged; look for a second sender at the same address, and for "
+                         "losses on the network");
+    }
     return findings;
 }
 
@@ -130,6 +164,10 @@ std::string WhyNotPassed(const AVCodecParameters& parameters, const VideoFinding
     if (parameters.codec_id != AV_CODEC_ID_H264) {
         return std::string("the video is ") + avcodec_get_name(parameters.codec_id) +
                ", and only H.264 is recorded as it comes: set the encoder to H.264";
+    }
+    if (parameters.width <= 0) {
+        // Nothing can be said of its pictures.
+        return "";
     }
     if (findings.fields) {
         return "the video is interlaced with single fields: set the encoder to progressive pictures";

@@ -24,7 +24,9 @@ struct VideoFindings {
 };
 
 /// Looks at the packets of `stream` among `packets`. `expected`: a rate that is taken for granted while the
-/// packets do not speak against it (of an earlier connection), or null.
+/// packets do not speak against it (of an earlier connection), or null. Throws `ReceiverError`
+/// (`kSourceUnsuitable`) where no packet has a time stamp, and `SourceLost` where most are damaged and the
+/// rest makes no sense.
 VideoFindings CheckVideo(AVFormatContext& format, AVStream& stream,
                          const std::deque<libav::Owner<AVPacket>>& packets, const FrameRate* expected);
 

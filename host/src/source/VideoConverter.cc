@@ -12,7 +12,7 @@ extern "C" {
 namespace receiver {
 
 VideoConverter::VideoConverter(const AVCodecParameters& parameters, const VideoEncoding& encoding,
-                               AVRational sourceRate)
+                               AVRational sourceRate, bool buildsUp)
     : encoding_(encoding),
       sourceRate_(sourceRate),
       period_(sourceRate.num > 0 ? av_rescale(90000, sourceRate.den, sourceRate.num) : 0),
@@ -34,6 +34,9 @@ VideoConverter::VideoConverter(const AVCodecParameters& parameters, const VideoE
     // Threads that take whole frames would hold several of them back, and encoding, which has its own, costs
     // more.
     decoder_->thread_count = 1;
+    if (buildsUp) {
+        decoder_->flags |= AV_CODEC_FLAG_OUTPUT_CORRUPT;
+    }
     libav::Check(avcodec_open2(decoder_.get(), decoder, nullptr), "open the decoder of the video");
 }
 

@@ -15,8 +15,10 @@ class VideoConverter final : public VideoPathInterface {
  public:
     /// `sourceRate` is the source's rate; its timecode is taken over when the rate stays. Throws
     /// `ReceiverError`
-    /// (`kSourceUnsuitable`) for video that cannot be decoded.
-    VideoConverter(const AVCodecParameters& parameters, const VideoEncoding& encoding, AVRational sourceRate);
+    /// (`kSourceUnsuitable`) for video that cannot be decoded. `buildsUp`: pictures are refreshed bit by bit,
+    /// and the first ones are taken although they are not whole yet.
+    VideoConverter(const AVCodecParameters& parameters, const VideoEncoding& encoding, AVRational sourceRate,
+                   bool buildsUp = false);
 
     bool IsStart(const AVPacket& packet) override { return (packet.flags & AV_PKT_FLAG_KEY) != 0; }
     void Push(const AVPacket& packet, const PictureSink& sink) override;

@@ -39,10 +39,21 @@ TEST(FileReport, AFileThatIsNoRecordingHasAProblemAndASize) {
     ASSERT_GE(descriptor, 0);
     close(descriptor);
     std::ofstream(path) << "no recording";
-    const RecordedFile file = ReadBack(path);
-    EXPECT_EQ(file.bytes, 12u);
-    EXPECT_EQ(file.problem, "Invalid data found when processing input");
+    const auto read = [](std::int64_t offset, unsigned char* data, int size) {
+        return static_cast<int>(
+            std::string("no recording").copy(reinterpret_cast<char*>(data), size, offset));
+    };
+    for (const RecordedFile& file : {ReadBack(path), ReadBack(path, 12, read)}) {
+        EXPECT_EQ(file.path, path);
+        EXPECT_EQ(file.bytes, 12u);
+        EXPECT_EQ(file.problem, "Invalid data found when processing input");
+    }
     unlink(path.c_str());
+}
+
+TEST(FileReport, AFileThatCannotBeReadToItsEndHasAProblem) {
+    const auto fails = [](std::int64_t, unsigned char*, int) { return -1; };
+    EXPECT_EQ(ReadBack("//server/share/a.MP4", 12, fails).problem, "Input/output error");
 }
 
 }  // namespace

@@ -10,7 +10,6 @@ inline Snapshot RecordingSnapshot() {
     snapshot.timecode = Timecode{10, 20, 30, 12, true};
     snapshot.seconds = 12.5;
     snapshot.recording = true;
-    snapshot.since = Timecode{10, 20, 18, 0, true};
     snapshot.framesPerSecond = 59.94;
     snapshot.videoKilobits = 8123.4;
     snapshot.audioKilobits = 192.2;

@@ -20,26 +20,48 @@ class TextDisplayTest : public ::testing::Test {
 
     std::ostringstream messages_;
     std::ostringstream results_;
-    TextDisplay display_{messages_, results_};
+    std::chrono::steady_clock::time_point now_{};
+    TextDisplay display_{messages_, results_, [this] { return now_; }};
 };
 
-TEST_F(TextDisplayTest, OneLineForEachChangeAndNoneWithout) {
+TEST_F(TextDisplayTest, BeginsAndEndsOfRecordingsAreLines) {
+    display_.RecordStarted({10, 20, 18, 0, true});
+    display_.RecordStopped({10, 20, 40, 0, true});
+    EXPECT_EQ(Said(), "recording at 10:20:18;00\nnot recording at 10:20:40;00\n");
+}
+
+TEST_F(TextDisplayTest, WaitingIsToldOnce) {
     Snapshot snapshot = RecordingSnapshot();
     display_.Show(snapshot);
-    EXPECT_EQ(Said(), "recording at 10:20:18;00\n");
-    display_.Show(snapshot);
     EXPECT_EQ(Said(), "");
-    snapshot.lost = 1;
-    display_.Show(snapshot);
-    EXPECT_EQ(Said(), "lost: 1 unit so far at 10:20:30;12\n");
-    snapshot.recording = false;
-    snapshot.since = Timecode{10, 20, 40, 0, true};
-    display_.Show(snapshot);
-    EXPECT_EQ(Said(), "not recording at 10:20:40;00\n");
     snapshot.waiting = true;
     display_.Show(snapshot);
     display_.Show(snapshot);
     EXPECT_EQ(Said(), "recording begins with the next IDR frame\n");
+}
+
+TEST_F(TextDisplayTest, LossesAreToldAtOnceAndThenEveryFiveSecondsWithTheTotal) {
+    Snapshot snapshot = RecordingSnapshot();
+    snapshot.lost = 1;
+    display_.Show(snapshot);
+    EXPECT_EQ(Said(), "lost: 1 unit so far at 10:20:30;12\n");
+    snapshot.lost = 2;
+    now_ += std::chrono::milliseconds(4999);
+    display_.Show(snapshot);
+    EXPECT_EQ(Said(), "");
+    snapshot.lost = 7;
+    now_ += std::chrono::milliseconds(1);
+    display_.Show(snapshot);
+    display_.Show(snapshot);
+    EXPECT_EQ(Said(), "lost: 7 units so far at 10:20:30;12\n");
+    now_ += std::chrono::minutes(1);
+    display_.Show(snapshot);
+    EXPECT_EQ(Said(), "");
+}
+
+TEST_F(TextDisplayTest, WhatNobodyHasReadIsCounted) {
+    EXPECT_EQ(TextRemark(1), "1 message could not be shown\n");
+    EXPECT_EQ(TextRemark(20), "20 messages could not be shown\n");
 }
 
 TEST_F(TextDisplayTest, StatusesAreWordsAndFaultsHaveTheirNumbers) {

@@ -81,6 +81,23 @@ TEST_F(ConversionsTest, AnotherCodecIsConvertedWhenThatIsAskedFor) {
     EXPECT_EQ(stream.value("width", 0), 320);
 }
 
+// As telephones record: where nothing moves there is no picture.
+TEST_F(ConversionsTest, AVaryingRateBecomesConstantWhenThatIsAskedFor) {
+    MaterialOptions options;
+    options.rate = "30";
+    options.seconds = 3;
+    options.container = "mp4";
+    options.more = {"-vf", "select='lt(t,1)+not(mod(n,3))'", "-fps_mode", "vfr"};
+    const auto material = MakeMaterial(folder, options);
+    const Outcome converted = RunReceiver({"--input", material.string(), "--speed", "4", "--transcode"});
+    EXPECT_EQ(converted.code, 0) << converted.errors;
+    ASSERT_THAT(Recordings(), SizeIs(1));
+    EXPECT_NEAR(static_cast<double>(DecodeVideo(Recordings().front()).checksums.size()), 90, 2);
+    const Outcome untouched = RunReceiver({"--input", material.string(), "--speed", "4"});
+    EXPECT_NE(untouched.code, 0);
+    EXPECT_THAT(untouched.errors, HasSubstr("the frame rate varies"));
+}
+
 TEST_F(ConversionsTest, TheTimecodeOfTheSourceIsTaken) {
     MaterialOptions options;
     options.rate = "30000/1001";

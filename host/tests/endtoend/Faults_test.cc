@@ -157,6 +157,18 @@ TEST_F(FaultsTest, KeysOnATerminalDriveTheRecord) {
     }
 }
 
+TEST_F(FaultsTest, KeysAreHeardWhileTheSourceIsNotThereYet) {
+    const FreePorts ports;
+    const auto receiver =
+        Start({"--input", "udp://127.0.0.1:" + std::to_string(ports.First()), "--timeout", "1"},
+              Process::Terminal::kPseudoTerminal);
+    ASSERT_TRUE(receiver->WaitForText("waiting for it")) << receiver->AllText();
+    receiver->Type("x");
+    ASSERT_TRUE(receiver->WaitForText("keys: r records")) << receiver->AllText();
+    receiver->Type("q");
+    EXPECT_EQ(receiver->Wait(), 0) << receiver->AllText();
+}
+
 TEST_F(FaultsTest, AfterAKillAFragmentedFileIsReadable) {
     const auto receiver = Start(Small({"--file-type", "fragment", "--fps", "50", "--speed", "4"}));
     // The first fragment is on disk, and the next one is begun.

@@ -4,6 +4,7 @@
 #include <gtest/gtest.h>
 
 #include <fstream>
+#include <nlohmann/json.hpp>
 
 #include "endtoend/ReceiverFixture.h"
 #include "support/Material.h"
@@ -80,6 +81,15 @@ INSTANTIATE_TEST_SUITE_P(
         Mistake{"BitrateWithUnit", {"--bitrate", "8M"}, kUsage, "--bitrate"},
         Mistake{"NegativeGop", {"--gop", "-1"}, kUsage, "--gop"},
         Mistake{"SpeedOfZero", {"--speed", "0"}, kUsage, "--speed"},
+        Mistake{"SpeedThatIsNoNumber", {"--speed", "nan"}, kUsage, "nan is no number"},
+        Mistake{"PortThatDoesNotExist", {"--input", "udp://127.0.0.1:99999"}, kUsage, "99999 is no port"},
+        Mistake{"PassphraseTooShort",
+                {"--input", "srt://127.0.0.1:9000?passphrase=open"},
+                kUsage,
+                "4 characters, and SRT takes 10 to 79"},
+        Mistake{"RangesThatAreEmpty", {"--record", ""}, kUsage, "--record is empty"},
+        Mistake{
+            "UserWithoutAShare", {"--user", "joe"}, kUsage, "--user goes with a folder on a network share"},
         Mistake{"SpeedOfALiveSource", {"--input", "udp://127.0.0.1:1", "--speed", "2"}, kUsage, "--speed"},
         Mistake{"RateOfAFile", {"--input", "a.ts", "--fps", "25"}, kUsage, "--fps"},
         Mistake{"WrongFileType", {"--file-type", "fragmented"}, kUsage, "--file-type"},
@@ -98,6 +108,7 @@ INSTANTIATE_TEST_SUITE_P(
                 kUsage,
                 "--no-drop-frame"},
         Mistake{"PrefixWithAFolder", {"--prefix", "a/b"}, kUsage, "--prefix"},
+        Mistake{"ShareWithoutAName", {"--output", "//server"}, kUsage, "//server/share/folder"},
         Mistake{"PriorityBeyondTheScale", {"--log-priority", "14"}, kUsage, "--log-priority"},
         Mistake{"TimeoutOfZero", {"--timeout", "0"}, kUsage, "--timeout"},
         Mistake{"TwoPasswords", {"--password", "a", "--password-file", "b"}, kUsage, "--password"},
@@ -159,6 +170,16 @@ TEST_F(MistakesTest, ASourceWithoutVideo) {
     ExpectRefused({"--input", file.string()}, kSourceUnsuitable, "video");
 }
 
+TEST_F(MistakesTest, ABareH264StreamIsBlamedForItsMissingTimeStamps) {
+    const auto file = folder.Path() / "bare.h264";
+    ASSERT_EQ(RunProgram({"ffmpeg", "-v", "error", "-i", MakeMaterial(folder).string(), "-c", "copy", "-an",
+                          file.string()})
+                  .code,
+              0);
+    ExpectRefused({"--input", file.string()}, kSourceUnsuitable, "time stamps");
+    ExpectRefused({"--input", file.string(), "--transcode"}, kSourceUnsuitable, "no audio");
+}
+
 TEST_F(MistakesTest, ACodecThatIsNotH264) {
     const auto file = folder.Path() / "mpeg2.ts";
     ASSERT_EQ(RunProgram({"ffmpeg", "-v", "error", "-f", "lavfi", "-i", "testsrc2=size=320x180:rate=25", "-t",
@@ -195,29 +216,6 @@ TEST_F(MistakesTest, AWrongPassphrase) {
     EXPECT_EQ(outcome.errors.find("the-wrong-one"), std::string::npos) << outcome.errors;
 }
 
-// The log of the module alone tells whose logon was refused, and with what password.
-TEST_F(MistakesTest, ACredentialOfAShareThatIsRefused) {
-    // Two slashes in front are a share to the module.
-    const std::string share = "/" + OutputFolder().string();
-    const auto passwordFile = folder.Path() / "password";
-    std::ofstream(passwordFile) << "open, sesame";
-    const std::vector<std::string> options = {
-        "--output", share,    "--user", "Ali, Baba\nand 40", "--password-file", passwordFile.string(),
-        "--size",   "320x180"};
-    for (const char* const form : {"--file-type=normal", "--json"}) {
-        auto all = options;
-        all.emplace_back(form);
-        const Outcome outcome = RunReceiver(all);
-        EXPECT_EQ(outcome.code, 7) << outcome.errors;
-        const std::string said = outcome.output + outcome.errors;
-        EXPECT_THAT(said, HasSubstr("LogonUser call failed. 0, "));
-        for (const char* const secret : {"Ali", "Baba", "and 40", "open", "sesame"}) {
-            EXPECT_EQ(said.find(secret), std::string::npos) << said;
-        }
-    }
-    EXPECT_THAT(Log(), HasSubstr("open, sesame"));
-}
-
 // The module reads the store too, and to it both kinds of slashes are one.
 TEST_F(MistakesTest, BackslashesInTheOutputFolderOfTheSettingsStore) {
     const auto place = folder.Path() / "from the store";
@@ -228,6 +226,35 @@ TEST_F(MistakesTest, BackslashesInTheOutputFolderOfTheSettingsStore) {
     EXPECT_EQ(outcome.code, 0) << outcome.errors;
     EXPECT_THAT(outcome.errors, HasSubstr("made the output folder " + place.string() + "\n"));
     EXPECT_EQ(RecordingsIn(place).size(), 1U);
+}
+
+// The store of a run with --max-minutes is a copy.
+TEST_F(MistakesTest, ASettingsStoreIsReadAlikeWithAndWithoutALengthOfFiles) {
+    const auto place = folder.Path() / "from the store";
+    std::ofstream(folder.Path() / "settings.ini")
+        << "[ Qx/Other/MP4FileOut ] ; this machine\nMP4OutputPath = " << place.string() << "\n";
+    for (const std::string minutes : {"--json", "--max-minutes=5"}) {
+        const Outcome outcome = RunProgram(
+            {RECEIVER_PROGRAM, "--module", CLIPFILE_MODULE, "--size", "320x180", "--seconds", "1", minutes},
+            environment);
+        EXPECT_EQ(outcome.code, 0) << outcome.errors;
+    }
+    EXPECT_EQ(RecordingsIn(place).size(), 2U);
+}
+
+TEST_F(MistakesTest, InJsonAWrongOptionIsAnEventToo) {
+    for (const std::vector<std::string>& options :
+         {std::vector<std::string>{"--json", "--speed", "nan"}, {"--record", "9-2", "--json"}}) {
+        const Outcome outcome = RunReceiver(options);
+        EXPECT_EQ(outcome.code, kUsage);
+        EXPECT_EQ(outcome.errors, "");
+        const auto event = nlohmann::json::parse(outcome.output);
+        EXPECT_EQ(event["event"], "failure");
+        EXPECT_EQ(event["exit_code"], kUsage);
+        EXPECT_THAT(event["text"].get<std::string>(),
+                    HasSubstr(options[0] == "--json" ? "--speed" : "--record"));
+        EXPECT_THAT(event["time"].get<std::string>(), ::testing::MatchesRegex("....-..-..T..:..:..\\....Z"));
+    }
 }
 
 TEST_F(MistakesTest, APortOnWhichNothingArrives) {

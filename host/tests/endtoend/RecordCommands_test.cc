@@ -15,7 +15,7 @@ namespace {
 
 using ::testing::SizeIs;
 
-struct Case {
+struct RangeCase {
     const char* name;
     const char* rate;
     const char* exactRate;
@@ -24,7 +24,7 @@ struct Case {
     bool fragmented;
 };
 
-std::ostream& operator<<(std::ostream& out, const Case& parameters) {
+std::ostream& operator<<(std::ostream& out, const RangeCase& parameters) {
     return out << parameters.name;
 }
 
@@ -39,7 +39,7 @@ std::size_t PictureAt(double seconds, const receiver::FrameRate& rate, int group
     return (picture + step - 1) / step * step;
 }
 
-class RecordRangesTest : public ReceiverFixture, public ::testing::WithParamInterface<Case> {};
+class RecordRangesTest : public ReceiverFixture, public ::testing::WithParamInterface<RangeCase> {};
 
 TEST_P(RecordRangesTest, EachFileHoldsThePicturesFromTheFirstIdrFrameToTheStop) {
     MaterialOptions options;
@@ -80,10 +80,10 @@ TEST_P(RecordRangesTest, EachFileHoldsThePicturesFromTheFirstIdrFrameToTheStop) 
 // The second file of the drop-frame case begins behind the minute, where two numbers are left out.
 INSTANTIATE_TEST_SUITE_P(
     Rates, RecordRangesTest,
-    ::testing::Values(Case{"Normal25", "25", "25", 10, "10:00:00:00", false},
-                      Case{"Normal2997Drop", "29.97", "30000/1001", 12, "10:00:57;00", false},
-                      Case{"Fragment50", "50", "50", 7, "23:59:57:00", true},
-                      Case{"Normal5994", "59.94", "60000/1001", 25, "10:00:00;00", false}),
+    ::testing::Values(RangeCase{"Normal25", "25", "25", 10, "10:00:00:00", false},
+                      RangeCase{"Normal2997Drop", "29.97", "30000/1001", 12, "10:00:57;00", false},
+                      RangeCase{"Fragment50", "50", "50", 7, "23:59:57:00", true},
+                      RangeCase{"Normal5994", "59.94", "60000/1001", 25, "10:00:00;00", false}),
     ::testing::PrintToStringParamName());
 
 using RecordCommandsTest = ReceiverFixture;

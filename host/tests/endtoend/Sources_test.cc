@@ -17,7 +17,7 @@ using ::testing::HasSubstr;
 
 enum class Road { kUdp, kRtp, kSrtListener, kSrtCaller, kHttp, kRtsp, kFile };
 
-struct Case {
+struct SourceCase {
     const char* name;
     Road road;
     const char* rate;       // as the receiver writes it
@@ -28,11 +28,11 @@ struct Case {
     const char* container;
 };
 
-std::ostream& operator<<(std::ostream& out, const Case& parameters) {
+std::ostream& operator<<(std::ostream& out, const SourceCase& parameters) {
     return out << parameters.name;
 }
 
-class SourcesTest : public ReceiverFixture, public ::testing::WithParamInterface<Case> {
+class SourcesTest : public ReceiverFixture, public ::testing::WithParamInterface<SourceCase> {
  protected:
     /// Sends the material over the road of this case and records `kSeconds` of it.
     Outcome Record(const std::filesystem::path& material) {
@@ -145,17 +145,20 @@ TEST_P(SourcesTest, IsRecordedByteForByte) {
 INSTANTIATE_TEST_SUITE_P(
     Roads, SourcesTest,
     ::testing::Values(
-        Case{"UdpNormal25WithKlv", Road::kUdp, "25", "25", false, "10:20:30:12", true, "ts"},
-        Case{"UdpFragment2997WithKlv", Road::kUdp, "29.97", "30000/1001", true, "09:59:58;20", true, "ts"},
-        Case{"RtpNormal5994", Road::kRtp, "59.94", "60000/1001", false, "10:00:59;50", false, "mp4"},
-        Case{"RtpFragment25", Road::kRtp, "25", "25", true, "23:59:59:20", false, "mp4"},
-        Case{"SrtListenerNormal50", Road::kSrtListener, "50", "50", false, "00:00:00:00", false, "ts"},
-        Case{"SrtCallerFragment25WithKlv", Road::kSrtCaller, "25", "25", true, "01:02:03:04", true, "ts"},
-        Case{"HttpNormal25WithKlv", Road::kHttp, "25", "25", false, "19:59:59:24", true, "ts"},
-        Case{"RtspFragment25", Road::kRtsp, "25", "25", true, "05:00:00:00", false, "mp4"},
-        Case{"FileNormal2997", Road::kFile, "29.97", "30000/1001", false, "10:00:58;28", false, "mp4"},
-        Case{"FileFragment50WithKlv", Road::kFile, "50", "50", true, "12:34:56:49", true, "ts"},
-        Case{"FileFragment5994", Road::kFile, "59.94", "60000/1001", true, "00:09:59;59", false, "mkv"}),
+        SourceCase{"UdpNormal25WithKlv", Road::kUdp, "25", "25", false, "10:20:30:12", true, "ts"},
+        SourceCase{"UdpFragment2997WithKlv", Road::kUdp, "29.97", "30000/1001", true, "09:59:58;20", true,
+                   "ts"},
+        SourceCase{"RtpNormal5994", Road::kRtp, "59.94", "60000/1001", false, "10:00:59;50", false, "mp4"},
+        SourceCase{"RtpFragment25", Road::kRtp, "25", "25", true, "23:59:59:20", false, "mp4"},
+        SourceCase{"SrtListenerNormal50", Road::kSrtListener, "50", "50", false, "00:00:00:00", false, "ts"},
+        SourceCase{"SrtCallerFragment25WithKlv", Road::kSrtCaller, "25", "25", true, "01:02:03:04", true,
+                   "ts"},
+        SourceCase{"HttpNormal25WithKlv", Road::kHttp, "25", "25", false, "19:59:59:24", true, "ts"},
+        SourceCase{"RtspFragment25", Road::kRtsp, "25", "25", true, "05:00:00:00", false, "mp4"},
+        SourceCase{"FileNormal2997", Road::kFile, "29.97", "30000/1001", false, "10:00:58;28", false, "mp4"},
+        SourceCase{"FileFragment50WithKlv", Road::kFile, "50", "50", true, "12:34:56:49", true, "ts"},
+        SourceCase{"FileFragment5994", Road::kFile, "59.94", "60000/1001", true, "00:09:59;59", false,
+                   "mkv"}),
     ::testing::PrintToStringParamName());
 
 using GroupsTest = ReceiverFixture;

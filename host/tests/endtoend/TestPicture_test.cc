@@ -80,17 +80,18 @@ double FirstBeep(const std::filesystem::path& file) {
     return static_cast<double>(beep - loudness.begin()) * kWindow / kAudioRate;
 }
 
-struct Case {
+struct TestPictureCase {
     const char* name;
     const char* rate;
     const char* exactRate;
 };
 
-std::ostream& operator<<(std::ostream& out, const Case& parameters) {
+std::ostream& operator<<(std::ostream& out, const TestPictureCase& parameters) {
     return out << parameters.name;
 }
 
-class TestPictureRangesTest : public ReceiverFixture, public ::testing::WithParamInterface<Case> {};
+class TestPictureRangesTest : public ReceiverFixture,
+                              public ::testing::WithParamInterface<TestPictureCase> {};
 
 // A range that ends with the run, and an IDR frame in each twelve pictures.
 TEST_P(TestPictureRangesTest, TheFileHoldsThePicturesFromTheFirstIdrFrameToTheStop) {
@@ -120,8 +121,10 @@ TEST_P(TestPictureRangesTest, TheFileHoldsThePicturesFromTheFirstIdrFrameToTheSt
 }
 
 INSTANTIATE_TEST_SUITE_P(Rates, TestPictureRangesTest,
-                         ::testing::Values(Case{"Fps25", "25", "25"}, Case{"Fps2997", "29.97", "30000/1001"},
-                                           Case{"Fps50", "50", "50"}, Case{"Fps5994", "59.94", "60000/1001"}),
+                         ::testing::Values(TestPictureCase{"Fps25", "25", "25"},
+                                           TestPictureCase{"Fps2997", "29.97", "30000/1001"},
+                                           TestPictureCase{"Fps50", "50", "50"},
+                                           TestPictureCase{"Fps5994", "59.94", "60000/1001"}),
                          ::testing::PrintToStringParamName());
 
 }  // namespace

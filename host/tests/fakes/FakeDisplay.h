@@ -18,6 +18,8 @@ class FakeDisplay final : public DisplayInterface {
     void Status(const ModuleStatus& status) override { statuses.push_back(status); }
     void FileOpened(const std::string& path) override { opened.push_back(path); }
     void FileClosed(const std::string& path) override { closed.push_back(path); }
+    void RecordStarted(const Timecode& at) override { started.push_back(at); }
+    void RecordStopped(const Timecode& at) override { stopped.push_back(at); }
     void Show(const Snapshot& snapshot) override { snapshots.push_back(snapshot); }
     void Finish(const Summary& end) override {
         summary = end;
@@ -30,6 +32,8 @@ class FakeDisplay final : public DisplayInterface {
     std::vector<ModuleStatus> statuses;
     std::vector<std::string> opened;
     std::vector<std::string> closed;
+    std::vector<Timecode> started;
+    std::vector<Timecode> stopped;
     std::vector<Snapshot> snapshots;
     Summary summary;
     int finished = 0;

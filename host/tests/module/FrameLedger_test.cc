@@ -5,11 +5,10 @@
 #include <thread>
 #include <vector>
 
+#include "support/WaitTimes.h"
+
 namespace receiver {
 namespace {
-
-constexpr std::chrono::milliseconds kNow{0};
-constexpr std::chrono::seconds kDeadline{30};
 
 /// Twenty units in the module; nothing is cut.
 std::vector<std::function<void()>> TwentyUnits(FrameLedger& ledger) {

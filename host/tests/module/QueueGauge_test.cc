@@ -4,11 +4,10 @@
 
 #include <thread>
 
+#include "support/WaitTimes.h"
+
 namespace receiver {
 namespace {
-
-constexpr std::chrono::milliseconds kNow{0};
-constexpr std::chrono::seconds kDeadline{30};
 
 TEST(QueueGauge, CountsEverythingThatEnteredUntilAMarkComesThrough) {
     QueueGauge gauge;

@@ -16,36 +16,6 @@ namespace {
 
 using ::testing::HasSubstr;
 
-TEST(WithFileLength, SetsTheLengthInItsSection) {
-    EXPECT_EQ(WithFileLength("[Qx/Other/MP4FileOut]\nMP4OutputPath = /srv\nMP4MaxFileSize = 120\n", 5),
-              "[Qx/Other/MP4FileOut]\nMP4MaxFileSize = 5\nMP4OutputPath = /srv\n");
-}
-
-TEST(WithFileLength, AddsTheSectionWhereThereIsNone) {
-    EXPECT_EQ(WithFileLength("", 0), "[Qx/Other/MP4FileOut]\nMP4MaxFileSize = 0\n");
-    EXPECT_EQ(WithFileLength("[Other]\na = b", 7),
-              "[Other]\na = b\n[Qx/Other/MP4FileOut]\nMP4MaxFileSize = 7\n");
-}
-
-TEST(WithFileLength, LeavesTheSameKeyOfOtherSectionsAlone) {
-    EXPECT_EQ(WithFileLength("[A]\nMP4MaxFileSize = 1\n[Qx/Other/MP4FileOut]\n", 5),
-              "[A]\nMP4MaxFileSize = 1\n[Qx/Other/MP4FileOut]\nMP4MaxFileSize = 5\n");
-}
-
-TEST(WithFileLength, KeepsCommentsAndOddValuesAsTheyAre) {
-    EXPECT_EQ(WithFileLength(
-                  "# note\r\n [Qx/Other/MP4FileOut] \r\n;MP4MaxFileSize = 9\r\nMP4AuthPassword = a=[b];\"\r\n"
-                  "\tMP4MaxFileSize=3\r\n",
-                  8),
-              "# note\r\n [Qx/Other/MP4FileOut] \r\nMP4MaxFileSize = 8\n;MP4MaxFileSize = 9\r\n"
-              "MP4AuthPassword = a=[b];\"\r\n");
-}
-
-TEST(WithFileLength, SkipsAByteOrderMark) {
-    EXPECT_EQ(WithFileLength("\xEF\xBB\xBF[Qx/Other/MP4FileOut]\n", 2),
-              "[Qx/Other/MP4FileOut]\nMP4MaxFileSize = 2\n");
-}
-
 class SettingsFileTest : public ::testing::Test {
  protected:
     SettingsFileTest() : folder_(::testing::TempDir() + "receiver_settings_XXXXXX") {
@@ -94,7 +64,7 @@ TEST_F(SettingsFileTest, AFileLengthMakesAPrivateCopyThatGoesAgain) {
         struct stat status {};
         ASSERT_EQ(stat(copy.c_str(), &status), 0);
         EXPECT_EQ(status.st_mode & 0777, 0600u);
-        EXPECT_EQ(TextInUse(), "[Qx/Other/MP4FileOut]\nMP4MaxFileSize = 30\nMP4AuthPassword = secret\n");
+        EXPECT_EQ(TextInUse(), "[Qx/Other/MP4FileOut]\nMP4AuthPassword = secret\nMP4MaxFileSize = 30\n");
     }
     EXPECT_FALSE(std::filesystem::exists(copy));
     EXPECT_TRUE(std::filesystem::exists(store));
@@ -104,6 +74,34 @@ TEST_F(SettingsFileTest, AFileLengthIsAddedToTheStoreInUse) {
     setenv("QX_SETTINGS", Write("[A]\nb = c\n").c_str(), 1);
     const SettingsFile settings(std::nullopt, 1);
     EXPECT_EQ(TextInUse(), "[A]\nb = c\n[Qx/Other/MP4FileOut]\nMP4MaxFileSize = 1\n");
+}
+
+// However the section is written that the module reads its settings from.
+TEST_F(SettingsFileTest, TheCopyKeepsWhatTheModuleReads) {
+    for (const char* const section :
+         {"[Qx/Other/MP4FileOut]", "[ Qx/Other/MP4FileOut ]", "\t[Qx/Other/MP4FileOut] ; where files go",
+          "\xEF\xBB\xBF[Qx/Other/MP4FileOut]\r"}) {
+        const std::string store = Write(
+            std::string(section) + "\nMP4OutputPath = /srv\nMP4MaxFileSize = 120\n[A]\nMP4MaxFileSize = 1\n");
+        const SettingsFile settings(store, 5);
+        EXPECT_EQ(
+            TextInUse(),
+            "[A]\nMP4MaxFileSize = 1\n[Qx/Other/MP4FileOut]\nMP4MaxFileSize = 5\nMP4OutputPath = /srv\n")
+            << section;
+    }
+}
+
+TEST_F(SettingsFileTest, AStoreThatTheModuleWouldNotUnderstandIsRefused) {
+    setenv("QX_SETTINGS", Write("[A]\nb = c\nMP4OutputPath /srv\n").c_str(), 1);
+    for (const std::optional<unsigned int> minutes : {std::optional<unsigned int>(), std::optional(5u)}) {
+        try {
+            const SettingsFile settings(std::nullopt, minutes);
+            ADD_FAILURE() << "was read";
+        } catch (const ReceiverError& error) {
+            EXPECT_EQ(error.Code(), ExitCode::kUsage);
+            EXPECT_THAT(error.what(), HasSubstr("/store.ini' cannot be read: line 3: "));
+        }
+    }
 }
 
 TEST_F(SettingsFileTest, AStoreInUseThatIsMissingCountsAsEmpty) {

@@ -6,25 +6,13 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
-#include <chrono>
 #include <csignal>
-#include <functional>
 #include <string>
-#include <thread>
+
+#include "support/WaitUntil.h"
 
 namespace receiver {
 namespace {
-
-bool WaitUntil(const std::function<bool()>& condition) {
-    const auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(30);
-    while (!condition()) {
-        if (std::chrono::steady_clock::now() > deadline) {
-            return false;
-        }
-        std::this_thread::yield();
-    }
-    return true;
-}
 
 tcflag_t LocalModes(int descriptor) {
     termios settings{};

@@ -14,7 +14,7 @@ constexpr std::int64_t kFrame = 3600;
 std::string Flags(RecordPlan& plan, std::int64_t frames, std::int64_t group) {
     std::string flags;
     for (std::int64_t frame = 0; frame < frames; ++frame) {
-        flags += plan.Next(frame * kFrame, frame % group == 0) ? '1' : '0';
+        flags += plan.Next(frame * kFrame, frame % group == 0).record ? '1' : '0';
     }
     return flags;
 }
@@ -45,9 +45,9 @@ TEST(RecordPlan, WithoutRangesRecordsFromTheFirstIdrFrame) {
     RecordPlan plan({});
     EXPECT_EQ(Flags(plan, 4, 2), "1111");
     RecordPlan late({});
-    EXPECT_FALSE(late.Next(0, false));
+    EXPECT_FALSE(late.Next(0, false).record);
     EXPECT_TRUE(late.Wanted());
-    EXPECT_TRUE(late.Next(kFrame, true));
+    EXPECT_TRUE(late.Next(kFrame, true).record);
 }
 
 TEST(RecordPlan, ARangeBeginsAtTheFirstIdrFrameAtOrAfterItsBegin) {
@@ -69,52 +69,122 @@ TEST(RecordPlan, ARangeWithoutAnIdrFrameRecordsNothing) {
 
 TEST(RecordPlan, TwoRangesWithinAFrameOfEachOtherAreStillTwoRecordings) {
     RecordPlan plan({{0, 4 * kFrame - 10}, {4 * kFrame - 5, std::nullopt}});
-    EXPECT_EQ(Flags(plan, 10, 2), "1111001111");
+    EXPECT_EQ(Flags(plan, 4, 2), "1111");
+    EXPECT_EQ(plan.Next(4 * kFrame, true), (RecordDecision{true, true, true}));
+    RecordPlan between({{0, 3 * kFrame - 10}, {3 * kFrame - 5, std::nullopt}});
+    EXPECT_EQ(Flags(between, 6, 2), "111011");
 }
 
 TEST(RecordPlan, CommandsHoldUntilTheNextOne) {
     RecordPlan plan({});
-    EXPECT_TRUE(plan.Next(0, true));
+    EXPECT_TRUE(plan.Next(0, true).record);
     plan.Stop();
-    EXPECT_FALSE(plan.Next(kFrame, true));
-    EXPECT_FALSE(plan.Next(2 * kFrame, true));
+    EXPECT_FALSE(plan.Next(kFrame, true).record);
+    EXPECT_FALSE(plan.Next(2 * kFrame, true).record);
     plan.Start();
-    EXPECT_FALSE(plan.Next(3 * kFrame, false));
-    EXPECT_TRUE(plan.Next(4 * kFrame, true));
+    EXPECT_FALSE(plan.Next(3 * kFrame, false).record);
+    EXPECT_TRUE(plan.Next(4 * kFrame, true).record);
     EXPECT_TRUE(plan.Recording());
 }
 
 TEST(RecordPlan, AStartDuringARecordingChangesNothing) {
     RecordPlan plan({});
-    EXPECT_TRUE(plan.Next(0, true));
+    EXPECT_TRUE(plan.Next(0, true).record);
     plan.Start();
-    EXPECT_TRUE(plan.Next(kFrame, false));
+    EXPECT_TRUE(plan.Next(kFrame, false).record);
 }
 
 TEST(RecordPlan, ACommandWorksBesideRangesUntilTheirNextBorder) {
     RecordPlan plan({Frames(2, 6)});
     plan.Start();
-    EXPECT_TRUE(plan.Next(0, true));
+    EXPECT_TRUE(plan.Next(0, true).record);
     plan.Stop();
-    EXPECT_FALSE(plan.Next(kFrame, true));
-    EXPECT_TRUE(plan.Next(2 * kFrame, true));
+    EXPECT_FALSE(plan.Next(kFrame, true).record);
+    EXPECT_TRUE(plan.Next(2 * kFrame, true).record);
+}
+
+TEST(RecordPlan, ASplitEndsARecordingAndBeginsAnotherWithTheSameIdrFrame) {
+    RecordPlan plan({});
+    EXPECT_EQ(plan.Next(0, true), (RecordDecision{true, false, true}));
+    plan.Split();
+    EXPECT_EQ(plan.Next(kFrame, false), (RecordDecision{true, false, false}));
+    EXPECT_EQ(plan.Next(2 * kFrame, true), (RecordDecision{true, true, true}));
+    EXPECT_EQ(plan.Next(3 * kFrame, true), (RecordDecision{true, false, false}));
+}
+
+TEST(RecordPlan, AnInterruptionLeavesNothingToSplit) {
+    RecordPlan plan({});
+    EXPECT_TRUE(plan.Next(0, true).record);
+    plan.Split();
+    plan.Interrupt();
+    EXPECT_EQ(plan.Next(kFrame, true), (RecordDecision{true, false, true}));
+    EXPECT_EQ(plan.Next(2 * kFrame, true), (RecordDecision{true, false, false}));
 }
 
 TEST(RecordPlan, AnInterruptionBeginsANewRecordingAtTheNextIdrFrame) {
     RecordPlan plan({});
-    EXPECT_TRUE(plan.Next(0, true));
+    EXPECT_TRUE(plan.Next(0, true).record);
     plan.Interrupt();
-    EXPECT_FALSE(plan.Next(kFrame, false));
-    EXPECT_TRUE(plan.Next(2 * kFrame, true));
+    EXPECT_FALSE(plan.Next(kFrame, false).record);
+    EXPECT_TRUE(plan.Next(2 * kFrame, true).record);
 }
 
 TEST(RecordPlan, NothingIsRecordedAfterTheFinish) {
     RecordPlan plan({Frames(0, 2), Frames(4, 8)});
-    EXPECT_TRUE(plan.Next(0, true));
+    EXPECT_TRUE(plan.Next(0, true).record);
     plan.Finish();
     plan.Start();
-    EXPECT_FALSE(plan.Next(4 * kFrame, true));
+    EXPECT_FALSE(plan.Next(4 * kFrame, true).record);
     EXPECT_FALSE(plan.Wanted());
+}
+
+TEST(RecordPlan, ARangeOfWhichThereIsNothingIsMissed) {
+    RecordPlan plan({Frames(1, 3), {5 * kFrame + 1, 5 * kFrame + 2}, Frames(7, 9)});
+    EXPECT_EQ(Flags(plan, 12, 4), "000000001000");
+    EXPECT_EQ(plan.TakeMissed(),
+              (std::vector<MissedRecording>{{kFrame, 3 * kFrame}, {5 * kFrame + 1, 5 * kFrame + 2}}));
+    EXPECT_TRUE(plan.TakeMissed().empty());
+}
+
+TEST(RecordPlan, AStreamWithoutAnIdrFrameIsMissedFromTheStartToTheEnd) {
+    RecordPlan plan({});
+    for (std::int64_t frame = 0; frame < 5; ++frame) {
+        plan.Next(frame * kFrame, false);
+    }
+    plan.Finish();
+    EXPECT_EQ(plan.TakeMissed(), (std::vector<MissedRecording>{{0, 4 * kFrame}}));
+}
+
+TEST(RecordPlan, ACommandThatIsWithdrawnBeforeAFrameComesMissesNothing) {
+    RecordPlan plan({});
+    EXPECT_TRUE(plan.Next(0, true).record);
+    plan.Stop();
+    plan.Start();
+    plan.Stop();
+    plan.Next(kFrame, false);
+    plan.Start();
+    plan.Next(2 * kFrame, false);
+    plan.Stop();
+    EXPECT_EQ(plan.TakeMissed(), (std::vector<MissedRecording>{{2 * kFrame, 2 * kFrame}}));
+}
+
+TEST(RecordPlan, WhatWasRecordedInPartIsNotMissed) {
+    RecordPlan plan({Frames(0, 9)});
+    EXPECT_TRUE(plan.Next(0, true).record);
+    plan.Interrupt();
+    EXPECT_FALSE(plan.Next(kFrame, false).record);
+    plan.Finish();
+    EXPECT_TRUE(plan.TakeMissed().empty());
+}
+
+TEST(RecordPlan, TellsTheFirstRangeThatTheStreamHasNotComeTo) {
+    RecordPlan plan({Frames(0, 2), Frames(4, 6), {8 * kFrame, std::nullopt}});
+    EXPECT_EQ(Flags(plan, 4, 1), "1100");
+    EXPECT_EQ(plan.Unreached(), Frames(4, 6));
+    plan.Next(6 * kFrame, true);
+    EXPECT_EQ(plan.Unreached(), (RecordRange{8 * kFrame, std::nullopt}));
+    plan.Next(8 * kFrame, true);
+    EXPECT_EQ(plan.Unreached(), std::nullopt);
 }
 
 }  // namespace

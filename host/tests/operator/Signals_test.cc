@@ -1,37 +1,63 @@
 #include "operator/Signals.h"
 
+#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <unistd.h>
 
-#include <chrono>
-#include <functional>
+#include "support/WaitUntil.h"
 
 namespace receiver {
 namespace {
 
+using ::testing::ElementsAre;
+
 void Nothing() {}
 
-bool WaitUntil(const std::function<bool()>& condition) {
-    const auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(30);
-    while (!condition()) {
-        if (std::chrono::steady_clock::now() > deadline) {
-            return false;
-        }
-        std::this_thread::yield();
-    }
-    return true;
+/// Waits for one command and gives what there is then.
+std::vector<RecordCommand> TakeRecord(Signals& signals) {
+    std::vector<RecordCommand> taken;
+    EXPECT_TRUE(WaitUntil([&] {
+        taken = signals.Take().record;
+        return !taken.empty();
+    }));
+    return taken;
 }
 
-TEST(Signals, UserSignalsAreRecordCommandsAndAreTakenOnce) {
+TEST(Signals, RecordCommandsAreTakenOnceAndInTheirOrder) {
     Signals signals(Nothing);
     kill(getpid(), SIGUSR1);
-    EXPECT_TRUE(WaitUntil([&] { return signals.Take().start; }));
+    EXPECT_THAT(TakeRecord(signals), ElementsAre(RecordCommand::kStart));
     kill(getpid(), SIGUSR2);
-    EXPECT_TRUE(WaitUntil([&] { return signals.Take().stop; }));
+    EXPECT_THAT(TakeRecord(signals), ElementsAre(RecordCommand::kStop));
+    kill(getpid(), SIGRTMIN);
+    EXPECT_THAT(TakeRecord(signals), ElementsAre(RecordCommand::kSplit));
     const SignalCommands after = signals.Take();
-    EXPECT_FALSE(after.start);
-    EXPECT_FALSE(after.stop);
+    EXPECT_TRUE(after.record.empty());
     EXPECT_FALSE(after.quit);
+}
+
+// The system hands out the start first, whichever was sent first.
+TEST(Signals, AStopAndAStartThatComeTogetherAreAStopWithAStartBehindIt) {
+    sigset_t both;
+    sigemptyset(&both);
+    sigaddset(&both, SIGUSR1);
+    sigaddset(&both, SIGUSR2);
+    sigset_t before;
+    pthread_sigmask(SIG_BLOCK, &both, &before);
+    kill(getpid(), SIGUSR2);
+    kill(getpid(), SIGUSR1);
+    {
+        Signals signals(Nothing);
+        std::vector<RecordCommand> taken;
+        EXPECT_TRUE(WaitUntil([&] {
+            for (const RecordCommand command : signals.Take().record) {
+                taken.push_back(command);
+            }
+            return taken.size() == 2;
+        }));
+        EXPECT_THAT(taken, ElementsAre(RecordCommand::kStop, RecordCommand::kStart));
+    }
+    pthread_sigmask(SIG_SETMASK, &before, nullptr);
 }
 
 TEST(Signals, InterruptAndTerminationAskForTheEndAndStayAsked) {
@@ -56,7 +82,7 @@ TEST(Signals, ABrokenPipeHasNoEffect) {
     Signals signals(Nothing);
     kill(getpid(), SIGPIPE);
     kill(getpid(), SIGUSR1);
-    EXPECT_TRUE(WaitUntil([&] { return signals.Take().start; }));
+    EXPECT_THAT(TakeRecord(signals), ElementsAre(RecordCommand::kStart));
     // It is still pending; the process of a test shall not die of it when the mask is given back.
     sigset_t pipe;
     sigemptyset(&pipe);
@@ -72,7 +98,7 @@ TEST(Signals, TheMaskIsGivenBack) {
     { const Signals signals(Nothing); }
     sigset_t after;
     pthread_sigmask(SIG_SETMASK, nullptr, &after);
-    for (const int number : {SIGINT, SIGTERM, SIGHUP, SIGUSR1, SIGUSR2, SIGPIPE}) {
+    for (const int number : {SIGINT, SIGTERM, SIGHUP, SIGUSR1, SIGUSR2, SIGRTMIN, SIGPIPE}) {
         EXPECT_EQ(sigismember(&before, number), sigismember(&after, number)) << number;
     }
 }
@@ -86,7 +112,9 @@ void LeaveATrace() {
 void EndAtOnce(int first, int second) {
     Signals signals(LeaveATrace);
     kill(getpid(), first);
-    WaitUntil([&] { return signals.QuitRequested(); });
+    if (!WaitUntil([&] { return signals.QuitRequested(); })) {
+        _exit(1);
+    }
     kill(getpid(), second);
     pause();
 }

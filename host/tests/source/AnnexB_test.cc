@@ -16,10 +16,10 @@ std::string Text(const Bytes& bytes) {
 // NAL units, each behind its start code. Of the parameter sets only the numbers matter: the first bit 1 is
 // number 0, the bits 010 are number 1.
 const Bytes kDelimiter{0, 0, 0, 1, 0x09, 0x10};
-const Bytes kSequence{0, 0, 0, 1, 0x67, 66, 0, 30, 0x80, 0x11};
-const Bytes kOtherSequence{0, 0, 0, 1, 0x67, 66, 0, 31, 0x80, 0x22};
-const Bytes kPicture{0, 0, 0, 1, 0x68, 0x80, 0x33};
-const Bytes kSecondPicture{0, 0, 0, 1, 0x68, 0x40, 0x44};
+const Bytes kSequenceSet{0, 0, 0, 1, 0x67, 66, 0, 30, 0x80, 0x11};
+const Bytes kOtherSequenceSet{0, 0, 0, 1, 0x67, 66, 0, 31, 0x80, 0x22};
+const Bytes kPictureSet{0, 0, 0, 1, 0x68, 0x80, 0x33};
+const Bytes kSecondPictureSet{0, 0, 0, 1, 0x68, 0x40, 0x44};
 const Bytes kSei{0, 0, 1, 0x06, 0x05, 0x01, 0xFF, 0x80};
 const Bytes kIdr{0, 0, 1, 0x65, 0x88, 0x84};
 const Bytes kSlice{0, 0, 1, 0x41, 0x9A, 0x24};
@@ -50,11 +50,11 @@ TEST(NalUnits, AreFoundBehindStartCodesOfThreeAndFourBytes) {
 }
 
 TEST(NalUnits, ZeroBytesBehindAUnitDoNotBelongToIt) {
-    const Bytes stream = kPicture + Bytes{0, 0, 0} + kIdr;
+    const Bytes stream = kPictureSet + Bytes{0, 0, 0} + kIdr;
     const auto units = NalUnits(stream);
     ASSERT_EQ(units.size(), 2u);
     EXPECT_EQ(Bytes(units[0].bytes.begin(), units[0].bytes.end()), (Bytes{0x68, 0x80, 0x33}));
-    EXPECT_EQ(units[0].end, kPicture.size());
+    EXPECT_EQ(units[0].end, kPictureSet.size());
 }
 
 TEST(NalUnits, NothingIsFoundInBytesWithoutStartCode) {
@@ -64,7 +64,7 @@ TEST(NalUnits, NothingIsFoundInBytesWithoutStartCode) {
 }
 
 TEST(NalUnits, AStartCodeWithNothingBehindItEndsTheUnitBeforeIt) {
-    const Bytes stream = kPicture + Bytes{0, 0, 1};
+    const Bytes stream = kPictureSet + Bytes{0, 0, 1};
     const auto units = NalUnits(stream);
     ASSERT_EQ(units.size(), 1u);
     EXPECT_EQ(Bytes(units[0].bytes.begin(), units[0].bytes.end()), (Bytes{0x68, 0x80, 0x33}));
@@ -127,35 +127,39 @@ TEST(NalUnits, OfEveryShortStreamAreThoseOfTheDefinitionAndOfTheAnalyser) {
 }
 
 TEST(ParameterSets, AnIdrFrameThatHasBothStaysAsItIs) {
-    EXPECT_EQ(Completed(kSequence + kPicture, kDelimiter + kSequence + kPicture + kIdr), std::nullopt);
+    EXPECT_EQ(Completed(kSequenceSet + kPictureSet, kDelimiter + kSequenceSet + kPictureSet + kIdr),
+              std::nullopt);
 }
 
 TEST(ParameterSets, OtherFramesStayAsTheyAre) {
-    EXPECT_EQ(Completed(kSequence + kPicture, kDelimiter + kSlice), std::nullopt);
+    EXPECT_EQ(Completed(kSequenceSet + kPictureSet, kDelimiter + kSlice), std::nullopt);
 }
 
 TEST(ParameterSets, BothGoBehindTheDelimiterAndBeforeEverythingElse) {
-    EXPECT_EQ(Completed(kSequence + kPicture, kDelimiter + kSei + kIdr),
-              Text(kDelimiter + kSequence + kPicture + kSei + kIdr));
+    EXPECT_EQ(Completed(kSequenceSet + kPictureSet, kDelimiter + kSei + kIdr),
+              Text(kDelimiter + kSequenceSet + kPictureSet + kSei + kIdr));
 }
 
 TEST(ParameterSets, WithoutADelimiterBothComeFirst) {
-    EXPECT_EQ(Completed(kSequence + kPicture, kSei + kIdr), Text(kSequence + kPicture + kSei + kIdr));
+    EXPECT_EQ(Completed(kSequenceSet + kPictureSet, kSei + kIdr),
+              Text(kSequenceSet + kPictureSet + kSei + kIdr));
 }
 
 TEST(ParameterSets, OnlyTheMissingKindIsAdded) {
-    EXPECT_EQ(Completed(kSequence + kPicture, kSequence + kIdr), Text(kSequence + kPicture + kIdr));
-    EXPECT_EQ(Completed(kSequence + kPicture, kDelimiter + kPicture + kIdr),
-              Text(kDelimiter + kSequence + kPicture + kIdr));
+    EXPECT_EQ(Completed(kSequenceSet + kPictureSet, kSequenceSet + kIdr),
+              Text(kSequenceSet + kPictureSet + kIdr));
+    EXPECT_EQ(Completed(kSequenceSet + kPictureSet, kDelimiter + kPictureSet + kIdr),
+              Text(kDelimiter + kSequenceSet + kPictureSet + kIdr));
 }
 
 TEST(ParameterSets, EveryPictureParameterSetIsAdded) {
-    EXPECT_EQ(Completed(kSequence + kSecondPicture + kPicture, kIdr),
-              Text(kSequence + kPicture + kSecondPicture + kIdr));
+    EXPECT_EQ(Completed(kSequenceSet + kSecondPictureSet + kPictureSet, kIdr),
+              Text(kSequenceSet + kPictureSet + kSecondPictureSet + kIdr));
 }
 
 TEST(ParameterSets, TheLastOneOfANumberCounts) {
-    EXPECT_EQ(Completed(kSequence + kPicture + kOtherSequence, kIdr), Text(kOtherSequence + kPicture + kIdr));
+    EXPECT_EQ(Completed(kSequenceSet + kPictureSet + kOtherSequenceSet, kIdr),
+              Text(kOtherSequenceSet + kPictureSet + kIdr));
 }
 
 TEST(ParameterSets, NothingIsAddedWhereNothingIsKnown) {

@@ -81,6 +81,7 @@ TEST_F(UnitAssemblerTest, SilenceStandsInForAudioThatStaysAway) {
     Picture(75 * 3600);
     EXPECT_EQ(Made().substr(0, 3), "s0 ");
     EXPECT_EQ(notice_, "the source has gaps: 1 audio frame missing and filled with silence");
+    EXPECT_EQ(assembler_.SilentFrames(), 1u);
 }
 
 TEST_F(UnitAssemblerTest, AudioOfALostPictureIsLeftOut) {
@@ -128,6 +129,43 @@ TEST_F(UnitAssemblerTest, AudioThatEndsBeforeTheLastPictureIsFilledUpToItsEnd) {
     EXPECT_EQ(Made(), "s512 s1536 s2560 s3584");
     assembler_.Finish();
     EXPECT_EQ(Made(), "");
+}
+
+TEST_F(UnitAssemblerTest, SoundThatHasStoppedLongBeforeTheEndIsToldThere) {
+    assembler_.Begin(true);
+    for (std::int64_t number = 0; number <= 50; ++number) {
+        Audio(number == 0 ? 0 : -10000);
+        Picture(number * 3600);
+    }
+    Made();
+    assembler_.Finish();
+    Made();
+    // 51 pictures are 95.6 frames of sound, of which one came.
+    EXPECT_EQ(notice_, "the source has gaps: 95 audio frames missing and filled with silence");
+}
+
+TEST_F(UnitAssemblerTest, PicturesThatEndLongBeforeTheSoundAreLost) {
+    assembler_.Begin(true);
+    Audio(0);
+    Picture(0);
+    // The last one begins at 5.013 s, and the pictures end at 0.04 s.
+    for (std::int64_t time = 1024; time <= 235 * 1024; time += 1024) {
+        Audio(time);
+    }
+    assembler_.Finish();
+    Made();
+    EXPECT_EQ(notice_, "the pictures ended 5 s before the sound, which is left out: 124 video frames lost");
+    EXPECT_EQ(assembler_.LostFrames(), 124u);
+}
+
+TEST_F(UnitAssemblerTest, SoundThatRunsAheadOfThePicturesAtTheEndIsNoLoss) {
+    assembler_.Begin(true);
+    Audio(0);
+    Picture(0);
+    Audio(3 * 48000);
+    assembler_.Finish();
+    EXPECT_EQ(Made(), "a0 v0 s1024");
+    EXPECT_EQ(assembler_.LostFrames(), 0u);
 }
 
 TEST_F(UnitAssemblerTest, NothingIsFilledUpWithoutAPicture) {

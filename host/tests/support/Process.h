@@ -44,6 +44,8 @@ class Process {
     std::string AllText() const;
 
     void Signal(int number) const;
+    /// The system's number of the process.
+    pid_t Id() const { return pid_; }
     /// On a pseudo terminal: presses keys.
     void Type(const std::string& keys) const;
     /// On a pseudo terminal: closes the window, so that the system hangs up. No more output is captured.

@@ -3,11 +3,18 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <arpa/inet.h>
+#include <netinet/in.h>
+#include <sys/socket.h>
+#include <unistd.h>
+
 #include <csignal>
 
 #include "support/CodedMedia.h"
+#include "support/FrameJudge.h"
 #include "support/FreePorts.h"
 #include "support/Judges.h"
+#include "support/LossyRelay.h"
 #include "support/Material.h"
 #include "support/Process.h"
 #include "support/Senders.h"
@@ -112,6 +119,130 @@ TEST(MaterialTest, ThePicturesOfTwoContainersAreTheSame) {
     const CodedMedia movie = ReadCodedMedia(MakeMaterial(folder, options));
     ASSERT_EQ(transport.video.size(), 10U);
     EXPECT_EQ(transport.video, movie.video);
+}
+
+/// A material of a second with pictures and sounds of which no two are alike, and a copy of it.
+class FrameJudgeTest : public ::testing::Test {
+ protected:
+    FrameJudgeTest() {
+        MaterialOptions options;
+        options.seconds = 1;
+        options.more = {"-filter_complex", "anoisesrc=sample_rate=48000:seed=7[noise]", "-map", "0:v", "-map",
+                        "[noise]"};
+        sent_ = MakeMaterial(folder_, options);
+        judge_.AddSent(sent_);
+    }
+    FrameJudge::Verdict JudgeCopy(const std::vector<std::string>& options) {
+        const auto copy = (folder_.Path() / "copy.ts").string();
+        std::vector<std::string> command{"ffmpeg", "-v", "error", "-y", "-i", sent_.string()};
+        command.insert(command.end(), options.begin(), options.end());
+        command.insert(command.end(), {"-c", "copy", copy});
+        const Outcome outcome = RunProgram(command);
+        EXPECT_EQ(outcome.code, 0) << outcome.errors;
+        return judge_.Judge(copy);
+    }
+
+    const TemporaryFolder folder_;
+    std::filesystem::path sent_;
+    FrameJudge judge_;
+};
+
+TEST_F(FrameJudgeTest, FindsNothingWrongWithACopy) {
+    const FrameJudge::Verdict verdict = JudgeCopy({});
+    EXPECT_EQ(judge_.SentPictures(), 25U);
+    EXPECT_EQ(verdict.pictures, 25U);
+    EXPECT_GE(verdict.sounds, 46U);
+    EXPECT_EQ(verdict.unknownPictures + verdict.unknownSounds, 0U);
+    EXPECT_EQ(verdict.missingPictures + verdict.missingSounds, 0U);
+    EXPECT_LT(verdict.outOfStep, 0.001);
+}
+
+TEST_F(FrameJudgeTest, CountsWhatIsMissing) {
+    const FrameJudge::Verdict verdict =
+        JudgeCopy({"-bsf:v", "noise=drop=between(n\\,12\\,14)", "-bsf:a", "noise=drop=eq(n\\,20)"});
+    EXPECT_EQ(verdict.pictures, 22U);
+    EXPECT_EQ(verdict.missingPictures, 3U);
+    EXPECT_EQ(verdict.missingSounds, 1U);
+}
+
+TEST_F(FrameJudgeTest, MeasuresHowFarTheSoundIsOutOfStep) {
+    const FrameJudge::Verdict verdict = JudgeCopy({"-bsf:a", "setts=ts=TS+9000"});
+    EXPECT_NEAR(verdict.outOfStep, 0.1, 0.001);
+}
+
+/// A UDP socket of this machine.
+class Socket {
+ public:
+    explicit Socket(std::uint16_t port) : file_(socket(AF_INET, SOCK_DGRAM | SOCK_CLOEXEC, 0)) {
+        const sockaddr_in address = loopback(port);
+        EXPECT_EQ(bind(file_, reinterpret_cast<const sockaddr*>(&address), sizeof address), 0);
+        const timeval patience{kPatience.count(), 0};
+        setsockopt(file_, SOL_SOCKET, SO_RCVTIMEO, &patience, sizeof patience);
+    }
+    ~Socket() { close(file_); }
+    Socket(const Socket&) = delete;
+    Socket& operator=(const Socket&) = delete;
+
+    void Send(std::uint16_t port, char byte) const {
+        const sockaddr_in address = loopback(port);
+        EXPECT_EQ(sendto(file_, &byte, 1, 0, reinterpret_cast<const sockaddr*>(&address), sizeof address), 1);
+    }
+    char Receive() {
+        char byte = 0;
+        socklen_t length = sizeof from_;
+        EXPECT_EQ(recvfrom(file_, &byte, 1, 0, reinterpret_cast<sockaddr*>(&from_), &length), 1);
+        return byte;
+    }
+    /// Where the last packet came from.
+    std::uint16_t From() const { return ntohs(from_.sin_port); }
+
+ private:
+    static sockaddr_in loopback(std::uint16_t port) {
+        sockaddr_in address{};
+        address.sin_family = AF_INET;
+        address.sin_port = htons(port);
+        address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
+        return address;
+    }
+
+    int file_;
+    sockaddr_in from_{};
+};
+
+TEST(LossyRelayTest, PassesPacketsInBothDirections) {
+    const FreePorts ports;
+    const std::uint16_t front = ports.First();
+    Socket receiver(static_cast<std::uint16_t>(front + 1));
+    Socket sender(static_cast<std::uint16_t>(front + 2));
+    const LossyRelay relay(front, static_cast<std::uint16_t>(front + 1), 0, 1);
+    sender.Send(front, 'a');
+    EXPECT_EQ(receiver.Receive(), 'a');
+    receiver.Send(receiver.From(), 'b');
+    EXPECT_EQ(sender.Receive(), 'b');
+    EXPECT_EQ(sender.From(), front);
+    EXPECT_EQ(relay.Forth().passed, 1U);
+    EXPECT_EQ(relay.Back().passed, 1U);
+}
+
+TEST(LossyRelayTest, DropsItsShareAndNothingElse) {
+    const FreePorts ports;
+    const std::uint16_t front = ports.First();
+    Socket receiver(static_cast<std::uint16_t>(front + 1));
+    const Socket sender(static_cast<std::uint16_t>(front + 2));
+    const LossyRelay relay(front, static_cast<std::uint16_t>(front + 1), 0.25, 1);
+    constexpr std::uint64_t kPackets = 200;
+    for (std::uint64_t number = 1; number <= kPackets; ++number) {
+        const auto passed = relay.Forth().passed;
+        sender.Send(front, static_cast<char>(number));
+        while (relay.Forth().passed + relay.Forth().dropped < number) {
+            std::this_thread::yield();
+        }
+        if (relay.Forth().passed > passed) {
+            EXPECT_EQ(receiver.Receive(), static_cast<char>(number));
+        }
+    }
+    // Five standard deviations of a binomial distribution.
+    EXPECT_NEAR(static_cast<double>(relay.Forth().dropped), 50, 31);
 }
 
 }  // namespace

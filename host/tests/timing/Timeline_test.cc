@@ -10,6 +10,8 @@ namespace receiver {
 namespace {
 
 constexpr std::int64_t kSecond = 90000;
+constexpr std::int64_t kEarliest = std::numeric_limits<std::int64_t>::min();
+constexpr std::int64_t kLatest = std::numeric_limits<std::int64_t>::max();
 constexpr std::int64_t kWrap33 = std::int64_t{1} << 33;
 
 TEST(UnwrapNear, GoesOnBehindTheEndOfA33BitCounter) {
@@ -111,33 +113,29 @@ TEST(Timeline, ALateArrivalOfAFewTenthsIsNotCountedIntoAJump) {
 
 /// Whatever a source stamps, times stay near what is expected, and no sum leaves 64 bits.
 TEST(Timeline, StampsNearTheEndsOf64BitsAreJumps) {
-    constexpr std::int64_t kLowest = std::numeric_limits<std::int64_t>::min();
-    constexpr std::int64_t kHighest = std::numeric_limits<std::int64_t>::max();
-    for (const std::int64_t first : {kLowest, kLowest + 1, std::int64_t{-1}, std::int64_t{0}, kHighest}) {
-        for (const std::int64_t second : {kLowest, kLowest + 1, std::int64_t{0}, kHighest - 1, kHighest}) {
+    for (const std::int64_t first : {kEarliest, kEarliest + 1, std::int64_t{-1}, std::int64_t{0}, kLatest}) {
+        for (const std::int64_t second : {kEarliest, kEarliest + 1, std::int64_t{0}, kLatest - 1, kLatest}) {
             Timeline line;
             line.Anchor(first, 0);
             for (const std::int64_t stamp : {second, first, second}) {
                 const auto place = line.TimeOf(stamp, kSecond, 0, kSecond);
                 EXPECT_GE(place.time, 0) << first << ' ' << second;
                 EXPECT_LE(place.time, kSecond + Timeline::kLongestGap) << first << ' ' << second;
-                line.Nearest(stamp, kHighest);
-                line.Nearest(stamp, kLowest);
+                line.Nearest(stamp, kLatest);
+                line.Nearest(stamp, kEarliest);
             }
-            line.Anchor(first, kLowest);
-            line.TimeOf(second, kHighest, kHighest, kHighest);
-            line.TimeOf(first, kLowest, 0, kHighest);
+            line.Anchor(first, kEarliest);
+            line.TimeOf(second, kLatest, kLatest, kLatest);
+            line.TimeOf(first, kEarliest, 0, kLatest);
         }
     }
 }
 
 TEST(UnwrapNear, StaysWithin64Bits) {
-    constexpr std::int64_t kLowest = std::numeric_limits<std::int64_t>::min();
-    constexpr std::int64_t kHighest = std::numeric_limits<std::int64_t>::max();
     for (const int bits : {32, 33, 62}) {
         const std::int64_t span = std::int64_t{1} << bits;
-        for (const std::int64_t stamp : {kLowest, std::int64_t{0}, kHighest}) {
-            for (const std::int64_t reference : {kLowest, std::int64_t{0}, kHighest}) {
+        for (const std::int64_t stamp : {kEarliest, std::int64_t{0}, kLatest}) {
+            for (const std::int64_t reference : {kEarliest, std::int64_t{0}, kLatest}) {
                 const std::int64_t value = UnwrapNear(stamp, bits, reference);
                 EXPECT_LE(Distance(value, reference), static_cast<std::uint64_t>(span / 2));
             }

@@ -94,6 +94,24 @@ const std::string* SettingsStore::Find(const std::string& section, const std::st
     return found == values_.end() ? nullptr : &found->second;
 }
 
+void SettingsStore::Set(const std::string& section, const std::string& key, const std::string& text) {
+    values_[SectionAndKey(section, key)] = text;
+}
+
+std::string SettingsStore::FileText() const {
+    std::string text;
+    const std::string* open = nullptr;
+    for (const auto& [name, value] : values_) {
+        const auto& [section, key] = name;
+        if (open == nullptr || *open != section) {
+            text.append("[").append(section).append("]\n");
+            open = &section;
+        }
+        text.append(key).append(" = ").append(value).append("\n");
+    }
+    return text;
+}
+
 bool ParseNumber(const std::string& text, unsigned int& number) {
     static_assert(sizeof(number) == 4);
     unsigned int parsed = 0;

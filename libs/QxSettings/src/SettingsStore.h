@@ -13,8 +13,8 @@ struct SettingsError {
     std::string reason;
 };
 
-/// The keys of one settings file. The form of the file is told at `QxRegistry`. Constant once loaded, and
-/// then readable from any thread.
+/// The keys of one settings file. The form of the file is told at `QxRegistry`. Readable from any thread
+/// while no thread loads or sets.
 class SettingsStore {
  public:
     /// Takes over the keys of the file at `path`. A file that does not exist has none. False, with `error`
@@ -23,6 +23,12 @@ class SettingsStore {
 
     /// The text under `key` in `section`, null when there is none. Lives as long as the store.
     const std::string* Find(const std::string& section, const std::string& key) const;
+
+    /// Adds a key, or gives it another text. Names and text must be such as a file can hold: without line
+    /// breaks and without blanks around them.
+    void Set(const std::string& section, const std::string& key, const std::string& text);
+    /// A file that has these keys and no others.
+    std::string FileText() const;
 
  private:
     using SectionAndKey = std::pair<std::string, std::string>;

@@ -182,6 +182,29 @@ TEST(SettingsStore, FailedLoadDropsTheKeysOfTheLoadBefore) {
     EXPECT_EQ(store.Find("s", "k"), nullptr);
 }
 
+TEST(SettingsStore, AKeyThatIsSetIsAddedOrReplaced) {
+    SettingsStore store;
+    store.Set("s", "k", "one");
+    store.Set("s", "k", "two");
+    ASSERT_NE(store.Find("s", "k"), nullptr);
+    EXPECT_EQ(*store.Find("s", "k"), "two");
+}
+
+TEST(SettingsStore, TheTextOfAFileHoldsEveryKeyOnceAndIsReadAgainAsTheSame) {
+    const TempDir dir;
+    SettingsStore store;
+    SettingsError error;
+    ASSERT_TRUE(store.Load(dir.Write("\xEF\xBB\xBF; note\r\n[ b/c ] ; note\r\n k = [v]; \"=# \r\n"
+                                     "x=\n[a]\nk.l = 1 2\n"),
+                           error));
+    const std::string text = "[a]\nk.l = 1 2\n[b/c]\nk = [v]; \"=#\nx = \n";
+    EXPECT_EQ(store.FileText(), text);
+    SettingsStore again;
+    ASSERT_TRUE(again.Load(dir.Write(text), error));
+    EXPECT_EQ(again.FileText(), text);
+    EXPECT_EQ(SettingsStore().FileText(), "");
+}
+
 TEST(ParseNumber, TakesUnsigned32BitDecimals) {
     const std::vector<std::pair<std::string, unsigned int>> cases = {{"0", 0U},
                                                                      {"7", 7U},

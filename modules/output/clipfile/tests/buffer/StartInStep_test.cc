@@ -20,7 +20,7 @@ constexpr std::uint32_t kVideoClock = 90000;
 constexpr std::int64_t kHalf = 7680;
 
 /// The picture is at 1 s.
-const std::shared_ptr<StreamData> kPicture = stream_units::VideoUnit(0, 90000, 1000);
+const std::shared_ptr<StreamData> kVideoUnit = stream_units::VideoUnit(0, 90000, 1000);
 
 /// Audio that begins so many samples after the picture.
 std::shared_ptr<StreamData> audioAt(std::int64_t samples) {
@@ -38,26 +38,26 @@ std::shared_ptr<StreamData> metaAt(std::int64_t ticks) {
     return stream_units::MetaUnit(0, rtp, rtp / 90);
 }
 StartInStep find(const UnitList& cache, std::uint32_t clock = kAudioClock) {
-    return FindStart(cache, clock, {*kPicture, kVideoClock}, kHalf);
+    return FindStart(cache, clock, {*kVideoUnit, kVideoClock}, kHalf);
 }
 
 TEST(TicksBetween, TakesTheRtpTimestampsThatTellTheSameInstant) {
     // 1 sample is 15 ticks of 1/720000 s, and a tick of 90 kHz 8.
-    EXPECT_EQ(TicksBetween({*kPicture, kVideoClock}, {*audioAt(1), kAudioClock}), 15);
-    EXPECT_EQ(TicksBetween({*kPicture, kVideoClock}, {*audioAt(-1), kAudioClock}), -15);
-    EXPECT_EQ(TicksBetween({*metaAt(-7), kVideoClock}, {*kPicture, kVideoClock}), 56);
+    EXPECT_EQ(TicksBetween({*kVideoUnit, kVideoClock}, {*audioAt(1), kAudioClock}), 15);
+    EXPECT_EQ(TicksBetween({*kVideoUnit, kVideoClock}, {*audioAt(-1), kAudioClock}), -15);
+    EXPECT_EQ(TicksBetween({*metaAt(-7), kVideoClock}, {*kVideoUnit, kVideoClock}), 56);
 }
 
 TEST(TicksBetween, TakesTimestampsThatWereRoundedUpAsWell) {
     const auto unit = stream_units::AudioUnit(0, 48047, 1001);  // 1000.98 ms
-    EXPECT_EQ(TicksBetween({*kPicture, kVideoClock}, {*unit, kAudioClock}), 47 * 15);
+    EXPECT_EQ(TicksBetween({*kVideoUnit, kVideoClock}, {*unit, kAudioClock}), 47 * 15);
 }
 
 TEST(TicksBetween, TakesTheMillisecondsWhenARtpClockTellsSomethingElse) {
-    EXPECT_EQ(TicksBetween({*kPicture, kVideoClock}, {*foreignAudioAt(511), kAudioClock}), 10 * 720);
-    EXPECT_EQ(TicksBetween({*kPicture, kVideoClock}, {*foreignAudioAt(-1), kAudioClock}), -720);
+    EXPECT_EQ(TicksBetween({*kVideoUnit, kVideoClock}, {*foreignAudioAt(511), kAudioClock}), 10 * 720);
+    EXPECT_EQ(TicksBetween({*kVideoUnit, kVideoClock}, {*foreignAudioAt(-1), kAudioClock}), -720);
     const auto far = stream_units::AudioUnit(0, 48000, 1002);
-    EXPECT_EQ(TicksBetween({*kPicture, kVideoClock}, {*far, kAudioClock}), 2 * 720);
+    EXPECT_EQ(TicksBetween({*kVideoUnit, kVideoClock}, {*far, kAudioClock}), 2 * 720);
 }
 
 TEST(FindStart, TakesTheAudioFrameThatIsNearestToThePicture) {

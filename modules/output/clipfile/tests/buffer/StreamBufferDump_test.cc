@@ -9,15 +9,15 @@
 #include "support/BufferHarness.h"
 #include "support/IncompleteChunks.h"
 #include "support/LogLines.h"
+#include "support/StreamBufferLog.h"
 #include "support/StreamUnits.h"
 
 namespace clipfileModule {
 namespace {
 
+using stream_buffer_log::kChunkFile;
+using stream_buffer_log::kMakeChunk;
 using stream_units::kIdr;
-
-constexpr char kMakeChunk[] = "clipfileModule::StreamBuffer::makeChunk";
-constexpr char kFile[] = "modules/output/clipfile/src/clipfileModule/buffer/StreamBufferChunk.cc";
 
 using StreamBufferDumpIncomplete = IncompleteChunks;
 
@@ -34,7 +34,7 @@ TEST(StreamBufferDump, AChunkIsDumpedBeforeItIsCounted) {
     ASSERT_NE(video, lines.end());
     EXPECT_EQ(video->priority, LOG_PRIORITY_DETAIL);
     EXPECT_EQ(video->function, "clipfileModule::StreamBuffer::dumpChunk");
-    EXPECT_EQ(video->file, kFile);
+    EXPECT_EQ(video->file, kChunkFile);
     // Only the chunk thread logs in between, so its lines are taken alone.
     std::vector<std::string> texts;
     for (auto line = video; line != lines.end() && texts.size() < 36; ++line) {

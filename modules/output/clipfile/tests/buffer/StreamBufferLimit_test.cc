@@ -9,17 +9,17 @@
 #include "support/BufferHarness.h"
 #include "support/IncompleteChunks.h"
 #include "support/LogLines.h"
+#include "support/StreamBufferLog.h"
 #include "support/StreamUnits.h"
 
 namespace clipfileModule {
 namespace {
 
+using stream_buffer_log::kChunkFile;
+using stream_buffer_log::kMakeChunk;
 using stream_units::kIdr;
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
-
-constexpr char kMakeChunk[] = "clipfileModule::StreamBuffer::makeChunk";
-constexpr char kFile[] = "modules/output/clipfile/src/clipfileModule/buffer/StreamBufferChunk.cc";
 
 using StreamBufferIncomplete = IncompleteChunks;
 
@@ -122,7 +122,7 @@ TEST_F(StreamBufferIncomplete, The601stVideoUnitEndsTheRecordingWithCode23) {
     ASSERT_TRUE(harness.controller.WaitForCall("status 7 26"));
     EXPECT_THAT(harness.controller.Calls(), ElementsAre("status 6 23", "status 7 26"));
     EXPECT_EQ(log.Count(LOG_PRIORITY_ERROR, kMakeChunk, "stream is stopped. video buffer is full."), 1u);
-    EXPECT_EQ(log.Find("stream is stopped. video buffer is full.")->file, kFile);
+    EXPECT_EQ(log.Find("stream is stopped. video buffer is full.")->file, kChunkFile);
 }
 
 TEST_F(StreamBufferIncomplete, The901stAudioUnitEndsTheRecordingWithCode24) {

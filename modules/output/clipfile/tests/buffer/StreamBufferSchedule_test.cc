@@ -11,15 +11,15 @@
 #include "LogCapture.h"
 #include "support/BufferHarness.h"
 #include "support/LogLines.h"
+#include "support/StreamBufferLog.h"
 #include "support/StreamUnits.h"
 
 namespace clipfileModule {
 namespace {
 
+using stream_buffer_log::kStop;
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
-
-constexpr char kStop[] = "clipfileModule::StreamBuffer::Stop";
 
 TEST(StreamBufferError, BeforeTheFirstChunkTheModuleFailsForGood) {
     BufferHarness harness;

@@ -7,18 +7,14 @@
 #include "LogCapture.h"
 #include "support/BufferHarness.h"
 #include "support/LogLines.h"
+#include "support/StreamBufferLog.h"
 #include "support/StreamUnits.h"
 
 namespace clipfileModule {
 namespace {
 
+using stream_buffer_log::Line;
 using ::testing::ElementsAre;
-
-constexpr char kFile[] = "modules/output/clipfile/src/clipfileModule/buffer/StreamBuffer.cc";
-
-auto Line(_LogPriority priority, const char* function, const char* text) {
-    return LineOf(kFile, priority, function, text);
-}
 
 stream_units::MetaFields timecode(unsigned char frames, bool dropFrame = false) {
     return {std::nullopt, stream_units::Timecode{10, 20, 30, frames, dropFrame}};

@@ -7,23 +7,19 @@
 #include "LogCapture.h"
 #include "support/BufferHarness.h"
 #include "support/LogLines.h"
+#include "support/StreamBufferLog.h"
 #include "support/StreamUnits.h"
 
 namespace clipfileModule {
 namespace {
 
+using stream_buffer_log::kRemoveBefore;
+using stream_buffer_log::kSetHeader;
+using stream_buffer_log::Line;
 using stream_units::kIdr;
 using ::testing::Contains;
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
-
-constexpr char kSetHeader[] = "clipfileModule::StreamBuffer::SetVideoSequenceHeader";
-constexpr char kRemoveBefore[] = "clipfileModule::StreamBuffer::removeBefore";
-constexpr char kFile[] = "modules/output/clipfile/src/clipfileModule/buffer/StreamBuffer.cc";
-
-auto Line(_LogPriority priority, const char* function, const char* text) {
-    return LineOf(kFile, priority, function, text);
-}
 
 // One test for each row of the table of states.
 

@@ -7,20 +7,20 @@
 #include "LogCapture.h"
 #include "support/BufferHarness.h"
 #include "support/LogLines.h"
+#include "support/StreamBufferLog.h"
 #include "support/StreamUnits.h"
 
 namespace clipfileModule {
 namespace {
 
+using stream_buffer_log::kCancel;
+using stream_buffer_log::kRemoveBefore;
+using stream_buffer_log::kStart;
+using stream_buffer_log::kStop;
+using stream_buffer_log::Line;
 using stream_units::kIdr;
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
-
-constexpr char kStart[] = "clipfileModule::StreamBuffer::Start";
-constexpr char kStop[] = "clipfileModule::StreamBuffer::Stop";
-constexpr char kCancel[] = "clipfileModule::StreamBuffer::Cancel";
-constexpr char kRemoveBefore[] = "clipfileModule::StreamBuffer::removeBefore";
-constexpr char kFile[] = "modules/output/clipfile/src/clipfileModule/buffer/StreamBuffer.cc";
 
 /// The lines without those of the stream description.
 std::vector<CapturedLine> linesOf(const LogCapture& log) {
@@ -38,10 +38,6 @@ std::vector<CapturedLine> linesOf(const LogCapture& log) {
         }
     }
     return lines;
-}
-
-auto Line(_LogPriority priority, const char* function, const char* text) {
-    return LineOf(kFile, priority, function, text);
 }
 
 TEST(StreamBuffer, ConstructionLogsNothingAndKeepsTheTimestamps) {

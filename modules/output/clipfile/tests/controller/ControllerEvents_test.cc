@@ -11,6 +11,7 @@
 #include "support/ControllerPeer.h"
 #include "support/FakeHost.h"
 #include "support/FakeRegistry.h"
+#include "support/LogLines.h"
 #include "support/SchedulePoints.h"
 #include "support/SettleEventLoop.h"
 #include "support/WaitUntil.h"
@@ -22,10 +23,6 @@ const std::string kFile = "modules/output/clipfile/src/clipfileModule/controller
 
 std::shared_ptr<Event> makeStatusEvent(const std::string& value) {
     return std::make_shared<TransferStatusNotifyEvent>(FakeHost::StatusMap{{"file_output_status", value}});
-}
-
-std::string functionName(const std::string& operation) {
-    return "clipfileModule::Controller::" + operation;
 }
 
 /// A running controller whose event thread stands in its wait.
@@ -64,23 +61,24 @@ TEST_F(ControllerEventsTest, ExecutePostsStandby) {
     controller_.Execute();
     ASSERT_TRUE(WaitForValues(1));
     EXPECT_EQ(Values(), std::vector<std::string>{"standby"});
-    EXPECT_TRUE(log_.Contains(LOG_PRIORITY_TRACE, functionName("Execute").c_str(), "start."));
-    EXPECT_TRUE(log_.Contains(LOG_PRIORITY_TRACE, functionName("Execute").c_str(), "end."));
+    EXPECT_TRUE(log_.Contains(LOG_PRIORITY_TRACE, controllerFunction("Execute").c_str(), "start."));
+    EXPECT_TRUE(log_.Contains(LOG_PRIORITY_TRACE, controllerFunction("Execute").c_str(), "end."));
 }
 
 TEST_F(ControllerEventsTest, APostIsLoggedOnBothSides) {
     controller_.PostEvent(makeStatusEvent("x"));
     ASSERT_TRUE(log_.WaitForText("end. no event."));
     for (const char* text : {"start. event_id = 6.", "end."}) {
-        EXPECT_TRUE(log_.Contains(LOG_PRIORITY_TRACE, functionName("PostEvent").c_str(), text)) << text;
+        EXPECT_TRUE(log_.Contains(LOG_PRIORITY_TRACE, controllerFunction("PostEvent").c_str(), text)) << text;
     }
     std::vector<std::string> loop;
     for (const CapturedLine& line : log_.Lines()) {
         EXPECT_EQ(line.priority, LOG_PRIORITY_TRACE) << line;
         EXPECT_EQ(line.file, kFile) << line;
         // The loop itself may pass once more, for a signal of the set-up that came late.
-        if (line.function != functionName("PostEvent") && line.function != functionName("EventLoop")) {
-            loop.push_back(line.function->substr(functionName("").size()) + " " + line.text);
+        if (line.function != controllerFunction("PostEvent") &&
+            line.function != controllerFunction("EventLoop")) {
+            loop.push_back(line.function->substr(controllerFunction("").size()) + " " + line.text);
         }
     }
     EXPECT_EQ(loop, (std::vector<std::string>{"getEvent start.", "getEvent event id = 6.", "getEvent end.",
@@ -101,8 +99,9 @@ TEST_F(ControllerEventsTest, EventsRunInOrderOfArrival) {
 }
 
 TEST_F(ControllerEventsTest, SendEventGoesAheadOfAllThatWaitAndTwoOfThemRunInReverseOrder) {
-    auto gate = log_.BlockAt(
-        [](const CapturedLine& line) { return line.function == functionName("OnTransferStatusNotify"); });
+    auto gate = log_.BlockAt([](const CapturedLine& line) {
+        return line.function == controllerFunction("OnTransferStatusNotify");
+    });
     controller_.PostEvent(makeStatusEvent("running"));
     ASSERT_TRUE(gate.WaitReached());
     controller_.PostEvent(makeStatusEvent("posted 1"));
@@ -112,13 +111,15 @@ TEST_F(ControllerEventsTest, SendEventGoesAheadOfAllThatWaitAndTwoOfThemRunInRev
     gate.Release();
     ASSERT_TRUE(WaitForValues(5));
     EXPECT_EQ(Values(), (std::vector<std::string>{"running", "sent 2", "sent 1", "posted 1", "posted 2"}));
-    EXPECT_EQ(log_.Count(LOG_PRIORITY_TRACE, functionName("SendEvent").c_str(), "start. event_id = 6."), 2U);
-    EXPECT_EQ(log_.Count(LOG_PRIORITY_TRACE, functionName("SendEvent").c_str(), "end."), 2U);
+    EXPECT_EQ(log_.Count(LOG_PRIORITY_TRACE, controllerFunction("SendEvent").c_str(), "start. event_id = 6."),
+              2U);
+    EXPECT_EQ(log_.Count(LOG_PRIORITY_TRACE, controllerFunction("SendEvent").c_str(), "end."), 2U);
 }
 
 TEST_F(ControllerEventsTest, APostDoesNotWaitForARunningHandler) {
-    auto gate = log_.BlockAt(
-        [](const CapturedLine& line) { return line.function == functionName("OnTransferStatusNotify"); });
+    auto gate = log_.BlockAt([](const CapturedLine& line) {
+        return line.function == controllerFunction("OnTransferStatusNotify");
+    });
     controller_.PostEvent(makeStatusEvent("running"));
     ASSERT_TRUE(gate.WaitReached());
     // Both return while the handler is held.
@@ -134,7 +135,8 @@ TEST_F(ControllerEventsTest, AnEventWithId8IsInvalidAndDoesNotStopTheLoop) {
     controller_.PostEvent(makeStatusEvent("after"));
     ASSERT_TRUE(WaitForValues(1));
     EXPECT_EQ(Values(), std::vector<std::string>{"after"});
-    EXPECT_TRUE(log_.Contains(LOG_PRIORITY_WARNING, functionName("dispatchEvent").c_str(), "invalid event."));
+    EXPECT_TRUE(
+        log_.Contains(LOG_PRIORITY_WARNING, controllerFunction("dispatchEvent").c_str(), "invalid event."));
 }
 
 TEST_F(ControllerEventsTest, AStatusThatTheHostRefusesIsLoggedAndNotSentAgain) {
@@ -145,7 +147,7 @@ TEST_F(ControllerEventsTest, AStatusThatTheHostRefusesIsLoggedAndNotSentAgain) {
     controller_.PostEvent(makeStatusEvent("after"));
     ASSERT_TRUE(WaitForValues(2));
     EXPECT_EQ(Values(), (std::vector<std::string>{"refused", "after"}));
-    EXPECT_TRUE(log_.Contains(LOG_PRIORITY_ERROR, functionName("OnTransferStatusNotify").c_str(),
+    EXPECT_TRUE(log_.Contains(LOG_PRIORITY_ERROR, controllerFunction("OnTransferStatusNotify").c_str(),
                               "SendTransmissionStatus() failed. result = 5."));
 }
 
@@ -153,7 +155,7 @@ TEST_F(ControllerEventsTest, ASignalWithoutAPostIsNoEvent) {
     // Nothing tells when the thread is inside its wait, so the signal is repeated until it meets it there.
     ASSERT_TRUE(waitUntil([&] {
         peer_.SignalEventLoop();
-        return log_.Contains(LOG_PRIORITY_TRACE, functionName("EventLoop").c_str(), "no event.");
+        return log_.Contains(LOG_PRIORITY_TRACE, controllerFunction("EventLoop").c_str(), "no event.");
     }));
     controller_.PostEvent(makeStatusEvent("after"));
     EXPECT_TRUE(WaitForValues(1));
@@ -199,20 +201,23 @@ TEST_F(ControllerEventsTest, ATerminateEventThatRunsStopsBufferingAndEndsTheLoop
     ASSERT_TRUE(host_.WaitForStatus({3, 0}));
     ASSERT_TRUE(log_.WaitFor([](const auto& lines) {
         return std::any_of(lines.begin(), lines.end(), [](const CapturedLine& line) {
-            return line.function == functionName("EventLoop") && line.text == "end.";
+            return line.function == controllerFunction("EventLoop") && line.text == "end.";
         });
     }));
     for (const char* text : {"start.", "end."}) {
-        EXPECT_TRUE(log_.Contains(LOG_PRIORITY_TRACE, functionName("OnTerminate").c_str(), text)) << text;
-        EXPECT_TRUE(log_.Contains(LOG_PRIORITY_TRACE, functionName("BufferingStop").c_str(), text)) << text;
+        EXPECT_TRUE(log_.Contains(LOG_PRIORITY_TRACE, controllerFunction("OnTerminate").c_str(), text))
+            << text;
+        EXPECT_TRUE(log_.Contains(LOG_PRIORITY_TRACE, controllerFunction("BufferingStop").c_str(), text))
+            << text;
     }
-    EXPECT_TRUE(
-        log_.Contains(LOG_PRIORITY_TRACE, functionName("BufferingStop").c_str(), "stream buffering stop."));
+    EXPECT_TRUE(log_.Contains(LOG_PRIORITY_TRACE, controllerFunction("BufferingStop").c_str(),
+                              "stream buffering stop."));
 }
 
 TEST_F(ControllerEventsTest, TheDrainRunsWhatWaitsAlsoAfterTerminate) {
-    auto gate = log_.BlockAt(
-        [](const CapturedLine& line) { return line.function == functionName("OnTransferStatusNotify"); });
+    auto gate = log_.BlockAt([](const CapturedLine& line) {
+        return line.function == controllerFunction("OnTransferStatusNotify");
+    });
     controller_.PostEvent(makeStatusEvent("running"));
     ASSERT_TRUE(gate.WaitReached());
     controller_.PostEvent(std::make_shared<TerminateEvent>());
@@ -251,7 +256,7 @@ class ControllerFirstWaitTest : public testing::Test {
     Controller controller_;
     ControllerPeer peer_{controller_};
     LogCapture::Gate gate_ = log_.BlockAt([](const CapturedLine& line) {
-        return line.function == functionName("EventLoop") && line.text == "start.";
+        return line.function == controllerFunction("EventLoop") && line.text == "start.";
     });
 };
 
@@ -259,16 +264,17 @@ TEST_F(ControllerFirstWaitTest, TheFirstExecuteBeforeTheWaitIsDeliveredOnlyAtThe
     const SchedulePoints points;
     ASSERT_TRUE(controller_.Initialize(&host_));
     ASSERT_TRUE(gate_.WaitReached());
-    const auto eventThread =
-        log_.FindIf([](const CapturedLine& line) { return line.function == functionName("EventLoop"); });
+    const auto eventThread = log_.FindIf(
+        [](const CapturedLine& line) { return line.function == controllerFunction("EventLoop"); });
     controller_.Execute();
     gate_.Release();
     // In front of the lock, and in front of the wait; that the events can be counted means that the thread
     // has given the lock back and is inside.
     ASSERT_TRUE(points.WaitFor(eventThread->thread, 2));
     EXPECT_EQ(peer_.WaitingEvents(), 1U);
-    EXPECT_EQ(
-        log_.CountIf([](const CapturedLine& line) { return line.function == functionName("getEvent"); }), 0U);
+    EXPECT_EQ(log_.CountIf(
+                  [](const CapturedLine& line) { return line.function == controllerFunction("getEvent"); }),
+              0U);
     controller_.PostEvent(makeStatusEvent("next"));
     ASSERT_TRUE(host_.WaitForTransmissions(2));
     EXPECT_EQ(host_.Transmissions()[0].at("file_output_status"), "standby");
@@ -283,8 +289,8 @@ TEST_F(ControllerFirstWaitTest, UninitializeEndsAThreadThatHasNotReachedItsWait)
     ASSERT_TRUE(log_.WaitForText("start join..."));
     gate_.Release();
     ender.join();
-    EXPECT_TRUE(log_.Contains(LOG_PRIORITY_TRACE, functionName("EventLoop").c_str(), "terminate."));
-    EXPECT_TRUE(log_.Contains(LOG_PRIORITY_TRACE, functionName("EventLoop").c_str(), "end."));
+    EXPECT_TRUE(log_.Contains(LOG_PRIORITY_TRACE, controllerFunction("EventLoop").c_str(), "terminate."));
+    EXPECT_TRUE(log_.Contains(LOG_PRIORITY_TRACE, controllerFunction("EventLoop").c_str(), "end."));
     EXPECT_EQ(host_.Statuses().size(), 0U);
 }
 

@@ -16,6 +16,7 @@
 #include "support/FakeRegistry.h"
 #include "support/FileOutputRecorder.h"
 #include "support/HeldQueueThreads.h"
+#include "support/LogLines.h"
 #include "support/SettleEventLoop.h"
 #include "support/StreamUnits.h"
 #include "support/WaitUntil.h"
@@ -31,10 +32,6 @@ using Texts = std::vector<std::string>;
 constexpr std::size_t kVideo = 0;
 constexpr std::size_t kAudio = 1;
 constexpr std::size_t kMeta = 2;
-
-std::string functionName(const std::string& operation) {
-    return "clipfileModule::Controller::" + operation;
-}
 
 MetaFields recFlag(bool on, std::optional<Timecode> timecode = std::nullopt) {
     return {on, timecode};
@@ -92,14 +89,14 @@ class ControllerStreamTest : public testing::Test {
     }
     std::size_t CountLines(const std::string& operation, const std::string& text) {
         return log_.CountIf([&](const CapturedLine& line) {
-            return line.function == functionName(operation) && line.text == text;
+            return line.function == controllerFunction(operation) && line.text == text;
         });
     }
     /// Texts that `operation` logged, each checked for priority and source.
     Texts TextsOf(const std::string& operation) {
         Texts texts;
         for (const CapturedLine& line : log_.Lines()) {
-            if (line.function == functionName(operation)) {
+            if (line.function == controllerFunction(operation)) {
                 EXPECT_EQ(line.priority, LOG_PRIORITY_TRACE) << line;
                 EXPECT_EQ(line.file,
                           "modules/output/clipfile/src/clipfileModule/controller/ControllerStream.cc")
@@ -184,9 +181,9 @@ TEST_F(ControllerStreamTest, The51stUnitOfAHeldUpQueueIsRefusedAndLoggedAndThe50
             EXPECT_EQ(log_.CountIf([&](const CapturedLine& line) { return line.text == medium.overflow; }),
                       0U);
             (controller_.*medium.push)(MetaUnit(51, 51, 0));
-            EXPECT_EQ(
-                log_.Count(LOG_PRIORITY_WARNING, functionName(medium.operation).c_str(), medium.overflow),
-                1U);
+            EXPECT_EQ(log_.Count(LOG_PRIORITY_WARNING, controllerFunction(medium.operation).c_str(),
+                                 medium.overflow),
+                      1U);
         }
         ASSERT_TRUE(log_.WaitForText(expected.back()));
         Texts handed;
@@ -265,7 +262,7 @@ TEST_F(ControllerStreamTest, TheFlagOffStopsTheRecordingThroughTheEventThread) {
     PushMeta(MetaUnit(1, 180000, 2000, recFlag(true)));
     {
         auto gate = log_.BlockAt(
-            [](const CapturedLine& line) { return line.function == functionName("OnStopStream"); });
+            [](const CapturedLine& line) { return line.function == controllerFunction("OnStopStream"); });
         PushMeta(MetaUnit(2, 270000, 3000, recFlag(false, Timecode{23, 59, 59, 24})));
         ASSERT_TRUE(gate.WaitReached());
         // The metadata thread has gone on; the stop waits for the event thread.

@@ -16,13 +16,13 @@ namespace clipfileModule {
 namespace {
 
 /// 64 chunks are in the file before it is closed, in `moov` and one fragment; 8 follow on closing.
-constexpr std::size_t kChunks = 72;
+constexpr std::size_t kClosedChunks = 72;
 constexpr std::size_t kFlushedChunks = 64;
-constexpr std::size_t kPictures = 8 * kChunks;
+constexpr std::size_t kPictures = 8 * kClosedChunks;
 constexpr std::size_t kFlushedPictures = 8 * kFlushedChunks;
 constexpr std::size_t kPicturesInMoov = 8 * 32;
 
-constexpr RecordingPlan kPlan = {"fragment", RecordRules::kExact, 25000, 25000, 1000, false, kChunks};
+constexpr RecordingPlan kPlan = {"fragment", RecordRules::kExact, 25000, 25000, 1000, false, kClosedChunks};
 
 /// Counts the samples that come out of each of the demuxer's pads until its end of stream.
 constexpr const char* kDemuxerScript = R"(
@@ -123,7 +123,7 @@ class JudgedFragments : public ::testing::Test {
 TEST_F(JudgedFragments, AClosedFileIsReadWhole) {
     recorded.Record(kPlan);
     recorded.Close();
-    const Samples all = {kPictures, recorded.AudioBefore(kChunks), kPictures};
+    const Samples all = {kPictures, recorded.AudioBefore(kClosedChunks), kPictures};
     EXPECT_EQ(ofFfprobe(recorded.Path()), all);
     EXPECT_EQ(ofGStreamer(recorded.Path()), all);
 }
@@ -165,7 +165,8 @@ TEST_F(JudgedFragments, AudioAndMetadataThatBeginAfterTheFirstFragmentAreReadOpe
     EXPECT_EQ(ofFfprobe(path), open);
     EXPECT_EQ(ofGStreamer(path), open);
     recorded.Close();
-    const Samples closed = {kPictures, recorded.AudioBefore(kChunks) - silent, 8 * (kChunks - 48)};
+    const Samples closed = {kPictures, recorded.AudioBefore(kClosedChunks) - silent,
+                            8 * (kClosedChunks - 48)};
     EXPECT_EQ(ofFfprobe(recorded.Path()), closed);
     EXPECT_EQ(ofGStreamer(recorded.Path()), closed);
 }
@@ -184,7 +185,7 @@ TEST_F(JudgedFragments, AnOpenFileOfTheTimecodesFragmentIsRead) {
     const std::filesystem::path path = recorded.Work().Path() / "died.MP4";
     std::ofstream(path, std::ios::binary)
         .write(reinterpret_cast<const char*>(bytes.data()), static_cast<std::streamsize>(bytes.size()));
-    const Samples all = {kPictures, recorded.AudioBefore(kChunks), kPictures};
+    const Samples all = {kPictures, recorded.AudioBefore(kClosedChunks), kPictures};
     EXPECT_EQ(ofFfprobe(path), all);
     EXPECT_EQ(ofGStreamer(path), all);
 }

@@ -27,12 +27,12 @@ using ::testing::IsEmpty;
 using ::testing::Not;
 
 /// The state that a failure in the middle of closing needs cannot be reached with real sizes.
-class PatchedMuxer : public Mp4NormalMuxer {
+class PatchedNormalMuxer : public Mp4NormalMuxer {
  public:
     using Mp4NormalMuxer::m_payload;
 };
 
-class Mp4FileTest : public MuxerFixture<PatchedMuxer> {};
+class Mp4FileTest : public MuxerFixture<PatchedNormalMuxer> {};
 
 TEST_F(Mp4FileTest, ItsNameIsTheTimecode) {
     initialize();

@@ -24,13 +24,13 @@ using ::testing::IsEmpty;
 using ::testing::Not;
 
 /// Lengths that make a file's length pass 32 bits cannot be reached in a test with real ones.
-class PatchedMuxer : public Mp4FragmentMuxer {
+class PatchedFragmentMuxer : public Mp4FragmentMuxer {
  public:
     using Mp4FragmentMuxer::m_info;
     using Mp4FragmentMuxer::m_payload;
 };
 
-class Mp4FragmentMuxerTest : public MuxerFixture<PatchedMuxer> {
+class Mp4FragmentMuxerTest : public MuxerFixture<PatchedFragmentMuxer> {
  protected:
     std::size_t begun(const std::string& routine) const {
         return log.Count(LOG_PRIORITY_DETAIL, ("clipfileModule::Mp4FragmentMuxer::" + routine).c_str(),

@@ -23,6 +23,11 @@ MATCHER_P2(PlainLine, priority, text, "") {
            !arg.file.has_value() && arg.line == 0;
 }
 
+/// The name under which an operation of the controller logs.
+inline std::string controllerFunction(const std::string& operation) {
+    return "clipfileModule::Controller::" + operation;
+}
+
 inline std::vector<std::string> operatorLines(const LogCapture& log) {
     return log.Texts(LOG_PRIORITY_OPERATOR);
 }

@@ -3,14 +3,13 @@
 
 #include <algorithm>
 
+#include "common/RtpClock.h"
 #include "controller/Controller.h"
 
 namespace clipfileModule {
 
 namespace {
 
-/// Ticks of the clock of start and stop timestamps in a millisecond.
-constexpr std::int64_t kTicksPerMilliSec = 90;
 /// An audio frame of 1024 samples at 48 kHz in milliseconds, rounded up.
 constexpr std::uint64_t kAudioFrame = 22;
 /// No unit of the same clock comes so late behind those of other media: a queue holds some two seconds.

@@ -13,9 +13,6 @@ namespace {
 constexpr std::uint32_t kAudioTimescale = 48000;
 constexpr std::uint32_t kAudioSampleDuration = 1024;
 
-/// The sets' NAL header byte, profile, compatibility and level.
-constexpr std::uint64_t kMinimumSpsSize = 4;
-
 struct FrameRateRow {
     std::uint32_t key;  // frames per 1000 seconds
     std::uint32_t timescale;

@@ -6,6 +6,9 @@
 
 namespace clipfileModule {
 
+/// Bytes of the shortest sequence parameter set that counts: NAL header, profile, compatibility and level.
+inline constexpr std::uint64_t kMinimumSpsSize = 4;
+
 /// The numbers that file format and buffering need, derived once from the stream's parameters and then only
 /// read.
 class InputStreamInfo {

@@ -7,6 +7,7 @@
 #include "common/Log.h"
 #include "mp4/FourCc.h"
 #include "mp4/FrameNumber.h"
+#include "mp4/InputStreamInfo.h"
 #include "mp4/Mp4File.h"
 #include "mp4/MuxerRoutine.h"
 
@@ -26,7 +27,6 @@ constexpr std::uint16_t kUndetermined = 0x55C4;
 
 constexpr std::uint16_t kAudioChannels = 2;
 constexpr std::uint32_t kAvcEntry = 2;
-constexpr std::uint64_t kMinimumSpsSize = 4;
 constexpr std::uint32_t kUsageItem = 10;
 
 /// A reference to this very file.

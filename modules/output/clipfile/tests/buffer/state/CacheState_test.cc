@@ -7,15 +7,15 @@
 #include "buffer/state/ErrorCacheState.h"
 #include "buffer/state/FakeStreamBuffer.h"
 #include "buffer/state/StopCacheState.h"
+#include "support/StreamBufferLog.h"
 #include "support/StreamUnits.h"
 
 namespace clipfileModule {
 namespace {
 
+using stream_buffer_log::kDump;
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
-
-constexpr char kDump[] = "clipfileModule::CacheState::dump";
 
 /// Shows what the family shares.
 class PlainState : public CacheState {

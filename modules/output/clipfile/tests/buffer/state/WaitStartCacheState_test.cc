@@ -7,17 +7,18 @@
 
 #include "LogCapture.h"
 #include "buffer/state/FakeStreamBuffer.h"
+#include "support/StreamBufferLog.h"
 #include "support/StreamUnits.h"
 
 namespace clipfileModule {
 namespace {
 
+using stream_buffer_log::kDump;
 using ::testing::Contains;
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 
 constexpr char kExecute[] = "clipfileModule::WaitStartCacheState::Execute";
-constexpr char kDump[] = "clipfileModule::CacheState::dump";
 
 class WaitStartCacheStateTest : public ::testing::Test {
  protected:

@@ -12,8 +12,17 @@
 
 #include "support/SambaServer.h"
 
+/// This program offers a lock, as a host does that uses libsmbclient itself.
+extern "C" {
+__attribute__((visibility("default"), used)) clipfileModule::Mutex clipfile_smb_process_lock;
+}
+
 namespace clipfileModule {
 namespace {
+
+TEST(SmbLibrary, TakesTheLockThatTheProgramOffers) {
+    EXPECT_EQ(&SmbLibrary::ProcessLock(), &clipfile_smb_process_lock);
+}
 
 const SmbLibrary& library() {
     std::string reason;
@@ -61,7 +70,10 @@ TEST_F(SmbClientTest, FailsWithoutAConnection) {
     SmbClient client(library(), parsed(server.Path()), {});
     std::uint64_t bytes = 0;
     SMBCFILE* file = nullptr;
-    EXPECT_EQ(client.TestExistence(url("a")), ENOTCONN);
+    SmbStatus status;
+    EXPECT_EQ(client.Look(url("a"), status), ENOTCONN);
+    EXPECT_EQ(client.OpenForReading(url("a"), file), ENOTCONN);
+    EXPECT_EQ(client.Remove(url("a")), ENOTCONN);
     EXPECT_EQ(client.CreateDirectories(shareUrl(), url("a")), ENOTCONN);
     EXPECT_EQ(client.AvailableSpace(url(""), nullptr, bytes), ENOTCONN);
     EXPECT_EQ(client.Open(url("a"), file), ENOTCONN);
@@ -74,12 +86,16 @@ TEST_F(SmbClientTest, RefusesCredentialsThatTheLibraryWouldCutShort) {
 }
 
 TEST_F(SmbClientTest, TellsWhatExists) {
-    std::ofstream(server.Folder() / "a b\xC3\xA4(2)") << "x";
+    std::ofstream(server.Folder() / "a b\xC3\xA4(2)") << "xyz";
     const auto client = connect(server.Path());
-    EXPECT_EQ(client->TestExistence(shareUrl()), 0);
-    EXPECT_EQ(client->TestExistence(url("a b\xC3\xA4(2)")), 0);
-    EXPECT_EQ(client->TestExistence(url("none")), ENOENT);
-    EXPECT_EQ(client->TestExistence(url("none\\none")), ENOENT);
+    SmbStatus status;
+    EXPECT_EQ(client->Look(shareUrl(), status), 0);
+    EXPECT_TRUE(status.isFolder);
+    EXPECT_EQ(client->Look(url("a b\xC3\xA4(2)"), status), 0);
+    EXPECT_FALSE(status.isFolder);
+    EXPECT_EQ(status.size, 3U);
+    EXPECT_EQ(client->Look(url("none"), status), ENOENT);
+    EXPECT_EQ(client->Look(url("none\\none"), status), ENOENT);
 }
 
 TEST_F(SmbClientTest, MakesDirectoriesWithAllMissingLevels) {
@@ -141,14 +157,37 @@ TEST_F(SmbClientTest, WritesAndReadsAtAnyPosition) {
     EXPECT_EQ(std::string(text, count), "end");
 }
 
+TEST_F(SmbClientTest, AReaderLeavesTheFileAsItIsAndKeepsNobodyOff) {
+    std::ofstream(server.Folder() / "file") << "text";
+    const auto client = connect(server.Path());
+    SMBCFILE* file = nullptr;
+    EXPECT_EQ(client->OpenForReading(url("none"), file), ENOENT);
+    ASSERT_EQ(client->OpenForReading(url("file"), file), 0);
+    char text[8] = {};
+    std::size_t count = 0;
+    EXPECT_EQ(client->Read(file, 1, text, sizeof text, count), 0);
+    EXPECT_EQ(std::string(text, count), "ext");
+    SMBCFILE* second = nullptr;
+    EXPECT_EQ(connect(server.Path())->Open(url("file"), second), 0);
+}
+
+TEST_F(SmbClientTest, DeletesAFile) {
+    std::ofstream(server.Folder() / "file") << "text";
+    const auto client = connect(server.Path());
+    EXPECT_EQ(client->Remove(url("file")), 0);
+    EXPECT_FALSE(std::filesystem::exists(server.Folder() / "file"));
+    EXPECT_EQ(client->Remove(url("file")), ENOENT);
+}
+
 TEST_F(SmbClientTest, DoesNotConnectAgainByItself) {
     const auto client = connect(server.Path());
-    EXPECT_EQ(client->TestExistence(shareUrl()), 0);
+    SmbStatus status;
+    EXPECT_EQ(client->Look(shareUrl(), status), 0);
     server.Kill();
     server.Start();
-    EXPECT_NE(client->TestExistence(shareUrl()), 0);
-    EXPECT_NE(client->TestExistence(shareUrl()), 0);
-    EXPECT_EQ(connect(server.Path())->TestExistence(shareUrl()), 0);
+    EXPECT_NE(client->Look(shareUrl(), status), 0);
+    EXPECT_NE(client->Look(shareUrl(), status), 0);
+    EXPECT_EQ(connect(server.Path())->Look(shareUrl(), status), 0);
 }
 
 TEST_F(SmbClientTest, ClosesWhatIsStillOpenAtItsEnd) {

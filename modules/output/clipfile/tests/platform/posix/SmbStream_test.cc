@@ -132,7 +132,8 @@ TEST_F(SmbStreamTest, AServerThatIsFrozenCostsOneTimeOutAndNoMore) {
     const auto before = std::chrono::steady_clock::now();
     std::uint64_t bytes = 0;
     EXPECT_EQ(made->AvailableSpace(parsed(server.Path()).Url(), bytes), ETIMEDOUT);
-    EXPECT_EQ(made->TestExistence(parsed(server.Path()).Url()), ETIMEDOUT);
+    SmbStatus status;
+    EXPECT_EQ(made->Look(parsed(server.Path()).Url(), status), ETIMEDOUT);
     EXPECT_EQ(std::fclose(stream), EOF);
     made.reset();
     const auto took = std::chrono::steady_clock::now() - before;

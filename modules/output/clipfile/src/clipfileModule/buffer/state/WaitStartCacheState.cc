@@ -3,13 +3,11 @@
 #include "buffer/state/EndSyncRecState.h"
 #include "buffer/state/StartCacheState.h"
 #include "common/Log.h"
+#include "common/RtpClock.h"
 
 namespace clipfileModule {
 
 namespace {
-
-/// Ticks of the 90 kHz clock in a millisecond.
-constexpr std::uint64_t kTicksPerMilliSec = 90;
 
 /// Half an AAC frame of 1024 samples at 48 kHz, rounded up.
 constexpr std::uint64_t kHalfAudioFrameMilliSec = 11;
@@ -22,7 +20,7 @@ constexpr std::string_view kAudio = "audio";
 
 /// Unsigned on purpose: an open stop of -1 lies above every timestamp.
 std::uint64_t toMilliSec(std::int64_t ticks) {
-    return static_cast<std::uint64_t>(ticks) / kTicksPerMilliSec;
+    return static_cast<std::uint64_t>(ticks) / std::uint64_t{kTicksPerMilliSec};
 }
 
 }  // namespace

@@ -125,7 +125,6 @@ SMBCCTX* SmbClient::makeContext() {
     library_.setOptionUseKerberos(context, ownRights ? 1 : 0);
     library_.setOptionFallbackAfterKerberos(context, ownRights ? 1 : 0);
     library_.setOptionUseCCache(context, 0);
-    library_.setOptionOpenShareMode(context, SMBC_SHAREMODE_DENY_WRITE);
     library_.setFunctionCheckServer(context, trustServer);
     addServer_ = library_.getFunctionAddCachedServer(context);
     library_.setFunctionAddCachedServer(context, onServerAdded);
@@ -194,14 +193,18 @@ int SmbClient::Connect() {
     return lost_;
 }
 
-int SmbClient::TestExistence(const std::string& url) {
+int SmbClient::Look(const std::string& url, SmbStatus& status) {
     if (lost_ != 0) {
         return lost_;
     }
     const Turn turn(library_);
-    struct stat status = {};
+    struct stat found = {};
     errno = 0;
-    return resultOf(library_.getFunctionStat(context_)(context_, url.c_str(), &status) == 0);
+    if (library_.getFunctionStat(context_)(context_, url.c_str(), &found) != 0) {
+        return lastError();
+    }
+    status = {S_ISDIR(found.st_mode), static_cast<std::uint64_t>(found.st_size)};
+    return 0;
 }
 
 int SmbClient::CreateDirectories(const std::string& shareUrl, const std::string& url) {
@@ -246,13 +249,21 @@ int SmbClient::AvailableSpace(const std::string& url, SMBCFILE* file, std::uint6
 }
 
 int SmbClient::Open(const std::string& url, SMBCFILE*& file) {
+    return open(url, O_RDWR | O_CREAT | O_TRUNC, SMBC_SHAREMODE_DENY_WRITE, file);
+}
+
+int SmbClient::OpenForReading(const std::string& url, SMBCFILE*& file) {
+    return open(url, O_RDONLY, SMBC_SHAREMODE_DENY_NONE, file);
+}
+
+int SmbClient::open(const std::string& url, int flags, smbc_share_mode shareMode, SMBCFILE*& file) {
     if (lost_ != 0) {
         return lost_;
     }
     const Turn turn(library_);
+    library_.setOptionOpenShareMode(context_, shareMode);
     errno = 0;
-    SMBCFILE* const opened =
-        library_.getFunctionOpen(context_)(context_, url.c_str(), O_RDWR | O_CREAT | O_TRUNC, 0666);
+    SMBCFILE* const opened = library_.getFunctionOpen(context_)(context_, url.c_str(), flags, 0666);
     if (opened == nullptr) {
         return lastError();
     }
@@ -311,6 +322,15 @@ int SmbClient::Close(SMBCFILE* file) {
     files_.erase(std::remove(files_.begin(), files_.end(), file), files_.end());
     errno = 0;
     return resultOf(library_.getFunctionClose(context_)(context_, file) == 0);
+}
+
+int SmbClient::Remove(const std::string& url) {
+    if (lost_ != 0) {
+        return lost_;
+    }
+    const Turn turn(library_);
+    errno = 0;
+    return resultOf(library_.getFunctionUnlink(context_)(context_, url.c_str()) == 0);
 }
 
 }  // namespace clipfileModule

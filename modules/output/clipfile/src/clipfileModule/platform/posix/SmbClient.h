@@ -21,6 +21,13 @@ struct SmbCredentials {
     std::string password;
 };
 
+/// What the server says of a file or a folder.
+struct SmbStatus {
+    bool isFolder = false;
+    /// Of a file, in bytes.
+    std::uint64_t size = 0;
+};
+
 /// One connection to one share, over SMB 2 or later, signed and encrypted as the server asks for it. Never
 /// connects again by itself: a connection that is lost stays lost, and all operations fail from then on.
 ///
@@ -41,7 +48,7 @@ class SmbClient {
     /// does not accept them for the share.
     int Connect();
 
-    int TestExistence(const std::string& url);
+    int Look(const std::string& url, SmbStatus& status);
     /// Makes `url` and what is missing above it, up to the share, which is `shareUrl`. EEXIST when it is
     /// there.
     int CreateDirectories(const std::string& shareUrl, const std::string& url);
@@ -50,10 +57,14 @@ class SmbClient {
     int AvailableSpace(const std::string& url, SMBCFILE* file, std::uint64_t& bytes);
     /// Creates the file, or truncates it, and keeps other writers off it.
     int Open(const std::string& url, SMBCFILE*& file);
+    /// Opens a file that is there, and keeps nobody off it.
+    int OpenForReading(const std::string& url, SMBCFILE*& file);
     int Write(SMBCFILE* file, std::int64_t offset, const char* data, std::size_t size);
     /// `count` is below `size` at the end of the file alone.
     int Read(SMBCFILE* file, std::int64_t offset, char* data, std::size_t size, std::size_t& count);
     int Close(SMBCFILE* file);
+    /// Deletes a file.
+    int Remove(const std::string& url);
 
  private:
     static SmbClient& of(SMBCCTX* context);
@@ -64,6 +75,7 @@ class SmbClient {
     static int onServerRemoved(SMBCCTX* context, SMBCSRV* server);
 
     SMBCCTX* makeContext();
+    int open(const std::string& url, int flags, smbc_share_mode shareMode, SMBCFILE*& file);
 
     const SmbLibrary& library_;
     const SharePath share_;

@@ -57,7 +57,8 @@ bool findAll(void* handle, SmbLibrary& library) {
            find(handle, "smbc_getFunctionLseek", library.getFunctionLseek) &&
            find(handle, "smbc_getFunctionRead", library.getFunctionRead) &&
            find(handle, "smbc_getFunctionWrite", library.getFunctionWrite) &&
-           find(handle, "smbc_getFunctionClose", library.getFunctionClose);
+           find(handle, "smbc_getFunctionClose", library.getFunctionClose) &&
+           find(handle, "smbc_getFunctionUnlink", library.getFunctionUnlink);
 }
 
 LoadResult load() {
@@ -66,6 +67,7 @@ LoadResult load() {
     result.loaded = handle != nullptr && findAll(handle, result.library);
     if (result.loaded) {
         PinLibrary();
+        MutexLock lock(SmbLibrary::ProcessLock());
         result.library.takesThreads = EnableSmbThreads(handle);
     } else {
         const char* const error = dlerror();
@@ -86,8 +88,9 @@ const SmbLibrary* SmbLibrary::Get(std::string& reason) {
 }
 
 Mutex& SmbLibrary::ProcessLock() {
-    static Mutex mutex;
-    return mutex;
+    static Mutex own;
+    static void* const offered = dlsym(RTLD_DEFAULT, kLockSymbol);
+    return offered != nullptr ? *static_cast<Mutex*>(offered) : own;
 }
 
 }  // namespace clipfileModule

@@ -17,18 +17,15 @@ namespace clipfileModule {
 /// the hundred libraries behind it. Once loaded it stays, and so does the library that this code is part of.
 ///
 /// What it does not do for threads, and who does it here:
-/// - Its stack of memory frames belongs to the process, and the second thread in it ends in a crash, until it
-/// is
-///   given thread-local storage: `EnableSmbThreads`. Where it does not take that, `ProcessLock` is held
-///   around every call, and a server that stalls holds up all connections.
+/// - Its stack of memory frames belongs to the process, and the second thread in it ends in a crash, until
+///   it is given thread-local storage: `EnableSmbThreads`. Where it does not take that, `ProcessLock` is
+///   held around every call, and a server that stalls holds up all connections.
 /// - A context with all that belongs to it may then be used beside others, but making, initialising,
-/// connecting and
-///   freeing one touches what belongs to the process (the settings, the count of contexts, the name cache,
-///   lists of mechanisms that are filled at first use): under `ProcessLock`.
+///   connecting and freeing one touches what belongs to the process (the settings, the count of contexts,
+///   the name cache, lists of mechanisms that are filled at first use): under `ProcessLock`.
 /// - It blocks SIGPIPE on one thread and needs it blocked on all: see `TimedWorker`.
-/// - It reads `$HOME/.smb/smb.conf`, or else the system's smb.conf, once, when the first context is made, and
-/// throws
-///   the settings away when the last one goes: one that nobody uses is kept.
+/// - It reads `$HOME/.smb/smb.conf`, or else the system's smb.conf, once, when the first context is made,
+///   and throws the settings away when the last one goes: one that nobody uses is kept.
 struct SmbLibrary {
     decltype(&smbc_new_context) newContext;
     decltype(&smbc_init_context) initContext;
@@ -62,13 +59,18 @@ struct SmbLibrary {
     decltype(&smbc_getFunctionRead) getFunctionRead;
     decltype(&smbc_getFunctionWrite) getFunctionWrite;
     decltype(&smbc_getFunctionClose) getFunctionClose;
+    decltype(&smbc_getFunctionUnlink) getFunctionUnlink;
 
     /// False when one thread at a time may be in it.
     bool takesThreads;
 
     /// Null when it cannot be loaded; `reason` then says why. Any thread.
     static const SmbLibrary* Get(std::string& reason);
+    /// One for the whole process, also where several of its libraries hold a copy of this code, or a host
+    /// uses libsmbclient itself: a program that offers `kLockSymbol` shares its own.
     static Mutex& ProcessLock();
+    /// The name of a variable of the type `Mutex` that the program itself exports.
+    static constexpr const char* kLockSymbol = "clipfile_smb_process_lock";
 };
 
 }  // namespace clipfileModule

@@ -18,9 +18,16 @@ SmbSession::SmbSession(const SmbLibrary& library, const SharePath& share, const 
     connectResult_ = worker_.Run([](SmbClient& client) { return client.Connect(); });
 }
 
-int SmbSession::TestExistence(const std::string& url) {
-    return connectResult_ != 0 ? connectResult_
-                               : worker_.Run([url](SmbClient& client) { return client.TestExistence(url); });
+int SmbSession::Look(const std::string& url, SmbStatus& status) {
+    if (connectResult_ != 0) {
+        return connectResult_;
+    }
+    const auto result = std::make_shared<SmbStatus>();
+    const int error = worker_.Run([url, result](SmbClient& client) { return client.Look(url, *result); });
+    if (error == 0) {
+        status = *result;
+    }
+    return error;
 }
 
 int SmbSession::CreateDirectories(const std::string& url) {
@@ -60,6 +67,23 @@ int SmbSession::Open(const std::string& url, SMBCFILE*& file) {
     return error;
 }
 
+int SmbSession::OpenForReading(const std::string& url, SMBCFILE*& file, std::uint64_t& size) {
+    if (connectResult_ != 0) {
+        return connectResult_;
+    }
+    const auto opened = std::make_shared<SMBCFILE*>(nullptr);
+    const auto status = std::make_shared<SmbStatus>();
+    const int error = worker_.Run([url, opened, status](SmbClient& client) {
+        const int failure = client.Look(url, *status);
+        return failure != 0 ? failure : client.OpenForReading(url, *opened);
+    });
+    if (error == 0) {
+        file = *opened;
+        size = status->size;
+    }
+    return error;
+}
+
 int SmbSession::Write(SMBCFILE* file, std::int64_t offset,
                       const std::shared_ptr<const std::vector<char>>& data) {
     return worker_.Run([file, offset, data](SmbClient& client) {
@@ -83,6 +107,11 @@ int SmbSession::Read(SMBCFILE* file, std::int64_t offset, std::size_t size, std:
 
 int SmbSession::Close(SMBCFILE* file) {
     return worker_.Run([file](SmbClient& client) { return client.Close(file); });
+}
+
+int SmbSession::Remove(const std::string& url) {
+    return connectResult_ != 0 ? connectResult_
+                               : worker_.Run([url](SmbClient& client) { return client.Remove(url); });
 }
 
 void SmbSession::RemoveStream(SmbStream& stream) {

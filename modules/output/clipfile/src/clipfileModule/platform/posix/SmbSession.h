@@ -37,16 +37,19 @@ class SmbSession {
     bool IsOf(const SharePath& share) const { return share.ShareUrl() == share_.ShareUrl(); }
     const SmbCredentials& Credentials() const { return credentials_; }
 
-    int TestExistence(const std::string& url);
+    int Look(const std::string& url, SmbStatus& status);
     int CreateDirectories(const std::string& url);
     /// What the streams of this session hold back is sent first.
     int AvailableSpace(const std::string& url, std::uint64_t& bytes);
     int Open(const std::string& url, SMBCFILE*& file);
+    /// `size` is that of the file.
+    int OpenForReading(const std::string& url, SMBCFILE*& file, std::uint64_t& size);
     /// Leaves `data` alone afterwards, unless the time-out has passed.
     int Write(SMBCFILE* file, std::int64_t offset, const std::shared_ptr<const std::vector<char>>& data);
     /// `data` gets fewer octets than `size` at the end of the file alone.
     int Read(SMBCFILE* file, std::int64_t offset, std::size_t size, std::vector<char>& data);
     int Close(SMBCFILE* file);
+    int Remove(const std::string& url);
 
     void AddStream(SmbStream& stream) { streams_.push_back(&stream); }
     void RemoveStream(SmbStream& stream);

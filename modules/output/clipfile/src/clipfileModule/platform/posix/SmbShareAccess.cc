@@ -106,7 +106,8 @@ int AvailableSpace(const std::string& path, std::uint64_t& bytes) {
 int TestExistence(const std::string& path) {
     SharePath share;
     const int error = findSession(path, share);
-    return error != 0 ? error : rights.session->TestExistence(share.Url());
+    SmbStatus status;
+    return error != 0 ? error : rights.session->Look(share.Url(), status);
 }
 
 int CreateDirectories(const std::string& path) {

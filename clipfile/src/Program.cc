@@ -1,0 +1,165 @@
+#include "Program.h"
+
+#include <CLI/CLI.hpp>
+#include <exception>
+#include <filesystem>
+#include <functional>
+#include <nlohmann/json.hpp>
+
+#include "inspect/BoxTree.h"
+#include "inspect/Inspection.h"
+#include "inspect/JsonReport.h"
+#include "inspect/TextReport.h"
+#include "recover/Recovery.h"
+#include "recover/UnfinishedFiles.h"
+
+namespace clipfile {
+
+namespace {
+
+using Json = nlohmann::ordered_json;
+
+/// Options as they stand on the command line.
+struct Options {
+    std::vector<std::string> files;
+    bool json = false;
+    bool boxes = false;
+    std::size_t rows = 4;
+    RecoveryOptions recovery;
+};
+
+/// Writes one JSON value on a line. Names of files need not be UTF-8.
+void PrintJson(std::ostream& out, const Json& json) {
+    out << json.dump(-1, ' ', false, Json::error_handler_t::replace) << '\n';
+}
+
+/// Does `work` on each file and goes on behind those that fail.
+ExitCode ForEachFile(const Options& options, std::ostream& out, std::ostream& errors,
+                     const std::function<ExitCode(const std::string&)>& work) {
+    ExitCode result = ExitCode::kSuccess;
+    for (const std::string& path : options.files) {
+        ExitCode code = ExitCode::kSuccess;
+        std::string sentence;
+        try {
+            code = work(path);
+        } catch (const ToolError& error) {
+            code = error.Code();
+            sentence = error.what();
+        } catch (const std::exception& error) {
+            code = ExitCode::kUnreadable;
+            sentence = path + " cannot be worked on: " + error.what();
+        }
+        if (!sentence.empty() && options.json) {
+            PrintJson(out, {{"file", path}, {"error", sentence}});
+        } else if (!sentence.empty()) {
+            errors << "clipfile: " << sentence << '\n';
+        }
+        result = Worse(result, code);
+    }
+    return result;
+}
+
+ExitCode InspectFile(const std::string& path, const Options& options, std::ostream& out) {
+    const InputFile file(path);
+    if (options.boxes && options.json) {
+        PrintJson(out, {{"file", path}, {"boxes", BoxesToJson(file, options.rows)}});
+    } else if (options.boxes) {
+        PrintBoxes(out, file, options.rows);
+    } else if (options.json) {
+        PrintJson(out, ToJson(Inspect(file)));
+    } else {
+        PrintText(out, Inspect(file));
+    }
+    return ExitCode::kSuccess;
+}
+
+std::string Plural(std::uint64_t count, const std::string& word) {
+    return std::to_string(count) + " " + word + (count == 1 ? "" : "s");
+}
+
+ExitCode RecoverOne(const std::string& path, const Options& options, std::ostream& out) {
+    const RecoveryResult result = RecoverFile(path, options.recovery);
+    if (options.json) {
+        PrintJson(out, {{"file", path},
+                        {"recovered", result.isRecovered},
+                        {"written", result.written.string()},
+                        {"pictures", result.pictures},
+                        {"audio_frames", result.audioFrames},
+                        {"metadata_units", result.metadataUnits},
+                        {"bytes_left", result.bytesLeft},
+                        {"parameter_sets", result.parameterSets}});
+    } else if (!result.isRecovered) {
+        out << path << " is closed: nothing to recover.\n";
+    } else {
+        out << path << ": " << Plural(result.pictures, "picture") << ", "
+            << Plural(result.audioFrames, "audio frame") << " and " << Plural(result.metadataUnits, "unit")
+            << " of metadata are in " << result.written.string();
+        if (!result.parameterSets.empty()) {
+            out << ", with parameter sets from " << result.parameterSets;
+        }
+        out << "; " << Plural(result.bytesLeft, "byte") << " behind them belong to nothing whole.\n";
+    }
+    return ExitCode::kSuccess;
+}
+
+/// Files as they are, and of folders the recordings in them that are not closed.
+ExitCode Recover(const std::string& path, const Options& options, std::ostream& out, std::ostream& errors) {
+    if (!std::filesystem::is_directory(path)) {
+        return RecoverOne(path, options, out);
+    }
+    Options found = options;
+    found.files = UnfinishedIn(path);
+    return ForEachFile(found, out, errors,
+                       [&](const std::string& file) { return RecoverOne(file, options, out); });
+}
+
+void AddInspect(CLI::App& app, Options& options) {
+    CLI::App* const command =
+        app.add_subcommand("inspect", "Tell what is in recordings, closed or unfinished.");
+    command->add_option("FILE", options.files, "Recordings")->required();
+    command->add_flag(
+        "--boxes", options.boxes,
+        "List the boxes of any MP4 file, with offsets, and fields by their names in the standard");
+    command->add_option("--rows", options.rows, "Rows of each table that --boxes shows")
+        ->capture_default_str();
+    command->add_flag("--json", options.json, "One JSON object a file and line");
+}
+
+CLI::App* AddRecover(CLI::App& app, Options& options) {
+    CLI::App* const command = app.add_subcommand(
+        "recover", "Make whole files of recordings that were cut off. The originals stay as they are.");
+    command->add_option("FILE|DIR", options.files, "Recordings, or folders to search for unfinished ones")
+        ->required();
+    command->add_option("--like", options.recovery.like,
+                        "A closed recording of the same stream, for the parameter sets of a normal file");
+    CLI::Option* const output =
+        command->add_option("--output", options.recovery.output, "Folder for the recovered files")
+            ->check(CLI::ExistingDirectory);
+    command
+        ->add_flag("--in-place", options.recovery.inPlace,
+                   "Put each recovered file in the place of its original")
+        ->excludes(output);
+    command->add_flag("--json", options.json, "One JSON object a file and line");
+    return command;
+}
+
+}  // namespace
+
+ExitCode RunProgram(const std::vector<std::string>& arguments, std::ostream& out, std::ostream& errors) {
+    Options options;
+    CLI::App app("Looks into the recordings of the clipfile module.", "clipfile");
+    app.require_subcommand(1);
+    AddInspect(app, options);
+    const CLI::App* const recover = AddRecover(app, options);
+    std::vector<std::string> reversed(arguments.rbegin(), arguments.rend() - 1);
+    try {
+        app.parse(reversed);
+    } catch (const CLI::ParseError& error) {
+        return app.exit(error, out, errors) == 0 ? ExitCode::kSuccess : ExitCode::kUsage;
+    }
+    return ForEachFile(options, out, errors, [&](const std::string& path) {
+        return recover->parsed() ? Recover(path, options, out, errors) : InspectFile(path, options, out);
+    });
+}
+
+}  // namespace clipfile

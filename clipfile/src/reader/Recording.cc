@@ -1,0 +1,152 @@
+#include "reader/Recording.h"
+
+#include "common/ToolError.h"
+#include "reader/BigEndian.h"
+
+namespace clipfile {
+
+namespace {
+
+ToolError NotOurs(const InputFile& file, const std::string& what) {
+    return {ExitCode::kUnreadable, file.Path().string() + " " + what + "."};
+}
+
+/// Reads what stands in front of the samples and returns where it ends.
+std::uint64_t ReadHead(const InputFile& file, Recording& recording) {
+    BoxCursor cursor(file, 0, file.Size());
+    const auto ftyp = cursor.Next();
+    if (!ftyp || ftyp->type != FourCc("ftyp")) {
+        throw NotOurs(file, "is no MP4 file");
+    }
+    const auto uuid = cursor.Next();
+    if (ftyp->IsTorn() || !uuid || uuid->IsTorn()) {
+        throw NotOurs(file, "ends before its first sample: nothing was recorded in it");
+    }
+    const auto profile = ReadProfile(file, *uuid);
+    if (!profile || (profile->format != kNormalProfile && profile->format != kFragmentedProfile)) {
+        throw NotOurs(file, "is an MP4 file, but none of this recorder: it lacks its profile");
+    }
+    recording.profile = *profile;
+    recording.kind = profile->format == kNormalProfile ? FileKind::kNormal : FileKind::kFragmented;
+    return cursor.Position();
+}
+
+void Complete(Recording& recording, const std::string& missing) {
+    recording.reason = missing;
+    recording.completion = missing.empty() ? Completion::kClosed : Completion::kUnfinished;
+}
+
+void ReadNormal(const InputFile& file, std::uint64_t position, Recording& recording) {
+    BoxCursor cursor(file, position, file.Size());
+    const auto mdat = cursor.Next();
+    if (!mdat || mdat->type != FourCc("mdat")) {
+        recording.dataBegin = recording.dataEnd = position;
+        Complete(recording, "It ends before its samples.");
+        return;
+    }
+    recording.dataBegin = mdat->Payload();
+    recording.dataEnd = mdat->end;
+    if (mdat->PayloadSize() == 0 && mdat->end < file.Size()) {
+        // The header is patched on closing. Until then all that follows are samples.
+        recording.dataEnd = file.Size();
+        Complete(recording, "The length of its samples and 'moov' were never written.");
+        return;
+    }
+    const auto moov = cursor.Next();
+    if (mdat->IsTorn() || !moov || moov->type != FourCc("moov") || moov->IsTorn()) {
+        Complete(recording, mdat->IsTorn() ? "It ends inside of its samples." : "It has no whole 'moov'.");
+        return;
+    }
+    recording.moov = moov;
+    recording.movie = ReadMovie(file, *moov);
+    const bool followed = cursor.Next().has_value() || !cursor.Fault().empty();
+    Complete(recording, followed ? "Other bytes follow its 'moov'." : "");
+}
+
+/// Goes through the fragments. Returns what is missing, or nothing.
+std::string ReadFragments(const InputFile& file, std::uint64_t position, Recording& recording) {
+    BoxCursor cursor(file, position, file.Size());
+    bool hasFragment = false;
+    while (const auto box = cursor.Next()) {
+        switch (box->type) {
+            case FourCc("moof"):
+                if (box->IsTorn()) {
+                    recording.brokenFragment = box;
+                    return "It ends inside of the index of fragment " +
+                           std::to_string(recording.fragmentCount + 1) + ".";
+                }
+                hasFragment = true;
+                ++recording.fragmentCount;
+                break;
+            case FourCc("mdat"):
+                if (box->IsTorn() && hasFragment) {
+                    return "It ends inside of the samples of fragment " +
+                           std::to_string(recording.fragmentCount) + ".";
+                }
+                break;
+            case FourCc("mfra"):
+                if (!box->IsTorn()) {
+                    recording.fragmentIndex = box;
+                }
+                break;
+            default:
+                return "What stands at " + std::to_string(box->offset) + " is no part of a recording.";
+        }
+    }
+    if (!cursor.Fault().empty()) {
+        return cursor.Fault();
+    }
+    return recording.fragmentIndex ? "" : "It has no whole 'mfra'.";
+}
+
+void ReadFragmented(const InputFile& file, std::uint64_t position, Recording& recording) {
+    BoxCursor cursor(file, position, file.Size());
+    recording.dataBegin = recording.dataEnd = position;
+    const auto moov = cursor.Next();
+    if (!moov || moov->type != FourCc("moov") || moov->IsTorn()) {
+        Complete(recording, "It ends before its first fragment was written.");
+        return;
+    }
+    recording.moov = moov;
+    recording.movie = ReadMovie(file, *moov);
+    const auto mdat = cursor.Next();
+    if (!mdat || mdat->type != FourCc("mdat")) {
+        recording.dataBegin = recording.dataEnd = moov->end;
+        Complete(recording, "It ends before the samples of its 'moov'.");
+        return;
+    }
+    recording.dataBegin = mdat->Payload();
+    recording.dataEnd = mdat->end;
+    if (mdat->IsTorn()) {
+        Complete(recording, "It ends inside of the samples of its 'moov'.");
+        return;
+    }
+    Complete(recording, ReadFragments(file, mdat->end, recording));
+}
+
+}  // namespace
+
+Recording ReadRecording(const InputFile& file) {
+    Recording recording;
+    const std::uint64_t position = ReadHead(file, recording);
+    if (recording.kind == FileKind::kNormal) {
+        ReadNormal(file, position, recording);
+    } else {
+        ReadFragmented(file, position, recording);
+    }
+    return recording;
+}
+
+std::optional<Box> FragmentCursor::Next() {
+    while (const auto box = cursor_.Next()) {
+        if (box->type == FourCc("moof")) {
+            return box->IsTorn() ? std::nullopt : box;
+        }
+        if (box->type != FourCc("mdat")) {
+            return std::nullopt;
+        }
+    }
+    return std::nullopt;
+}
+
+}  // namespace clipfile

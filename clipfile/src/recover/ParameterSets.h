@@ -1,0 +1,58 @@
+#pragma once
+
+#include <filesystem>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "reader/Profile.h"
+
+namespace clipfile {
+
+/// The sets that a decoder needs for the pictures of a recording: NAL units without start code. A file gets
+/// them in its `moov`, on closing.
+struct ParameterSets {
+    std::vector<unsigned char> sps;
+    std::vector<unsigned char> pps;
+};
+
+/// A place where the parameter sets of an unfinished file may be found.
+class ParameterSetSource {
+ public:
+    virtual ~ParameterSetSource() = default;
+    /// The next candidate for a file with this profile, or nothing when there are no more.
+    virtual std::optional<ParameterSets> Next(const Profile& profile) = 0;
+    /// The place, in the middle of a sentence.
+    virtual std::string Name() const = 0;
+};
+
+/// The sets of one file, which a person has named.
+class LikeFile : public ParameterSetSource {
+ public:
+    explicit LikeFile(std::filesystem::path path) : path_(std::move(path)) {}
+    /// Throws `ToolError` for a file that cannot be read, or has no parameter sets.
+    std::optional<ParameterSets> Next(const Profile& profile) override;
+    std::string Name() const override { return path_.string(); }
+
+ private:
+    std::filesystem::path path_;
+    bool isTaken_ = false;
+};
+
+/// The sets of the whole files in a folder, the newest first.
+class FolderFiles : public ParameterSetSource {
+ public:
+    /// `except` is the file that is recovered.
+    FolderFiles(std::filesystem::path folder, const std::filesystem::path& except);
+    std::optional<ParameterSets> Next(const Profile& profile) override;
+    std::string Name() const override { return "the folder " + folder_.string(); }
+
+ private:
+    std::filesystem::path folder_;
+    std::vector<std::filesystem::path> files_;  // the next at the back
+};
+
+/// Whether the sets can belong to a file with this profile, whose head of `avcC` comes from its sets.
+bool FitsProfile(const ParameterSets& sets, const Profile& profile);
+
+}  // namespace clipfile

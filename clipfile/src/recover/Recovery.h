@@ -1,0 +1,42 @@
+#pragma once
+
+#include <cstdint>
+#include <filesystem>
+#include <optional>
+#include <string>
+
+namespace clipfile {
+
+struct RecoveryOptions {
+    /// A recording of the same stream, for the parameter sets of a normal file; empty for the newest whole
+    /// file in the same folder that fits.
+    std::filesystem::path like;
+    /// Folder for recovered files; empty for that of the original.
+    std::filesystem::path output;
+    /// The recovered file takes the place of the original.
+    bool inPlace = false;
+};
+
+/// What became of a file.
+struct RecoveryResult {
+    /// False for a closed file, with which there is nothing to do.
+    bool isRecovered = false;
+    std::filesystem::path written;
+    std::uint64_t pictures = 0;
+    std::uint64_t audioFrames = 0;
+    std::uint64_t metadataUnits = 0;
+    /// Bytes behind the last sample that was whole.
+    std::uint64_t bytesLeft = 0;
+    /// Where the parameter sets come from, when not from the file itself.
+    std::string parameterSets;
+};
+
+/// Makes a whole file of an unfinished one. The new file is complete on disk before it gets its name; the
+/// original is only read, and with `inPlace` replaced as a whole at the end.
+///
+/// Throws `ToolError` with one sentence when nothing can be recovered, when no parameter sets fit, when the
+/// file is still being recorded, or when the new one is there already or cannot be written. Nothing is left
+/// behind then.
+RecoveryResult RecoverFile(const std::filesystem::path& path, const RecoveryOptions& options);
+
+}  // namespace clipfile

@@ -1,0 +1,113 @@
+#include "Program.h"
+
+#include <gtest/gtest.h>
+
+#include <fstream>
+#include <nlohmann/json.hpp>
+#include <sstream>
+
+#include "support/ByteFile.h"
+#include "support/TempDir.h"
+#include "support/TestStream.h"
+
+namespace clipfile {
+namespace {
+
+class ProgramTest : public testing::Test {
+ protected:
+    ExitCode run(std::vector<std::string> arguments) {
+        arguments.insert(arguments.begin(), "clipfile");
+        out_.str("");
+        errors_.str("");
+        return RunProgram(arguments, out_, errors_);
+    }
+    std::string path(const std::string& name) const { return (folder_.Path() / name).string(); }
+    void recordNormal(const std::string& name, bool close = true) const {
+        test_stream::Record(path(name), {"normal", clipfileModule::RecordRules::kExact, close},
+                            test_stream::MakePlainStream(2));
+    }
+
+    TempDir folder_;
+    std::ostringstream out_;
+    std::ostringstream errors_;
+};
+
+TEST_F(ProgramTest, MistakesOfTheCommandLineHaveACodeOfTheirOwn) {
+    EXPECT_EQ(run({}), ExitCode::kUsage);
+    EXPECT_EQ(run({"inspect"}), ExitCode::kUsage);
+    EXPECT_EQ(run({"paint", "x"}), ExitCode::kUsage);
+    EXPECT_EQ(run({"inspect", "--size", "x"}), ExitCode::kUsage);
+    EXPECT_EQ(run({"--help"}), ExitCode::kSuccess);
+    EXPECT_NE(out_.str().find("inspect"), std::string::npos);
+}
+
+TEST_F(ProgramTest, WhatIsNoRecordingIsToldInASentence) {
+    const std::string empty = path("empty.MP4");
+    const std::string zeros = path("zeros.MP4");
+    const std::string foreign = path("foreign.MP4");
+    const std::string missing = path("missing.MP4");
+    std::ofstream(empty).close();
+    std::ofstream(zeros).close();
+    std::filesystem::resize_file(zeros, 10'000'000'000);
+    test_stream::WriteAll(foreign, byte_file::Join({byte_file::MakeBox("ftyp", {byte_file::Text("isom")}),
+                                                    byte_file::MakeBox("mdat", {byte_file::Words({1})})}));
+    const std::pair<std::string, std::string> cases[] = {
+        {empty, empty + " is empty."},
+        {folder_.Path().string(), folder_.Path().string() + " is a folder, not a file."},
+        {zeros, zeros + " is no MP4 file."},
+        {foreign, foreign + " is an MP4 file, but none of this recorder: it lacks its profile."},
+        {missing, missing + " does not exist."},
+        {"/dev/null", "/dev/null is no regular file."},
+    };
+    for (const auto& [file, sentence] : cases) {
+        EXPECT_EQ(run({"inspect", file}), ExitCode::kUnreadable) << file;
+        EXPECT_EQ(out_.str(), "");
+        EXPECT_EQ(errors_.str(), "clipfile: " + sentence + "\n");
+    }
+}
+
+TEST_F(ProgramTest, AFileThatCannotBeReadDoesNotKeepTheOthersBack) {
+    recordNormal("a.MP4");
+    EXPECT_EQ(run({"inspect", path("missing.MP4"), path("a.MP4")}), ExitCode::kUnreadable);
+    EXPECT_TRUE(out_.str().starts_with(path("a.MP4") + ": normal, closed"));
+}
+
+TEST_F(ProgramTest, JsonHasALineAFileAndToldErrorsToo) {
+    recordNormal("a.MP4");
+    EXPECT_EQ(run({"inspect", "--json", path("a.MP4"), path("missing.MP4")}), ExitCode::kUnreadable);
+    std::istringstream lines(out_.str());
+    std::string line;
+    std::getline(lines, line);
+    EXPECT_EQ(nlohmann::json::parse(line).at("closed"), true);
+    std::getline(lines, line);
+    EXPECT_EQ(nlohmann::json::parse(line).at("error"), path("missing.MP4") + " does not exist.");
+    EXPECT_EQ(errors_.str(), "");
+}
+
+TEST_F(ProgramTest, BoxesAreListedOfAnyMp4File) {
+    test_stream::WriteAll(
+        path("foreign.MP4"),
+        byte_file::MakeBox("moov", {byte_file::MakeBox("mfhd", {byte_file::Words({0, 7})})}));
+    EXPECT_EQ(run({"inspect", "--boxes", path("foreign.MP4")}), ExitCode::kSuccess);
+    EXPECT_EQ(out_.str(),
+              "moov at 0, 24 bytes\n"
+              "  mfhd at 8, 16 bytes\n"
+              "      version 0, flags 000000, sequence_number 7\n");
+    EXPECT_EQ(run({"inspect", "--boxes", "--json", path("foreign.MP4")}), ExitCode::kSuccess);
+    const auto json = nlohmann::json::parse(out_.str());
+    EXPECT_EQ(json.at("boxes").at(0).at("children").at(0).at("fields").at("sequence_number"), 7);
+}
+
+TEST_F(ProgramTest, BoxesOfARecordingNameTheirFields) {
+    recordNormal("a.MP4");
+    EXPECT_EQ(run({"inspect", "--boxes", "--rows", "1", path("a.MP4")}), ExitCode::kSuccess);
+    for (const char* const text :
+         {"major_brand ZQVC, minor_version 01001FFF", "format 20000000", "handler_type meta",
+          "sequenceParameterSetNALUnit 67640028AC", "sample_count 16, sample_delta 1001",
+          "number_of_frames 30", "      15 more rows"}) {
+        EXPECT_NE(out_.str().find(text), std::string::npos) << text;
+    }
+}
+
+}  // namespace
+}  // namespace clipfile

@@ -1,0 +1,140 @@
+#include "output/FolderWatch.h"
+
+#include <array>
+#include <condition_variable>
+#include <mutex>
+#include <utility>
+
+#include "common/ReceiverError.h"
+
+namespace receiver {
+namespace {
+
+constexpr std::time_t kDay = 86400;
+/// So much before midnight the folder of the next day counts as today's.
+constexpr std::time_t kAhead = 60;
+/// A server that does not answer, or refuses, is asked again after this many looks: it counts refused
+/// passwords.
+constexpr int kRestAfterFailure = 30;
+constexpr std::chrono::milliseconds kEndPatience{500};
+
+}  // namespace
+
+struct FolderWatch::State {
+    State(std::unique_ptr<OutputFolder> watched, std::string last, TimeSource time,
+          std::chrono::milliseconds every)
+        : folder(std::move(watched)), prefix(std::move(last)), now(std::move(time)), interval(every) {}
+
+    const std::unique_ptr<OutputFolder> folder;
+    const std::string prefix;
+    const TimeSource now;
+    const std::chrono::milliseconds interval;
+
+    mutable std::mutex mutex;
+    std::condition_variable changed;
+    // Guarded by mutex:
+    bool ending = false;
+    bool ended = false;
+    std::optional<std::uint64_t> freeBytes;
+    std::string obstacle;
+    std::string warning;
+    /// The day that was warned of.
+    std::string warnedOf;
+};
+
+std::string DateOf(std::time_t time) {
+    std::tm parts = {};
+    localtime_r(&time, &parts);
+    std::array<char, 16> text = {};
+    const std::size_t size = std::strftime(text.data(), text.size(), "%Y%m%d", &parts);
+    return {text.data(), size};
+}
+
+void ExpectDatedFolders(OutputFolder& folder, const std::string& prefix, std::time_t now) {
+    for (const std::time_t time : {now, now + kDay}) {
+        const std::string obstacle = folder.Obstacle(DateOf(time), prefix);
+        if (!obstacle.empty()) {
+            throw ReceiverError(ExitCode::kOutput, obstacle);
+        }
+    }
+}
+
+FolderWatch::FolderWatch(std::unique_ptr<OutputFolder> folder, const std::string& prefix,
+                         const TimeSource& now, std::chrono::milliseconds interval)
+    : state_(std::make_shared<State>(std::move(folder), prefix, now, interval)),
+      thread_([state = state_] { watch(*state); }) {}
+
+FolderWatch::~FolderWatch() {
+    bool ended = false;
+    {
+        std::unique_lock lock(state_->mutex);
+        state_->ending = true;
+        state_->changed.notify_all();
+        ended = state_->changed.wait_for(lock, kEndPatience, [this] { return state_->ended; });
+    }
+    if (ended) {
+        thread_.join();
+    } else {
+        thread_.detach();
+    }
+}
+
+void FolderWatch::watch(State& state) {
+    std::unique_lock lock(state.mutex);
+    while (!state.ending) {
+        lock.unlock();
+        look(state);
+        lock.lock();
+        const int looks = state.freeBytes ? 1 : kRestAfterFailure;
+        state.changed.wait_for(lock, looks * state.interval, [&state] { return state.ending; });
+    }
+    state.ended = true;
+    state.changed.notify_all();
+}
+
+void FolderWatch::look(State& state) {
+    std::optional<std::uint64_t> freeBytes;
+    std::string obstacle;
+    std::string warning;
+    const std::time_t now = state.now();
+    const std::string tomorrow = DateOf(now + kDay);
+    try {
+        freeBytes = state.folder->FreeBytes();
+        if (freeBytes) {
+            obstacle = state.folder->Obstacle(DateOf(now), state.prefix);
+            if (obstacle.empty() && DateOf(now + kAhead) == tomorrow) {
+                obstacle = state.folder->Obstacle(tomorrow, state.prefix);
+            } else if (obstacle.empty()) {
+                warning = state.folder->Obstacle(tomorrow, state.prefix);
+            }
+        }
+    } catch (const ReceiverError&) {
+        // What the module writes to meets the same.
+        freeBytes.reset();
+    }
+    const std::lock_guard lock(state.mutex);
+    state.freeBytes = freeBytes;
+    state.obstacle = obstacle;
+    if (!warning.empty() && state.warnedOf != tomorrow) {
+        state.warnedOf = tomorrow;
+        state.warning = warning;
+    }
+}
+
+std::optional<std::uint64_t> FolderWatch::FreeBytes() const {
+    const std::lock_guard lock(state_->mutex);
+    return state_->freeBytes;
+}
+
+std::string FolderWatch::Obstacle() const {
+    const std::lock_guard lock(state_->mutex);
+    return state_->obstacle;
+}
+
+std::optional<std::string> FolderWatch::TakeWarning() {
+    const std::lock_guard lock(state_->mutex);
+    std::string warning = std::exchange(state_->warning, {});
+    return warning.empty() ? std::nullopt : std::optional<std::string>(std::move(warning));
+}
+
+}  // namespace receiver

@@ -1,0 +1,59 @@
+#include "output/ModuleLogFile.h"
+
+#include <fcntl.h>
+#include <stdlib.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstring>
+#include <string>
+
+#include "common/ReceiverError.h"
+
+namespace receiver {
+namespace {
+
+constexpr const char* kVariable = "QX_LOG";
+
+std::string ValueOf(const char* variable) {
+    const char* const set = getenv(variable);
+    return set != nullptr ? set : "";
+}
+
+std::string DefaultFolder(const OutputPlace& place) {
+    if (!place.onShare) {
+        return place.folder + "/";
+    }
+    // Of several, the first one (systemd.exec(5)).
+    const std::string folders = ValueOf("LOGS_DIRECTORY");
+    return folders.empty() ? "" : folders.substr(0, folders.find(':')) + "/";
+}
+
+void ExpectWritable(const std::string& file) {
+    const int descriptor =
+        open(file.c_str(), O_WRONLY | O_APPEND | O_CREAT | O_CLOEXEC | O_NOCTTY | O_NONBLOCK, 0600);
+    if (descriptor < 0) {
+        throw ReceiverError(ExitCode::kOutput, "the log '" + file + "' cannot be written: " +
+                                                   std::strerror(errno) + "; --log names another one.");
+    }
+    close(descriptor);
+}
+
+}  // namespace
+
+void SetUpLog(const Options& options, const OutputPlace& place) {
+    if (options.log) {
+        setenv(kVariable, *options.log == "-" ? "" : options.log->c_str(), 1);
+    } else if (ValueOf(kVariable).empty()) {
+        setenv(kVariable, (DefaultFolder(place) + "receiver.log").c_str(), 1);
+    }
+    if (options.logPriority) {
+        setenv("QX_LOG_PRIORITY", std::to_string(*options.logPriority).c_str(), 1);
+    }
+    const std::string file = ValueOf(kVariable);
+    if (place.onShare && !place.password.empty() && !file.empty()) {
+        ExpectWritable(file);
+    }
+}
+
+}  // namespace receiver

@@ -1,0 +1,31 @@
+#pragma once
+
+#include <string>
+
+#include "options/Options.h"
+
+namespace receiver {
+
+/// Where files go.
+struct OutputPlace {
+    /// What the module is told: the folder, or that it is to take the one of the settings store.
+    std::string parameter;
+    /// With slashes, and none at the end. A folder on a share is `//server/share/folder`.
+    std::string folder;
+    bool onShare = false;
+    /// Last folder of the path of a file; empty for none.
+    std::string prefix;
+    /// With what the module logs on to a share; empty where there is neither an option nor an entry of the
+    /// settings store.
+    std::string user;
+    std::string password;
+};
+
+/// The module's rules, with an output of our own where it would refuse: start parameters, else settings
+/// store. Throws `ReceiverError` with `kUsage` for a path of a share that names none.
+OutputPlace PlaceOf(const Options& options);
+
+/// A path as the module has it, for a folder or a file of an `OutputPlace`.
+std::string ModulePath(std::string path);
+
+}  // namespace receiver

@@ -1,0 +1,242 @@
+#include <unistd.h>
+
+#include <algorithm>
+#include <array>
+#include <cerrno>
+#include <chrono>
+#include <cstring>
+#include <functional>
+#include <system_error>
+#include <vector>
+
+#include "common/ReceiverError.h"
+#include "output/OutputFolder.h"
+#include "platform/SharePath.h"
+#include "platform/posix/SmbSession.h"
+
+/// The module has a copy of the same code: both use libsmbclient, and this lock, which the program exports.
+extern "C" {
+__attribute__((visibility("default"), used)) clipfileModule::Mutex clipfile_smb_process_lock;
+}
+
+namespace receiver {
+namespace {
+
+using clipfileModule::SharePath;
+using clipfileModule::SmbCredentials;
+using clipfileModule::SmbLibrary;
+using clipfileModule::SmbSession;
+using clipfileModule::SmbStatus;
+
+ReceiverError Unusable(const std::string& sentence) {
+    return {ExitCode::kOutput, sentence};
+}
+
+/// The server has answered; anything else tells of the way to it.
+bool IsAnswer(int error) {
+    constexpr std::array<int, 13> kAnswers{0,     ENOENT, EACCES, EPERM, EEXIST, ENOTDIR,     EISDIR,
+                                           EBUSY, ENOSPC, EDQUOT, EROFS, EINVAL, ENAMETOOLONG};
+    return std::find(kAnswers.begin(), kAnswers.end(), error) != kAnswers.end();
+}
+
+class ShareFolder final : public OutputFolder {
+ public:
+    explicit ShareFolder(const OutputPlace& place)
+        : place_(place), credentials_(SmbCredentials::Of(place.user, place.password)) {}
+
+    bool Prepare() override;
+    std::optional<std::uint64_t> FreeBytes() override;
+    std::string Obstacle(const std::string& date, const std::string& prefix) override;
+    bool Exists(const std::string& path) override;
+    RecordedFile ReadBackFile(const std::string& path) override;
+
+ private:
+    /// On a connection that a server has given up since, for its age or with its restart, it is tried once
+    /// more on a new one. Returns an error number.
+    int run(const std::function<int(SmbSession&)>& operation);
+    int connect();
+    int look(const std::string& path, SmbStatus& status);
+    void expectConnection();
+    bool makeWhereMissing();
+    void expectWritable();
+
+    const OutputPlace place_;
+    const SmbCredentials credentials_;
+    std::shared_ptr<SmbSession> session_;
+};
+
+std::string UrlOf(const std::string& path) {
+    SharePath share;
+    SharePath::Parse(ModulePath(path), share);
+    return share.Url();
+}
+
+int ShareFolder::connect() {
+    std::string reason;
+    const SmbLibrary* const library = SmbLibrary::Get(reason);
+    if (library == nullptr) {
+        throw Unusable("the output folder '" + place_.folder +
+                       "' is on a share, and libsmbclient cannot be " + "loaded: " + reason +
+                       "; install it (Debian: libsmbclient0).");
+    }
+    SharePath share;
+    SharePath::Parse(ModulePath(place_.folder), share);
+    try {
+        session_ = std::make_shared<SmbSession>(*library, share, credentials_);
+    } catch (const std::system_error& error) {
+        return error.code().value();
+    }
+    return session_->ConnectResult();
+}
+
+int ShareFolder::run(const std::function<int(SmbSession&)>& operation) {
+    int error = ENOTCONN;
+    if (session_ != nullptr) {
+        error = operation(*session_);
+    }
+    if (!IsAnswer(error)) {
+        session_.reset();
+        error = connect();
+        error = error != 0 ? error : operation(*session_);
+    }
+    if (!IsAnswer(error) || (session_ != nullptr && session_->ConnectResult() != 0)) {
+        session_.reset();
+    }
+    return error;
+}
+
+int ShareFolder::look(const std::string& path, SmbStatus& status) {
+    return run([&](SmbSession& session) { return session.Look(UrlOf(path), status); });
+}
+
+void ShareFolder::expectConnection() {
+    const std::string named = "the share of the output folder '" + place_.folder + "' ";
+    const int error = run([](SmbSession&) { return 0; });
+    switch (error) {
+        case 0:
+            return;
+        case EACCES:
+        case EPERM:
+            throw Unusable(named + (place_.user.empty() ? "refuses who has no name; --user gives one."
+                                                        : "refuses the user name or the password; --user and "
+                                                          "--password-file give others."));
+        case ENOENT:
+            throw Unusable(named + "does not exist; --output names another one.");
+        default:
+            throw Unusable(named + "cannot be reached: " + std::strerror(error) +
+                           "; see that its server runs, and takes connections from here.");
+    }
+}
+
+bool ShareFolder::makeWhereMissing() {
+    const std::string named = "the output folder '" + place_.folder + "' ";
+    SmbStatus status;
+    int error = look(place_.folder, status);
+    if (error == 0 && !status.isFolder) {
+        throw Unusable(named + "is no folder; --output names another one.");
+    }
+    if (error != ENOENT) {
+        // Folders that may not be looked at can have room for files.
+        return false;
+    }
+    const std::string parent = place_.folder.substr(0, place_.folder.rfind('/'));
+    error = look(parent, status);
+    if (error == 0) {
+        error = run([&](SmbSession& session) { return session.CreateDirectories(UrlOf(place_.folder)); });
+    }
+    if (error != 0) {
+        throw Unusable(named + "does not exist and cannot be made: " + std::strerror(error) +
+                       "; make it, or name another one with --output.");
+    }
+    return true;
+}
+
+/// Whether rights of the server allow that can only be tried.
+void ShareFolder::expectWritable() {
+    const std::string probe = UrlOf(place_.folder) + "/.receiver-" + std::to_string(getpid()) + "-" +
+                              std::to_string(std::chrono::system_clock::now().time_since_epoch().count());
+    const int error = run([&probe](SmbSession& session) {
+        SMBCFILE* file = nullptr;
+        int failure = session.Open(probe, file);
+        if (failure == 0) {
+            failure = session.Close(file);
+            session.Remove(probe);
+        }
+        return failure;
+    });
+    if (error != 0) {
+        throw Unusable("the output folder '" + place_.folder + "' is not writable: " + std::strerror(error) +
+                       "; change its rights, or name another one with --output.");
+    }
+}
+
+bool ShareFolder::Prepare() {
+    expectConnection();
+    const bool made = makeWhereMissing();
+    const std::optional<std::uint64_t> free = FreeBytes();
+    if (free && *free < kMinFreeBytes) {
+        throw Unusable(FullSentence(place_.folder, *free));
+    }
+    expectWritable();
+    return made;
+}
+
+std::optional<std::uint64_t> ShareFolder::FreeBytes() {
+    std::uint64_t bytes = 0;
+    const int error =
+        run([&](SmbSession& session) { return session.AvailableSpace(UrlOf(place_.folder), bytes); });
+    return error == 0 ? std::optional<std::uint64_t>(bytes) : std::nullopt;
+}
+
+std::string ShareFolder::Obstacle(const std::string& date, const std::string& prefix) {
+    const std::string dated = place_.folder + "/" + date;
+    for (const std::string& path : {prefix.empty() ? dated : dated + "/" + prefix, dated}) {
+        SmbStatus status;
+        const int error = look(path, status);
+        if (error == EACCES || error == EPERM) {
+            return UnusableSentence(dated, std::string("cannot be entered: ") + std::strerror(error));
+        }
+        if (error == 0 && !status.isFolder) {
+            return UnusableSentence(path, "is no folder");
+        }
+    }
+    return {};
+}
+
+bool ShareFolder::Exists(const std::string& path) {
+    SmbStatus status;
+    return look(path, status) == 0;
+}
+
+RecordedFile ShareFolder::ReadBackFile(const std::string& path) {
+    SMBCFILE* file = nullptr;
+    std::uint64_t bytes = 0;
+    const int error =
+        run([&](SmbSession& session) { return session.OpenForReading(UrlOf(path), file, bytes); });
+    if (error != 0) {
+        RecordedFile recorded;
+        recorded.path = path;
+        recorded.problem = std::strerror(error);
+        return recorded;
+    }
+    // On this connection alone: the file is open there.
+    RecordedFile recorded =
+        ReadBack(path, bytes, [this, file](std::int64_t offset, unsigned char* data, int size) {
+            std::vector<char> read;
+            if (session_->Read(file, offset, static_cast<std::size_t>(size), read) != 0) {
+                return -1;
+            }
+            std::copy(read.begin(), read.end(), data);
+            return static_cast<int>(read.size());
+        });
+    session_->Close(file);
+    return recorded;
+}
+
+}  // namespace
+
+std::unique_ptr<OutputFolder> OpenShareFolder(const OutputPlace& place) {
+    return std::make_unique<ShareFolder>(place);
+}
+
+}  // namespace receiver

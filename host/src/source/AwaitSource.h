@@ -1,0 +1,41 @@
+#pragma once
+
+#include <chrono>
+#include <functional>
+
+#include "source/SourceInterface.h"
+
+namespace receiver {
+
+/// How often it is told that a source is still waited for.
+inline constexpr std::chrono::seconds kTellEvery{60};
+
+/// The time that passes while a source is waited for.
+class WaitClockInterface {
+ public:
+    using TimePoint = std::chrono::steady_clock::time_point;
+
+    virtual ~WaitClockInterface() = default;
+    virtual TimePoint Now() = 0;
+    /// Returns at `time`, at once where that has passed. Throws `Stopped` when somebody ends the wait.
+    virtual void SleepUntil(TimePoint time) = 0;
+};
+
+/// The time of this machine. `stop` may be null; true ends a wait.
+class SteadyWaitClock final : public WaitClockInterface {
+ public:
+    explicit SteadyWaitClock(bool (*stop)()) : stop_(stop) {}
+    TimePoint Now() override { return std::chrono::steady_clock::now(); }
+    void SleepUntil(TimePoint time) override;
+
+ private:
+    bool (*const stop_)();
+};
+
+/// Calls `attempt` until it does not throw `SourceAbsent`, with pauses; `listens`: an attempt itself waits
+/// for a sender, and a pause is only needed behind one that fails at once. `attempt` is given whether the
+/// absence has been told to `listener`, which happens at the first failure and then every minute.
+void AwaitSource(bool listens, const std::function<void(bool told)>& attempt,
+                 SourceListenerInterface& listener, WaitClockInterface& clock);
+
+}  // namespace receiver
