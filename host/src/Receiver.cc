@@ -11,12 +11,7 @@
 #include <utility>
 #include <vector>
 
-<<<<<<< HEAD
 #include "GroupWatch.h"
-#include "OutputFolder.h"
-#include "QxRegistry.h"
-=======
->>>>>>> ec6f36eb7a6d9e0f7eb4793bdd78337611b44474
 #include "Recorder.h"
 #include "Shortfalls.h"
 #include "StreamRates.h"
@@ -92,14 +87,6 @@ StartParameters ParametersOf(const Options& options, const OutputPlace& place,
         parameters.numbers["-encodedBPS"] = static_cast<int>(description.bitrate);
     }
     return parameters;
-}
-
-/// Minutes of a file, by the module's rule.
-std::int64_t FileLength() {
-    constexpr unsigned int kUsual = 120;
-    unsigned int minutes = 0;
-    const bool stored = QxRegistry::GetInstance()->getValue("Qx/Other/MP4FileOut", "MP4MaxFileSize", minutes);
-    return stored ? minutes : kUsual;
 }
 
 void CheckTimecode(const Options& options, const FrameRate& rate) {
@@ -256,16 +243,12 @@ ExitCode Running::Record(const SourceOpener& open) {
         if (options_.mode == OutputMode::kSync) {
             session.GoOnline();
         }
-<<<<<<< HEAD
-        Recorder recorder(recorderSettings, session, log, plan_);
+        Recorder recorder(recorderSettings, session, log, plan_, commands_);
         // A run that is shorter than a file has one only.
-        if (const std::int64_t minutes = FileLength();
+        if (const std::int64_t minutes = FileMinutes();
             !options_.seconds || *options_.seconds > static_cast<double>(minutes * 60)) {
             groups_.emplace(recorderSettings.frameRate, minutes, options_.source.pictureGroup);
         }
-=======
-        Recorder recorder(recorderSettings, session, log, plan_, commands_);
->>>>>>> ec6f36eb7a6d9e0f7eb4793bdd78337611b44474
         try {
             Loop(*source, recorder);
         } catch (const ReceiverError& error) {

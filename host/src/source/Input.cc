@@ -91,15 +91,6 @@ Input::Input(const std::string& url, double timeout, double patience, std::share
     : url_(url), timeout_(timeout), patience_(patience), interrupt_(std::move(interrupt)), stop_(stop) {
     Open();
     stop_ = nullptr;
-<<<<<<< HEAD
-=======
-    const bool seekable = format_->pb != nullptr && (format_->pb->seekable & AVIO_SEEKABLE_NORMAL) != 0;
-    const std::string format = format_->iformat->name;
-    recorded_ = (seekable && format != "sdp") ||
-                (format == "hls" && format_->duration != AV_NOPTS_VALUE && format_->duration > 0);
-    transport_ = format == "mpegts" || format == "hls";
-    rtp_ = format == "sdp" || format == "rtsp" || format == "rtp";
->>>>>>> ec6f36eb7a6d9e0f7eb4793bdd78337611b44474
     Alive();
 }
 
@@ -156,6 +147,7 @@ void Input::Open() {
 void Input::Classify() {
     const std::string_view format = format_->iformat->name;
     const bool seekable = format_->pb != nullptr && (format_->pb->seekable & AVIO_SEEKABLE_NORMAL) != 0;
+    transport_ = format == "mpegts" || format == "hls";
     rtp_ = format == "sdp" || format == "rtsp" || format == "rtp";
     if (format == "hls") {
         // A playlist that is complete has a length; one that still grows is a file all the same.
