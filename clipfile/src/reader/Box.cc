@@ -140,6 +140,16 @@ std::optional<Box> FindChild(const InputFile& file, const Box& parent, std::uint
     return FindBox(file, parent.Payload(), parent.end, type);
 }
 
+Box RequireChild(const InputFile& file, const Box& parent, std::uint32_t type) {
+    const auto box = FindChild(file, parent, type);
+    if (!box) {
+        throw FormatError(parent.offset, "'" + FourCcText(parent.type) + "' at " +
+                                             std::to_string(parent.offset) + " lacks '" + FourCcText(type) +
+                                             "'.");
+    }
+    return *box;
+}
+
 BoxCursor Children(const InputFile& file, const Box& parent, std::uint64_t skipped) {
     return {file, parent.Payload() + std::min(skipped, parent.PayloadSize()), parent.end};
 }

@@ -66,31 +66,24 @@ void ReadNormal(const InputFile& file, std::uint64_t position, Recording& record
 /// Goes through the fragments. Returns what is missing, or nothing.
 std::string ReadFragments(const InputFile& file, std::uint64_t position, Recording& recording) {
     BoxCursor cursor(file, position, file.Size());
-    bool hasFragment = false;
+    bool isDataNext = false;  // the samples of the fragment before
     while (const auto box = cursor.Next()) {
-        switch (box->type) {
-            case FourCc("moof"):
-                if (box->IsTorn()) {
-                    recording.brokenFragment = box;
-                    return "It ends inside of the index of fragment " +
-                           std::to_string(recording.fragmentCount + 1) + ".";
-                }
-                hasFragment = true;
-                ++recording.fragmentCount;
-                break;
-            case FourCc("mdat"):
-                if (box->IsTorn() && hasFragment) {
-                    return "It ends inside of the samples of fragment " +
-                           std::to_string(recording.fragmentCount) + ".";
-                }
-                break;
-            case FourCc("mfra"):
-                if (!box->IsTorn()) {
-                    recording.fragmentIndex = box;
-                }
-                break;
-            default:
-                return "What stands at " + std::to_string(box->offset) + " is no part of a recording.";
+        const std::string number = std::to_string(recording.fragmentCount + (isDataNext ? 0 : 1));
+        if (box->type == FourCc("moof") && !isDataNext) {
+            if (box->IsTorn()) {
+                return "It ends inside of the index of fragment " + number + ".";
+            }
+            ++recording.fragmentCount;
+            isDataNext = true;
+        } else if (box->type == FourCc("mdat") && isDataNext) {
+            if (box->IsTorn()) {
+                return "It ends inside of the samples of fragment " + number + ".";
+            }
+            isDataNext = false;
+        } else if (box->type == FourCc("mfra") && !isDataNext && !recording.fragmentIndex) {
+            recording.fragmentIndex = box->IsTorn() ? std::nullopt : box;
+        } else {
+            return "What stands at " + std::to_string(box->offset) + " is no part of a recording.";
         }
     }
     if (!cursor.Fault().empty()) {

@@ -33,9 +33,8 @@ struct Recording {
     /// Sample bytes of a normal file, or of the part that `moov` of a fragmented one describes.
     std::uint64_t dataBegin = 0;
     std::uint64_t dataEnd = 0;
-    /// Whole `moof` boxes, and the one that is torn or broken, if any.
+    /// `moof` boxes that are whole.
     std::uint64_t fragmentCount = 0;
-    std::optional<Box> brokenFragment;
     std::optional<Box> fragmentIndex;  // mfra
 };
 

@@ -3,9 +3,9 @@
 #include <algorithm>
 #include <array>
 
+#include "media/NalUnits.h"
 #include "reader/BigEndian.h"
 #include "reader/MetadataUnit.h"
-#include "recover/NalUnits.h"
 
 namespace clipfile {
 

@@ -5,9 +5,9 @@
 #include <optional>
 #include <vector>
 
+#include "media/Decoders.h"
 #include "reader/InputFile.h"
 #include "recover/ChunkSource.h"
-#include "recover/Decoders.h"
 
 namespace clipfile {
 

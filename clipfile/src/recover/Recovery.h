@@ -39,4 +39,7 @@ struct RecoveryResult {
 /// behind then.
 RecoveryResult RecoverFile(const std::filesystem::path& path, const RecoveryOptions& options);
 
+/// Whether there is a file already where the recovered one would go.
+bool IsRecovered(const std::filesystem::path& path, const RecoveryOptions& options);
+
 }  // namespace clipfile

@@ -6,12 +6,13 @@
 #include <string>
 #include <thread>
 
+#include "support/Ticks.h"
+
 namespace receiver {
 namespace {
 
 using ::testing::ElementsAre;
 
-constexpr std::int64_t kPeriod = 3600;
 constexpr std::int64_t kGroup = 4;
 
 /// Frames at 25 a second with an IDR frame every four, decided one by one as the recorder does.
@@ -22,7 +23,7 @@ class CommandQueueTest : public ::testing::Test {
         std::string flags;
         for (int i = 0; i < count; ++i, ++frame_) {
             queue_.Apply(plan_);
-            const RecordDecision decision = plan_.Next(frame_ * kPeriod, frame_ % kGroup == 0);
+            const RecordDecision decision = plan_.Next(frame_ * kFrame, frame_ % kGroup == 0);
             queue_.Settle(decision, Timecode{0, 0, 0, static_cast<std::uint8_t>(frame_), false});
             flags += decision.ended && decision.begun ? "|" : "";
             flags += decision.record ? '1' : '0';
