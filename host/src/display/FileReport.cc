@@ -35,7 +35,7 @@ std::string Problem(int error) {
 constexpr std::uint32_t kTimecodeTag = MKTAG('t', 'm', 'c', 'd');
 constexpr std::uint32_t kMetadataTag = MKTAG('r', 't', 'm', 'd');
 
-const AVStream* FindStream(const AVFormatContext& context, bool (*matches)(const AVCodecParameters&)) {
+AVStream* FindStream(const AVFormatContext& context, bool (*matches)(const AVCodecParameters&)) {
     for (unsigned int i = 0; i < context.nb_streams; ++i) {
         if (matches(*context.streams[i]->codecpar)) {
             return context.streams[i];
@@ -64,33 +64,41 @@ std::string TimecodeOfMetadata(const AVPacket& packet) {
 }
 
 /// The tables of a fragmented file are empty: length and frames come from its fragments, and the first
-/// address from its metadata, since its timecode track holds no value.
-void ReadFragments(AVFormatContext& context, const AVStream& video, RecordedFile& file) {
+/// address from its metadata, since its timecode track holds no value. Only the first samples are read, and
+/// of the rest what the fragments say of them: files are large, and may lie behind a network.
+void ReadFragments(AVFormatContext& context, AVStream& video, RecordedFile& file) {
     const AVStream* const metadata =
         FindStream(context, [](const AVCodecParameters& codec) { return codec.codec_tag == kMetadataTag; });
+    const auto isOfInterest = [&](const AVStream* stream) { return stream == &video || stream == metadata; };
+    for (unsigned int i = 0; i < context.nb_streams; ++i) {
+        context.streams[i]->discard = isOfInterest(context.streams[i]) ? AVDISCARD_DEFAULT : AVDISCARD_ALL;
+    }
     const std::unique_ptr<AVPacket, FreePacket> packet(av_packet_alloc());
-    std::int64_t begin = 0;
     std::int64_t duration = 0;
     file.startTimecode.clear();
-    bool first = true;
     while (packet && av_read_frame(&context, packet.get()) >= 0) {
-        if (packet->stream_index == video.index) {
-            // The demuxer does not tell how long the last frame of all fragments lasts: as long as the one
-            // before it.
-            duration = packet->duration > 0 || file.frames == 0 ? packet->duration : packet->pts - begin;
-            begin = packet->pts;
-            ++file.frames;
-        } else if (metadata != nullptr && packet->stream_index == metadata->index && first) {
+        AVStream& stream = *context.streams[packet->stream_index];
+        if (&stream == &video) {
+            duration = packet->duration;
+        } else {
             file.startTimecode = TimecodeOfMetadata(*packet);
-            first = false;
         }
+        stream.discard = AVDISCARD_ALL;
         av_packet_unref(packet.get());
     }
-    file.seconds = Seconds(begin + duration, video);
+    const int count = avformat_index_get_entries_count(&video);
+    if (count > 0) {
+        const std::int64_t last = avformat_index_get_entry(&video, count - 1)->timestamp;
+        // The demuxer does not tell how long the last frame lasts: as long as the one before it.
+        const std::int64_t before =
+            count > 1 ? avformat_index_get_entry(&video, count - 2)->timestamp : last - duration;
+        file.frames = static_cast<std::uint64_t>(count);
+        file.seconds = Seconds(last + last - before, video);
+    }
 }
 
 /// Octets of one question to the reader of a file.
-constexpr int kReadSize = 1 << 18;
+constexpr int kReadSize = 1 << 16;
 
 /// A file as FFmpeg's libraries read it.
 struct ReaderState {
@@ -147,7 +155,7 @@ void ReadOpened(AVFormatContext* opened, const std::string& name, RecordedFile& 
         return;
     }
     const std::unique_ptr<AVFormatContext, CloseInput> context(opened);
-    const AVStream* const video = FindStream(
+    AVStream* const video = FindStream(
         *context, [](const AVCodecParameters& codec) { return codec.codec_type == AVMEDIA_TYPE_VIDEO; });
     if (video == nullptr) {
         file.problem = "there is no video in it";

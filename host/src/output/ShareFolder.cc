@@ -28,6 +28,10 @@ using clipfileModule::SmbLibrary;
 using clipfileModule::SmbSession;
 using clipfileModule::SmbStatus;
 
+using Clock = std::chrono::steady_clock;
+
+constexpr std::chrono::seconds kRestOfUnreachable{10};
+
 ReceiverError Unusable(const std::string& sentence) {
     return {ExitCode::kOutput, sentence};
 }
@@ -52,7 +56,8 @@ class ShareFolder final : public OutputFolder {
 
  private:
     /// On a connection that a server has given up since, for its age or with its restart, it is tried once
-    /// more on a new one. Returns an error number.
+    /// more on a new one. Where there is no server, later ones fail at once for a while: a run that has many
+    /// files to look at ends all the same. Returns an error number.
     int run(const std::function<int(SmbSession&)>& operation);
     int connect();
     int look(const std::string& path, SmbStatus& status);
@@ -63,6 +68,9 @@ class ShareFolder final : public OutputFolder {
     const OutputPlace place_;
     const SmbCredentials credentials_;
     std::shared_ptr<SmbSession> session_;
+    /// Of the latest attempt to connect, when that got no answer.
+    int unreachable_ = 0;
+    Clock::time_point unreachableUntil_{};
 };
 
 std::string UrlOf(const std::string& path) {
@@ -96,7 +104,12 @@ int ShareFolder::run(const std::function<int(SmbSession&)>& operation) {
     }
     if (!IsAnswer(error)) {
         session_.reset();
+        if (unreachable_ != 0 && Clock::now() < unreachableUntil_) {
+            return unreachable_;
+        }
         error = connect();
+        unreachable_ = IsAnswer(error) ? 0 : error;
+        unreachableUntil_ = Clock::now() + kRestOfUnreachable;
         error = error != 0 ? error : operation(*session_);
     }
     if (!IsAnswer(error) || (session_ != nullptr && session_->ConnectResult() != 0)) {

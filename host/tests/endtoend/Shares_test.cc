@@ -141,44 +141,70 @@ TEST_F(SharesTest, AShareOfTheSettingsStoreWithItsCredentials) {
     EXPECT_THAT(outcome.output, HasSubstr("\"problem\":null"));
 }
 
-TEST_F(SharesTest, ThePasswordComesFromEachPlaceAndIsShownNowhere) {
-    const SambaServer server;
-    const auto credentials = folder.Path() / "credentials";
-    std::filesystem::create_directory(credentials);
-    const std::string password = SambaServer::kPassword;
-    struct Source {
-        std::vector<std::string> options;
-        std::map<std::string, std::string> environment;
-    };
-    std::ofstream(credentials / "receiver.password") << password << "\n";
-    ASSERT_EQ(chmod((credentials / "receiver.password").c_str(), 0400), 0);
-    const std::vector<Source> sources = {{{"--password-file", passwordFile_}, {}},
-                                         {{"--password", password}, {}},
-                                         {{"--password=" + password}, {}},
-                                         {{}, {{"RECEIVER_PASSWORD", password}}},
-                                         {{}, {{"CREDENTIALS_DIRECTORY", credentials.string()}}}};
-    const auto variables = environment;
-    std::size_t recordings = 0;
-    for (const Source& source : sources) {
-        for (const char* const display : {"--no-drop-frame", "--json"}) {
-            environment = variables;
-            environment.insert(source.environment.begin(), source.environment.end());
-            auto options = To(Slashed(server.Path()), {"--user", SambaServer::kUser, "--log-priority", "13",
-                                                       "--speed", "2", display});
-            options.insert(options.end(), source.options.begin(), source.options.end());
-            const auto receiver = Start(options);
-            ASSERT_TRUE(receiver->WaitForText(".MP4")) << receiver->AllText();
-            const std::filesystem::path process = "/proc/" + std::to_string(receiver->Id());
-            for (const char* const file : {"cmdline", "environ"}) {
-                EXPECT_THAT(TextOf(process / file), AllOf(Not(IsEmpty()), Not(HasSubstr(password)))) << file;
-            }
-            EXPECT_EQ(receiver->Wait(), 0) << receiver->AllText();
-            EXPECT_THAT(receiver->AllText(), Not(HasSubstr(password)));
-            EXPECT_THAT(Log(), AllOf(Not(IsEmpty()), Not(HasSubstr(password))));
-            EXPECT_THAT(RecordingsIn(server.Folder()), SizeIs(++recordings));
-        }
-    }
+/// Where the password stands: PASSWORD in an option or a variable, or one of the files.
+struct PasswordPlace {
+    const char* name;
+    std::vector<std::string> options;
+    std::map<std::string, std::string> variables;
+};
+
+std::ostream& operator<<(std::ostream& out, const PasswordPlace& place) {
+    return out << place.name;
 }
+
+class PasswordPlaceTest : public SharesTest, public ::testing::WithParamInterface<PasswordPlace> {
+ protected:
+    PasswordPlaceTest() {
+        // A credential as the service manager leaves it.
+        std::ofstream(folder.Path() / "receiver.password") << SambaServer::kPassword << "\n";
+        EXPECT_EQ(chmod((folder.Path() / "receiver.password").c_str(), 0400), 0);
+    }
+    std::string Filled(std::string text) const {
+        for (const auto& [word, meaning] :
+             std::map<std::string, std::string>{{"PASSWORD", SambaServer::kPassword},
+                                                {"FILE", passwordFile_},
+                                                {"FOLDER", folder.Path().string()}}) {
+            if (const std::size_t at = text.find(word); at != std::string::npos) {
+                text.replace(at, word.size(), meaning);
+            }
+        }
+        return text;
+    }
+};
+
+TEST_P(PasswordPlaceTest, IsTakenAndShownNowhere) {
+    const SambaServer server;
+    for (const auto& [name, value] : GetParam().variables) {
+        environment[name] = Filled(value);
+    }
+    const std::string password = SambaServer::kPassword;
+    for (const char* const display : {"--no-drop-frame", "--json"}) {
+        auto options =
+            To(Slashed(server.Path()), {"--user", SambaServer::kUser, "--log-priority", "13", display});
+        for (const std::string& option : GetParam().options) {
+            options.push_back(Filled(option));
+        }
+        const auto receiver = Start(options);
+        ASSERT_TRUE(receiver->WaitForText(".MP4")) << receiver->AllText();
+        const std::filesystem::path process = "/proc/" + std::to_string(receiver->Id());
+        for (const char* const file : {"cmdline", "environ"}) {
+            EXPECT_THAT(TextOf(process / file), AllOf(Not(IsEmpty()), Not(HasSubstr(password)))) << file;
+        }
+        EXPECT_EQ(receiver->Wait(), 0) << receiver->AllText();
+        EXPECT_THAT(receiver->AllText(), Not(HasSubstr(password)));
+        EXPECT_THAT(Log(), AllOf(Not(IsEmpty()), Not(HasSubstr(password))));
+    }
+    EXPECT_THAT(RecordingsIn(server.Folder()), SizeIs(2));
+}
+
+INSTANTIATE_TEST_SUITE_P(Passwords, PasswordPlaceTest,
+                         ::testing::Values(PasswordPlace{"File", {"--password-file", "FILE"}, {}},
+                                           PasswordPlace{"Option", {"--password", "PASSWORD"}, {}},
+                                           PasswordPlace{"OptionInOneWord", {"--password=PASSWORD"}, {}},
+                                           PasswordPlace{"Variable", {}, {{"RECEIVER_PASSWORD", "PASSWORD"}}},
+                                           PasswordPlace{
+                                               "Credential", {}, {{"CREDENTIALS_DIRECTORY", "FOLDER"}}}),
+                         ::testing::PrintToStringParamName());
 
 TEST_F(SharesTest, ARefusedPasswordIsSaidBeforeAnythingIsMade) {
     const SambaServer server;

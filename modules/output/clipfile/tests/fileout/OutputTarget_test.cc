@@ -315,5 +315,15 @@ TEST_F(OutputTargetDeathTest, APathWhoseStateCannotBeReadEndsTheProcess) {
     EXPECT_DEATH(Record(), "filesystem_error");
 }
 
+TEST_F(OutputTargetTest, APathWhoseStateCannotBeReadIsCause24WithExactRules) {
+    settings.recordRules = RecordRules::kExact;
+    fs::create_symlink("20261120", dir.Path() / "20261120");
+    Record();
+    EXPECT_THAT(Statuses(), ElementsAre("7 24"));
+    const std::string path = dir.ModulePath() + "\\20261120\\Cam";
+    EXPECT_THAT(Errors(), ElementsAre("filename: Too many levels of symbolic links, " + path + ".",
+                                      "mp4 mkdir error. " + dir.ModulePath() + "."));
+}
+
 }  // namespace
 }  // namespace clipfileModule

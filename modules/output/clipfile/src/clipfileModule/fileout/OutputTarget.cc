@@ -108,8 +108,10 @@ bool FileOutput::makeOutputPath(Work& work, const OutputSettings& settings, std:
 bool FileOutput::createOutputDirectory(Work& work, const std::string& path) {
     const PlatformInterface& platform = GetPlatform();
     // Contract: anything-counts-as-directory. A file too.
-    // Contract: directory-errors-end-the-process. What looking throws is not caught.
-    if (platform.Exists(path)) {
+    // Contract: directory-errors-end-the-process. What looking throws is not caught. With exact rules it is a
+    // fault like any other: making the directory fails too.
+    const bool exact = work.settings.recordRules == RecordRules::kExact;
+    if (exact ? platform.TestExistence(path) == 0 : platform.Exists(path)) {
         return true;
     }
     boost::system::error_code error;

@@ -3,6 +3,7 @@
 #include <gtest/gtest.h>
 
 #include <cerrno>
+#include <chrono>
 #include <cstdint>
 #include <filesystem>
 #include <fstream>
@@ -23,6 +24,9 @@ namespace {
 TEST(SmbLibrary, TakesTheLockThatTheProgramOffers) {
     EXPECT_EQ(&SmbLibrary::ProcessLock(), &clipfile_smb_process_lock);
 }
+
+/// For answers on a loaded machine.
+constexpr std::chrono::seconds kPatience(30);
 
 const SmbLibrary& library() {
     std::string reason;
@@ -56,7 +60,8 @@ class SmbClientTest : public ::testing::Test {
  protected:
     std::unique_ptr<SmbClient> connect(const std::string& path) {
         auto client = std::make_unique<SmbClient>(
-            library(), parsed(path), SmbCredentials::Of(SambaServer::kUser, SambaServer::kPassword));
+            library(), parsed(path), SmbCredentials::Of(SambaServer::kUser, SambaServer::kPassword),
+            kPatience);
         EXPECT_EQ(client->Connect(), 0);
         return client;
     }
@@ -67,7 +72,7 @@ class SmbClientTest : public ::testing::Test {
 };
 
 TEST_F(SmbClientTest, FailsWithoutAConnection) {
-    SmbClient client(library(), parsed(server.Path()), {});
+    SmbClient client(library(), parsed(server.Path()), {}, kPatience);
     std::uint64_t bytes = 0;
     SMBCFILE* file = nullptr;
     SmbStatus status;
@@ -81,7 +86,7 @@ TEST_F(SmbClientTest, FailsWithoutAConnection) {
 }
 
 TEST_F(SmbClientTest, RefusesCredentialsThatTheLibraryWouldCutShort) {
-    SmbClient client(library(), parsed(server.Path()), {"", "user", std::string(256, 'x')});
+    SmbClient client(library(), parsed(server.Path()), {"", "user", std::string(256, 'x')}, kPatience);
     EXPECT_EQ(client.Connect(), EINVAL);
 }
 

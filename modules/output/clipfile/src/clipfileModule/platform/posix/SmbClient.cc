@@ -85,10 +85,11 @@ SmbCredentials SmbCredentials::Of(const std::string& userName, const std::string
     return {"", userName, password};
 }
 
-SmbClient::SmbClient(const SmbLibrary& library, const SharePath& share, const SmbCredentials& credentials)
+SmbClient::SmbClient(const SmbLibrary& library, const SharePath& share, const SmbCredentials& credentials,
+                     std::chrono::milliseconds answerTimeout)
     : library_(library), share_(share), credentials_(credentials), lost_(ENOTCONN) {
     MutexLock lock(SmbLibrary::ProcessLock());
-    context_ = makeContext();
+    context_ = makeContext(answerTimeout);
 }
 
 SmbClient::~SmbClient() {
@@ -107,7 +108,7 @@ SmbClient::~SmbClient() {
     library_.freeContext(context_, 1);
 }
 
-SMBCCTX* SmbClient::makeContext() {
+SMBCCTX* SmbClient::makeContext(std::chrono::milliseconds answerTimeout) {
     keepLibraryInitialised(library_);
     SMBCCTX* const context = library_.newContext();
     if (context == nullptr) {
@@ -115,7 +116,7 @@ SMBCCTX* SmbClient::makeContext() {
     }
     const bool ownRights = credentials_.user.empty();
     library_.setDebug(context, 0);
-    library_.setTimeout(context, kAnswerTimeoutMilliSec);
+    library_.setTimeout(context, static_cast<int>(answerTimeout.count()));
     library_.setOptionUserData(context, this);
     library_.setFunctionAuthDataWithContext(context, fillIn);
     library_.setUser(context, credentials_.user.c_str());

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <chrono>
 #include <cstddef>
 #include <cstdint>
 #include <string>
@@ -35,10 +36,9 @@ struct SmbStatus {
 /// for several of its time-outs. All return an error number, 0 for success. URLs are those of `SharePath`.
 class SmbClient {
  public:
-    /// How long libsmbclient waits for an answer.
-    static constexpr int kAnswerTimeoutMilliSec = 3000;
-
-    SmbClient(const SmbLibrary& library, const SharePath& share, const SmbCredentials& credentials);
+    /// `answerTimeout` is how long libsmbclient waits for an answer.
+    SmbClient(const SmbLibrary& library, const SharePath& share, const SmbCredentials& credentials,
+              std::chrono::milliseconds answerTimeout);
     /// Closes the files that are still open, and disconnects.
     ~SmbClient();
     SmbClient(const SmbClient&) = delete;
@@ -74,7 +74,7 @@ class SmbClient {
                              const char* workgroup, const char* user);
     static int onServerRemoved(SMBCCTX* context, SMBCSRV* server);
 
-    SMBCCTX* makeContext();
+    SMBCCTX* makeContext(std::chrono::milliseconds answerTimeout);
     int open(const std::string& url, int flags, smbc_share_mode shareMode, SMBCFILE*& file);
 
     const SmbLibrary& library_;

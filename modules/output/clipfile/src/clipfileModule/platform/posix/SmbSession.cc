@@ -9,12 +9,15 @@ namespace clipfileModule {
 
 // A job may outlive the call that gave it to the worker: it takes copies, and puts results where both look.
 
-SmbSession::SmbSession(const SmbLibrary& library, const SharePath& share, const SmbCredentials& credentials)
+SmbSession::SmbSession(const SmbLibrary& library, const SharePath& share, const SmbCredentials& credentials,
+                       const SmbLimits& limits)
     : share_(share),
       credentials_(credentials),
       worker_(
-          [&library, share, credentials] { return std::make_unique<SmbClient>(library, share, credentials); },
-          kOperationLimit, kEndLimit) {
+          [&library, share, credentials, answer = limits.answer] {
+              return std::make_unique<SmbClient>(library, share, credentials, answer);
+          },
+          limits.operation, limits.end) {
     connectResult_ = worker_.Run([](SmbClient& client) { return client.Connect(); });
 }
 

@@ -13,22 +13,28 @@ namespace clipfileModule {
 
 class SmbStream;
 
-/// The connection of one writing thread to a share, whose operations all return within `kOperationLimit`.
+/// How long somebody may be kept waiting.
+struct SmbLimits {
+    /// By an operation. A writer that is told to stop in the middle of one still ends within the time that it
+    /// is given.
+    std::chrono::milliseconds operation{3000};
+    /// By one answer of the server.
+    std::chrono::milliseconds answer{3000};
+    /// By the farewell to the server.
+    std::chrono::milliseconds end{300};
+};
+
+/// The connection of one writing thread to a share, whose operations all return within their limit.
 /// Behind it a thread of its own drives the client. Once an operation has passed the limit every later one
 /// fails with ETIMEDOUT at once, and that thread frees the connection when it can.
 ///
 /// One thread at a time uses a session and its streams. Operations return an error number, 0 for success.
 class SmbSession {
  public:
-    /// A writer that is told to stop in the middle of an operation still ends within the time that it is
-    /// given.
-    static constexpr std::chrono::milliseconds kOperationLimit{3000};
-    /// For the farewell to the server.
-    static constexpr std::chrono::milliseconds kEndLimit{300};
-
     /// Connects; `ConnectResult` tells how that went. Throws `std::system_error` when no thread can be
     /// started.
-    SmbSession(const SmbLibrary& library, const SharePath& share, const SmbCredentials& credentials);
+    SmbSession(const SmbLibrary& library, const SharePath& share, const SmbCredentials& credentials,
+               const SmbLimits& limits = {});
     SmbSession(const SmbSession&) = delete;
     SmbSession& operator=(const SmbSession&) = delete;
 

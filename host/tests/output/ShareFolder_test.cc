@@ -1,0 +1,122 @@
+#include <arpa/inet.h>
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <netinet/in.h>
+#include <sys/socket.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <filesystem>
+#include <fstream>
+
+#include "common/ReceiverError.h"
+#include "output/OutputFolder.h"
+#include "support/SambaServer.h"
+
+namespace receiver {
+namespace {
+
+using ::testing::HasSubstr;
+
+/// Takes connections, and answers nothing.
+class SilentServer {
+ public:
+    SilentServer() : socket_(socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0)) {
+        address_.sin_family = AF_INET;
+        address_.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
+        socklen_t size = sizeof address_;
+        auto* const address = reinterpret_cast<sockaddr*>(&address_);
+        EXPECT_EQ(bind(socket_, address, size), 0);
+        EXPECT_EQ(getsockname(socket_, address, &size), 0);
+        EXPECT_EQ(listen(socket_, 64), 0);
+    }
+    ~SilentServer() { close(socket_); }
+    SilentServer(const SilentServer&) = delete;
+    SilentServer& operator=(const SilentServer&) = delete;
+
+    std::string Folder() const {
+        return "//127.0.0.1:" + std::to_string(ntohs(address_.sin_port)) + "/share";
+    }
+    /// Connections since the last call.
+    int TakeConnections() const {
+        int count = 0;
+        for (int taken = 0; (taken = accept(socket_, nullptr, nullptr)) >= 0; ++count) {
+            close(taken);
+        }
+        return count;
+    }
+
+ private:
+    const int socket_;
+    sockaddr_in address_ = {};
+};
+
+OutputPlace PlaceAt(const std::string& folder) {
+    OutputPlace place;
+    place.folder = folder;
+    place.onShare = true;
+    place.user = SambaServer::kUser;
+    place.password = SambaServer::kPassword;
+    return place;
+}
+
+std::string FolderOf(const SambaServer& server) {
+    std::string folder = server.Path();
+    std::replace(folder.begin(), folder.end(), '\\', '/');
+    return folder;
+}
+
+TEST(ShareFolder, AConnectionThatTheServerHasGivenUpIsMadeAgain) {
+    SambaServer server;
+    const auto folder = OpenOutputFolder(PlaceAt(FolderOf(server)));
+    EXPECT_FALSE(folder->Prepare());
+    EXPECT_GT(folder->FreeBytes().value_or(0), 0U);
+    server.CutConnections();
+    EXPECT_GT(folder->FreeBytes().value_or(0), 0U);
+    server.Kill();
+    server.Start();
+    EXPECT_FALSE(folder->Exists(FolderOf(server) + "/none"));
+    std::ofstream(server.Folder() / "file") << "x";
+    EXPECT_TRUE(folder->Exists(FolderOf(server) + "/file"));
+}
+
+TEST(ShareFolder, AServerThatDoesNotAnswerIsLeftAloneForAWhile) {
+    const SilentServer server;
+    const auto folder = OpenOutputFolder(PlaceAt(server.Folder()));
+    EXPECT_EQ(folder->FreeBytes(), std::nullopt);
+    EXPECT_GT(server.TakeConnections(), 0);
+    for (int i = 0; i < 5; ++i) {
+        EXPECT_FALSE(folder->Exists(server.Folder() + "/file"));
+        EXPECT_NE(folder->ReadBackFile(server.Folder() + "/file").problem, "");
+    }
+    EXPECT_EQ(server.TakeConnections(), 0);
+}
+
+TEST(ShareFolder, TellsAboutItsDatedFoldersAndLeavesNothingBehind) {
+    const SambaServer server;
+    const auto folder = OpenOutputFolder(PlaceAt(FolderOf(server)));
+    EXPECT_FALSE(folder->Prepare());
+    EXPECT_TRUE(std::filesystem::is_empty(server.Folder()));
+    EXPECT_EQ(folder->Obstacle("20261121", "CAM1"), "");
+    std::filesystem::create_directories(server.Folder() / "20261121" / "CAM1");
+    EXPECT_EQ(folder->Obstacle("20261121", "CAM1"), "");
+    EXPECT_EQ(folder->Obstacle("20261121", ""), "");
+    std::ofstream(server.Folder() / "20261122") << "x";
+    EXPECT_THAT(folder->Obstacle("20261122", "CAM1"), HasSubstr("/20261122' is no folder; "));
+    std::ofstream(server.Folder() / "20261121" / "CAM2") << "x";
+    EXPECT_THAT(folder->Obstacle("20261121", "CAM2"), HasSubstr("/20261121/CAM2' is no folder; "));
+}
+
+TEST(ShareFolder, AFileThatIsNoRecordingHasAProblemAndASize) {
+    const SambaServer server;
+    std::ofstream(server.Folder() / "a.MP4") << "no recording";
+    const auto folder = OpenOutputFolder(PlaceAt(FolderOf(server)));
+    const RecordedFile file = folder->ReadBackFile(FolderOf(server) + "/a.MP4");
+    EXPECT_EQ(file.path, FolderOf(server) + "/a.MP4");
+    EXPECT_EQ(file.bytes, 12U);
+    EXPECT_EQ(file.problem, "Invalid data found when processing input");
+    EXPECT_EQ(folder->ReadBackFile(FolderOf(server) + "/b.MP4").problem, "No such file or directory");
+}
+
+}  // namespace
+}  // namespace receiver
