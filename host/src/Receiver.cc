@@ -1,6 +1,5 @@
 #include "Receiver.h"
 
-#include <stdlib.h>
 #include <sys/stat.h>
 
 #include <chrono>
@@ -11,7 +10,9 @@
 #include <utility>
 #include <vector>
 
+#include "ModuleReport.h"
 #include "Recorder.h"
+#include "RunSettings.h"
 #include "Shortfalls.h"
 #include "StreamRates.h"
 #include "module/Host.h"
@@ -35,11 +36,6 @@ constexpr std::chrono::milliseconds kDisplayInterval{250};
 /// The run ends with the frame behind the last one; when the stream has dried up, nobody waits for it.
 constexpr std::chrono::seconds kFinishPatience{2};
 
-/// A fault of the stream; the recording begins anew.
-constexpr int kStatusFault = 6;
-/// With it: the host went offline, which is how each run ends.
-constexpr int kCauseOffline = 26;
-
 constexpr const char* kOneRecording =
     "in mode on the whole run is one recording; --mode sync takes record commands";
 
@@ -51,77 +47,6 @@ std::string WithFullStop(std::string sentence) {
 void GiveToGroup() {
     const mode_t mask = umask(0077);
     umask(mask & ~static_cast<mode_t>(0070));
-}
-
-void CheckUser(const Options& options, const OutputPlace& place) {
-    if (options.user && !place.onShare) {
-        throw ReceiverError(
-            ExitCode::kUsage,
-            "--user goes with a folder on a network share, such as //server/share/folder, and "
-            "the output folder '" +
-                place.folder + "' is none.");
-    }
-}
-
-StartParameters ParametersOf(const Options& options, const OutputPlace& place,
-                             const SourceDescription& description) {
-    StartParameters parameters;
-    parameters.texts = {{"-outputPath", place.parameter},
-                        {"-fileType", options.fileType},
-                        {"-naluType", options.naluType},
-                        {"-outputMode", options.mode == OutputMode::kOn ? "on" : "sync"},
-                        {"-recordRules", "exact"}};
-    const auto add = [&](const char* key, const std::optional<std::string>& value) {
-        if (value) {
-            parameters.texts[key] = *value;
-        }
-    };
-    add("-filePrefix", options.prefix);
-    add("-userName", options.user);
-    add("-password", options.password);
-    parameters.numbers = {{"-encodedHeight", static_cast<int>(description.height)},
-                          {"-encodedWidth", static_cast<int>(description.width)},
-                          {"-encodedFPS", static_cast<int>(description.frameRate.key)}};
-    if (description.bitrate != 0) {
-        parameters.numbers["-encodedBPS"] = static_cast<int>(description.bitrate);
-    }
-    return parameters;
-}
-
-void CheckTimecode(const Options& options, const FrameRate& rate) {
-    if (!options.timecode) {
-        return;
-    }
-    if (!IsValid(*options.timecode, rate.timecodeFrames) ||
-        (options.timecode->dropFrame && !rate.dropFrame)) {
-        throw ReceiverError(ExitCode::kUsage,
-                            "--timecode " + ToString(*options.timecode) +
-                                " does not exist at the frame rate of the source, which counts " +
-                                std::to_string(rate.timecodeFrames) + " frames a second.");
-    }
-}
-
-Recorder::Settings RecorderSettings(const Options& options, const FrameRate& rate) {
-    Recorder::Settings settings;
-    settings.mode = options.mode;
-    settings.frameRate = rate;
-    settings.timecode = options.timecode;
-    settings.dropFrame = options.dropFrame;
-    if (settings.timecode && rate.dropFrame && options.dropFrame) {
-        // The rate asks for drop frame, also where the address was written with a colon.
-        settings.timecode->dropFrame = true;
-        if (!IsValid(*settings.timecode, rate.timecodeFrames)) {
-            throw ReceiverError(ExitCode::kUsage, "--timecode " + ToString(*options.timecode) +
-                                                      " is left out by the drop-frame rule; choose another "
-                                                      "one, or forbid drop frame with --no-drop-frame.");
-        }
-    }
-    if (options.seconds) {
-        settings.length = static_cast<std::int64_t>(*options.seconds * static_cast<double>(kVideoClock));
-    }
-    settings.fragments = options.fileType == "fragment";
-    settings.followDisk = !IsLive(options.source.url);
-    return settings;
 }
 
 /// A run with its module and its display.
@@ -151,20 +76,12 @@ class Running final : public SourceListenerInterface {
     void TellMissed();
     static bool QuitAsked();
     void TellLateStops(const Recorder& recorder);
-    void TakeStatuses(bool ending);
-    void TakeModuleEvents();
-    void FileClosed(const std::string& path);
     void Show(const SourceInterface& source, const Recorder& recorder);
     std::uint64_t Lost(const SourceInterface& source) const;
     Summary Summarise(const SourceInterface& source, const Recorder::Progress& past);
 
     /// The run, for the one callback that knows of no object. It comes on the thread of the run.
     static Running* current;
-
-    struct WrittenFile {
-        std::string path;
-        bool closed;
-    };
 
     const Options& options_;
     Signals& signals_;
@@ -179,13 +96,10 @@ class Running final : public SourceListenerInterface {
     /// The operator ends the run.
     bool quit_ = false;
     StreamRates rates_;
-    std::vector<WrittenFile> files_;
-    std::string openFile_;
-    std::uint64_t faults_ = 0;
+    ModuleReport report_{display_};
     std::uint64_t lateStops_ = 0;
     /// Recordings of which there is nothing.
     bool missed_ = false;
-    ModuleStatus told_;
     /// The source has become another one.
     bool changed_ = false;
     std::optional<Clock::time_point> finishSince_;
@@ -225,8 +139,7 @@ ExitCode Running::Record(const SourceOpener& open) {
         return ExitCode::kSuccess;
     }
     display_.Notice("source: " + source->Description().summary);
-    CheckTimecode(options_, source->Description().frameRate);
-    Recorder::Settings recorderSettings = RecorderSettings(options_, source->Description().frameRate);
+    Recorder::Settings recorderSettings = RecorderSettingsOf(options_, source->Description().frameRate);
 
     // Each lives as long as the module, which may still hold one that a hanging disk has kept.
     std::vector<std::unique_ptr<Host>> hosts;
@@ -253,10 +166,10 @@ ExitCode Running::Record(const SourceOpener& open) {
         recorder.NoteEnd();
         TellChanges(recorder);
         TellLateStops(recorder);
-        TakeStatuses(false);
+        report_.Tell(host_->TakeStatuses(), false);
         session.End();
-        TakeModuleEvents();
-        TakeStatuses(true);
+        report_.Tell(log.TakeEvents());
+        report_.Tell(host_->TakeStatuses(), true);
         recorderSettings.past = recorder.Past();
         plan_.Interrupt();
     } while (changed_ && !host_->Failed());
@@ -412,61 +325,10 @@ void Running::TellLateStops(const Recorder& recorder) {
         "file is closed late");
 }
 
-void Running::TakeStatuses(bool ending) {
-    for (const ModuleStatus& status : host_->TakeStatuses()) {
-        if (status.status == kStatusFault) {
-            if (ending && status.cause == kCauseOffline) {
-                continue;
-            }
-            ++faults_;
-        }
-        // The module says more than once that buffering has stopped.
-        if (status != told_) {
-            told_ = status;
-            display_.Status(status);
-        }
-    }
-}
-
-void Running::TakeModuleEvents() {
-    for (const ModuleEvent& event : log_->TakeEvents()) {
-        switch (event.kind) {
-            case ModuleEvent::Kind::kFileOpened:
-                openFile_ = event.text;
-                files_.push_back({event.text, false});
-                display_.FileOpened(event.text);
-                break;
-            case ModuleEvent::Kind::kFileClosed:
-                FileClosed(event.text);
-                break;
-            case ModuleEvent::Kind::kRecordRestarted:
-                display_.Notice("the recording begins anew after a fault");
-                break;
-            case ModuleEvent::Kind::kError:
-                display_.Notice("module log: " + event.text);
-                break;
-            case ModuleEvent::Kind::kRecordStarted:
-            case ModuleEvent::Kind::kRecordStopped:
-            case ModuleEvent::Kind::kRecordRemoved:
-                break;
-        }
-    }
-}
-
-void Running::FileClosed(const std::string& path) {
-    for (WrittenFile& file : files_) {
-        file.closed = file.closed || file.path == path;
-    }
-    if (openFile_ == path) {
-        openFile_.clear();
-    }
-    display_.FileClosed(path);
-}
-
 void Running::Show(const SourceInterface& source, const Recorder& recorder) {
     shown_ = Clock::now();
-    TakeModuleEvents();
-    TakeStatuses(false);
+    report_.Tell(log_->TakeEvents());
+    report_.Tell(host_->TakeStatuses(), false);
     Snapshot snapshot;
     snapshot.timecode = recorder.LastTimecode();
     snapshot.seconds = static_cast<double>(recorder.Elapsed()) / static_cast<double>(kVideoClock);
@@ -478,7 +340,7 @@ void Running::Show(const SourceInterface& source, const Recorder& recorder) {
     snapshot.audioKilobits = rates_.AudioKilobits();
     snapshot.klvPackets = rates_.KlvPackets();
     snapshot.status = host_->Status();
-    snapshot.file = openFile_;
+    snapshot.file = report_.OpenFile();
     snapshot.freeBytes = watch_->FreeBytes();
     snapshot.lost = Lost(source);
     display_.Show(snapshot);
@@ -499,7 +361,7 @@ Summary Running::Summarise(const SourceInterface& source, const Recorder::Progre
     run.unreached = plan_.Unreached();
     const SourceCounts counts = source.Counts();
     run.silentFrames = counts.silentFrames;
-    for (const WrittenFile& file : files_) {
+    for (const ModuleReport::WrittenFile& file : report_.Files()) {
         // One that could not be made was announced and has told why.
         if (file.closed || folder_->Exists(file.path)) {
             run.files.push_back(folder_->ReadBackFile(file.path));
@@ -515,8 +377,8 @@ Summary Running::Summarise(const SourceInterface& source, const Recorder::Progre
     summary.lost = Lost(source);
     if (host_->Failed()) {
         summary.exitCode = ExitCode::kRecordingFailed;
-    } else if (summary.lost != 0 || faults_ != 0 || lateStops_ != 0 || missed_ || !shortfalls.empty() ||
-               counts.reconnections != 0 || counts.changes != 0) {
+    } else if (summary.lost != 0 || report_.Faults() != 0 || lateStops_ != 0 || missed_ ||
+               !shortfalls.empty() || counts.reconnections != 0 || counts.changes != 0) {
         summary.exitCode = ExitCode::kLost;
     }
     return summary;

@@ -413,19 +413,6 @@ TEST_F(ReceiverTest, ATimecodeThatTheRateDoesNotHaveIsAUsageError) {
     EXPECT_EQ(Record(10), ExitCode::kUsage);
 }
 
-TEST_F(ReceiverTest, ATimecodeThatDropFrameLeavesOutIsAUsageError) {
-    const auto record = [this] {
-        auto source = std::make_unique<FakeSource>(10);
-        source->ChangeDescription().frameRate = ParseFrameRate("29.97").value();
-        return Record(std::move(source));
-    };
-    options_.timecode = Timecode{10, 1, 0, 0, false};
-    EXPECT_EQ(record(), ExitCode::kUsage);
-    EXPECT_THAT(display_.failure, HasSubstr("drop-frame rule"));
-    options_.dropFrame = false;
-    EXPECT_EQ(record(), ExitCode::kSuccess);
-}
-
 TEST_F(ReceiverTest, AUserWithoutAShareIsAUsageError) {
     options_.user = "joe";
     EXPECT_EQ(Record(10), ExitCode::kUsage);

@@ -17,6 +17,10 @@ constexpr std::int64_t kBackReordered = 90000;
 /// And what comes in the order of time, whose stamps merely jitter: this, or three units.
 constexpr std::int64_t kBack = 13500;
 
+/// Stamps that are compared with: more than the audio frames that are sent together, of which the first one
+/// alone is stamped by the sender.
+constexpr std::size_t kRecent = 32;
+
 /// How far behind the expected time a unit of `usual` ticks may stand.
 std::int64_t Back(std::int64_t usual) {
     return std::max(3 * usual, kBack);
@@ -60,6 +64,25 @@ std::optional<std::int64_t> StreamClock::StampOf(Track& track, const AVPacket& p
     track.last = UnwrapNear(raw, track.stream->pts_wrap_bits, *track.last);
     const std::int64_t stamp = av_rescale_q(*track.last, base, kTicks);
     reference_ = stamp;
+    return stamp;
+}
+
+std::optional<std::int64_t> StreamClock::NewStampOf(Track& track, const AVPacket& packet) {
+    const auto stamp = StampOf(track, packet);
+    const auto& recent = track.recent;
+    if (!stamp) {
+        return std::nullopt;
+    }
+    // Two units with one stamp are what a damaged packet leaves.
+    const bool twice = !recent.empty() && recent.back() == *stamp && !track.stands;
+    track.stands = std::find(recent.begin(), recent.end(), *stamp) != recent.end();
+    if (track.stands) {
+        return twice ? stamp : std::nullopt;
+    }
+    track.recent.push_back(*stamp);
+    if (track.recent.size() > kRecent) {
+        track.recent.pop_front();
+    }
     return stamp;
 }
 

@@ -2,6 +2,7 @@
 
 #include <chrono>
 #include <cstdint>
+#include <deque>
 #include <optional>
 
 #include "source/CodedUnits.h"
@@ -24,6 +25,10 @@ class StreamClock {
         /// Where the next packet would stand if nothing is missing, and when the last one came.
         std::int64_t expected = 0;
         std::chrono::steady_clock::time_point arrived = {};
+        /// The last stamps, unwrapped, in ticks.
+        std::deque<std::int64_t> recent = {};
+        /// The last unit had a stamp that came before.
+        bool stands = false;
     };
 
     /// `audio` may be null. `recorded`: what is read waits for us, so that its clock alone tells the time.
@@ -35,9 +40,11 @@ class StreamClock {
     /// That frame has come: it is stamped with `stamp`, and decoded `delay` before it is shown.
     void Anchor(std::int64_t stamp, std::int64_t delay);
 
-    /// The packet's stamp, unwrapped. Nothing when it has none.
-    std::optional<std::int64_t> VideoStamp(const AVPacket& packet) { return StampOf(video_, packet); }
-    std::optional<std::int64_t> AudioStamp(const AVPacket& packet) { return StampOf(*audio_, packet); }
+    /// The packet's stamp, unwrapped. Nothing when it has none, or one that the stream had a moment ago: a
+    /// clock that stands still tells nothing.
+    std::optional<std::int64_t> VideoStamp(const AVPacket& packet) { return NewStampOf(video_, packet); }
+    std::optional<std::int64_t> AudioStamp(const AVPacket& packet) { return NewStampOf(*audio_, packet); }
+    /// The same, also a stamp that comes again.
     std::optional<std::int64_t> StampOf(Track& track, const AVPacket& packet);
 
     /// Where a picture of `usual` ticks stands. It is stamped with `stamp`, if at all, and stamps follow each
@@ -52,6 +59,7 @@ class StreamClock {
     std::optional<std::int64_t> TimeNear(std::int64_t stamp, std::int64_t time) const;
 
  private:
+    std::optional<std::int64_t> NewStampOf(Track& track, const AVPacket& packet);
     std::int64_t Elapsed(Track& track, std::int64_t usual) const;
     std::int64_t TimeOf(Track& track, std::int64_t stamp, std::int64_t usual, std::int64_t back);
     void FindStep(Track& track, std::int64_t stamp);

@@ -215,6 +215,7 @@ void UnitAssembler::Finish() {
     // The last sound of a stream often ends a little before its last picture.
     if (audioBegun_ && silent > kLongestSilentEnd) {
         tally_.filled += silent;
+        silentFrames_ += silent;
     }
     CountMissingEnd(end);
     TellGaps();

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <array>
+#include <map>
 #include <utility>
 
 namespace endtoend {
@@ -9,8 +10,6 @@ namespace {
 
 /// Of the packets that a damage is for, one in so many has it.
 constexpr unsigned int kRarity = 100;
-/// Packets that a network puts into one datagram.
-constexpr std::size_t kDatagram = 7;
 constexpr unsigned char kAllBits = 0xFF;
 
 /// Below `limit`. The distributions of the library are not the same everywhere.
@@ -245,11 +244,12 @@ Damage WrapAt(double place) {
 
 Damage StandStillAt(double place, const Pids& pids) {
     return [place, pids](Pieces pieces, Random& /*random*/) {
-        std::optional<std::int64_t> last;
+        std::map<int, std::int64_t> last;
         for (std::size_t at = placeOf(pieces, place); at < pieces.size(); ++at) {
-            if (isOf(pids, pieces[at])) {
-                last = last ? last : StampOf(pieces[at]);
-                ChangeStamps(pieces[at], [&last](std::int64_t stamp) { return last.value_or(stamp); });
+            const auto stamp = StampOf(pieces[at]);
+            if (isOf(pids, pieces[at]) && stamp) {
+                const std::int64_t frozen = last.try_emplace(PidOf(pieces[at]), *stamp).first->second;
+                ChangeStamps(pieces[at], [frozen](std::int64_t) { return frozen; });
             }
         }
         return pieces;
@@ -303,10 +303,10 @@ Damage Both(Damage first, Damage second) {
 
 Pieces Interleave(const Pieces& one, const Pieces& other) {
     Pieces pieces;
-    for (std::size_t at = 0; at < std::max(one.size(), other.size()); at += kDatagram) {
+    for (std::size_t at = 0; at < std::max(one.size(), other.size()); at += kDatagramPackets) {
         for (const Pieces* const from : {&one, &other}) {
             const std::size_t begin = std::min(at, from->size());
-            const std::size_t end = std::min(at + kDatagram, from->size());
+            const std::size_t end = std::min(at + kDatagramPackets, from->size());
             pieces.insert(pieces.end(), from->begin() + static_cast<std::ptrdiff_t>(begin),
                           from->begin() + static_cast<std::ptrdiff_t>(end));
         }

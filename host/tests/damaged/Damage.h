@@ -13,6 +13,9 @@ using Random = std::mt19937;
 /// What a network, a sender or a disk does to a stream.
 using Damage = std::function<Pieces(Pieces, Random&)>;
 
+/// Packets that are sent in one datagram.
+inline constexpr std::size_t kDatagramPackets = 7;
+
 /// Packets of these PIDs; of all without any.
 using Pids = std::set<int>;
 
@@ -71,7 +74,7 @@ Damage BreakParameterSets(double place, double end);
 /// One damage behind the other.
 Damage Both(Damage first, Damage second);
 
-/// Every second stretch of seven packets, as two senders on one port do.
+/// A datagram of each in turn, as two senders on one port do.
 Pieces Interleave(const Pieces& one, const Pieces& other);
 
 }  // namespace endtoend

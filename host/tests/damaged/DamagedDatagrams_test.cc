@@ -17,8 +17,6 @@
 namespace endtoend {
 namespace {
 
-/// Packets in a datagram.
-constexpr std::size_t kDatagram = 7;
 /// What is sent, of the material's 8 seconds.
 constexpr double kShare = 0.5;
 constexpr std::chrono::seconds kLength{4};
@@ -29,7 +27,7 @@ using DatagramDamage = std::function<std::vector<Bytes>(std::vector<Bytes>, Rand
 std::vector<Bytes> Datagrams(const Pieces& pieces) {
     std::vector<Bytes> datagrams;
     for (std::size_t at = 0; at < pieces.size(); ++at) {
-        if (at % kDatagram == 0) {
+        if (at % kDatagramPackets == 0) {
             datagrams.emplace_back();
         }
         datagrams.back().insert(datagrams.back().end(), pieces[at].begin(), pieces[at].end());
@@ -53,17 +51,17 @@ void SendDatagrams(const std::vector<Bytes>& datagrams, std::uint16_t port, std:
     close(file);
 }
 
-struct Case {
+struct DatagramCase {
     const char* name;
     DatagramDamage damage;
     Expectation expected;
 };
 
-std::ostream& operator<<(std::ostream& out, const Case& parameters) {
+std::ostream& operator<<(std::ostream& out, const DatagramCase& parameters) {
     return out << parameters.name;
 }
 
-class DamagedDatagramTest : public DamagedFixture, public ::testing::WithParamInterface<Case> {};
+class DamagedDatagramTest : public DamagedFixture, public ::testing::WithParamInterface<DatagramCase> {};
 
 TEST_P(DamagedDatagramTest, AreRecordedInStepOrRefusedWithASentence) {
     const DamagedMaterial& material = DamagedMaterial::Get();
@@ -98,35 +96,36 @@ const Expectation kSentenced{.code = kUnavailable, .sentence = "the source was l
 
 INSTANTIATE_TEST_SUITE_P(
     All, DamagedDatagramTest,
-    ::testing::Values(Case{"Dropped", Rarely([](std::vector<Bytes>& all, std::size_t at) {
-                               all.erase(all.begin() + static_cast<std::ptrdiff_t>(at));
-                           }),
-                           kSentenced},
-                      Case{"Reordered", Rarely([](std::vector<Bytes>& all, std::size_t at) {
-                               std::swap(all[at], all[at + 1]);
-                           }),
-                           kSentenced},
-                      Case{"CutShort", Rarely([](std::vector<Bytes>& all, std::size_t at) {
-                               all[at].resize(all[at].size() / 3);
-                           }),
-                           kSentenced},
-                      Case{"OfAnotherProtocol",
-                           Rarely([](std::vector<Bytes>& all, std::size_t at) {
-                               all.insert(all.begin() + static_cast<std::ptrdiff_t>(at), Bytes(500, 0x11));
-                           }),
-                           {.code = kUnavailable, .sentence = "the source was lost", .pictures = 90}},
-                      Case{"OfTwoSenders",
-                           [](const std::vector<Bytes>& all, Random&) {
-                               std::vector<Bytes> both;
-                               for (std::size_t at = 0; at < all.size(); ++at) {
-                                   both.push_back(all[at]);
-                                   both.push_back(all[(at + all.size() / 2) % all.size()]);
-                               }
-                               return both;
-                           },
-                           {.code = kUnavailable,
-                            .sentence = "look for a second sender at the same address",
-                            .pictures = 0}}),
+    ::testing::Values(DatagramCase{"Dropped", Rarely([](std::vector<Bytes>& all, std::size_t at) {
+                                       all.erase(all.begin() + static_cast<std::ptrdiff_t>(at));
+                                   }),
+                                   kSentenced},
+                      DatagramCase{"Reordered", Rarely([](std::vector<Bytes>& all, std::size_t at) {
+                                       std::swap(all[at], all[at + 1]);
+                                   }),
+                                   kSentenced},
+                      DatagramCase{"CutShort", Rarely([](std::vector<Bytes>& all, std::size_t at) {
+                                       all[at].resize(all[at].size() / 3);
+                                   }),
+                                   kSentenced},
+                      DatagramCase{"OfAnotherProtocol",
+                                   Rarely([](std::vector<Bytes>& all, std::size_t at) {
+                                       all.insert(all.begin() + static_cast<std::ptrdiff_t>(at),
+                                                  Bytes(500, 0x11));
+                                   }),
+                                   {.code = kUnavailable, .sentence = "the source was lost", .pictures = 90}},
+                      DatagramCase{"OfTwoSenders",
+                                   [](const std::vector<Bytes>& all, Random&) {
+                                       std::vector<Bytes> both;
+                                       for (std::size_t at = 0; at < all.size(); ++at) {
+                                           both.push_back(all[at]);
+                                           both.push_back(all[(at + all.size() / 2) % all.size()]);
+                                       }
+                                       return both;
+                                   },
+                                   {.code = kUnavailable,
+                                    .sentence = "look for a second sender at the same address",
+                                    .pictures = 0}}),
     ::testing::PrintToStringParamName());
 
 }  // namespace

@@ -15,7 +15,7 @@ namespace {
 /// What happens to the bytes of a file.
 using FileDamage = std::function<void(Bytes&, Random&)>;
 
-struct Case {
+struct FileCase {
     const char* name;
     /// The extension chooses the container.
     const char* file;
@@ -25,7 +25,7 @@ struct Case {
     std::vector<std::string> options = {};
 };
 
-std::ostream& operator<<(std::ostream& out, const Case& parameters) {
+std::ostream& operator<<(std::ostream& out, const FileCase& parameters) {
     return out << parameters.name;
 }
 
@@ -55,7 +55,7 @@ FileDamage Hole(double begin, std::size_t size) {
     };
 }
 
-class DamagedFileTest : public DamagedFixture, public ::testing::WithParamInterface<Case> {};
+class DamagedFileTest : public DamagedFixture, public ::testing::WithParamInterface<FileCase> {};
 
 TEST_P(DamagedFileTest, IsRecordedInStepOrRefusedWithASentence) {
     const DamagedMaterial& material = DamagedMaterial::Get();
@@ -88,25 +88,25 @@ const Expectation kHole{.sentence = "the source has gaps", .pictures = 90, .dama
 INSTANTIATE_TEST_SUITE_P(
     All, DamagedFileTest,
     ::testing::Values(
-        Case{"Mp4Whole", "a.mp4", Cut(1), {.code = kEverything, .pictures = 200}},
-        Case{"Mp4WithoutItsIndex",
-             "a.mp4",
-             Cut(0.6),
-             {.code = kUnavailable, .sentence = "carries nothing that is known", .pictures = 0}},
-        Case{"Mp4Cut", "a.mp4", Cut(0.6), kCut, kIndexFirst},
-        Case{"Mp4Flipped", "a.mp4", Flip(20, 0.1), kFlipped, kIndexFirst},
-        Case{"Mp4Hole", "a.mp4", Hole(0.5, 5000), kHole, kIndexFirst},
+        FileCase{"Mp4Whole", "a.mp4", Cut(1), {.code = kEverything, .pictures = 200}},
+        FileCase{"Mp4WithoutItsIndex",
+                 "a.mp4",
+                 Cut(0.6),
+                 {.code = kUnavailable, .sentence = "carries nothing that is known", .pictures = 0}},
+        FileCase{"Mp4Cut", "a.mp4", Cut(0.6), kCut, kIndexFirst},
+        FileCase{"Mp4Flipped", "a.mp4", Flip(20, 0.1), kFlipped, kIndexFirst},
+        FileCase{"Mp4Hole", "a.mp4", Hole(0.5, 5000), kHole, kIndexFirst},
         // No header tells how long a file is that grows.
-        Case{"FragmentsCut",
-             "a.mp4",
-             Cut(0.6),
-             {.code = kEverything, .otherCode = kLost, .pictures = 90},
-             kFragments},
-        Case{"FragmentsHole", "a.mp4", Hole(0.5, 5000), kHole, kFragments},
-        Case{"MkvCut", "a.mkv", Cut(0.6), kCut}, Case{"MkvFlipped", "a.mkv", Flip(20, 0.1), kFlipped},
-        Case{"MkvHole", "a.mkv", Hole(0.5, 5000), kHole}, Case{"FlvCut", "a.flv", Cut(0.6), kCut},
-        Case{"FlvFlipped", "a.flv", Flip(20, 0.1), kFlipped},
-        Case{"FlvHole", "a.flv", Hole(0.5, 5000), kHole}),
+        FileCase{"FragmentsCut",
+                 "a.mp4",
+                 Cut(0.6),
+                 {.code = kEverything, .otherCode = kLost, .pictures = 90},
+                 kFragments},
+        FileCase{"FragmentsHole", "a.mp4", Hole(0.5, 5000), kHole, kFragments},
+        FileCase{"MkvCut", "a.mkv", Cut(0.6), kCut}, FileCase{"MkvFlipped", "a.mkv", Flip(20, 0.1), kFlipped},
+        FileCase{"MkvHole", "a.mkv", Hole(0.5, 5000), kHole}, FileCase{"FlvCut", "a.flv", Cut(0.6), kCut},
+        FileCase{"FlvFlipped", "a.flv", Flip(20, 0.1), kFlipped},
+        FileCase{"FlvHole", "a.flv", Hole(0.5, 5000), kHole}),
     ::testing::PrintToStringParamName());
 
 }  // namespace
