@@ -74,7 +74,7 @@ std::optional<std::string> PasswordOfService() {
         }
     }
     const char* const set = getenv(kPasswordVariable);
-    return set != nullptr ? std::optional<std::string>(set) : std::nullopt;
+    return set != nullptr && *set != '\0' ? std::optional<std::string>(set) : std::nullopt;
 }
 
 void HidePasswordVariable() {

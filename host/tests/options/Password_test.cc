@@ -86,6 +86,8 @@ TEST_F(PasswordTest, ThatIsNotThereIsRefused) {
 
 TEST_F(PasswordTest, ComesFromTheOptionsThenTheCredentialThenTheEnvironment) {
     EXPECT_EQ(Parsed({}), std::nullopt);
+    setenv("RECEIVER_PASSWORD", "", 1);
+    EXPECT_EQ(Parsed({}), std::nullopt);
     setenv("RECEIVER_PASSWORD", "of the environment", 1);
     EXPECT_EQ(Parsed({}), "of the environment");
     setenv("CREDENTIALS_DIRECTORY", folder_.c_str(), 1);

@@ -123,7 +123,7 @@ TEST_F(ShareRecording, AServerThatIsFrozenFromTheStartFailsTheLogonWithinItsTime
     ExpectRecorded(server.Folder());
 }
 
-TEST_F(ShareRecording, AFullShareEndsWithCause23AndAClosedFile) {
+TEST_F(ShareRecording, AFullShareEndsWithCause23AndAClosedFileAndIsUsedWhenItHasRoom) {
     constexpr std::uint64_t kMinFreeSpace = 157286400;
     constexpr std::uint64_t kRoom = 1U << 20U;
     SambaServer server(SambaServer::Shares{{"rec", {}}}, {}, [](const std::filesystem::path& folder) {
@@ -144,6 +144,16 @@ TEST_F(ShareRecording, AFullShareEndsWithCause23AndAClosedFile) {
     }
     EXPECT_THAT(failures(host), ElementsAre(Pair(7, 23)));
     EXPECT_EQ(countPrefix(log_, "no disk freespace. "), 1U);
+    ExpectRecorded(server.Folder());
+
+    for (const auto& entry : std::filesystem::directory_iterator(server.Folder())) {
+        std::filesystem::remove_all(entry);
+    }
+    log_.Clear();
+    FakeHost next;
+    setUp(next, server.Path());
+    Record(next);
+    EXPECT_THAT(failures(next), IsEmpty());
     ExpectRecorded(server.Folder());
     umount2(server.Folder().c_str(), MNT_DETACH);
 }

@@ -146,7 +146,7 @@ INSTANTIATE_TEST_SUITE_P(
                 {"filename: Permission denied, SERVER", "mp4 mkdir error. SERVER"}}),
     [](const auto& tested) { return std::string(tested.param.name); });
 
-TEST_F(ShareRecording, AServerThatIsNotThereFailsTheLogon) {
+TEST_F(ShareRecording, AServerThatIsNotThereFailsTheLogonAndIsUsedWhenItIsBack) {
     SambaServer server;
     server.Kill();
     FakeHost host;
@@ -156,6 +156,14 @@ TEST_F(ShareRecording, AServerThatIsNotThereFailsTheLogon) {
     // ECONNREFUSED is 6f.
     EXPECT_TRUE(log_.Contains("LogonUser call failed. 0, 6f, " + server.Path() + ", recorder, " +
                               SambaServer::kPassword));
+
+    server.Start();
+    log_.Clear();
+    FakeHost next;
+    setUp(next, server.Path());
+    Record(next);
+    EXPECT_THAT(failures(next), IsEmpty());
+    ExpectRecorded(server.Folder());
 }
 
 }  // namespace
