@@ -1,11 +1,10 @@
 #include <stdlib.h>
 
-#include <cstdio>
 #include <filesystem>
-#include <sstream>
 
 #include "MemoryFile.h"
-#include "Program.h"
+#include "common/ToolError.h"
+#include "recover/Recovery.h"
 
 namespace {
 
@@ -46,11 +45,12 @@ extern "C" int LLVMFuzzerInitialize(int*, char***) {
 /// The file is also the one whose parameter sets are taken, where it has some.
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
     static const OutputFolder folder;
-    const MemoryFile file(data, size);
-    std::ostringstream out;
-    clipfile::RunProgram(
-        {"clipfile", "recover", "--like", file.Path(), "--output", folder.Path().string(), file.Path()}, out,
-        out);
+    const MemoryFile memory(data, size);
+    try {
+        clipfile::RecoverFile(memory.Path(), {memory.Path(), folder.Path(), false});
+    } catch (const clipfile::ToolError&) {
+        return 0;
+    }
     folder.Clear();
     return 0;
 }

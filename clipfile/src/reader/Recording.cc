@@ -2,6 +2,7 @@
 
 #include "common/ToolError.h"
 #include "reader/BigEndian.h"
+#include "reader/FormatError.h"
 
 namespace clipfile {
 
@@ -36,6 +37,17 @@ void Complete(Recording& recording, const std::string& missing) {
     recording.completion = missing.empty() ? Completion::kClosed : Completion::kUnfinished;
 }
 
+/// Reads `moov`. One that contradicts itself counts as none: what had not reached the disk when the power
+/// went reads as zeros in many file systems.
+void TakeMovie(const InputFile& file, const Box& moov, Recording& recording) {
+    try {
+        recording.movie = ReadMovie(file, moov);
+        recording.moov = moov;
+    } catch (const FormatError& error) {
+        Complete(recording, std::string("Its 'moov' is broken. ") + error.what());
+    }
+}
+
 void ReadNormal(const InputFile& file, std::uint64_t position, Recording& recording) {
     BoxCursor cursor(file, position, file.Size());
     const auto mdat = cursor.Next();
@@ -57,10 +69,9 @@ void ReadNormal(const InputFile& file, std::uint64_t position, Recording& record
         Complete(recording, mdat->IsTorn() ? "It ends inside of its samples." : "It has no whole 'moov'.");
         return;
     }
-    recording.moov = moov;
-    recording.movie = ReadMovie(file, *moov);
     const bool followed = cursor.Next().has_value() || !cursor.Fault().empty();
     Complete(recording, followed ? "Other bytes follow its 'moov'." : "");
+    TakeMovie(file, *moov, recording);
 }
 
 /// Goes through the fragments. Returns what is missing, or nothing.
@@ -100,8 +111,10 @@ void ReadFragmented(const InputFile& file, std::uint64_t position, Recording& re
         Complete(recording, "It ends before its first fragment was written.");
         return;
     }
-    recording.moov = moov;
-    recording.movie = ReadMovie(file, *moov);
+    TakeMovie(file, *moov, recording);
+    if (!recording.movie) {
+        return;
+    }
     const auto mdat = cursor.Next();
     if (!mdat || mdat->type != FourCc("mdat")) {
         recording.dataBegin = recording.dataEnd = moov->end;

@@ -15,8 +15,7 @@ using Chunk = std::shared_ptr<clipfileModule::ChunkData>;
 class ChunkSource {
  public:
     virtual ~ChunkSource() = default;
-    /// The next chunk, which has at least one picture, or null at the end. Throws `FormatError` for tables
-    /// that contradict themselves.
+    /// The next chunk, or null at the end.
     virtual Chunk Next() = 0;
     /// Where the samples end that were given so far, or, at the end, where the good bytes end.
     virtual std::uint64_t Position() const = 0;

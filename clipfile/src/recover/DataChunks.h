@@ -30,7 +30,6 @@ class DataChunks : public ChunkSource {
     };
     struct Pictures {
         std::vector<Extent> whole;
-        std::uint64_t end = 0;
         /// The last one is not whole, or it cannot be told.
         bool isTorn = false;
     };

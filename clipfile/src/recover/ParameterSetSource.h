@@ -33,7 +33,7 @@ class LikeFile : public ParameterSetSource {
     bool isTaken_ = false;
 };
 
-/// The sets of the whole files in a folder, the newest first.
+/// The sets of the other files in a folder that have some, the newest first.
 class FolderFiles : public ParameterSetSource {
  public:
     /// `except` is the file that is recovered.

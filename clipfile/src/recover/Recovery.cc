@@ -240,6 +240,8 @@ RecoveryResult RecoverFile(const fs::path& path, const RecoveryOptions& options)
         CopyChunks(first, *source, writer, result);
     }
     CheckWritten(written.Path(), result);
+    std::error_code ignored;
+    fs::permissions(written.Path(), fs::status(path).permissions(), ignored);
     written.Keep(options.inPlace);
     result.isRecovered = true;
     result.written = target;

@@ -8,8 +8,8 @@
 namespace clipfile {
 
 struct RecoveryOptions {
-    /// A recording of the same stream, for the parameter sets of a normal file; empty for the newest whole
-    /// file in the same folder that fits.
+    /// A recording of the same stream, for the parameter sets of a normal file; empty for the newest other
+    /// file in the same folder whose sets fit.
     std::filesystem::path like;
     /// Folder for recovered files; empty for that of the original.
     std::filesystem::path output;
