@@ -9,7 +9,6 @@ namespace receiver {
 namespace {
 
 constexpr std::int64_t kChunk = 8;
-constexpr std::int64_t kAudioFrame = 1024;
 /// How long a file may grow beyond its length until an IDR frame comes in step.
 constexpr std::int64_t kPatienceSeconds = 120;
 /// Groups of which no two that follow each other are alike.

@@ -3,13 +3,10 @@
 #include <gtest/gtest.h>
 
 #include "fakes/FakeSource.h"
+#include "support/Rates.h"
 
 namespace receiver {
 namespace {
-
-FrameRate Rate(const char* text) {
-    return ParseFrameRate(text).value();
-}
 
 /// What is told of a stream whose IDR frames stand at these pictures.
 std::vector<std::string> Told(GroupWatch watch, const FrameRate& rate,

@@ -4,6 +4,7 @@
 #include <array>
 
 #include "reader/BigEndian.h"
+#include "reader/FormatError.h"
 
 namespace clipfile {
 
