@@ -11,10 +11,6 @@
 namespace receiver {
 namespace {
 
-ReceiverError Unusable(const std::string& sentence) {
-    return {ExitCode::kOutput, sentence};
-}
-
 class LocalFolder final : public OutputFolder {
  public:
     explicit LocalFolder(std::string folder) : folder_(std::move(folder)) {}

@@ -32,10 +32,6 @@ using Clock = std::chrono::steady_clock;
 
 constexpr std::chrono::seconds kRestOfUnreachable{10};
 
-ReceiverError Unusable(const std::string& sentence) {
-    return {ExitCode::kOutput, sentence};
-}
-
 /// The server has answered; anything else tells of the way to it.
 bool IsAnswer(int error) {
     constexpr std::array<int, 13> kAnswers{0,     ENOENT, EACCES, EPERM, EEXIST, ENOTDIR,     EISDIR,
