@@ -5,6 +5,7 @@
 #include <optional>
 #include <string>
 
+#include "common/ReceiverError.h"
 #include "display/FileReport.h"
 #include "output/OutputPlace.h"
 
@@ -42,6 +43,8 @@ std::unique_ptr<OutputFolder> OpenOutputFolder(const OutputPlace& place);
 std::unique_ptr<OutputFolder> OpenLocalFolder(const std::string& folder);
 std::unique_ptr<OutputFolder> OpenShareFolder(const OutputPlace& place);
 
+/// What ends the run for a folder that cannot be used.
+ReceiverError Unusable(const std::string& sentence);
 /// The sentence for a folder with less than `kMinFreeBytes`.
 std::string FullSentence(const std::string& folder, std::uint64_t freeBytes);
 /// The sentence for a folder that cannot be used, for the `reason`.
