@@ -10,8 +10,10 @@
 #include "inspect/Inspection.h"
 #include "inspect/JsonReport.h"
 #include "inspect/TextReport.h"
+#include "reader/Folder.h"
 #include "recover/Recovery.h"
 #include "recover/UnfinishedFiles.h"
+#include "verify/Verification.h"
 
 namespace clipfile {
 
@@ -26,6 +28,7 @@ struct Options {
     bool boxes = false;
     std::size_t rows = 4;
     RecoveryOptions recovery;
+    bool deep = false;
 };
 
 /// Writes one JSON value on a line. Names of files need not be UTF-8.
@@ -109,8 +112,45 @@ ExitCode Recover(const std::string& path, const Options& options, std::ostream& 
     }
     Options found = options;
     found.files = UnfinishedIn(path);
+    std::erase_if(found.files, [&](const std::string& file) { return IsRecovered(file, options.recovery); });
+    if (found.files.empty() && !options.json) {
+        out << path << " has no unfinished recording.\n";
+    }
     return ForEachFile(found, out, errors,
                        [&](const std::string& file) { return RecoverOne(file, options, out); });
+}
+
+ExitCode PrintDefects(const std::vector<Verification>& files, const Options& options, std::ostream& out) {
+    ExitCode result = ExitCode::kSuccess;
+    for (const Verification& file : files) {
+        if (options.json) {
+            PrintJson(out, {{"file", file.path.string()}, {"defects", file.defects}});
+        } else {
+            for (const std::string& defect : file.defects) {
+                out << file.path.string() << ": " << defect << '\n';
+            }
+        }
+        result = Worse(result, file.defects.empty() ? ExitCode::kSuccess : ExitCode::kDefects);
+    }
+    return result;
+}
+
+/// All files are read before any is told of: neighbours are compared.
+ExitCode Verify(const Options& options, std::ostream& out, std::ostream& errors) {
+    Options found = options;
+    found.files.clear();
+    for (const std::string& path : options.files) {
+        const bool isFolder = std::filesystem::is_directory(path);
+        const auto inside = isFolder ? FilesIn(path) : std::vector<std::string>{path};
+        found.files.insert(found.files.end(), inside.begin(), inside.end());
+    }
+    std::vector<Verification> files;
+    const ExitCode read = ForEachFile(found, out, errors, [&](const std::string& path) {
+        files.push_back(VerifyFile(path, options.deep));
+        return ExitCode::kSuccess;
+    });
+    VerifyNeighbours(files);
+    return Worse(read, PrintDefects(files, options, out));
 }
 
 void AddInspect(CLI::App& app, Options& options) {
@@ -123,6 +163,15 @@ void AddInspect(CLI::App& app, Options& options) {
     command->add_option("--rows", options.rows, "Rows of each table that --boxes shows")
         ->capture_default_str();
     command->add_flag("--json", options.json, "One JSON object a file and line");
+}
+
+CLI::App* AddVerify(CLI::App& app, Options& options) {
+    CLI::App* const command =
+        app.add_subcommand("verify", "Tell what is wrong with recordings, a line a defect.");
+    command->add_option("FILE|DIR", options.files, "Recordings, or folders with recordings")->required();
+    command->add_flag("--deep", options.deep, "Read all samples, not headers and tables alone");
+    command->add_flag("--json", options.json, "One JSON object a file and line");
+    return command;
 }
 
 CLI::App* AddRecover(CLI::App& app, Options& options) {
@@ -150,12 +199,16 @@ ExitCode RunProgram(const std::vector<std::string>& arguments, std::ostream& out
     CLI::App app("Looks into the recordings of the clipfile module.", "clipfile");
     app.require_subcommand(1);
     AddInspect(app, options);
+    const CLI::App* const verify = AddVerify(app, options);
     const CLI::App* const recover = AddRecover(app, options);
     std::vector<std::string> reversed(arguments.rbegin(), arguments.rend() - 1);
     try {
         app.parse(reversed);
     } catch (const CLI::ParseError& error) {
         return app.exit(error, out, errors) == 0 ? ExitCode::kSuccess : ExitCode::kUsage;
+    }
+    if (verify->parsed()) {
+        return Verify(options, out, errors);
     }
     return ForEachFile(options, out, errors, [&](const std::string& path) {
         return recover->parsed() ? Recover(path, options, out, errors) : InspectFile(path, options, out);

@@ -109,5 +109,50 @@ TEST_F(ProgramTest, BoxesOfARecordingNameTheirFields) {
     }
 }
 
+TEST_F(ProgramTest, DefectsAreALineEachAndACode) {
+    recordNormal("01_02_03_04.MP4");
+    EXPECT_EQ(run({"verify", path("01_02_03_04.MP4")}), ExitCode::kSuccess);
+    EXPECT_EQ(out_.str(), "");
+    recordNormal("open.MP4", false);
+    EXPECT_EQ(run({"verify", folder_.Path().string()}), ExitCode::kDefects);
+    EXPECT_EQ(
+        out_.str(),
+        path("open.MP4") + ": It is not closed. The length of its samples and 'moov' were never written.\n");
+    EXPECT_EQ(run({"verify", "--json", path("01_02_03_04.MP4"), path("missing.MP4")}), ExitCode::kUnreadable);
+    EXPECT_EQ(out_.str(), "{\"file\":\"" + path("missing.MP4") + "\",\"error\":\"" + path("missing.MP4") +
+                              " does not exist.\"}\n{\"file\":\"" + path("01_02_03_04.MP4") +
+                              "\",\"defects\":[]}\n");
+}
+
+TEST_F(ProgramTest, RecoveryTellsWhatItHasWritten) {
+    test_stream::Record(path("a.MP4"), {"fragment", clipfileModule::RecordRules::kExact, false},
+                        test_stream::MakePlainStream(32));
+    EXPECT_EQ(run({"recover", path("a.MP4")}), ExitCode::kSuccess);
+    EXPECT_EQ(out_.str(), path("a.MP4") +
+                              ": 256 pictures, 400 audio frames and 256 units of metadata are in " +
+                              path("a.recovered.MP4") + "; 0 bytes behind them belong to nothing whole.\n");
+    EXPECT_EQ(run({"recover", path("a.recovered.MP4")}), ExitCode::kSuccess);
+    EXPECT_EQ(out_.str(), path("a.recovered.MP4") + " is closed: nothing to recover.\n");
+}
+
+TEST_F(ProgramTest, RecoveryOfAFolderPassesOverWhatIsRecoveredAlready) {
+    test_stream::Record(path("a.MP4"), {"fragment", clipfileModule::RecordRules::kExact, false},
+                        test_stream::MakePlainStream(32));
+    EXPECT_EQ(run({"recover", "--json", folder_.Path().string()}), ExitCode::kSuccess);
+    EXPECT_EQ(nlohmann::json::parse(out_.str()).at("pictures"), 256);
+    EXPECT_EQ(run({"recover", folder_.Path().string()}), ExitCode::kSuccess);
+    EXPECT_EQ(out_.str(), folder_.Path().string() + " has no unfinished recording.\n");
+}
+
+TEST_F(ProgramTest, WhatCannotBeRecoveredIsToldWithTheReason) {
+    test_stream::Record(path("a.MP4"), {"fragment", clipfileModule::RecordRules::kExact, false},
+                        test_stream::MakePlainStream(1));
+    EXPECT_EQ(run({"recover", path("a.MP4")}), ExitCode::kDefects);
+    EXPECT_EQ(errors_.str(),
+              "clipfile: " + path("a.MP4") + " cannot be recovered: there is no whole picture in it.\n");
+    EXPECT_EQ(run({"recover", "--in-place", "--output", folder_.Path().string(), path("a.MP4")}),
+              ExitCode::kUsage);
+}
+
 }  // namespace
 }  // namespace clipfile

@@ -10,6 +10,7 @@
 #include <utility>
 #include <vector>
 
+#include "GroupWatch.h"
 #include "ModuleReport.h"
 #include "Recorder.h"
 #include "RunSettings.h"
@@ -97,6 +98,7 @@ class Running final : public SourceListenerInterface {
     bool quit_ = false;
     StreamRates rates_;
     ModuleReport report_{display_};
+    std::optional<GroupWatch> groups_;
     std::uint64_t lateStops_ = 0;
     /// Recordings of which there is nothing.
     bool missed_ = false;
@@ -155,6 +157,11 @@ ExitCode Running::Record(const SourceOpener& open) {
             session.GoOnline();
         }
         Recorder recorder(recorderSettings, session, log, plan_, commands_);
+        // A run that is shorter than a file has one only.
+        if (const std::int64_t minutes = FileMinutes();
+            !options_.seconds || *options_.seconds > static_cast<double>(minutes * 60)) {
+            groups_.emplace(recorderSettings.frameRate, minutes, options_.source.pictureGroup);
+        }
         try {
             Loop(*source, recorder);
         } catch (const ReceiverError& error) {
@@ -197,6 +204,9 @@ void Running::Loop(SourceInterface& source, Recorder& recorder) {
         }
         if (result == SourceInterface::Result::kUnit) {
             rates_.Count(unit);
+            if (const auto notice = groups_ ? groups_->Look(unit) : std::nullopt) {
+                display_.Notice(*notice);
+            }
             recorder.Put(std::move(unit));
         }
         if (result == SourceInterface::Result::kIdle && source.Counts().away) {

@@ -11,8 +11,6 @@
 namespace receiver {
 namespace {
 
-constexpr std::int64_t kAudioFrame = 1024;
-
 /// An access unit delimiter (ISO/IEC 14496-10 7.3.2.4): a unit that holds no picture.
 constexpr std::array<unsigned char, 6> kDelimiter{0x00, 0x00, 0x00, 0x01, 0x09, 0xF0};
 

@@ -4,6 +4,7 @@
 #include <gtest/gtest.h>
 
 #include "common/ReceiverError.h"
+#include "support/Rates.h"
 
 namespace receiver {
 namespace {
@@ -11,10 +12,6 @@ namespace {
 using ::testing::HasSubstr;
 using ::testing::Pair;
 using ::testing::UnorderedElementsAre;
-
-FrameRate Rate(const char* text) {
-    return ParseFrameRate(text).value();
-}
 
 /// The sentence of a usage error; empty when there is none.
 template <typename Action>

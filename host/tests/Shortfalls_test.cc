@@ -27,7 +27,9 @@ TEST(Shortfalls, ARunWithEverythingHasNone) {
 
 TEST(Shortfalls, ASourceWithoutAnythingToBeginWithIsToldUnlessTheOperatorEndedTheRun) {
     RunRecord run;
-    EXPECT_THAT(ShortfallsOf(run), ElementsAre("nothing was recorded: the source has sent no IDR frame"));
+    EXPECT_THAT(ShortfallsOf(run),
+                ElementsAre("nothing was recorded: the source has sent no IDR frame; set the encoder to "
+                            "closed groups of pictures, or use --transcode"));
     run.endedByOperator = true;
     EXPECT_THAT(ShortfallsOf(run), IsEmpty());
 }

@@ -18,6 +18,7 @@ void Count(const Sample& sample, TrackSummary& summary, std::uint64_t& group) {
     if (!summary.first) {
         summary.first = sample;
     }
+    summary.isEven = summary.isEven && sample.duration == summary.first->duration;
     summary.last = sample;
     ++summary.samples;
     summary.bytes += sample.size;
@@ -45,6 +46,7 @@ TrackSummary Summarize(const InputFile& file, const Recording& recording, std::s
         std::uint64_t group = 0;
         while (const auto sample = samples.Next()) {
             if (!IsThere(file, *sample)) {
+                summary.lacksSamples = true;
                 break;
             }
             Count(*sample, summary, group);

@@ -26,6 +26,10 @@ struct TrackSummary {
     double start = 0;
     std::optional<Sample> first;
     std::optional<Sample> last;
+    /// All samples have the same duration.
+    bool isEven = true;
+    /// The tables name samples that are not in the file; they are not counted.
+    bool lacksSamples = false;
 
     double Seconds() const;
 };

@@ -4,6 +4,7 @@
 #include <array>
 
 #include "reader/BigEndian.h"
+#include "reader/FormatError.h"
 
 namespace clipfile {
 
@@ -138,6 +139,16 @@ std::optional<Box> FindBox(const InputFile& file, std::uint64_t begin, std::uint
 
 std::optional<Box> FindChild(const InputFile& file, const Box& parent, std::uint32_t type) {
     return FindBox(file, parent.Payload(), parent.end, type);
+}
+
+Box RequireChild(const InputFile& file, const Box& parent, std::uint32_t type) {
+    const auto box = FindChild(file, parent, type);
+    if (!box) {
+        throw FormatError(parent.offset, "'" + FourCcText(parent.type) + "' at " +
+                                             std::to_string(parent.offset) + " lacks '" + FourCcText(type) +
+                                             "'.");
+    }
+    return *box;
 }
 
 BoxCursor Children(const InputFile& file, const Box& parent, std::uint64_t skipped) {

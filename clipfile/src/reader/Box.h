@@ -50,6 +50,8 @@ class BoxCursor {
 /// The box of this type among those in a part of a file.
 std::optional<Box> FindBox(const InputFile& file, std::uint64_t begin, std::uint64_t end, std::uint32_t type);
 std::optional<Box> FindChild(const InputFile& file, const Box& parent, std::uint32_t type);
+/// The same for a child that has to be there. Throws `FormatError` where it is not.
+Box RequireChild(const InputFile& file, const Box& parent, std::uint32_t type);
 
 /// The first child that counts, in a box whose payload begins with `skipped` bytes of fields.
 BoxCursor Children(const InputFile& file, const Box& parent, std::uint64_t skipped = 0);

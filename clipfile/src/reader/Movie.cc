@@ -15,16 +15,6 @@ constexpr std::size_t kMaxTracks = 64;
 /// The longest decoder configuration that is read: an `avcC` may have 31 sets of 65535 bytes.
 constexpr std::uint64_t kMaxConfiguration = 4 * 1024 * 1024;
 
-Box Require(const InputFile& file, const Box& parent, std::uint32_t type) {
-    const auto box = FindChild(file, parent, type);
-    if (!box) {
-        throw FormatError(parent.offset, "'" + FourCcText(parent.type) + "' at " +
-                                             std::to_string(parent.offset) + " lacks '" + FourCcText(type) +
-                                             "'.");
-    }
-    return *box;
-}
-
 /// The fields at the front of a box, from `skipped` on. Reading past them throws `FormatError`.
 class Fields {
  public:
@@ -158,25 +148,25 @@ void ReadEdit(const InputFile& file, const Box& trak, Track& track) {
 Track ReadTrack(const InputFile& file, const Box& trak) {
     Track track;
     {
-        Fields tkhd(file, Require(file, trak, FourCc("tkhd")));
+        Fields tkhd(file, RequireChild(file, trak, FourCc("tkhd")));
         tkhd.Skip(2 * TimeWidth(tkhd));
         track.id = tkhd.U32();
     }
-    const Box mdia = Require(file, trak, FourCc("mdia"));
+    const Box mdia = RequireChild(file, trak, FourCc("mdia"));
     {
-        Fields mdhd(file, Require(file, mdia, FourCc("mdhd")));
+        Fields mdhd(file, RequireChild(file, mdia, FourCc("mdhd")));
         const std::size_t width = TimeWidth(mdhd);
         mdhd.Skip(2 * width);
         track.timescale = mdhd.U32();
         track.duration = mdhd.Take(width);
     }
     {
-        Fields hdlr(file, Require(file, mdia, FourCc("hdlr")));
+        Fields hdlr(file, RequireChild(file, mdia, FourCc("hdlr")));
         hdlr.Skip(8);
         track.handler = hdlr.U32();
     }
-    const Box stbl = Require(file, Require(file, mdia, FourCc("minf")), FourCc("stbl"));
-    ReadEntry(file, Require(file, stbl, FourCc("stsd")), track);
+    const Box stbl = RequireChild(file, RequireChild(file, mdia, FourCc("minf")), FourCc("stbl"));
+    ReadEntry(file, RequireChild(file, stbl, FourCc("stsd")), track);
     ReadEdit(file, trak, track);
     track.tables = ReadSampleTables(file, stbl);
     return track;
@@ -223,7 +213,7 @@ const Track* Movie::Find(std::uint32_t handler) const {
 Movie ReadMovie(const InputFile& file, const Box& moov) {
     Movie movie;
     {
-        Fields mvhd(file, Require(file, moov, FourCc("mvhd")));
+        Fields mvhd(file, RequireChild(file, moov, FourCc("mvhd")));
         const std::size_t width = TimeWidth(mvhd);
         movie.creationTime = mvhd.Take(width);
         mvhd.Skip(width);

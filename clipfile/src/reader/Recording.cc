@@ -2,6 +2,7 @@
 
 #include "common/ToolError.h"
 #include "reader/BigEndian.h"
+#include "reader/FormatError.h"
 
 namespace clipfile {
 
@@ -36,6 +37,17 @@ void Complete(Recording& recording, const std::string& missing) {
     recording.completion = missing.empty() ? Completion::kClosed : Completion::kUnfinished;
 }
 
+/// Reads `moov`. One that contradicts itself counts as none: what had not reached the disk when the power
+/// went reads as zeros in many file systems.
+void TakeMovie(const InputFile& file, const Box& moov, Recording& recording) {
+    try {
+        recording.movie = ReadMovie(file, moov);
+        recording.moov = moov;
+    } catch (const FormatError& error) {
+        Complete(recording, std::string("Its 'moov' is broken. ") + error.what());
+    }
+}
+
 void ReadNormal(const InputFile& file, std::uint64_t position, Recording& recording) {
     BoxCursor cursor(file, position, file.Size());
     const auto mdat = cursor.Next();
@@ -57,40 +69,32 @@ void ReadNormal(const InputFile& file, std::uint64_t position, Recording& record
         Complete(recording, mdat->IsTorn() ? "It ends inside of its samples." : "It has no whole 'moov'.");
         return;
     }
-    recording.moov = moov;
-    recording.movie = ReadMovie(file, *moov);
     const bool followed = cursor.Next().has_value() || !cursor.Fault().empty();
     Complete(recording, followed ? "Other bytes follow its 'moov'." : "");
+    TakeMovie(file, *moov, recording);
 }
 
 /// Goes through the fragments. Returns what is missing, or nothing.
 std::string ReadFragments(const InputFile& file, std::uint64_t position, Recording& recording) {
     BoxCursor cursor(file, position, file.Size());
-    bool hasFragment = false;
+    bool isDataNext = false;  // the samples of the fragment before
     while (const auto box = cursor.Next()) {
-        switch (box->type) {
-            case FourCc("moof"):
-                if (box->IsTorn()) {
-                    recording.brokenFragment = box;
-                    return "It ends inside of the index of fragment " +
-                           std::to_string(recording.fragmentCount + 1) + ".";
-                }
-                hasFragment = true;
-                ++recording.fragmentCount;
-                break;
-            case FourCc("mdat"):
-                if (box->IsTorn() && hasFragment) {
-                    return "It ends inside of the samples of fragment " +
-                           std::to_string(recording.fragmentCount) + ".";
-                }
-                break;
-            case FourCc("mfra"):
-                if (!box->IsTorn()) {
-                    recording.fragmentIndex = box;
-                }
-                break;
-            default:
-                return "What stands at " + std::to_string(box->offset) + " is no part of a recording.";
+        const std::string number = std::to_string(recording.fragmentCount + (isDataNext ? 0 : 1));
+        if (box->type == FourCc("moof") && !isDataNext) {
+            if (box->IsTorn()) {
+                return "It ends inside of the index of fragment " + number + ".";
+            }
+            ++recording.fragmentCount;
+            isDataNext = true;
+        } else if (box->type == FourCc("mdat") && isDataNext) {
+            if (box->IsTorn()) {
+                return "It ends inside of the samples of fragment " + number + ".";
+            }
+            isDataNext = false;
+        } else if (box->type == FourCc("mfra") && !isDataNext && !recording.fragmentIndex) {
+            recording.fragmentIndex = box->IsTorn() ? std::nullopt : box;
+        } else {
+            return "What stands at " + std::to_string(box->offset) + " is no part of a recording.";
         }
     }
     if (!cursor.Fault().empty()) {
@@ -107,8 +111,10 @@ void ReadFragmented(const InputFile& file, std::uint64_t position, Recording& re
         Complete(recording, "It ends before its first fragment was written.");
         return;
     }
-    recording.moov = moov;
-    recording.movie = ReadMovie(file, *moov);
+    TakeMovie(file, *moov, recording);
+    if (!recording.movie) {
+        return;
+    }
     const auto mdat = cursor.Next();
     if (!mdat || mdat->type != FourCc("mdat")) {
         recording.dataBegin = recording.dataEnd = moov->end;

@@ -27,20 +27,19 @@ struct Recording {
     Completion completion = Completion::kUnfinished;
     /// Why it is not closed, as a sentence; empty when it is.
     std::string reason;
-    /// Nothing when the file has no whole `moov`.
+    /// Nothing when the file has no whole `moov`, or one that contradicts itself.
     std::optional<Movie> movie;
     std::optional<Box> moov;
     /// Sample bytes of a normal file, or of the part that `moov` of a fragmented one describes.
     std::uint64_t dataBegin = 0;
     std::uint64_t dataEnd = 0;
-    /// Whole `moof` boxes, and the one that is torn or broken, if any.
+    /// `moof` boxes that are whole.
     std::uint64_t fragmentCount = 0;
-    std::optional<Box> brokenFragment;
     std::optional<Box> fragmentIndex;  // mfra
 };
 
 /// Reads how a file is built, box headers and `moov` alone. Throws `ToolError` with one sentence for a file
-/// that is no MP4 file, and for one that is no recording; `FormatError` when `moov` is there and broken.
+/// that is no MP4 file, and for one that is no recording.
 Recording ReadRecording(const InputFile& file);
 
 /// Goes through the `moof` boxes behind the first `mdat` that are whole, and stops at the first that is not.

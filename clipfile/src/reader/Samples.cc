@@ -12,15 +12,6 @@ namespace {
 constexpr std::uint64_t kFullHeader = 4;     // version, flags
 constexpr std::uint64_t kCountedHeader = 8;  // and entry_count
 
-Box Require(const InputFile& file, const Box& stbl, std::uint32_t type) {
-    const auto box = FindChild(file, stbl, type);
-    if (!box) {
-        throw FormatError(stbl.offset, "The tables at " + std::to_string(stbl.offset) + " lack '" +
-                                           FourCcText(type) + "'.");
-    }
-    return *box;
-}
-
 /// The number at a place of a box that has to have it.
 std::uint32_t NumberAt(const InputFile& file, const Box& box, std::uint64_t at) {
     if (box.PayloadSize() < at + 4) {
@@ -48,10 +39,10 @@ bool HasOffsets(const InputFile& file, const Box& ctts) {
 
 SampleTables ReadSampleTables(const InputFile& file, const Box& stbl) {
     SampleTables tables;
-    tables.times = CountedTable(file, Require(file, stbl, FourCc("stts")), 8);
-    tables.chunks = CountedTable(file, Require(file, stbl, FourCc("stsc")), 12);
+    tables.times = CountedTable(file, RequireChild(file, stbl, FourCc("stts")), 8);
+    tables.chunks = CountedTable(file, RequireChild(file, stbl, FourCc("stsc")), 12);
 
-    const Box sizes = Require(file, stbl, FourCc("stsz"));
+    const Box sizes = RequireChild(file, stbl, FourCc("stsz"));
     tables.constantSize = NumberAt(file, sizes, kFullHeader);
     tables.sampleCount = NumberAt(file, sizes, kFullHeader + 4);
     if (tables.constantSize == 0) {
@@ -60,7 +51,7 @@ SampleTables ReadSampleTables(const InputFile& file, const Box& stbl) {
     if (const auto wide = FindChild(file, stbl, FourCc("co64"))) {
         tables.chunkOffsets = CountedTable(file, *wide, 8);
     } else {
-        tables.chunkOffsets = CountedTable(file, Require(file, stbl, FourCc("stco")), 4);
+        tables.chunkOffsets = CountedTable(file, RequireChild(file, stbl, FourCc("stco")), 4);
     }
     if (const auto sync = FindChild(file, stbl, FourCc("stss"))) {
         tables.syncSamples = CountedTable(file, *sync, 4);

@@ -8,6 +8,10 @@
 
 namespace clipfile {
 
+/// Bytes of a chunk, above which it is none of a recording: eight pictures at the highest bit rates have 20
+/// MB.
+inline constexpr std::uint64_t kMaxChunk = 256 * 1024 * 1024;
+
 using Chunk = std::shared_ptr<clipfileModule::ChunkData>;
 
 /// The chunks of a recording in the order of the file, up to where it is torn. The last one may be shorter:
@@ -15,8 +19,7 @@ using Chunk = std::shared_ptr<clipfileModule::ChunkData>;
 class ChunkSource {
  public:
     virtual ~ChunkSource() = default;
-    /// The next chunk, which has at least one picture, or null at the end. Throws `FormatError` for tables
-    /// that contradict themselves.
+    /// The next chunk, or null at the end.
     virtual Chunk Next() = 0;
     /// Where the samples end that were given so far, or, at the end, where the good bytes end.
     virtual std::uint64_t Position() const = 0;

@@ -3,9 +3,9 @@
 #include <algorithm>
 #include <array>
 
+#include "media/NalUnits.h"
 #include "reader/BigEndian.h"
 #include "reader/MetadataUnit.h"
-#include "recover/NalUnits.h"
 
 namespace clipfile {
 
@@ -19,6 +19,7 @@ constexpr std::size_t kMaxUnit = 8 * 1024 * 1024;
 constexpr std::uint32_t kMaxNalUnit = 64 * 1024 * 1024;
 constexpr std::size_t kMaxUnits = 4096;
 constexpr std::size_t kMaxAudioFrames = 4096;
+constexpr std::size_t kMaxPictures = 4096;
 /// Audio that is decoded at a time: two chunks at 128 kbit/s.
 constexpr std::size_t kAudioBatch = 8 * 1024;
 constexpr std::uint64_t kTimecodeSize = 4;
@@ -152,6 +153,7 @@ std::size_t DataChunks::AudioFrameAt(std::uint64_t offset) {
 }
 
 std::optional<DataChunks::Pictures> DataChunks::FindPictures(std::uint64_t offset, std::size_t units) {
+    const std::uint64_t begin = offset;
     Pictures pictures;
     Extent picture = {offset, 0, false};
     std::size_t slices = 0;  // of `picture`
@@ -167,6 +169,9 @@ std::optional<DataChunks::Pictures> DataChunks::FindPictures(std::uint64_t offse
     bool isCut = false;      // inside of a NAL unit
     bool endsEarly = false;  // the last picture may lack slices
     while (offset < end_ && !IsKeyAt(offset)) {
+        if (pictures.whole.size() == kMaxPictures || offset - begin > kMaxChunk) {
+            return std::nullopt;
+        }
         const Bytes head = At(offset, kNalLengthSize + kNalHeadSize);
         if (head.size() < kNalLengthSize + kNalHeadSize) {
             // The timecode sample, or the rest of a NAL unit.
@@ -208,7 +213,6 @@ std::optional<DataChunks::Pictures> DataChunks::FindPictures(std::uint64_t offse
         endPicture(offset);
     }
     PairFields(pictures, units);
-    pictures.end = offset;
     pictures.isTorn = isCut || lacksSlices || !IsKeyAt(offset);
     if (pictures.whole.empty() || !(endsWell || pictures.whole.size() == units)) {
         return std::nullopt;

@@ -5,9 +5,9 @@
 #include <optional>
 #include <vector>
 
+#include "media/Decoders.h"
 #include "reader/InputFile.h"
 #include "recover/ChunkSource.h"
-#include "recover/Decoders.h"
 
 namespace clipfile {
 
@@ -30,7 +30,6 @@ class DataChunks : public ChunkSource {
     };
     struct Pictures {
         std::vector<Extent> whole;
-        std::uint64_t end = 0;
         /// The last one is not whole, or it cannot be told.
         bool isTorn = false;
     };

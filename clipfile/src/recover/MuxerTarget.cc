@@ -20,11 +20,11 @@ struct Target {
     int error = 0;
 };
 
-Target target;
+Target currentTarget;
 
 MbxStatus Note(MbxStatus status) {
-    if (status != MBX_OK && target.error == 0) {
-        target.error = errno;
+    if (status != MBX_OK && currentTarget.error == 0) {
+        currentTarget.error = errno;
     }
     return status;
 }
@@ -43,7 +43,7 @@ MbxStatus OpenFile(const char*, std::uint32_t, MbxFile** file) {
         return MBX_ERR_NO_MEMORY;
     }
     // Never over a file that is there.
-    cell->stream = std::fopen(target.path.c_str(), "w+bxe");
+    cell->stream = std::fopen(currentTarget.path.c_str(), "w+bxe");
     if (cell->stream == nullptr) {
         std::free(cell);
         return Note(MBX_ERR_IO);
@@ -57,7 +57,7 @@ class TargetPlatform : public clipfileModule::PlatformInterface {
  public:
     std::chrono::system_clock::time_point Now() const override { return {}; }
     clipfileModule::LocalTime ToLocalTime(std::chrono::system_clock::time_point) const override {
-        return target.opened;
+        return currentTarget.opened;
     }
     std::string NativePath(const std::string& path) const override { return path; }
     int AvailableSpace(const std::string&, std::uint64_t&) const override { return ENOSYS; }
@@ -83,15 +83,15 @@ clipfileModule::LocalTime FromParts(const std::tm& parts) {
 }  // namespace
 
 MuxerTarget::MuxerTarget(const std::filesystem::path& path, const clipfileModule::LocalTime& opened) {
-    target = {path, opened, 0};
+    currentTarget = {path, opened, 0};
 }
 
 MuxerTarget::~MuxerTarget() {
-    target = {};
+    currentTarget = {};
 }
 
 int MuxerTarget::Error() const {
-    return target.error;
+    return currentTarget.error;
 }
 
 clipfileModule::LocalTime FromMp4Time(std::uint64_t seconds) {

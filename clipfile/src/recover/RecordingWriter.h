@@ -5,12 +5,12 @@
 #include <memory>
 
 #include "controller/OutputSettings.h"
+#include "media/ParameterSets.h"
 #include "mp4/Mp4Muxer.h"
 #include "reader/MetadataUnit.h"
 #include "reader/Recording.h"
 #include "recover/ChunkSource.h"
 #include "recover/MuxerTarget.h"
-#include "recover/ParameterSets.h"
 
 namespace clipfile {
 

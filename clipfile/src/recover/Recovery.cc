@@ -13,6 +13,7 @@
 #include "common/ToolError.h"
 #include "reader/BigEndian.h"
 #include "recover/DataChunks.h"
+#include "recover/ParameterSetSource.h"
 #include "recover/RecordingWriter.h"
 #include "recover/TableChunks.h"
 
@@ -201,6 +202,10 @@ void CheckWritten(const fs::path& path, const RecoveryResult& result) {
 
 }  // namespace
 
+bool IsRecovered(const fs::path& path, const RecoveryOptions& options) {
+    return !options.inPlace && fs::exists(TargetOf(path, options));
+}
+
 RecoveryResult RecoverFile(const fs::path& path, const RecoveryOptions& options) {
     const InputFile file(path);
     const FileLock lock(path);
@@ -210,7 +215,7 @@ RecoveryResult RecoverFile(const fs::path& path, const RecoveryOptions& options)
         return result;
     }
     const fs::path target = TargetOf(path, options);
-    if (!options.inPlace && fs::exists(target)) {
+    if (IsRecovered(path, options)) {
         throw ToolError(ExitCode::kUnreadable, target.string() + " is there already.");
     }
 
@@ -235,6 +240,8 @@ RecoveryResult RecoverFile(const fs::path& path, const RecoveryOptions& options)
         CopyChunks(first, *source, writer, result);
     }
     CheckWritten(written.Path(), result);
+    std::error_code ignored;
+    fs::permissions(written.Path(), fs::status(path).permissions(), ignored);
     written.Keep(options.inPlace);
     result.isRecovered = true;
     result.written = target;

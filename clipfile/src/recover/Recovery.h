@@ -8,8 +8,8 @@
 namespace clipfile {
 
 struct RecoveryOptions {
-    /// A recording of the same stream, for the parameter sets of a normal file; empty for the newest whole
-    /// file in the same folder that fits.
+    /// A recording of the same stream, for the parameter sets of a normal file; empty for the newest other
+    /// file in the same folder whose sets fit.
     std::filesystem::path like;
     /// Folder for recovered files; empty for that of the original.
     std::filesystem::path output;
@@ -38,5 +38,8 @@ struct RecoveryResult {
 /// file is still being recorded, or when the new one is there already or cannot be written. Nothing is left
 /// behind then.
 RecoveryResult RecoverFile(const std::filesystem::path& path, const RecoveryOptions& options);
+
+/// Whether there is a file already where the recovered one would go.
+bool IsRecovered(const std::filesystem::path& path, const RecoveryOptions& options);
 
 }  // namespace clipfile

@@ -3,16 +3,13 @@
 #include <algorithm>
 #include <array>
 
+#include "media/NalUnits.h"
 #include "reader/BigEndian.h"
 #include "reader/FormatError.h"
-#include "recover/NalUnits.h"
 
 namespace clipfile {
 
 namespace {
-
-/// Above this a sample is none of a recording; pictures at the highest bit rates have a few megabytes.
-constexpr std::uint32_t kMaxSample = 256 * 1024 * 1024;
 
 /// Whether the sample ends in the zeros that go on behind it. No NAL unit ends with one (ISO/IEC
 /// 14496-10 7.4.1).
@@ -62,9 +59,7 @@ TableChunks::TableChunks(const InputFile& file, const Recording& recording, cons
       recording_(recording),
       clock_(clock),
       cursor_(file, recording),
-      position_(recording.dataBegin) {
-    EnterMovie();
-}
+      position_(recording.dataBegin) {}
 
 TableChunks::~TableChunks() = default;
 
@@ -106,6 +101,19 @@ bool TableChunks::EnterFragment() {
 }
 
 Chunk TableChunks::Next() {
+    try {
+        return Take();
+    } catch (const FormatError&) {
+        // Tables may be broken where their bytes never reached the disk. What came before them is good.
+        isTorn_ = true;
+        return nullptr;
+    }
+}
+
+Chunk TableChunks::Take() {
+    if (part_ == nullptr) {
+        EnterMovie();
+    }
     while (!isTorn_) {
         const auto runs = TakeRuns();
         if (!runs) {
@@ -152,9 +160,9 @@ bool TableChunks::ReadSample(Medium medium, const Sample& sample, clipfileModule
     if (sample.offset > file_.Size() || sample.size > file_.Size() - sample.offset) {
         return false;
     }
-    if (sample.size > kMaxSample) {
-        throw FormatError(sample.offset, "A sample has " + std::to_string(sample.size) +
-                                             " bytes, more than a recording has.");
+    chunk.size += sample.size;
+    if (chunk.size > kMaxChunk) {
+        throw FormatError(sample.offset, "A chunk has more bytes than any of a recording.");
     }
     std::vector<unsigned char> bytes = file_.Read(sample.offset, sample.size);
     // A file system may give back zeros for what it had not written yet when the power went.

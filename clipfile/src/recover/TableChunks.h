@@ -10,7 +10,7 @@
 namespace clipfile {
 
 /// The chunks of a file that has a `moov`, by its tables and those of its fragments. It ends at the first
-/// sample that is not whole.
+/// sample that is not whole, and where the tables contradict themselves.
 class TableChunks : public ChunkSource {
  public:
     /// `file` and `recording`, which has a movie, must outlive it.
@@ -25,6 +25,7 @@ class TableChunks : public ChunkSource {
     enum Medium : std::size_t { kMeta, kAudio, kVideo, kMediumCount };
     struct Part;
 
+    Chunk Take();
     static std::optional<Medium> MediumOf(const Track& track);
     void EnterMovie();
     bool EnterFragment();

@@ -1,8 +1,8 @@
 #include "recover/UnfinishedFiles.h"
 
-#include <algorithm>
 #include <exception>
 
+#include "reader/Folder.h"
 #include "reader/Recording.h"
 
 namespace clipfile {
@@ -20,17 +20,8 @@ bool IsUnfinished(const std::filesystem::path& path) {
 }  // namespace
 
 std::vector<std::string> UnfinishedIn(const std::filesystem::path& folder) {
-    std::vector<std::string> files;
-    std::error_code error;
-    const auto options = std::filesystem::directory_options::skip_permission_denied;
-    for (auto entry = std::filesystem::recursive_directory_iterator(folder, options, error);
-         entry != std::filesystem::recursive_directory_iterator(); entry.increment(error)) {
-        if (entry->path().extension() == ".MP4" && entry->is_regular_file(error) &&
-            IsUnfinished(entry->path())) {
-            files.push_back(entry->path().string());
-        }
-    }
-    std::sort(files.begin(), files.end());
+    std::vector<std::string> files = FilesIn(folder);
+    std::erase_if(files, [](const std::string& path) { return !IsUnfinished(path); });
     return files;
 }
 

@@ -135,7 +135,7 @@ TEST_F(InspectionTest, TheTextNamesTracksTimecodesAndProfile) {
                              "  video     avc1, 1920x1080, High level 4.0, 29.97 frames/s, 16 pictures in 2 "
                              "chunks, 1 of them IDR, "
                              "at most 16 apart, 8 kbit/s\n"
-                             "  audio     mp4a, 48000 Hz, 2 channels, 26 frames, 2 kbit/s\n"
+                             "  audio     mp4a, 48000 Hz, 2 channels, 25 frames, 2 kbit/s\n"
                              "  timecode  tmcd, 30 frames a second, drop frame\n"
                              "  metadata  rtmd, 16 units, 28 kbit/s\n"
                              "  start     audio +0.0 ms, metadata +0 frames from the first picture\n"

@@ -6,6 +6,11 @@
 #include "support/ByteFile.h"
 
 namespace clipfile {
+
+void PrintTo(const BoxLayout& layout, std::ostream* out) {
+    *out << layout.type;
+}
+
 namespace {
 
 using byte_file::ByteFile;

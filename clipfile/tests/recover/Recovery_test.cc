@@ -5,6 +5,7 @@
 #include <fstream>
 
 #include "recover/RecoveryFixture.h"
+#include "support/BoxFinder.h"
 #include "support/CodedMedia.h"
 
 namespace clipfile {
@@ -118,6 +119,33 @@ TEST_F(RecoveryTest, ANormalFileWhoseEndNeverReachedTheDiskIsCutThere) {
         std::filesystem::remove(recovered());
         EXPECT_EQ(RecoverFile(original(), {like(), {}, false}).pictures, 19U) << zeros;
     }
+}
+
+TEST_F(RecoveryTest, ABrokenIndexOfANormalFileIsMadeAgain) {
+    recordUnfinished(MakeCodedStream(2));
+    auto bytes = ReadAll(like());
+    std::fill(bytes.end() - 800, bytes.end(), static_cast<unsigned char>(0));
+    WriteAll(original(), bytes);
+    RecoverFile(original(), {like(), {}, false});
+    EXPECT_EQ(WithoutTimes(recovered()), WithoutTimes(like()));
+}
+
+TEST_F(RecoveryTest, AFragmentWhoseIndexIsBrokenEndsTheFile) {
+    Record(original(), {"fragment", kExact, false}, MakePlainStream(96));
+    auto bytes = ReadAll(original());
+    const auto moof = box_finder::Find(bytes, "moof:2");
+    // The track of its first `tfhd`: moof, mfhd, traf, tfhd, version and flags.
+    bytes[moof.offset + 8 + 16 + 8 + 8 + 4 + 3] = 99;
+    WriteAll(original(), bytes);
+    EXPECT_EQ(RecoverFile(original(), {}).pictures, 512U);
+}
+
+TEST_F(RecoveryTest, TheRecoveredFileIsForThoseWhoMayReadTheOriginal) {
+    Record(original(), {"fragment", kExact, false}, MakePlainStream(32));
+    const auto mode = std::filesystem::perms::owner_read | std::filesystem::perms::owner_write;
+    std::filesystem::permissions(original(), mode);
+    RecoverFile(original(), {});
+    EXPECT_EQ(std::filesystem::status(recovered()).permissions(), mode);
 }
 
 TEST_F(RecoveryTest, AClosedFileIsLeftAlone) {

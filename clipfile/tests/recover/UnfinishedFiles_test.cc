@@ -13,10 +13,10 @@ TEST(UnfinishedFiles, AreRecordingsThatAreNotClosed) {
     const std::filesystem::path day = folder.Path() / "20261121" / "CAM1";
     std::filesystem::create_directories(day);
     const test_stream::Stream stream = test_stream::MakePlainStream(1);
-    constexpr auto kExact = clipfileModule::RecordRules::kExact;
-    test_stream::Record(day / "closed.MP4", {"normal", kExact, true}, stream);
-    test_stream::Record(day / "b.MP4", {"normal", kExact, false}, stream);
-    test_stream::Record(folder.Path() / "a.MP4", {"fragment", kExact, false}, stream);
+    constexpr auto kRules = clipfileModule::RecordRules::kExact;
+    test_stream::Record(day / "closed.MP4", {"normal", kRules, true}, stream);
+    test_stream::Record(day / "b.MP4", {"normal", kRules, false}, stream);
+    test_stream::Record(folder.Path() / "a.MP4", {"fragment", kRules, false}, stream);
     test_stream::WriteAll(day / "other.MP4", {1, 2, 3});
     EXPECT_EQ(UnfinishedIn(folder.Path()),
               (std::vector<std::string>{(day / "b.MP4").string(), (folder.Path() / "a.MP4").string()}));

@@ -35,10 +35,10 @@ nal_access::NalUnit Nal(const Data& bytes) {
     return unit;
 }
 
-/// Audio frames that begin before a chunk: 1024 samples each, against 8 pictures of 1001 / 30000 s.
+/// Audio frames in front of a chunk: those that begin at least half a frame before it does.
 std::size_t AudioBefore(std::size_t chunk) {
-    const std::uint64_t samples = chunk * kPicturesInChunk * 1001 * 48000 / 30000;
-    return static_cast<std::size_t>((samples + 1023) / 1024);
+    const std::uint64_t begin = chunk * kPicturesInChunk * 1001 * 48000 / 30000;
+    return begin < 512 ? 0 : static_cast<std::size_t>((begin - 512) / 1024 + 1);
 }
 
 clipfileModule::OutputSettings Settings(std::uint32_t width, std::uint32_t height) {

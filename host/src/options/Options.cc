@@ -121,7 +121,7 @@ void CheckEmpty(const CLI::App& app) {
 /// Options that are right by themselves and contradict each other.
 void CheckTogether(const CLI::App& app, const Options& options) {
     const bool encodes = options.source.url == "test:" || options.source.transcode;
-    for (const char* const name : {"--fps", "--size", "--bitrate", "--gop"}) {
+    for (const char* const name : {"--fps", "--size", "--bitrate"}) {
         if (!encodes && app.count(name) != 0) {
             throw Wrong(std::string(name) +
                         " has no effect on a source that is recorded as it is: it goes with --input test: or "
@@ -149,8 +149,8 @@ void AddSourceOptions(CLI::App& app, Options& options, Texts& texts) {
     const auto group = "Source";
     app.add_option(
            "-i,--input", options.source.url,
-           "Address as FFmpeg writes it (udp://, srt://, rtsp://, http://, an .sdp file for RTP), a file, "
-           "or test: for a picture and a tone")
+           "Address as FFmpeg writes it (udp://, srt://, rtsp://, rtmp://, http://, with .m3u8 for HLS, an "
+           ".sdp file for RTP), a file, or test: for a picture and a tone")
         ->type_name("URL")
         ->capture_default_str()
         ->group(group);
@@ -188,8 +188,10 @@ void AddSourceOptions(CLI::App& app, Options& options, Texts& texts) {
         ->type_name("KBITS")
         ->capture_default_str()
         ->group("test: and --transcode");
-    app.add_option("--gop", options.source.pictureGroup,
-                   "Frames from one IDR frame to the next; as many as in a second when not given")
+    app.add_option(
+           "--gop", options.source.pictureGroup,
+           "Frames from one IDR frame to the next: encoded ones, as many as in a second when not given; of "
+           "a source that is recorded as it is what it sends, judged at once and not when measured")
         ->check(CLI::Range(1u, 600u))
         ->type_name("FRAMES")
         ->group("test: and --transcode");

@@ -32,20 +32,23 @@ bool LocalFolder::Prepare() {
     if (status.type() == std::filesystem::file_type::not_found) {
         made = std::filesystem::create_directory(folder_, error);
         if (!made) {
-            throw Unusable("the output folder '" + folder_ + "' does not exist and cannot be made: " +
-                           error.message() + "; make it, or see that its disk is mounted.");
+            throw ReceiverError(ExitCode::kOutput,
+                                "the output folder '" + folder_ + "' does not exist and cannot be made: " +
+                                    error.message() + "; make it, or see that its disk is mounted.");
         }
     } else if (status.type() != std::filesystem::file_type::directory) {
-        throw Unusable("the output folder '" + folder_ + "' is no folder" +
-                       (error ? ": " + error.message() : std::string()) + "; --output names another one.");
+        throw ReceiverError(ExitCode::kOutput, "the output folder '" + folder_ + "' is no folder" +
+                                                   (error ? ": " + error.message() : std::string()) +
+                                                   "; --output names another one.");
     }
     if (access(folder_.c_str(), W_OK | X_OK) != 0) {
-        throw Unusable("the output folder '" + folder_ + "' is not writable: " + std::strerror(errno) +
-                       "; change its rights, or name another one with --output.");
+        throw ReceiverError(ExitCode::kOutput, "the output folder '" + folder_ +
+                                                   "' is not writable: " + std::strerror(errno) +
+                                                   "; change its rights, or name another one with --output.");
     }
     const std::optional<std::uint64_t> free = FreeBytes();
     if (free && *free < kMinFreeBytes) {
-        throw Unusable(FullSentence(folder_, *free));
+        throw ReceiverError(ExitCode::kOutput, FullSentence(folder_, *free));
     }
     return made;
 }

@@ -23,6 +23,12 @@ std::string Stored(const char* key) {
 
 }  // namespace
 
+std::int64_t FileMinutes() {
+    constexpr unsigned int kUsual = 120;
+    unsigned int minutes = 0;
+    return QxRegistry::GetInstance()->getValue(kSection, "MP4MaxFileSize", minutes) ? minutes : kUsual;
+}
+
 std::string ModulePath(std::string path) {
     std::replace(path.begin(), path.end(), '/', '\\');
     return path;

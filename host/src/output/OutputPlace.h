@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstdint>
 #include <string>
 
 #include "options/Options.h"
@@ -24,6 +25,9 @@ struct OutputPlace {
 /// The module's rules, with an output of our own where it would refuse: start parameters, else settings
 /// store. Throws `ReceiverError` with `kUsage` for a path of a share that names none.
 OutputPlace PlaceOf(const Options& options);
+
+/// Minutes after which a file is followed by another, by the module's rules: of the settings store, else 120.
+std::int64_t FileMinutes();
 
 /// A path as the module has it, for a folder or a file of an `OutputPlace`.
 std::string ModulePath(std::string path);

@@ -79,9 +79,10 @@ int ShareFolder::connect() {
     std::string reason;
     const SmbLibrary* const library = SmbLibrary::Get(reason);
     if (library == nullptr) {
-        throw Unusable("the output folder '" + place_.folder +
-                       "' is on a share, and libsmbclient cannot be " + "loaded: " + reason +
-                       "; install it (Debian: libsmbclient0).");
+        throw ReceiverError(ExitCode::kOutput, "the output folder '" + place_.folder +
+                                                   "' is on a share, and libsmbclient cannot be " +
+                                                   "loaded: " + reason +
+                                                   "; install it (Debian: libsmbclient0).");
     }
     SharePath share;
     SharePath::Parse(ModulePath(place_.folder), share);
@@ -126,14 +127,17 @@ void ShareFolder::expectConnection() {
             return;
         case EACCES:
         case EPERM:
-            throw Unusable(named + (place_.user.empty() ? "refuses who has no name; --user gives one."
-                                                        : "refuses the user name or the password; --user and "
-                                                          "--password-file give others."));
+            throw ReceiverError(
+                ExitCode::kOutput,
+                named + (place_.user.empty() ? "refuses who has no name; --user gives one."
+                                             : "refuses the user name or the password; --user and "
+                                               "--password-file give others."));
         case ENOENT:
-            throw Unusable(named + "does not exist; --output names another one.");
+            throw ReceiverError(ExitCode::kOutput, named + "does not exist; --output names another one.");
         default:
-            throw Unusable(named + "cannot be reached: " + std::strerror(error) +
-                           "; see that its server runs, and takes connections from here.");
+            throw ReceiverError(ExitCode::kOutput,
+                                named + "cannot be reached: " + std::strerror(error) +
+                                    "; see that its server runs, and takes connections from here.");
     }
 }
 
@@ -142,7 +146,7 @@ bool ShareFolder::makeWhereMissing() {
     SmbStatus status;
     int error = look(place_.folder, status);
     if (error == 0 && !status.isFolder) {
-        throw Unusable(named + "is no folder; --output names another one.");
+        throw ReceiverError(ExitCode::kOutput, named + "is no folder; --output names another one.");
     }
     if (error != ENOENT) {
         // Folders that may not be looked at can have room for files.
@@ -154,8 +158,9 @@ bool ShareFolder::makeWhereMissing() {
         error = run([&](SmbSession& session) { return session.CreateDirectories(UrlOf(place_.folder)); });
     }
     if (error != 0) {
-        throw Unusable(named + "does not exist and cannot be made: " + std::strerror(error) +
-                       "; make it, or name another one with --output.");
+        throw ReceiverError(ExitCode::kOutput,
+                            named + "does not exist and cannot be made: " + std::strerror(error) +
+                                "; make it, or name another one with --output.");
     }
     return true;
 }
@@ -174,8 +179,9 @@ void ShareFolder::expectWritable() {
         return failure;
     });
     if (error != 0) {
-        throw Unusable("the output folder '" + place_.folder + "' is not writable: " + std::strerror(error) +
-                       "; change its rights, or name another one with --output.");
+        throw ReceiverError(ExitCode::kOutput, "the output folder '" + place_.folder +
+                                                   "' is not writable: " + std::strerror(error) +
+                                                   "; change its rights, or name another one with --output.");
     }
 }
 
@@ -184,7 +190,7 @@ bool ShareFolder::Prepare() {
     const bool made = makeWhereMissing();
     const std::optional<std::uint64_t> free = FreeBytes();
     if (free && *free < kMinFreeBytes) {
-        throw Unusable(FullSentence(place_.folder, *free));
+        throw ReceiverError(ExitCode::kOutput, FullSentence(place_.folder, *free));
     }
     expectWritable();
     return made;

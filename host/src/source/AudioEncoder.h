@@ -2,13 +2,12 @@
 
 #include "source/CodedUnits.h"
 #include "source/Libav.h"
+#include "source/SourceInterface.h"
 
 namespace receiver {
 
 inline constexpr int kAudioRate = 48000;
 inline constexpr int kAudioChannels = 2;
-/// Samples of an audio frame.
-inline constexpr int kAudioFrame = 1024;
 
 /// `frame` behind an ADTS header for AAC LC, 48 kHz, stereo (ISO/IEC 14496-3 1.A.2), without CRC.
 std::shared_ptr<unsigned char> WithAdtsHeader(const unsigned char* frame, std::size_t size);

@@ -46,6 +46,8 @@ bool IsRecordedConfig(const std::uint8_t* config, int size) {
 }
 
 constexpr const char* kAudioChanged = "the audio is no longer AAC LC 48 kHz stereo";
+/// What aac_frame_length can tell.
+constexpr std::size_t kLongestAdtsFrame = 8191;
 /// Frames in a row, of another format or undecodable, that are more than damage.
 constexpr std::uint64_t kForeign = 3;
 constexpr int kUndecodable = 50;
@@ -103,9 +105,11 @@ void AudioPass::Push(const AVPacket& packet, const AudioSink& sink) {
     if (*headers_ && size != FrameLength(packet)) {
         // Cut short, as the last frame of a stream that breaks off is.
         ++damaged_;
+    } else if (size == 0 || size + kAdtsHeader > kLongestAdtsFrame) {
+        ++damaged_;
     } else if (*headers_) {
         sink({libav::Share(packet), size, time});
-    } else if (size > 0) {
+    } else {
         sink({WithAdtsHeader(packet.data, size), size + kAdtsHeader, time});
     }
 }

@@ -13,8 +13,18 @@ constexpr AVRational kTicks{1, 90000};
 constexpr std::size_t kLongestWait = 4000;
 /// Pictures without an IDR frame among them after which the operator is told.
 constexpr std::uint64_t kWithoutStart = 300;
+/// Packets of a new stream, while none of the one before comes, that show a medium to have moved.
+constexpr int kMoved = 25;
 /// What came between the first picture and the first IDR frame is counted on no further than this.
 constexpr std::int64_t kLongestCount = std::int64_t{3600} * 90000;
+
+/// False for a stream of which the tables tell and nothing has come.
+bool HasBegun(const AVStream& stream) {
+    const AVCodecParameters& parameters = *stream.codecpar;
+    return parameters.codec_type == AVMEDIA_TYPE_VIDEO   ? parameters.width > 0
+           : parameters.codec_type == AVMEDIA_TYPE_AUDIO ? parameters.sample_rate > 0
+                                                         : true;
+}
 
 }  // namespace
 
@@ -46,7 +56,8 @@ void Connection::Choose(const SourceOptions& options) {
             audio_ = stream;
         } else if (stream->codecpar->codec_id == AV_CODEC_ID_SMPTE_KLV) {
             klv_.push_back({stream});
-        } else if (choice.audio >= 0 || stream->codecpar->codec_type != AVMEDIA_TYPE_AUDIO) {
+        } else if (HasBegun(*stream) &&
+                   (choice.audio >= 0 || stream->codecpar->codec_type != AVMEDIA_TYPE_AUDIO)) {
             stream->discard = AVDISCARD_ALL;
         }
     }
@@ -57,6 +68,19 @@ void Connection::CheckOther(const AVPacket& packet) {
     if (audio_ == nullptr && stream.codecpar->codec_type == AVMEDIA_TYPE_AUDIO &&
         avcodec_find_decoder(stream.codecpar->codec_id) != nullptr && input_->AskFor(stream.id)) {
         throw FormatChanged("audio has begun");
+    }
+    // Streams that had begun are no longer read. The tables of a programme may move a medium to another one.
+    const bool video = stream.codecpar->codec_type == AVMEDIA_TYPE_VIDEO;
+    const bool audio = audio_ != nullptr && stream.codecpar->codec_type == AVMEDIA_TYPE_AUDIO;
+    if (video && newPictures_ == 0) {
+        newPosition_ = packet.pos;
+    }
+    if (video && ++newPictures_ >= kMoved) {
+        position_ = newPosition_;
+        throw FormatChanged("the video moved to another stream");
+    }
+    if (audio && ++newSounds_ >= kMoved) {
+        throw FormatChanged("the audio moved to another stream");
     }
 }
 
@@ -126,6 +150,8 @@ StreamClock::Track* Connection::KlvTrackOf(const AVPacket& packet) {
 
 void Connection::Handle(AVPacket& packet) {
     const bool audio = IsOf(packet, audio_);
+    newPictures_ = IsOf(packet, video_) ? 0 : newPictures_;
+    newSounds_ = audio ? 0 : newSounds_;
     if (IsOf(packet, video_)) {
         HandleVideo(packet);
     } else if (!audio && KlvTrackOf(packet) == nullptr) {

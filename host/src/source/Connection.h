@@ -50,7 +50,7 @@ class Connection {
     bool Flushing() const { return input_->TimedOut(); }
     /// When the first picture came.
     Clock::time_point Arrived() const { return ahead_.arrived; }
-    /// Byte at which the last packet stood in the input, -1 when not known.
+    /// Byte of the input at which what was not used begins, -1 when not known.
     std::int64_t Position() const { return position_; }
 
     /// Packets that could not be used, and were left out.
@@ -59,7 +59,7 @@ class Connection {
  private:
     void Choose(const SourceOptions& options);
     void ReadTimecodeTag();
-    /// Throws `FormatChanged` when it is of audio that was not there before.
+    /// Throws `FormatChanged` when it is of audio that was not there before, or of what ours has become.
     void CheckOther(const AVPacket& packet);
     bool NextPacket();
     void Handle(AVPacket& packet);
@@ -99,6 +99,11 @@ class Connection {
     std::uint64_t damaged_ = 0;
     std::uint64_t withoutStart_ = 0;
     std::int64_t position_ = -1;
+    /// Packets of new streams since the last of our own.
+    int newPictures_ = 0;
+    /// Of the first of these.
+    std::int64_t newPosition_ = -1;
+    int newSounds_ = 0;
 };
 
 }  // namespace receiver

@@ -17,6 +17,8 @@ namespace {
 
 /// What finding out may take beyond the time-out: the libraries look at up to 7 seconds of a stream.
 constexpr double kAnalysis = 10;
+/// Segments of a playlist come every ten seconds or so, and nothing in between.
+constexpr double kSegments = 30;
 /// Packets that may come when a wait is over.
 constexpr int kLongestDrain = 100;
 /// Seconds that a file may end before the length that its header tells.
@@ -89,12 +91,6 @@ Input::Input(const std::string& url, double timeout, double patience, std::share
     : url_(url), timeout_(timeout), patience_(patience), interrupt_(std::move(interrupt)), stop_(stop) {
     Open();
     stop_ = nullptr;
-    const bool seekable = format_->pb != nullptr && (format_->pb->seekable & AVIO_SEEKABLE_NORMAL) != 0;
-    const std::string format = format_->iformat->name;
-    recorded_ = (seekable && format != "sdp") ||
-                (format == "hls" && format_->duration != AV_NOPTS_VALUE && format_->duration > 0);
-    transport_ = format == "mpegts" || format == "hls";
-    rtp_ = format == "sdp" || format == "rtsp" || format == "rtp";
     Alive();
 }
 
@@ -144,7 +140,22 @@ void Input::Open() {
     }
     format_.reset(format);
     opened_ = std::chrono::steady_clock::now();
+    Classify();
     FindStreams();
+}
+
+void Input::Classify() {
+    const std::string_view format = format_->iformat->name;
+    const bool seekable = format_->pb != nullptr && (format_->pb->seekable & AVIO_SEEKABLE_NORMAL) != 0;
+    transport_ = format == "mpegts" || format == "hls";
+    rtp_ = format == "sdp" || format == "rtsp" || format == "rtp";
+    if (format == "hls") {
+        // A playlist that is complete has a length; one that still grows is a file all the same.
+        recorded_ = format_->duration != AV_NOPTS_VALUE && format_->duration > 0;
+        timeout_ = std::max(timeout_, kSegments);
+    } else {
+        recorded_ = seekable && format != "sdp";
+    }
 }
 
 void Input::FindStreams() {

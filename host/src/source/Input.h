@@ -37,9 +37,9 @@ class Stopped : public std::runtime_error {
 class Input {
  public:
     /// Opens `url` and finds out what it carries. `patience`: seconds that it may take to answer. `timeout`:
-    /// seconds that may pass later between two calls of `Alive`. `stop` may be null; it is asked until this
-    /// returns. Throws `ReceiverError` (`kSourceUnavailable`), of it `SourceAbsent` where a later attempt may
-    /// succeed, and `Stopped`.
+    /// seconds that may pass later between two calls of `Alive`, 30 at the least for HLS. `stop` may be null;
+    /// it is asked until this returns. Throws `ReceiverError` (`kSourceUnavailable`), of it `SourceAbsent`
+    /// where a later attempt may succeed, and `Stopped`.
     Input(const std::string& url, double timeout, double patience, std::shared_ptr<Interrupt> interrupt,
           bool (*stop)());
 
@@ -76,6 +76,8 @@ class Input {
     bool Expired();
     AVFormatContext* NewFormat();
     void Open();
+    /// Finds out what kind of source this is, from what the address and its first bytes tell.
+    void Classify();
     void FindStreams();
     void CarryOn(std::int64_t position);
     int ReadFrame(AVPacket& packet);
@@ -88,7 +90,7 @@ class Input {
     [[noreturn]] void FailOpening(int result);
 
     const std::string url_;
-    const double timeout_;
+    double timeout_;
     const double patience_;
     const std::shared_ptr<Interrupt> interrupt_;
     /// Null once the source is open.

@@ -21,6 +21,8 @@ constexpr std::size_t kPictures = 25;
 constexpr std::size_t kLongest = 4000;
 /// How long the sender's first report is waited for, which RTP's senders give every five seconds or so.
 constexpr std::chrono::seconds kReportPatience{6};
+/// What the packets that are looked at may span, in ticks.
+constexpr std::int64_t kLongestSpan = std::int64_t{60} * 90000;
 /// What takes longer to read had not come yet; what the libraries hold is there at once.
 constexpr std::chrono::milliseconds kHeld{2};
 
@@ -35,8 +37,12 @@ class ArrivalWatch {
             return;
         }
         first_ = first_.value_or(packet.pts);
-        const auto since = std::chrono::microseconds(av_rescale_q(packet.pts - *first_, base, {1, 1000000}));
-        arrived_ = std::min(arrived_.value_or(now), now - since);
+        arrived_ = arrived_.value_or(now);
+        const std::int64_t ticks = av_rescale_q(packet.pts - *first_, base, kTicks);
+        // A clock that leaps tells nothing.
+        if (ticks > 0 && ticks < kLongestSpan) {
+            arrived_ = std::min(*arrived_, now - std::chrono::microseconds(ticks * 100 / 9));
+        }
     }
     /// `opened` is when the input answered, which its first bytes make it do, but for those of RTP.
     Clock::time_point Arrived(Clock::time_point opened, bool rtp) const {

@@ -16,6 +16,8 @@ enum class Medium { kVideo, kAudio, kKlv };
 /// Clock rates of the media, as the module wants its timestamps: ticks a second.
 inline constexpr std::int64_t kVideoClock = 90000;
 inline constexpr std::int64_t kAudioClock = 48000;
+/// Samples of an audio frame, each a tick of its clock.
+inline constexpr int kAudioFrame = 1024;
 
 /// Where pictures lie further apart than this, in ticks of 90000, a recording ends, and another one begins.
 inline constexpr std::int64_t kLongestStep = kVideoClock / 2;

@@ -17,9 +17,10 @@ constexpr std::int64_t kBackReordered = 90000;
 /// And what comes in the order of time, whose stamps merely jitter: this, or three units.
 constexpr std::int64_t kBack = 13500;
 
-/// Stamps that are compared with: more than the audio frames that are sent together, of which the first one
-/// alone is stamped by the sender.
-constexpr std::size_t kRecent = 32;
+/// Stamps that are compared with: that of the picture before, and as many audio frames as are mostly sent
+/// together, of which the first one alone is stamped by the sender.
+constexpr std::size_t kRecentPictures = 1;
+constexpr std::size_t kRecentSounds = 16;
 
 /// How far behind the expected time a unit of `usual` ticks may stand.
 std::int64_t Back(std::int64_t usual) {
@@ -67,7 +68,15 @@ std::optional<std::int64_t> StreamClock::StampOf(Track& track, const AVPacket& p
     return stamp;
 }
 
-std::optional<std::int64_t> StreamClock::NewStampOf(Track& track, const AVPacket& packet) {
+std::optional<std::int64_t> StreamClock::VideoStamp(const AVPacket& packet) {
+    return NewStampOf(video_, packet, kRecentPictures);
+}
+
+std::optional<std::int64_t> StreamClock::AudioStamp(const AVPacket& packet) {
+    return NewStampOf(*audio_, packet, kRecentSounds);
+}
+
+std::optional<std::int64_t> StreamClock::NewStampOf(Track& track, const AVPacket& packet, std::size_t kept) {
     const auto stamp = StampOf(track, packet);
     const auto& recent = track.recent;
     if (!stamp) {
@@ -80,7 +89,7 @@ std::optional<std::int64_t> StreamClock::NewStampOf(Track& track, const AVPacket
         return twice ? stamp : std::nullopt;
     }
     track.recent.push_back(*stamp);
-    if (track.recent.size() > kRecent) {
+    if (track.recent.size() > kept) {
         track.recent.pop_front();
     }
     return stamp;

@@ -42,8 +42,8 @@ class StreamClock {
 
     /// The packet's stamp, unwrapped. Nothing when it has none, or one that the stream had a moment ago: a
     /// clock that stands still tells nothing.
-    std::optional<std::int64_t> VideoStamp(const AVPacket& packet) { return NewStampOf(video_, packet); }
-    std::optional<std::int64_t> AudioStamp(const AVPacket& packet) { return NewStampOf(*audio_, packet); }
+    std::optional<std::int64_t> VideoStamp(const AVPacket& packet);
+    std::optional<std::int64_t> AudioStamp(const AVPacket& packet);
     /// The same, also a stamp that comes again.
     std::optional<std::int64_t> StampOf(Track& track, const AVPacket& packet);
 
@@ -59,7 +59,7 @@ class StreamClock {
     std::optional<std::int64_t> TimeNear(std::int64_t stamp, std::int64_t time) const;
 
  private:
-    std::optional<std::int64_t> NewStampOf(Track& track, const AVPacket& packet);
+    std::optional<std::int64_t> NewStampOf(Track& track, const AVPacket& packet, std::size_t kept);
     std::int64_t Elapsed(Track& track, std::int64_t usual) const;
     std::int64_t TimeOf(Track& track, std::int64_t stamp, std::int64_t usual, std::int64_t back);
     void FindStep(Track& track, std::int64_t stamp);

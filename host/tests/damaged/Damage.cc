@@ -295,12 +295,6 @@ Damage BreakParameterSets(double place, double end) {
     });
 }
 
-Damage Both(Damage first, Damage second) {
-    return [first = std::move(first), second = std::move(second)](Pieces pieces, Random& random) {
-        return second(first(std::move(pieces), random), random);
-    };
-}
-
 Pieces Interleave(const Pieces& one, const Pieces& other) {
     Pieces pieces;
     for (std::size_t at = 0; at < std::max(one.size(), other.size()); at += kDatagramPackets) {

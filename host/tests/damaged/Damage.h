@@ -71,9 +71,6 @@ Damage EmptyUnits(int pid);
 /// Inverts the sequence parameter sets from `place` to `end`.
 Damage BreakParameterSets(double place, double end);
 
-/// One damage behind the other.
-Damage Both(Damage first, Damage second);
-
 /// A datagram of each in turn, as two senders on one port do.
 Pieces Interleave(const Pieces& one, const Pieces& other);
 

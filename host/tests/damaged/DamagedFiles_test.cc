@@ -37,7 +37,7 @@ FileDamage Cut(double share) {
 }
 
 /// So many bytes become others, from that share of the file on.
-FileDamage Flip(std::size_t count, double begin) {
+FileDamage FlipBytes(std::size_t count, double begin) {
     return [count, begin](Bytes& bytes, Random& random) {
         const auto from = static_cast<std::size_t>(begin * static_cast<double>(bytes.size()));
         for (std::size_t hit = 0; hit < count; ++hit) {
@@ -87,26 +87,28 @@ const Expectation kHole{.sentence = "the source has gaps", .pictures = 90, .dama
 
 INSTANTIATE_TEST_SUITE_P(
     All, DamagedFileTest,
-    ::testing::Values(
-        FileCase{"Mp4Whole", "a.mp4", Cut(1), {.code = kEverything, .pictures = 200}},
-        FileCase{"Mp4WithoutItsIndex",
-                 "a.mp4",
-                 Cut(0.6),
-                 {.code = kUnavailable, .sentence = "carries nothing that is known", .pictures = 0}},
-        FileCase{"Mp4Cut", "a.mp4", Cut(0.6), kCut, kIndexFirst},
-        FileCase{"Mp4Flipped", "a.mp4", Flip(20, 0.1), kFlipped, kIndexFirst},
-        FileCase{"Mp4Hole", "a.mp4", Hole(0.5, 5000), kHole, kIndexFirst},
-        // No header tells how long a file is that grows.
-        FileCase{"FragmentsCut",
-                 "a.mp4",
-                 Cut(0.6),
-                 {.code = kEverything, .otherCode = kLost, .pictures = 90},
-                 kFragments},
-        FileCase{"FragmentsHole", "a.mp4", Hole(0.5, 5000), kHole, kFragments},
-        FileCase{"MkvCut", "a.mkv", Cut(0.6), kCut}, FileCase{"MkvFlipped", "a.mkv", Flip(20, 0.1), kFlipped},
-        FileCase{"MkvHole", "a.mkv", Hole(0.5, 5000), kHole}, FileCase{"FlvCut", "a.flv", Cut(0.6), kCut},
-        FileCase{"FlvFlipped", "a.flv", Flip(20, 0.1), kFlipped},
-        FileCase{"FlvHole", "a.flv", Hole(0.5, 5000), kHole}),
+    ::testing::Values(FileCase{"Mp4Whole", "a.mp4", Cut(1), {.code = kEverything, .pictures = 200}},
+                      FileCase{
+                          "Mp4WithoutItsIndex",
+                          "a.mp4",
+                          Cut(0.6),
+                          {.code = kUnavailable, .sentence = "carries nothing that is known", .pictures = 0}},
+                      FileCase{"Mp4Cut", "a.mp4", Cut(0.6), kCut, kIndexFirst},
+                      FileCase{"Mp4Flipped", "a.mp4", FlipBytes(20, 0.1), kFlipped, kIndexFirst},
+                      FileCase{"Mp4Hole", "a.mp4", Hole(0.5, 5000), kHole, kIndexFirst},
+                      // No header tells how long a file is that grows.
+                      FileCase{"FragmentsCut",
+                               "a.mp4",
+                               Cut(0.6),
+                               {.code = kEverything, .otherCode = kLost, .pictures = 90},
+                               kFragments},
+                      FileCase{"FragmentsHole", "a.mp4", Hole(0.5, 5000), kHole, kFragments},
+                      FileCase{"MkvCut", "a.mkv", Cut(0.6), kCut},
+                      FileCase{"MkvFlipped", "a.mkv", FlipBytes(20, 0.1), kFlipped},
+                      FileCase{"MkvHole", "a.mkv", Hole(0.5, 5000), kHole},
+                      FileCase{"FlvCut", "a.flv", Cut(0.6), kCut},
+                      FileCase{"FlvFlipped", "a.flv", FlipBytes(20, 0.1), kFlipped},
+                      FileCase{"FlvHole", "a.flv", Hole(0.5, 5000), kHole}),
     ::testing::PrintToStringParamName());
 
 }  // namespace

@@ -148,6 +148,10 @@ INSTANTIATE_TEST_SUITE_P(
         StreamCase{"NoiseInside", NoiseAt(0.5, 1000), kUnharmed},
         StreamCase{"MuchNoiseInside", NoiseAt(0.5, 300000), kUnharmed},
         StreamCase{"PacketCutInside", CutAt(0.5, 100), {.sentence = kGaps, .pictures = 195}},
+        // Comes again, and is recorded again. Sound and picture are cut at two places there.
+        StreamCase{"Repeated",
+                   Repeat(0.4, 0.45),
+                   {.sentence = kGaps, .pictures = 195, .damaged = 15, .outOfStep = 0.022}},
         StreamCase{"PacketCutInFront", CutAt(0, 100), kUnharmed},
         // That the last picture is not whole, nobody can know.
         StreamCase{"EndInsideAPacket", EndAt(0.5), {.code = kEverything, .pictures = 95, .damaged = 1}},

@@ -21,7 +21,6 @@ using ::testing::HasSubstr;
 using ::testing::IsEmpty;
 using ::testing::SizeIs;
 
-constexpr int kOutputUnusable = 6;
 constexpr uid_t kNobody = 65534;
 
 mode_t ModeOf(const std::filesystem::path& path) {
@@ -76,7 +75,7 @@ TEST_F(DatedFoldersTest, ThoseOfTodayAndTomorrowHaveToBeOpenBeforeTheRun) {
     for (const int days : {0, 1}) {
         MakeClosed(Dated(days));
         const Outcome outcome = RunProgram(Command({"--seconds", "1"}), environment);
-        EXPECT_EQ(outcome.code, kOutputUnusable) << outcome.errors;
+        EXPECT_EQ(outcome.code, kOutput) << outcome.errors;
         EXPECT_THAT(outcome.errors,
                     AllOf(HasSubstr("receiver: the folder '" + Dated(days).string() + "' cannot be entered"),
                           HasSubstr("--group-write"), EndsWith(".\n")));
@@ -89,7 +88,7 @@ TEST_F(DatedFoldersTest, OneThatOthersMakeDuringTheRunEndsItBeforeItsFirstFile) 
     Process receiver(Command({"--record", "600-"}), environment);
     ASSERT_TRUE(receiver.WaitForText("source: ")) << receiver.AllText();
     MakeClosed(Dated(0));
-    EXPECT_EQ(receiver.Wait(), kOutputUnusable) << receiver.AllText();
+    EXPECT_EQ(receiver.Wait(), kOutput) << receiver.AllText();
     EXPECT_THAT(receiver.Errors(), HasSubstr("' cannot be entered: Permission denied; "));
 }
 
@@ -98,7 +97,7 @@ TEST_F(DatedFoldersTest, OneThatIsClosedDuringARecordingEndsItWithItsFileWhole) 
     ASSERT_TRUE(WaitFor([this] { return !Recordings().empty(); })) << receiver.AllText();
     const auto dated = Dated(0);
     ASSERT_EQ(chmod(dated.c_str(), 0), 0);
-    EXPECT_EQ(receiver.Wait(), kOutputUnusable) << receiver.AllText();
+    EXPECT_EQ(receiver.Wait(), kOutput) << receiver.AllText();
     ASSERT_EQ(chmod(dated.c_str(), 0700), 0);
     const auto recordings = Recordings();
     ASSERT_THAT(recordings, SizeIs(1));

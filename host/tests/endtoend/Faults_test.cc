@@ -93,7 +93,7 @@ TEST_F(FaultsTest, WithoutReconnectionALostSourceEndsTheRun) {
     MaterialOptions options;
     options.seconds = 2;
     const Sent sent(MakeMaterial(folder, options));
-    const auto receiver = Start({"--input", "udp://127.0.0.1:" + port, "--timeout", "2", "--no-reconnect",
+    const auto receiver = Start({"--input", "udp://127.0.0.1:" + port, "--timeout", "8", "--no-reconnect",
                                  "--timecode", "10:00:00:00"});
     ASSERT_TRUE(WaitUntilBound(ports.First())) << receiver->AllText();
     const auto sender = SendTransportStream(sent.file, "udp://127.0.0.1:" + port + "?pkt_size=1316");

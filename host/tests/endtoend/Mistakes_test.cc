@@ -23,7 +23,6 @@ constexpr int kUsage = 2;
 constexpr int kSourceUnavailable = 3;
 constexpr int kSourceUnsuitable = 4;
 constexpr int kModule = 5;
-constexpr int kOutput = 6;
 
 /// The last line that the program said.
 std::string LastLine(std::string text) {

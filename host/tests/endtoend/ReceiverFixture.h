@@ -15,6 +15,9 @@
 
 namespace endtoend {
 
+/// The exit code of a run that can write nothing to its output folder.
+inline constexpr int kOutput = 6;
+
 /// Runs the program as its users do, from the outside alone.
 class ReceiverFixture : public ::testing::Test {
  protected:

@@ -27,7 +27,6 @@ using ::testing::Not;
 using ::testing::SizeIs;
 using ::testing::StartsWith;
 
-constexpr int kOutput = 6;
 constexpr int kRecordingFailed = 7;
 
 std::string TextOf(const std::filesystem::path& file) {

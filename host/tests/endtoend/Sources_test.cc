@@ -161,5 +161,23 @@ INSTANTIATE_TEST_SUITE_P(
                    "mkv"}),
     ::testing::PrintToStringParamName());
 
+using GroupsTest = ReceiverFixture;
+
+TEST_F(GroupsTest, IdrFramesThatNeverMeetTheCadenceAreTold) {
+    MaterialOptions options;
+    options.rate = "24000/1001";
+    options.pictureGroup = 25;
+    const auto material = MakeMaterial(folder, options);
+    const Outcome outcome =
+        RunReceiver({"--input", material.string(), "--speed", "8", "--max-minutes", "60"});
+    EXPECT_EQ(outcome.code, 0) << outcome.errors;
+    EXPECT_THAT(outcome.errors, HasSubstr("meet every 533.9 s only"));
+    EXPECT_THAT(outcome.errors, HasSubstr("set the encoder to groups of 24 pictures"));
+    // At 62 minutes they meet in time.
+    const Outcome other = RunReceiver({"--input", material.string(), "--speed", "8", "--max-minutes", "62"});
+    EXPECT_EQ(other.code, 0) << other.errors;
+    EXPECT_EQ(other.errors.find("meet every"), std::string::npos) << other.errors;
+}
+
 }  // namespace
 }  // namespace endtoend

@@ -12,7 +12,6 @@
 namespace endtoend {
 namespace {
 
-using ::testing::HasSubstr;
 using ::testing::SizeIs;
 
 class StalledOutputTest : public ReceiverFixture {

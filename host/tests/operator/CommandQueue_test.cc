@@ -6,12 +6,13 @@
 #include <string>
 #include <thread>
 
+#include "support/Ticks.h"
+
 namespace receiver {
 namespace {
 
 using ::testing::ElementsAre;
 
-constexpr std::int64_t kFrame = 3600;
 constexpr std::int64_t kGroup = 4;
 
 /// Frames at 25 a second with an IDR frame every four, decided one by one as the recorder does.

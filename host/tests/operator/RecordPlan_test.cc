@@ -4,11 +4,10 @@
 
 #include <string>
 
+#include "support/Ticks.h"
+
 namespace receiver {
 namespace {
-
-constexpr std::int64_t kSecond = 90000;
-constexpr std::int64_t kFrame = 3600;
 
 /// The flags of `frames` frames at 25 a second, with an IDR frame every `group`: '1' and '0'.
 std::string Flags(RecordPlan& plan, std::int64_t frames, std::int64_t group) {

@@ -166,11 +166,14 @@ TEST(Options, ContradictionsAreErrors) {
     EXPECT_THAT(Refusal({"--input", "a.ts", "--fps", "25"}), HasSubstr("--fps has no effect"));
     EXPECT_THAT(Refusal({"--input", "a.ts", "--size", "1280x720"}), HasSubstr("--transcode"));
     EXPECT_THAT(Refusal({"--input", "a.ts", "--bitrate", "8000"}), HasSubstr("--bitrate has no effect"));
-    EXPECT_THAT(Refusal({"--input", "a.ts", "--gop", "25"}), HasSubstr("--gop has no effect"));
     EXPECT_THAT(Refusal({"--input", "udp://:9000", "--speed", "2"}), HasSubstr("--speed goes with files"));
     EXPECT_THAT(Refusal({"--mode", "on", "--record", "2-9"}), HasSubstr("--record goes with --mode sync"));
     EXPECT_THAT(Refusal({"--timecode", "10:00:00;02", "--no-drop-frame"}), HasSubstr("--no-drop-frame"));
     EXPECT_TRUE(Parsed({"--input", "a.ts", "--transcode", "--fps", "25"}).source.transcode);
+}
+
+TEST(Options, TheGroupOfASourceThatIsRecordedAsItIsMayBeTold) {
+    EXPECT_EQ(Parsed({"--input", "a.ts", "--gop", "25"}).source.pictureGroup, 25u);
 }
 
 TEST(Options, HelpTellsOfEveryOptionOfTheExamplesAndOfTheExitCodes) {

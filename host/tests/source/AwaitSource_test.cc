@@ -14,7 +14,7 @@
 namespace receiver {
 namespace {
 
-using std::chrono::seconds;
+using namespace std::chrono_literals;
 using ::testing::ElementsAre;
 using ::testing::Pair;
 
@@ -28,10 +28,12 @@ class DrivenClock final : public WaitClockInterface {
         }
         now_ = std::max(now_, time);
     }
-    void Pass(seconds time) { now_ += time; }
-    seconds Elapsed() const { return std::chrono::duration_cast<seconds>(now_.time_since_epoch()); }
+    void Pass(std::chrono::seconds time) { now_ += time; }
+    std::chrono::seconds Elapsed() const {
+        return std::chrono::duration_cast<std::chrono::seconds>(now_.time_since_epoch());
+    }
 
-    std::optional<seconds> stopsAt;
+    std::optional<std::chrono::seconds> stopsAt;
 
  private:
     TimePoint now_{};
@@ -43,7 +45,7 @@ class AwaitSourceTest : public testing::Test, public SourceListenerInterface {
         notices_.emplace_back(clock_.Elapsed().count(), sentence);
     }
     /// Attempts of `length` each fail until `there`.
-    void Await(bool listens, seconds length, seconds there) {
+    void Await(bool listens, std::chrono::seconds length, std::chrono::seconds there) {
         const auto attempt = [&](bool told) {
             attempts_.emplace_back(clock_.Elapsed().count(), told);
             if (clock_.Elapsed() + length > there) {
@@ -64,14 +66,14 @@ class AwaitSourceTest : public testing::Test, public SourceListenerInterface {
 constexpr const char* kTold = "nobody is there; waiting for it";
 
 TEST_F(AwaitSourceTest, WhatIsThereIsNotToldOf) {
-    Await(false, seconds(5), seconds(0));
+    Await(false, 5s, 0s);
     EXPECT_THAT(attempts_, ElementsAre(Pair(0, false)));
     EXPECT_TRUE(notices_.empty());
 }
 
 TEST_F(AwaitSourceTest, AbsenceIsToldOnceAndThenEveryMinute) {
     // An attempt of a second and a pause of two.
-    Await(false, seconds(1), seconds(182));
+    Await(false, 1s, 182s);
     EXPECT_THAT(notices_, ElementsAre(Pair(1, kTold), Pair(61, kTold), Pair(121, kTold), Pair(181, kTold)));
     // At 0, 3, ... 180 and, with success, 183.
     EXPECT_EQ(attempts_.size(), 62u);
@@ -80,13 +82,13 @@ TEST_F(AwaitSourceTest, AbsenceIsToldOnceAndThenEveryMinute) {
 }
 
 TEST_F(AwaitSourceTest, WhoListensDoesNotPauseBetweenTwoAttempts) {
-    Await(true, seconds(60), seconds(120));
+    Await(true, 60s, 120s);
     EXPECT_THAT(attempts_, ElementsAre(Pair(0, false), Pair(60, true), Pair(120, true)));
     EXPECT_THAT(notices_, ElementsAre(Pair(60, kTold), Pair(120, kTold)));
 }
 
 TEST_F(AwaitSourceTest, ListeningThatFailsAtOnceIsNotTriedInAHurry) {
-    Await(true, seconds(0), seconds(3));
+    Await(true, 0s, 3s);
     EXPECT_THAT(attempts_, ElementsAre(Pair(0, false), Pair(2, true), Pair(4, true)));
     EXPECT_THAT(notices_, ElementsAre(Pair(0, kTold)));
 }
@@ -98,8 +100,8 @@ TEST_F(AwaitSourceTest, AnotherFailureEndsTheWait) {
 }
 
 TEST_F(AwaitSourceTest, WhoeverStopsEndsTheWait) {
-    clock_.stopsAt = seconds(10);
-    EXPECT_THROW(Await(false, seconds(1), seconds(1000)), Stopped);
+    clock_.stopsAt = 10s;
+    EXPECT_THROW(Await(false, 1s, 1000s), Stopped);
     EXPECT_THAT(notices_, ElementsAre(Pair(1, kTold)));
 }
 

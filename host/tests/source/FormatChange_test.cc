@@ -1,3 +1,4 @@
+#include "SentMedia.h"
 #include "SourceTesting.h"
 #include "StreamServer.h"
 
@@ -147,6 +148,62 @@ INSTANTIATE_TEST_SUITE_P(
                                kPlainAac,
                            "the video changed from h264 to hevc", "H.264 128x96 25 fps, AAC LC 48 kHz stereo",
                            25, true}));
+
+/// A medium that goes on under another number in the tables of its programme.
+struct Move {
+    const char* name;
+    const char* stream;
+    const char* notice;
+    /// Pictures that may be left out: until the next IDR frame, and what the splice of two files costs.
+    std::size_t leftOut;
+};
+void PrintTo(const Move& move, std::ostream* out) {
+    *out << move.name;
+}
+
+class MovedMedium : public SourceTest, public testing::WithParamInterface<Move> {};
+
+TEST_P(MovedMedium, IsToldAndRecordedOn) {
+    // Noise, so that no two audio frames are alike.
+    Ffmpeg(
+        "-f lavfi -i testsrc2=size=128x96:rate=25:duration=9 -f lavfi -i "
+        "anoisesrc=sample_rate=48000:seed=7:duration=9" +
+        string(kPlainH264) + kPlainAac + "whole.ts");
+    // 168 pictures are 14 groups, 6.72 s. What comes first is longer than what is looked at.
+    Ffmpeg(
+        "-copyts -i whole.ts -c copy -bsf:v 'noise=drop=gte(n\\,168)' -bsf:a 'noise=drop=gte(n\\,315)' "
+        "-muxdelay 0 a.ts");
+    Ffmpeg(
+        "-copyts -i whole.ts -c copy -bsf:v 'noise=drop=lt(n\\,168)' -bsf:a 'noise=drop=lt(n\\,315)' "
+        "-muxdelay 0 -streamid " +
+        string(GetParam().stream) + " b.ts");
+    Shell("cat a.ts b.ts > ab.ts");
+    const auto source = OpenSource(Fast("ab.ts"), notices_, nullptr);
+    std::vector<SourceUnit> before;
+    std::vector<SourceUnit> after;
+    bool changed = false;
+    for (auto result = SourceInterface::Result::kIdle; result != SourceInterface::Result::kEnd;) {
+        SourceUnit unit;
+        result = source->Read(unit);
+        changed |= result == SourceInterface::Result::kChanged;
+        if (result == SourceInterface::Result::kUnit) {
+            (changed ? after : before).push_back(unit);
+        }
+    }
+    EXPECT_EQ(notices_.CountOf(string(GetParam().notice) + ": the recording goes on in a new file"), 1u)
+        << testing::PrintToString(notices_.sentences);
+    const SentMedia sent(Path("whole.ts"));
+    const auto pictures = sent.Find(Medium::kVideo, after);
+    ASSERT_FALSE(pictures.empty());
+    EXPECT_EQ(pictures.front().number % 12, 0u);
+    EXPECT_EQ(pictures.back().number, sent.Pictures() - 1);
+    EXPECT_LE(sent.Pictures() - Of(Medium::kVideo, before).size() - pictures.size(), GetParam().leftOut);
+    ExpectInStep(sent, after, pictures.front().number);
+}
+
+INSTANTIATE_TEST_SUITE_P(All, MovedMedium,
+                         testing::Values(Move{"audio", "1:300", "the audio moved to another stream", 15},
+                                         Move{"video", "0:301", "the video moved to another stream", 2}));
 
 }  // namespace
 }  // namespace receiver

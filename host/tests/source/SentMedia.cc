@@ -14,9 +14,6 @@
 namespace receiver {
 namespace {
 
-/// Half an audio frame of 1024 samples at 48 kHz.
-constexpr std::int64_t kHalfFrame = 960;
-
 /// What every transport keeps of a picture and of an audio frame: the last slice, and what stands behind the
 /// ADTS header.
 std::string EssenceOf(Medium medium, const unsigned char* data, std::size_t size) {
@@ -64,7 +61,8 @@ std::vector<SentMedia::Arrival> SentMedia::Find(Medium medium, const std::vector
     return arrivals;
 }
 
-void ExpectInStep(const SentMedia& sent, const std::vector<SourceUnit>& units, std::size_t first) {
+void ExpectInStep(const SentMedia& sent, const std::vector<SourceUnit>& units, std::size_t first,
+                  std::int64_t tolerance) {
     const auto pictures = sent.Find(Medium::kVideo, units);
     ASSERT_FALSE(pictures.empty());
     EXPECT_EQ(pictures.size(), Of(Medium::kVideo, units).size()) << "pictures that were not sent";
@@ -77,7 +75,7 @@ void ExpectInStep(const SentMedia& sent, const std::vector<SourceUnit>& units, s
     ASSERT_FALSE(sounds.empty());
     for (std::size_t at = 0; at < sounds.size(); ++at) {
         EXPECT_EQ(sounds[at].number, sounds.front().number + at);
-        EXPECT_LE(std::abs(sounds[at].offset - offset), kHalfFrame) << "audio frame " << sounds[at].number;
+        EXPECT_LE(std::abs(sounds[at].offset - offset), tolerance) << "audio frame " << sounds[at].number;
     }
     // No frame that stands at or behind the first picture is missing in front: silence leads up to a frame.
     const auto audio = Of(Medium::kAudio, units);

@@ -9,6 +9,9 @@
 
 namespace receiver {
 
+/// Half an audio frame of 1024 samples at 48 kHz, in ticks of 90000.
+inline constexpr std::int64_t kHalfAudioFrame = 960;
+
 /// What was sent, so that units of a source can be mapped back to it by their bytes.
 class SentMedia {
  public:
@@ -41,7 +44,8 @@ class SentMedia {
 };
 
 /// Expects that all pictures from `first` on came, without a loss, and that audio is in step with them within
-/// half an audio frame from the first one that begins with or behind them, without a gap either.
-void ExpectInStep(const SentMedia& sent, const std::vector<SourceUnit>& units, std::size_t first);
+/// `tolerance` from the first one that begins with or behind them, without a gap either.
+void ExpectInStep(const SentMedia& sent, const std::vector<SourceUnit>& units, std::size_t first,
+                  std::int64_t tolerance = kHalfAudioFrame);
 
 }  // namespace receiver

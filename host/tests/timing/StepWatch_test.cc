@@ -2,12 +2,13 @@
 
 #include <gtest/gtest.h>
 
+#include "support/Ticks.h"
+
 namespace receiver {
 namespace {
 
 constexpr auto kVideo = StepWatch::Medium::kVideo;
 constexpr auto kAudio = StepWatch::Medium::kAudio;
-constexpr std::int64_t kSecond = 90000;
 
 TEST(StepWatch, AStepThatBothMediaMakeIsTheClocks) {
     for (const bool videoFirst : {true, false}) {

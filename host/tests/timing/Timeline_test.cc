@@ -4,12 +4,12 @@
 
 #include <limits>
 
+#include "support/Ticks.h"
 #include "timing/Saturating.h"
 
 namespace receiver {
 namespace {
 
-constexpr std::int64_t kSecond = 90000;
 constexpr std::int64_t kEarliest = std::numeric_limits<std::int64_t>::min();
 constexpr std::int64_t kLatest = std::numeric_limits<std::int64_t>::max();
 constexpr std::int64_t kWrap33 = std::int64_t{1} << 33;

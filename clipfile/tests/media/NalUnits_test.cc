@@ -1,4 +1,4 @@
-#include "recover/NalUnits.h"
+#include "media/NalUnits.h"
 
 #include <gtest/gtest.h>
 

@@ -5,8 +5,8 @@
 #include <optional>
 #include <vector>
 
+#include "media/ParameterSets.h"
 #include "reader/InputFile.h"
-#include "recover/ParameterSets.h"
 
 namespace clipfile {
 

@@ -1,10 +1,10 @@
-#include "recover/Decoders.h"
+#include "media/Decoders.h"
 
 #include <algorithm>
 #include <cstring>
 #include <new>
 
-#include "recover/NalUnits.h"
+#include "media/NalUnits.h"
 
 extern "C" {
 #include <libavcodec/avcodec.h>
@@ -12,8 +12,7 @@ extern "C" {
 
 namespace clipfile {
 
-namespace {
-
+// Not in the unnamed namespace: `AudioFrameFinder::Decoder` holds them.
 struct FreeContext {
     void operator()(AVCodecContext* context) const { avcodec_free_context(&context); }
 };
@@ -26,6 +25,8 @@ struct FreeFrame {
 using Context = std::unique_ptr<AVCodecContext, FreeContext>;
 using Packet = std::unique_ptr<AVPacket, FreePacket>;
 using Frame = std::unique_ptr<AVFrame, FreeFrame>;
+
+namespace {
 
 /// A decoder that calls every fault a failure.
 Context OpenDecoder(AVCodecID id, Bytes extradata) {

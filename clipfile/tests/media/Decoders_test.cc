@@ -1,4 +1,4 @@
-#include "recover/Decoders.h"
+#include "media/Decoders.h"
 
 #include <gtest/gtest.h>
 

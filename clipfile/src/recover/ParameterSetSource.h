@@ -5,16 +5,10 @@
 #include <string>
 #include <vector>
 
+#include "media/ParameterSets.h"
 #include "reader/Profile.h"
 
 namespace clipfile {
-
-/// The sets that a decoder needs for the pictures of a recording: NAL units without start code. A file gets
-/// them in its `moov`, on closing.
-struct ParameterSets {
-    std::vector<unsigned char> sps;
-    std::vector<unsigned char> pps;
-};
 
 /// A place where the parameter sets of an unfinished file may be found.
 class ParameterSetSource {
@@ -39,7 +33,7 @@ class LikeFile : public ParameterSetSource {
     bool isTaken_ = false;
 };
 
-/// The sets of the whole files in a folder, the newest first.
+/// The sets of the other files in a folder that have some, the newest first.
 class FolderFiles : public ParameterSetSource {
  public:
     /// `except` is the file that is recovered.

@@ -1,4 +1,4 @@
-#include "recover/ParameterSets.h"
+#include "recover/ParameterSetSource.h"
 
 #include <algorithm>
 #include <exception>

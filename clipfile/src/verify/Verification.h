@@ -1,0 +1,30 @@
+#pragma once
+
+#include <cstdint>
+#include <filesystem>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "inspect/Inspection.h"
+
+namespace clipfile {
+
+/// What was found in a file, and what its neighbours are compared with.
+struct Verification {
+    std::filesystem::path path;
+    /// Each a sentence.
+    std::vector<std::string> defects;
+    Inspection inspection;
+};
+
+/// Compares a recording with the rules that closed files keep: its structure, tables against data, times,
+/// timecode against name and metadata. Reads headers and tables, and with `deep` all samples. Throws
+/// `ToolError` for a file that cannot be read or is no recording.
+Verification VerifyFile(const std::filesystem::path& path, bool deep);
+
+/// Compares the files of each folder with those that follow on them by timecode, and adds what is wrong to
+/// the defects of the file that comes first.
+void VerifyNeighbours(std::vector<Verification>& files);
+
+}  // namespace clipfile
