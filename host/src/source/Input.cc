@@ -283,7 +283,7 @@ void Input::Reach(const AVPacket& packet) {
     if (packet.pts != AV_NOPTS_VALUE) {
         const AVRational base = format_->streams[packet.stream_index]->time_base;
         const std::int64_t end = SaturatingAdd(packet.pts, packet.duration);
-        reached_ = std::max(reached_, av_rescale_q(end, base, AV_TIME_BASE_Q));
+        reached_ = std::max(reached_, av_rescale_q(end, base, AVRational{1, AV_TIME_BASE}));
     }
 }
 

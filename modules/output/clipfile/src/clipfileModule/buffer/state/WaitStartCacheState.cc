@@ -15,8 +15,8 @@ constexpr std::uint64_t kHalfAudioFrameMilliSec = 11;
 /// s at the lowest frame rate.
 constexpr std::uint64_t kVideoLagMilliSec = 3000;
 
-constexpr std::string_view kVideo = "video";
-constexpr std::string_view kAudio = "audio";
+constexpr std::string_view kVideoName = "video";
+constexpr std::string_view kAudioName = "audio";
 
 /// Unsigned on purpose: an open stop of -1 lies above every timestamp.
 std::uint64_t toMilliSec(std::int64_t ticks) {
@@ -30,7 +30,7 @@ WaitStartCacheState::WaitStartCacheState(StreamBufferInterface* owner, RecordRul
 
 bool WaitStartCacheState::isBeforeStart(const StreamData& unit, std::string_view mediaType) const {
     // An IDR frame on the start itself needs the audio that begins up to half a frame ahead of it.
-    const bool mayLead = rules == RecordRules::kExact && mediaType == kAudio;
+    const bool mayLead = rules == RecordRules::kExact && mediaType == kAudioName;
     return unit.timestamp + (mayLead ? kHalfAudioFrameMilliSec : 0) < toMilliSec(buffer->GetStartTimestamp());
 }
 
@@ -45,7 +45,7 @@ std::optional<std::int64_t> WaitStartCacheState::stopPassedBy(const StreamData& 
     const std::int64_t commandedEnd = buffer->GetEndTimestamp();
     const std::int64_t end = commandedEnd != -1 ? commandedEnd : stop;
     // The other media may have overtaken a picture that still belongs to the record.
-    const std::uint64_t lag = mediaType == kVideo ? 0 : kVideoLagMilliSec;
+    const std::uint64_t lag = mediaType == kVideoName ? 0 : kVideoLagMilliSec;
     return unit.timestamp >= toMilliSec(end) + lag ? std::optional(end) : std::nullopt;
 }
 
@@ -63,7 +63,7 @@ std::shared_ptr<CacheState> WaitStartCacheState::Execute(const std::shared_ptr<S
         // Contract: any-medium-cancels. Audio or metadata may be first.
         return std::make_shared<EndSyncRecState>(buffer);
     }
-    if (mediaType != kVideo) {
+    if (mediaType != kVideoName) {
         queue->queue.Push(unit);
         return nullptr;
     }
