@@ -8,6 +8,10 @@
 
 namespace clipfile {
 
+/// Bytes of a chunk, above which it is none of a recording: eight pictures at the highest bit rates have 20
+/// MB.
+inline constexpr std::uint64_t kMaxChunk = 256 * 1024 * 1024;
+
 using Chunk = std::shared_ptr<clipfileModule::ChunkData>;
 
 /// The chunks of a recording in the order of the file, up to where it is torn. The last one may be shorter:

@@ -20,7 +20,6 @@ constexpr std::uint32_t kMaxNalUnit = 64 * 1024 * 1024;
 constexpr std::size_t kMaxUnits = 4096;
 constexpr std::size_t kMaxAudioFrames = 4096;
 constexpr std::size_t kMaxPictures = 4096;
-constexpr std::uint64_t kMaxChunk = 256 * 1024 * 1024;
 /// Audio that is decoded at a time: two chunks at 128 kbit/s.
 constexpr std::size_t kAudioBatch = 8 * 1024;
 constexpr std::uint64_t kTimecodeSize = 4;

@@ -11,10 +11,6 @@ namespace clipfile {
 
 namespace {
 
-/// Bytes of a chunk, above which it is none of a recording: eight pictures at the highest bit rates have 20
-/// MB.
-constexpr std::uint64_t kMaxChunk = 256 * 1024 * 1024;
-
 /// Whether the sample ends in the zeros that go on behind it. No NAL unit ends with one (ISO/IEC
 /// 14496-10 7.4.1).
 bool RunsOutInZeros(const InputFile& file, const Sample& sample) {
