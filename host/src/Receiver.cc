@@ -343,8 +343,8 @@ void Running::Show(const SourceInterface& source, const Recorder& recorder) {
     snapshot.timecode = recorder.LastTimecode();
     snapshot.seconds = static_cast<double>(recorder.Elapsed()) / static_cast<double>(kVideoClock);
     snapshot.recording = options_.mode == OutputMode::kOn ? log_->OpenRecordings() > 0 : plan_.Recording();
-    snapshot.waiting =
-        recorder.LastTimecode() && options_.mode == OutputMode::kSync && plan_.Wanted() && !plan_.Recording();
+    // Before the first picture it is the source that is awaited.
+    snapshot.waiting = recorder.Waiting() && (recorder.LastTimecode() || source.Counts().earlyPictures != 0);
     snapshot.framesPerSecond = rates_.FramesPerSecond();
     snapshot.videoKilobits = rates_.VideoKilobits();
     snapshot.audioKilobits = rates_.AudioKilobits();
@@ -371,6 +371,8 @@ Summary Running::Summarise(const SourceInterface& source, const Recorder::Progre
     run.unreached = plan_.Unreached();
     const SourceCounts counts = source.Counts();
     run.silentFrames = counts.silentFrames;
+    run.earlyPictures = counts.earlyPictures != 0;
+    run.transcode = options_.source.transcode;
     for (const ModuleReport::WrittenFile& file : report_.Files()) {
         // One that could not be made was announced and has told why.
         if (file.closed || folder_->Exists(file.path)) {

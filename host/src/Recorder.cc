@@ -59,7 +59,8 @@ Recorder::Recorder(const Settings& settings, ModuleSession& session, const Modul
       log_(log),
       plan_(plan),
       commands_(commands),
-      feed_(session.Stream()) {
+      feed_(session.Stream()),
+      stops_(log.Stops()) {
     if (!settings_.past) {
         return;
     }
@@ -92,6 +93,11 @@ void Recorder::Put(SourceUnit unit) {
 void Recorder::Finish() {
     finishing_ = true;
     plan_.Finish();
+}
+
+bool Recorder::Waiting() const {
+    // In mode on everything is wanted.
+    return plan_.Wanted() && !(settings_.mode == OutputMode::kOn ? online_ : plan_.Recording());
 }
 
 std::int64_t Recorder::Elapsed() const {
@@ -228,7 +234,7 @@ void Recorder::Interrupt() {
 void Recorder::EndBeforeGap() {
     if (settings_.mode == OutputMode::kSync && plan_.Recording()) {
         plan_.Interrupt();
-        NoteChange(false, NextAddress());
+        NoteEndBehindLast();
         PushFlag(FrameTime(lastFrame_, 1), false, BuildMetadata(false, std::nullopt, {}));
     }
 }
@@ -255,8 +261,14 @@ void Recorder::NoteChange(bool begins, const Timecode& at) {
 
 void Recorder::NoteEnd() {
     if (timecode_) {
-        NoteChange(false, NextAddress());
+        NoteEndBehindLast();
     }
+}
+
+void Recorder::NoteEndBehindLast() {
+    const Timecode end = NextAddress();
+    NoteChange(false, end);
+    commands_.Settle({.ended = true}, end);
 }
 
 std::vector<Recorder::Change> Recorder::TakeChanges() {

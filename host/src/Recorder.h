@@ -92,6 +92,8 @@ class Recorder {
 
     /// Of the last frame.
     const std::optional<Timecode>& LastTimecode() const { return timecode_; }
+    /// A recording is commanded and waits for its IDR frame.
+    bool Waiting() const;
     /// The beginnings and ends of recordings since the last call.
     std::vector<Change> TakeChanges();
     /// The last frame has come: a recording that is still open has ended behind it.
@@ -116,6 +118,8 @@ class Recorder {
     bool PushSyncMeta(const SourceUnit& unit, const Timecode& timecode);
     void PushFlag(std::int64_t time, bool record, const std::vector<unsigned char>& meta);
     void EndBeforeGap();
+    /// The recording, if any, has ended with the last frame, and so has what stops commanded.
+    void NoteEndBehindLast();
     void NoteChange(bool begins, const Timecode& at);
     /// The address behind that of the last frame.
     Timecode NextAddress() const;
@@ -153,8 +157,9 @@ class Recorder {
     bool online_ = false;
     /// The record flag that was pushed last.
     std::optional<bool> flag_;
-    /// Stop commands so far, and since when one waits to be carried out.
-    int stops_ = 0;
+    /// Stop commands that the module should have carried out so far, those before this recorder included, and
+    /// since when one waits to be carried out.
+    int stops_;
     std::optional<Clock::time_point> stopSince_;
     std::uint64_t lateStops_ = 0;
 };

@@ -32,10 +32,11 @@ std::string DescribeUnreadable(const RecordedFile& file) {
 
 std::vector<std::string> ShortfallsOf(const RunRecord& run) {
     std::vector<std::string> sentences;
-    if (!run.anyFrame && !run.endedByOperator) {
-        sentences.emplace_back(
-            "nothing was recorded: the source has sent no IDR frame; set the encoder to closed groups of "
-            "pictures, or use --transcode");
+    if (!run.anyFrame && (run.earlyPictures || !run.endedByOperator)) {
+        sentences.push_back(
+            std::string("nothing was recorded: the source has sent no IDR frame; set the encoder to closed "
+                        "groups of pictures") +
+            (run.transcode ? "" : ", or use --transcode"));
     }
     if (run.oneRecording && run.anyFrame && run.recordedFrames == 0) {
         sentences.emplace_back("nothing was recorded: no IDR frame came");

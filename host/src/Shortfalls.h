@@ -16,6 +16,10 @@ struct RunRecord {
     bool endedByOperator = false;
     /// Frames that came, from the first IDR frame of the source on, and those that belong to recordings.
     bool anyFrame = false;
+    /// Pictures in front of it: the source was there, and nothing could begin with them.
+    bool earlyPictures = false;
+    /// The pictures are converted.
+    bool transcode = false;
     std::uint64_t recordedFrames = 0;
     /// The whole run was one recording.
     bool oneRecording = false;

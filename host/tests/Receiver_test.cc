@@ -215,6 +215,25 @@ TEST_F(ReceiverTest, AStreamWithoutAnIdrFrameIsToldAndIsALoss) {
     }
 }
 
+TEST_F(ReceiverTest, SigtermDoesNotHideThatALiveSourceHasSentNoIdrFrame) {
+    auto source = std::make_unique<FakeSource>(0);
+    source->MakeEndless();
+    source->ChangeCounts().earlyPictures = 50;
+    source->Before([this, &ended = *source, sent = false](std::size_t) mutable {
+        if (std::exchange(sent, true)) {
+            ended.Stop();
+            return;
+        }
+        kill(getpid(), SIGTERM);
+        while (!signals_.QuitRequested()) {
+            std::this_thread::yield();
+        }
+    });
+    EXPECT_EQ(Record(std::move(source)), ExitCode::kLost);
+    EXPECT_THAT(display_.notices, Contains("ending in order; a second signal ends at once"));
+    EXPECT_THAT(display_.notices, Contains(HasSubstr("the source has sent no IDR frame")));
+}
+
 TEST_F(ReceiverTest, ARangeWithoutAnIdrFrameIsToldAndIsALoss) {
     // The only IDR frames are those of the whole seconds.
     options_.record = {{90000 / 2, 90000 * 8 / 10}, {90000, 90000 * 2}};
@@ -274,6 +293,32 @@ TEST_F(ReceiverTest, SnapshotsTellOfTheRecording) {
     EXPECT_EQ(last.framesPerSecond, 25);
     EXPECT_GT(last.freeBytes.value_or(0), 0u);
     EXPECT_EQ(last.lost, 0u);
+}
+
+TEST_F(ReceiverTest, SnapshotsTellThatTheFirstIdrFrameIsAwaited) {
+    for (const OutputMode mode : {OutputMode::kSync, OutputMode::kOn}) {
+        options_.mode = mode;
+        display_.snapshots.clear();
+        auto source = std::make_unique<FakeSource>(0);
+        source->MakeEndless();
+        source->ChangeCounts().earlyPictures = 50;
+        source->Before([this, &ended = *source](std::size_t) {
+            if (!display_.snapshots.empty()) {
+                ended.Stop();
+            }
+        });
+        EXPECT_EQ(Record(std::move(source)), ExitCode::kLost);
+        ASSERT_THAT(display_.snapshots, Not(IsEmpty()));
+        EXPECT_TRUE(display_.snapshots.front().waiting);
+        EXPECT_FALSE(display_.snapshots.front().recording);
+    }
+}
+
+TEST_F(ReceiverTest, SnapshotsOfARunWithoutACommandWaitForNothing) {
+    options_.record = {{10 * 90000, 20 * 90000}};
+    EXPECT_EQ(Record(50), ExitCode::kLost);
+    ASSERT_THAT(display_.snapshots, Not(IsEmpty()));
+    EXPECT_FALSE(display_.snapshots.front().waiting);
 }
 
 TEST_F(ReceiverTest, AModuleThatIsNotThereHasItsExitCode) {

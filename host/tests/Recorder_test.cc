@@ -277,6 +277,24 @@ TEST_F(RecorderTest, AStopThatTheModuleCarriesOutIsNotLate) {
     EXPECT_EQ(recorder_->LateStops(), 0u);
 }
 
+TEST_F(RecorderTest, AStopIsMissedAlsoWhereAnEarlierRecorderOfTheRunHadItsOwn) {
+    Make(Sync());
+    PutLateAudio();
+    PutFrame(0, true);
+    plan_.Stop();
+    PutFrame(1, false);
+    recorder_->Close();
+    module_.deaf = true;
+    plan_.Start();
+    Make(Sync());
+    PutLateAudio();
+    PutFrame(2, true);
+    plan_.Stop();
+    PutFrame(3, false);
+    recorder_->Close();
+    EXPECT_EQ(recorder_->LateStops(), 1u);
+}
+
 // While the source is away nothing of its own reaches the end of the recording, which the module awaits.
 TEST_F(RecorderTest, ASourceThatIsAwayEndsTheRecordingBehindItsLastFrame) {
     Make(Sync());
@@ -291,6 +309,29 @@ TEST_F(RecorderTest, ASourceThatIsAwayEndsTheRecordingBehindItsLastFrame) {
     EXPECT_THAT(recorder_->TakeChanges(), ElementsAre(Begin(0), End(2)));
     recorder_->Interrupt();
     EXPECT_EQ(module_.Units().size(), 9u);
+}
+
+TEST_F(RecorderTest, AStopThatFindsTheSourceGoneHasEndedTheRecordingBehindItsLastFrame) {
+    Make(Sync());
+    PutLateAudio();
+    PutFrame(0, true);
+    PutFrame(1, false);
+    std::future<CommandResult> stop = commands_.Post(RecordCommand::kStop);
+    commands_.Apply(plan_);
+    recorder_->Interrupt();
+    PutFrame(50, true);
+    EXPECT_EQ(stop.get(), (CommandResult{Timecode{10, 0, 0, 2, false}, {}}));
+}
+
+TEST_F(RecorderTest, AStopBehindTheLastFrameOfTheStreamHasEndedTheRecordingThere) {
+    Make(Sync());
+    PutLateAudio();
+    PutFrame(0, true);
+    std::future<CommandResult> stop = commands_.Post(RecordCommand::kStop);
+    commands_.Apply(plan_);
+    recorder_->NoteEnd();
+    commands_.Close("over");
+    EXPECT_EQ(stop.get(), (CommandResult{Timecode{10, 0, 0, 1, false}, {}}));
 }
 
 TEST_F(RecorderTest, HalfASecondIsNoGap) {

@@ -25,13 +25,30 @@ TEST(Shortfalls, ARunWithEverythingHasNone) {
     EXPECT_THAT(ShortfallsOf(WholeRun()), IsEmpty());
 }
 
-TEST(Shortfalls, ASourceWithoutAnythingToBeginWithIsToldUnlessTheOperatorEndedTheRun) {
+TEST(Shortfalls, ASourceThatHasSentNothingIsToldUnlessTheOperatorEndedTheRun) {
     RunRecord run;
     EXPECT_THAT(ShortfallsOf(run),
                 ElementsAre("nothing was recorded: the source has sent no IDR frame; set the encoder to "
                             "closed groups of pictures, or use --transcode"));
     run.endedByOperator = true;
     EXPECT_THAT(ShortfallsOf(run), IsEmpty());
+}
+
+TEST(Shortfalls, PicturesWithoutAnIdrFrameAreToldWhoeverEndedTheRun) {
+    RunRecord run;
+    run.earlyPictures = true;
+    run.endedByOperator = true;
+    EXPECT_THAT(ShortfallsOf(run),
+                ElementsAre("nothing was recorded: the source has sent no IDR frame; set the encoder to "
+                            "closed groups of pictures, or use --transcode"));
+}
+
+TEST(Shortfalls, TheAdviceToTranscodeIsNotGivenToWhomHasDoneSo) {
+    RunRecord run;
+    run.transcode = true;
+    EXPECT_THAT(ShortfallsOf(run),
+                ElementsAre("nothing was recorded: the source has sent no IDR frame; set the encoder to "
+                            "closed groups of pictures"));
 }
 
 TEST(Shortfalls, ARunThatIsOneRecordingNeedsAnIdrFrame) {

@@ -4,28 +4,51 @@
 
 namespace receiver {
 
+void QueueGauge::State::Release(std::uint64_t mark) {
+    if (mark == marks.front()) {
+        passed = mark;
+        marks.pop_front();
+        return;
+    }
+    marks.erase(std::find(marks.begin(), marks.end(), mark));
+    // No mark would ever tell that what entered behind the newest one has left.
+    entered = marks.back();
+}
+
 void QueueGauge::Enter() {
-    ++entered_;
+    const std::lock_guard lock(state_->mutex);
+    ++state_->entered;
 }
 
 std::shared_ptr<StreamData> QueueGauge::MakeMark() {
-    Enter();
-    return {new StreamData, [state = state_, position = entered_](StreamData* mark) {
+    std::uint64_t position = 0;
+    {
+        const std::lock_guard lock(state_->mutex);
+        position = ++state_->entered;
+        state_->marks.push_back(position);
+    }
+    return {new StreamData, [state = state_, position](StreamData* mark) {
                 delete mark;
                 const std::lock_guard lock(state->mutex);
-                state->passed = std::max(state->passed, position);
+                state->Release(position);
                 state->changed.notify_all();
             }};
 }
 
 std::uint64_t QueueGauge::Bound() const {
     const std::lock_guard lock(state_->mutex);
-    return entered_ - state_->passed;
+    return state_->entered - state_->passed;
 }
 
 bool QueueGauge::WaitForBound(std::uint64_t bound, std::chrono::milliseconds patience) const {
     std::unique_lock lock(state_->mutex);
-    return state_->changed.wait_for(lock, patience, [&] { return entered_ - state_->passed <= bound; });
+    return state_->changed.wait_for(lock, patience,
+                                    [&] { return state_->entered - state_->passed <= bound; });
+}
+
+std::uint64_t QueueGauge::Passed() const {
+    const std::lock_guard lock(state_->mutex);
+    return state_->passed;
 }
 
 }  // namespace receiver

@@ -13,8 +13,6 @@ constexpr std::int64_t kOriginSeconds = 10;
 constexpr std::uint64_t kQueueBound = 40;
 /// Units from one mark to the next.
 constexpr int kUnitsPerMark = 8;
-/// The module can be held up for 3.5 s by a disk that hangs, and goes on then.
-constexpr std::chrono::milliseconds kPatience{5000};
 
 /// A disk that hangs slows the feed down and does not stop it: the module has to find out and say so.
 constexpr std::chrono::milliseconds kDiskPause{1000};
@@ -74,9 +72,11 @@ void StreamFeed::PushMark(Queue& queue) {
 }
 
 void StreamFeed::WaitFor(Queue& queue, std::uint64_t bound) {
-    const std::chrono::milliseconds patience = stalled_ ? std::chrono::milliseconds(0) : kPatience;
-    if (queue.gauge.Bound() > bound) {
-        stalled_ = !queue.gauge.WaitForBound(bound, patience);
+    const bool stalled = queue.stalledAt == queue.gauge.Passed();
+    if (queue.gauge.WaitForBound(bound, stalled ? std::chrono::milliseconds(0) : patience_)) {
+        queue.stalledAt.reset();
+    } else {
+        queue.stalledAt = queue.gauge.Passed();
     }
 }
 

@@ -2,6 +2,7 @@
 
 #include <chrono>
 #include <cstdint>
+#include <optional>
 #include <vector>
 
 #include "QxModuleStreamInterface.h"
@@ -21,7 +22,12 @@ namespace receiver {
 /// One thread at a time.
 class StreamFeed {
  public:
-    explicit StreamFeed(QxModuleStreamInterface& stream) : stream_(stream) {}
+    /// The module can be held up for 3.5 s by a disk that hangs, and goes on then.
+    static constexpr std::chrono::milliseconds kPatience{5000};
+
+    /// A queue of the module that has not moved for `patience` is not waited for again until it does.
+    explicit StreamFeed(QxModuleStreamInterface& stream, std::chrono::milliseconds patience = kPatience)
+        : stream_(stream), patience_(patience) {}
     StreamFeed(const StreamFeed&) = delete;
     StreamFeed& operator=(const StreamFeed&) = delete;
 
@@ -47,6 +53,8 @@ class StreamFeed {
         void (QxModuleStreamInterface::*push)(const std::shared_ptr<StreamData>&);
         QueueGauge gauge{};
         int sinceMark = 0;
+        /// How far it had come when it was waited for in vain.
+        std::optional<std::uint64_t> stalledAt{};
     };
 
     void Push(Queue& queue, const std::shared_ptr<StreamData>& unit);
@@ -54,12 +62,11 @@ class StreamFeed {
     void WaitFor(Queue& queue, std::uint64_t bound);
 
     QxModuleStreamInterface& stream_;
+    const std::chrono::milliseconds patience_;
     Queue video_{&QxModuleStreamInterface::PushVideo};
     Queue audio_{&QxModuleStreamInterface::PushAudio};
     Queue meta_{&QxModuleStreamInterface::PushMeta};
     FrameLedger frames_;
-    /// The module did not move for the whole patience; nobody waits for it again until it does.
-    bool stalled_ = false;
 };
 
 }  // namespace receiver

@@ -10,13 +10,18 @@
 namespace receiver {
 namespace {
 
-constexpr std::time_t kDay = 86400;
 /// So much before midnight the folder of the next day counts as today's.
 constexpr std::time_t kAhead = 60;
 /// A server that does not answer, or refuses, is asked again after this many looks: it counts refused
 /// passwords.
 constexpr int kRestAfterFailure = 30;
 constexpr std::chrono::milliseconds kEndPatience{500};
+
+std::tm LocalTime(std::time_t time) {
+    std::tm parts = {};
+    localtime_r(&time, &parts);
+    return parts;
+}
 
 }  // namespace
 
@@ -43,16 +48,24 @@ struct FolderWatch::State {
 };
 
 std::string DateOf(std::time_t time) {
-    std::tm parts = {};
-    localtime_r(&time, &parts);
+    const std::tm parts = LocalTime(time);
     std::array<char, 16> text = {};
     const std::size_t size = std::strftime(text.data(), text.size(), "%Y%m%d", &parts);
     return {text.data(), size};
 }
 
+std::string DateAfter(std::time_t time) {
+    std::tm parts = LocalTime(time);
+    ++parts.tm_mday;
+    // No clock is changed at noon.
+    parts.tm_hour = 12;
+    parts.tm_isdst = -1;
+    return DateOf(std::mktime(&parts));
+}
+
 void ExpectDatedFolders(OutputFolder& folder, const std::string& prefix, std::time_t now) {
-    for (const std::time_t time : {now, now + kDay}) {
-        const std::string obstacle = folder.Obstacle(DateOf(time), prefix);
+    for (const std::string& date : {DateOf(now), DateAfter(now)}) {
+        const std::string obstacle = folder.Obstacle(date, prefix);
         if (!obstacle.empty()) {
             throw ReceiverError(ExitCode::kOutput, obstacle);
         }
@@ -97,7 +110,7 @@ void FolderWatch::look(State& state) {
     std::string obstacle;
     std::string warning;
     const std::time_t now = state.now();
-    const std::string tomorrow = DateOf(now + kDay);
+    const std::string tomorrow = DateAfter(now);
     try {
         freeBytes = state.folder->FreeBytes();
         if (freeBytes) {

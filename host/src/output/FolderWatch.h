@@ -15,6 +15,8 @@ namespace receiver {
 
 /// The local date as the module names folders: "20261121".
 std::string DateOf(std::time_t time);
+/// That of the next day, however many hours the clock is changed by in between.
+std::string DateAfter(std::time_t time);
 
 /// Throws `ReceiverError` with `kOutput` when others have made the folder of today or of tomorrow and keep us
 /// out.

@@ -184,7 +184,7 @@ std::optional<std::int64_t> Connection::DelayOf(const AVPacket& packet) const {
 
 bool Connection::Start(const AVPacket& packet, std::optional<std::int64_t> stamp) {
     if (!stamp || !paths_.video->IsStart(packet)) {
-        if (++withoutStart_ == kWithoutStart) {
+        if (++earlyPictures_ == kWithoutStart) {
             assembler_->AddNotice("no IDR frame came in " + std::to_string(kWithoutStart) +
                                   " pictures, and a recording begins with one: set the encoder to closed "
                                   "groups of pictures, each begun by an IDR frame");

@@ -55,6 +55,8 @@ class Connection {
 
     /// Packets that could not be used, and were left out.
     std::uint64_t Damaged() const;
+    /// Pictures in front of the first IDR frame.
+    std::uint64_t EarlyPictures() const { return earlyPictures_; }
 
  private:
     void Choose(const SourceOptions& options);
@@ -97,7 +99,7 @@ class Connection {
     std::optional<std::int64_t> delay_;
     std::optional<Timecode> tag_;
     std::uint64_t damaged_ = 0;
-    std::uint64_t withoutStart_ = 0;
+    std::uint64_t earlyPictures_ = 0;
     std::int64_t position_ = -1;
     /// Packets of new streams since the last of our own.
     int newPictures_ = 0;

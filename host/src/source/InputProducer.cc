@@ -108,9 +108,14 @@ void InputProducer::Lose(const std::string& reason) {
         assembler_.AddNotice("the source was lost: " + reason + NextAttempt());
         told_ = now;
     }
-    damagedBefore_ += connection_->Damaged();
+    KeepCounts();
     connection_.reset();
     lost_ = now;
+}
+
+void InputProducer::KeepCounts() {
+    damagedBefore_ += connection_->Damaged();
+    earlyBefore_ += connection_->EarlyPictures();
 }
 
 void InputProducer::TryAgain() {
@@ -144,7 +149,7 @@ void InputProducer::TryAgain() {
 void InputProducer::Change(const std::string& reason) {
     connection_->Finish();
     ++changes_;
-    damagedBefore_ += connection_->Damaged();
+    KeepCounts();
     const std::int64_t position = connection_->Position();
     const std::int64_t passed = recorded_ ? 0 : Ticks(Clock::now() - lastPicture_);
     std::unique_ptr<Input> input = Connection::End(std::move(connection_));
@@ -208,10 +213,11 @@ void InputProducer::Publish() {
     lostFrames_ = assembler_.LostFrames();
     silentFrames_ = assembler_.SilentFrames();
     damaged_ = damagedBefore_ + (connection_ ? connection_->Damaged() : 0);
+    earlyPictures_ = earlyBefore_ + (connection_ ? connection_->EarlyPictures() : 0);
 }
 
 SourceCounts InputProducer::Counts() const {
-    return {lostFrames_, damaged_, reconnections_, changes_, away_, silentFrames_};
+    return {lostFrames_, damaged_, reconnections_, changes_, away_, silentFrames_, earlyPictures_};
 }
 
 }  // namespace receiver

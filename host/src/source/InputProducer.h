@@ -35,6 +35,8 @@ class InputProducer final : public ProducerInterface {
     using Clock = std::chrono::steady_clock;
 
     void Lose(const std::string& reason);
+    /// Keeps the counts of the connection, which is over.
+    void KeepCounts();
     void TryAgain();
     /// Tells why an attempt failed.
     void TellFailure(const ReceiverError& error);
@@ -62,6 +64,7 @@ class InputProducer final : public ProducerInterface {
     Clock::time_point tried_;
     Clock::time_point told_;
     std::uint64_t damagedBefore_ = 0;
+    std::uint64_t earlyBefore_ = 0;
     /// Ends the source when all that came before it has been handed over.
     std::optional<ReceiverError> end_;
 
@@ -71,6 +74,7 @@ class InputProducer final : public ProducerInterface {
     std::atomic<std::uint64_t> reconnections_{0};
     std::atomic<std::uint64_t> changes_{0};
     std::atomic<bool> away_{false};
+    std::atomic<std::uint64_t> earlyPictures_{0};
 };
 
 }  // namespace receiver

@@ -69,6 +69,8 @@ struct SourceCounts {
     bool away = false;
     /// Audio frames that are silence because those of the source did not come.
     std::uint64_t silentFrames = 0;
+    /// Pictures in front of the first IDR frame of a connection. A recording cannot begin with them.
+    std::uint64_t earlyPictures = 0;
 };
 
 /// Hears of what an operator should know, one sentence each ("the source was lost: ...; trying again in 4 s",

@@ -3,12 +3,14 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <csignal>
 #include <fstream>
 #include <iterator>
 
 #include "endtoend/ReceiverFixture.h"
 #include "support/Judges.h"
 #include "support/Material.h"
+#include "support/Senders.h"
 
 namespace endtoend {
 namespace {
@@ -52,6 +54,25 @@ TEST_F(IncompleteTest, AStreamWithoutAnIdrFrame) {
     EXPECT_THAT(converted.errors, HasSubstr("video is converted"));
     ASSERT_THAT(Recordings(), SizeIs(1));
     EXPECT_EQ(DecodeVideo(Recordings().front()).messages, "");
+}
+
+// A live source ends by the operator alone, who is not to take the run for a good one.
+TEST_F(IncompleteTest, ALiveStreamWithoutAnIdrFrame) {
+    MaterialOptions options;
+    options.seconds = 30;
+    options.pictureGroup = 500;
+    options.more = {"-x264-params", "scenecut=0"};
+    const std::filesystem::path tail = Tail(MakeMaterial(folder, options));
+    const FreePorts ports;
+    const std::string url = "udp://127.0.0.1:" + std::to_string(ports.First());
+    const auto receiver = Start({"--input", url});
+    ASSERT_TRUE(WaitUntilBound(ports.First())) << receiver->AllText();
+    const auto sender = SendTransportStream(tail, url + "?pkt_size=1316");
+    ASSERT_TRUE(receiver->WaitForText("source: H.264")) << receiver->AllText();
+    receiver->Signal(SIGTERM);
+    EXPECT_EQ(receiver->Wait(), kIncomplete);
+    EXPECT_THAT(receiver->Errors(), HasSubstr("nothing was recorded: the source has sent no IDR frame"));
+    EXPECT_THAT(Recordings(), SizeIs(0));
 }
 
 TEST_F(IncompleteTest, ARangeThatIsShorterThanTheGroupOfPictures) {

@@ -25,14 +25,17 @@ TEST(QueueGauge, AMarkIsAUnitWithoutPayload) {
     EXPECT_EQ(gauge.MakeMark()->payload, nullptr);
 }
 
-TEST(QueueGauge, AMarkThatIsReleasedLateTakesNothingBack) {
+TEST(QueueGauge, AMarkThatAFullQueueDropsHasNotComeThrough) {
     QueueGauge gauge;
+    gauge.Enter();
     std::shared_ptr<StreamData> first = gauge.MakeMark();
-    std::shared_ptr<StreamData> second = gauge.MakeMark();
-    second.reset();
-    EXPECT_EQ(gauge.Bound(), 0u);
+    gauge.Enter();
+    gauge.MakeMark().reset();
+    EXPECT_EQ(gauge.Bound(), 2u);
+    EXPECT_EQ(gauge.Passed(), 0u);
     first.reset();
     EXPECT_EQ(gauge.Bound(), 0u);
+    EXPECT_EQ(gauge.Passed(), 2u);
 }
 
 TEST(QueueGauge, WaitsForTheMarkAndNoLongerThanItsPatience) {

@@ -48,6 +48,19 @@ class QueueingModule final : public KeepingModule {
         thread_.join();
     }
 
+    /// Takes nothing more out of the queue.
+    void Halt() {
+        const std::lock_guard lock(mutex_);
+        halted_ = true;
+    }
+    /// Takes everything out, and goes on.
+    void Resume() {
+        std::unique_lock lock(mutex_);
+        halted_ = false;
+        changed_.notify_all();
+        changed_.wait(lock, [this] { return queue_.empty(); });
+    }
+
     void PushVideo(const std::shared_ptr<StreamData>& unit) override {
         const std::lock_guard lock(mutex_);
         if (queue_.size() >= kCapacity) {
@@ -58,9 +71,14 @@ class QueueingModule final : public KeepingModule {
         changed_.notify_all();
     }
 
-    void PushAudio(const std::shared_ptr<StreamData>&) override {}
+    void PushAudio(const std::shared_ptr<StreamData>& unit) override {
+        if (keepsAudio) {
+            KeepingModule::PushAudio(unit);
+        }
+    }
     void PushMeta(const std::shared_ptr<StreamData>&) override {}
 
+    bool keepsAudio = false;
     int dropped = 0;
     int taken = 0;
 
@@ -68,13 +86,14 @@ class QueueingModule final : public KeepingModule {
     void Run() {
         std::unique_lock lock(mutex_);
         while (true) {
-            changed_.wait(lock, [this] { return ended_ || !queue_.empty(); });
+            changed_.wait(lock, [this] { return ended_ || (!halted_ && !queue_.empty()); });
             if (queue_.empty()) {
                 return;
             }
             const std::shared_ptr<StreamData> unit = std::move(queue_.front());
             queue_.pop_front();
             taken += unit->payload != nullptr ? 1 : 0;
+            changed_.notify_all();
             lock.unlock();
             std::this_thread::yield();
             lock.lock();
@@ -85,6 +104,7 @@ class QueueingModule final : public KeepingModule {
     std::condition_variable changed_;
     std::deque<std::shared_ptr<StreamData>> queue_;
     bool ended_ = false;
+    bool halted_ = false;
     std::thread thread_;
 };
 
@@ -138,6 +158,52 @@ TEST(StreamFeed, WaitsWhenAQueueFillsUpSoThatNothingIsDropped) {
     feed.Settle();
     EXPECT_EQ(module.dropped, 0);
     EXPECT_EQ(module.taken, 3000);
+}
+
+// As after a machine that was suspended.
+TEST(StreamFeed, AModuleThatHaltedIsWaitedForAgainAsSoonAsItMoves) {
+    QueueingModule module;
+    StreamFeed feed(module, std::chrono::milliseconds(500));
+    module.Halt();
+    for (int i = 0; i < 100; ++i) {
+        feed.PushVideo(i, Bytes(1), 1);
+    }
+    const int dropped = module.dropped;
+    EXPECT_GT(dropped, 0);
+    module.Resume();
+    for (int i = 100; i < 3000; ++i) {
+        feed.PushVideo(i, Bytes(1), 1);
+    }
+    feed.Settle();
+    EXPECT_EQ(module.dropped, dropped);
+}
+
+// Not even a dropped mark counts as one that came through.
+TEST(StreamFeed, AModuleThatHaltsIsWaitedForOnce) {
+    QueueingModule module;
+    module.Halt();
+    constexpr std::chrono::milliseconds kPatience{300};
+    StreamFeed feed(module, kPatience);
+    const auto begin = std::chrono::steady_clock::now();
+    for (int i = 0; i < 300; ++i) {
+        feed.PushVideo(i, Bytes(1), 1);
+    }
+    const auto passed = std::chrono::steady_clock::now() - begin;
+    EXPECT_GE(passed, kPatience);
+    EXPECT_LT(passed, 3 * kPatience);
+}
+
+TEST(StreamFeed, AQueueThatHaltsDoesNotLetTheOthersOverflow) {
+    QueueingModule module;
+    module.keepsAudio = true;
+    StreamFeed feed(module, std::chrono::milliseconds(500));
+    for (int i = 0; i < 3000; ++i) {
+        if (i < 60) {
+            feed.PushAudio(i, Bytes(1), 1);
+        }
+        feed.PushVideo(i, Bytes(1), 1);
+    }
+    EXPECT_EQ(module.dropped, 0);
 }
 
 /// Lets go of everything, on a thread of its own, when the last of the three marks has come.

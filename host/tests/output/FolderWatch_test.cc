@@ -9,6 +9,8 @@
 #include <mutex>
 #include <thread>
 
+#include "common/ReceiverError.h"
+
 namespace receiver {
 namespace {
 
@@ -84,6 +86,19 @@ TEST_F(FolderWatchTest, DatesAreThoseOfTheLocalTime) {
     setenv("TZ", "UTC-13", 1);
     tzset();
     EXPECT_EQ(DateOf(kNoon), "20261122");
+}
+
+TEST_F(FolderWatchTest, TomorrowIsTheNextDateAlsoWhereADayHas23Or25Hours) {
+    // Central Europe: summer from the last Sunday of March to the last one of October.
+    setenv("TZ", "CET-1CEST,M3.5.0,M10.5.0/3", 1);
+    tzset();
+    // 2026-03-28, 23:30 local time; 2026-10-25, 00:30; 2026-12-31, 12:00.
+    EXPECT_EQ(DateAfter(1774737000), "20260329");
+    EXPECT_EQ(DateAfter(1792881000), "20261026");
+    EXPECT_EQ(DateAfter(1798714800), "20270101");
+    ScriptedFolder folder(script_);
+    Set([](Script& script) { script.obstacles["20260329/CAM1"] = "closed"; });
+    EXPECT_THROW(ExpectDatedFolders(folder, "CAM1", 1774737000), ReceiverError);
 }
 
 TEST_F(FolderWatchTest, TellsTheLatestFreeSpace) {
