@@ -57,18 +57,24 @@ constexpr std::int64_t kJitter = 1024;
 /// Samples of silence that fill a gap here; a longer one begins anew.
 constexpr std::int64_t kLongestFill = std::int64_t{10} * kAudioRate;
 
+/// "48 kHz stereo"
+std::string RateAndLayout(int rate, const AVChannelLayout& channels) {
+    std::array<char, 32> text{};
+    std::snprintf(text.data(), text.size(), "%.6g kHz ", rate / 1000.0);
+    std::array<char, 64> layout{};
+    av_channel_layout_describe(&channels, layout.data(), layout.size());
+    return std::string(text.data()) + layout.data();
+}
+
 }  // namespace
 
 std::string AudioSummary(const AVCodecParameters& parameters) {
-    std::array<char, 32> rate{};
-    std::snprintf(rate.data(), rate.size(), " %.6g kHz ", parameters.sample_rate / 1000.0);
-    std::array<char, 64> layout{};
-    av_channel_layout_describe(&parameters.ch_layout, layout.data(), layout.size());
     const char* const profile = avcodec_profile_name(parameters.codec_id, parameters.profile);
     std::string codec = avcodec_get_name(parameters.codec_id);
     std::transform(codec.begin(), codec.end(), codec.begin(),
                    [](char c) { return c >= 'a' && c <= 'z' ? static_cast<char>(c - 'a' + 'A') : c; });
-    return codec + (profile != nullptr ? std::string(" ") + profile : "") + rate.data() + layout.data();
+    return codec + (profile != nullptr ? std::string(" ") + profile : "") + " " +
+           RateAndLayout(parameters.sample_rate, parameters.ch_layout);
 }
 
 bool CanPass(const AVCodecParameters& parameters, const AVPacket* first) {
@@ -145,6 +151,9 @@ void AudioConverter::Push(const AVPacket& packet, const AudioSink& sink) {
     }
     failures_ = 0;
     Receive(sink);
+    if (foreign_ >= kForeign) {
+        throw FormatChanged("the audio changed from " + format_ + " to " + foreignFormat_);
+    }
 }
 
 void AudioConverter::Receive(const AudioSink& sink) {
@@ -157,7 +166,7 @@ void AudioConverter::Receive(const AudioSink& sink) {
             ++damaged_;
             return;
         }
-        if (frame_->pts != AV_NOPTS_VALUE) {
+        if (frame_->pts != AV_NOPTS_VALUE && !IsForeign(*frame_)) {
             Resample(frame_.get(), av_rescale(frame_->pts, kAudioRate, 90000));
         }
         av_frame_unref(frame_.get());
@@ -165,9 +174,20 @@ void AudioConverter::Receive(const AudioSink& sink) {
     }
 }
 
+bool AudioConverter::IsForeign(const AVFrame& frame) {
+    const bool foreign =
+        resampler_ && (inputRate_ != frame.sample_rate || inputChannels_ != frame.ch_layout.nb_channels);
+    if (foreign) {
+        ++foreign_;
+        foreignFormat_ = RateAndLayout(frame.sample_rate, frame.ch_layout);
+    } else {
+        damaged_ += std::exchange(foreign_, 0);
+    }
+    return foreign;
+}
+
 void AudioConverter::SetUpResampler(const AVFrame& frame) {
-    if (resampler_ && inputRate_ == frame.sample_rate && inputFormat_ == frame.format &&
-        inputChannels_ == frame.ch_layout.nb_channels) {
+    if (resampler_ && inputFormat_ == frame.format) {
         return;
     }
     AVChannelLayout stereo = AV_CHANNEL_LAYOUT_STEREO;
@@ -185,6 +205,7 @@ void AudioConverter::SetUpResampler(const AVFrame& frame) {
     inputRate_ = frame.sample_rate;
     inputFormat_ = frame.format;
     inputChannels_ = frame.ch_layout.nb_channels;
+    format_ = RateAndLayout(frame.sample_rate, frame.ch_layout);
 }
 
 void AudioConverter::Resample(const AVFrame* frame, std::int64_t time) {

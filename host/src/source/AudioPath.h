@@ -58,6 +58,8 @@ class AudioConverter final : public AudioPathInterface {
 
  private:
     void Receive(const AudioSink& sink);
+    /// True for a frame of another rate or with other channels than those before, which is left out.
+    bool IsForeign(const AVFrame& frame);
     void SetUpResampler(const AVFrame& frame);
     /// Null: what the resampler holds.
     void Resample(const AVFrame* frame, std::int64_t time);
@@ -70,6 +72,7 @@ class AudioConverter final : public AudioPathInterface {
     int inputRate_ = 0;
     int inputFormat_ = -1;
     int inputChannels_ = 0;
+    std::string format_;
     AudioEncoder encoder_;
     libav::Owner<AVAudioFifo> fifo_;
     libav::Owner<AVFrame> frame_;
@@ -80,6 +83,9 @@ class AudioConverter final : public AudioPathInterface {
     std::uint64_t damaged_ = 0;
     /// Packets in a row that could not be decoded.
     int failures_ = 0;
+    /// Frames in a row that are none of the format, and what the last one was.
+    std::uint64_t foreign_ = 0;
+    std::string foreignFormat_;
 };
 
 }  // namespace receiver

@@ -16,7 +16,12 @@ constexpr int kFasterSteps = 12;
 constexpr int kSlowerSteps = 25;
 /// Steps back, with no more pictures between them, that a clock which is set does not take.
 constexpr int kStepsBack = 3;
+/// Pictures in a row, shown by more or less behind their decoding than those before, that are more than a
+/// damaged stamp.
+constexpr int kDelayed = 2;
 constexpr int kReorderDepth = 16;
+
+constexpr const char* kReordered = "the video begins to send its pictures reordered (B frames)";
 
 /// First bytes of the parameter sets of HEVC (ITU-T H.265 7.3.1.2, types 32, 33 and 34). In H.264 they would
 /// be an unspecified type and data partitions.
@@ -58,24 +63,36 @@ void FormatWatch::Look(std::span<const unsigned char> picture, std::optional<std
     if (!untouched_ || !stamp) {
         return;
     }
+    if (delay) {
+        LookAtDelay(*delay);
+    }
     if (stamp_) {
-        LookAtOrder(*stamp - *stamp_, delay);
+        LookAtOrder(*stamp - *stamp_);
         LookAtRate(*stamp - *stamp_);
     }
     stamp_ = stamp;
+}
+
+void FormatWatch::LookAtDelay(std::int64_t delay) {
+    if (delay_ && std::abs(delay - *delay_) > period_ / 2) {
+        if (++delayed_ >= kDelayed) {
+            throw FormatChanged(kReordered);
+        }
+        return;
+    }
+    delayed_ = 0;
     delay_ = delay;
 }
 
-void FormatWatch::LookAtOrder(std::int64_t step, std::optional<std::int64_t> delay) {
-    const bool delayed = delay && delay_ && std::abs(*delay - *delay_) > period_ / 2;
+void FormatWatch::LookAtOrder(std::int64_t step) {
     if (step < 0 && step > -period_ * kReorderDepth) {
         backward_ = forward_ <= kReorderDepth ? backward_ + 1 : 1;
         forward_ = 0;
     } else {
         ++forward_;
     }
-    if (delayed || backward_ >= kStepsBack) {
-        throw FormatChanged("the video begins to send its pictures reordered (B frames)");
+    if (backward_ >= kStepsBack) {
+        throw FormatChanged(kReordered);
     }
 }
 

@@ -33,7 +33,8 @@ class FormatWatch {
               std::optional<std::int64_t> delay);
 
  private:
-    void LookAtOrder(std::int64_t step, std::optional<std::int64_t> delay);
+    void LookAtDelay(std::int64_t delay);
+    void LookAtOrder(std::int64_t step);
     void LookAtRate(std::int64_t step);
 
     const AVCodecID codec_;
@@ -41,7 +42,9 @@ class FormatWatch {
     /// Ticks of a picture.
     const std::int64_t period_;
     std::optional<std::int64_t> stamp_;
+    /// The last one that was as usual, and how many pictures in a row were not.
     std::optional<std::int64_t> delay_;
+    int delayed_ = 0;
     /// Pictures since the last one that was stamped in front of another, and how many such came close
     /// together.
     int forward_ = 0;

@@ -88,7 +88,12 @@ std::string Reason(int result) {
 
 Input::Input(const std::string& url, double timeout, double patience, std::shared_ptr<Interrupt> interrupt,
              bool (*stop)())
-    : url_(url), timeout_(timeout), patience_(patience), interrupt_(std::move(interrupt)), stop_(stop) {
+    : url_(url),
+      timeout_(timeout),
+      patience_(patience),
+      interrupt_(std::move(interrupt)),
+      opener_(std::this_thread::get_id()),
+      stop_(stop) {
     Open();
     stop_ = nullptr;
     Alive();
@@ -96,7 +101,12 @@ Input::Input(const std::string& url, double timeout, double patience, std::share
 
 int Input::OnWait(void* input) {
     Input& self = *static_cast<Input*>(input);
-    return self.interrupt_->Stopped() || self.Expired() || (self.stop_ != nullptr && self.stop_()) ? 1 : 0;
+    return self.Expired() || self.StopAsked() ? 1 : 0;
+}
+
+bool Input::StopAsked() const {
+    // The thread comes first: on another one not even the pointer may be read.
+    return interrupt_->Stopped() || (std::this_thread::get_id() == opener_ && stop_ != nullptr && stop_());
 }
 
 void Input::Expect(double seconds) {
@@ -164,7 +174,7 @@ void Input::FindStreams() {
     if (result < 0) {
         FailOpening(result);
     }
-    if (Expired() || interrupt_->Stopped() || (stop_ != nullptr && stop_())) {
+    if (Expired() || StopAsked()) {
         FailOpening(AVERROR_EXIT);
     }
 }
@@ -206,7 +216,7 @@ void Input::CarryOn(std::int64_t position) {
 }
 
 void Input::FailOpening(int result) {
-    if (interrupt_->Stopped() || (stop_ != nullptr && stop_())) {
+    if (StopAsked()) {
         throw Stopped();
     }
     const std::string shown = "'" + WithoutCredentials(url_) + "'";
@@ -261,7 +271,7 @@ int Input::ReadFrame(AVPacket& packet) {
         const bool over = Expired() && ++drained_ > kLongestDrain;
         result = over ? AVERROR_EXIT : av_read_frame(format_.get(), &packet);
         // So they end a search in bytes that are no transport stream, and go on with it when they are asked.
-    } while (result == AVERROR(EAGAIN) && !interrupt_->Stopped() && (stop_ == nullptr || !stop_()));
+    } while (result == AVERROR(EAGAIN) && !StopAsked());
     return result;
 }
 
@@ -308,7 +318,7 @@ void Input::CheckLength() const {
 bool Input::Read(AVPacket& packet) {
     libav::ForgetErrors();
     const int result = ReadFrame(packet);
-    if (interrupt_->Stopped() || (stop_ != nullptr && stop_())) {
+    if (StopAsked()) {
         throw Stopped();
     }
     if (result >= 0) {

@@ -7,6 +7,7 @@
 #include <set>
 #include <stdexcept>
 #include <string>
+#include <thread>
 
 #include "common/ReceiverError.h"
 #include "source/Interrupt.h"
@@ -38,8 +39,8 @@ class Input {
  public:
     /// Opens `url` and finds out what it carries. `patience`: seconds that it may take to answer. `timeout`:
     /// seconds that may pass later between two calls of `Alive`, 30 at the least for HLS. `stop` may be null;
-    /// it is asked until this returns. Throws `ReceiverError` (`kSourceUnavailable`), of it `SourceAbsent`
-    /// where a later attempt may succeed, and `Stopped`.
+    /// it is asked until this returns, on the calling thread alone. Throws `ReceiverError`
+    /// (`kSourceUnavailable`), of it `SourceAbsent` where a later attempt may succeed, and `Stopped`.
     Input(const std::string& url, double timeout, double patience, std::shared_ptr<Interrupt> interrupt,
           bool (*stop)());
 
@@ -72,6 +73,7 @@ class Input {
 
     /// Asked by the libraries while they wait. Not 0 ends the wait.
     static int OnWait(void* input);
+    bool StopAsked() const;
     void Expect(double seconds);
     bool Expired();
     AVFormatContext* NewFormat();
@@ -93,9 +95,12 @@ class Input {
     double timeout_;
     const double patience_;
     const std::shared_ptr<Interrupt> interrupt_;
+    /// The thread of the constructor. The libraries may ask on threads of their own, and `stop_` is not for
+    /// these.
+    const std::thread::id opener_;
     /// Null once the source is open.
     bool (*stop_)();
-    /// When the present wait is over, on the steady clock. The libraries may ask on threads of their own.
+    /// When the present wait is over, on the steady clock.
     std::atomic<std::chrono::steady_clock::rep> deadline_{0};
     /// A wait was over. The libraries may give out what they still hold before they tell.
     std::atomic<bool> timedOut_{false};

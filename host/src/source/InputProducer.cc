@@ -59,6 +59,19 @@ bool InputProducer::Produce(Batch& batch) {
     away_ = connection_ == nullptr;
     bool more = true;
     try {
+        more = Step();
+    } catch (const ReceiverError& error) {
+        Fail(error);
+    }
+    Publish();
+    Batch made = assembler_.Take();
+    std::move(made.begin(), made.end(), std::back_inserter(batch));
+    return more;
+}
+
+bool InputProducer::Step() {
+    bool more = true;
+    try {
         if (!connection_) {
             TryAgain();
         } else {
@@ -92,25 +105,34 @@ bool InputProducer::Produce(Batch& batch) {
     } catch (const Stopped&) {
         more = false;
     }
-    Publish();
-    Batch made = assembler_.Take();
-    std::move(made.begin(), made.end(), std::back_inserter(batch));
     return more;
 }
 
 void InputProducer::Lose(const std::string& reason) {
-    const auto now = Clock::now();
-    if (now - connected_ > kGood) {
-        attempts_ = 0;
-    }
     connection_->Finish();
+    Drop();
     if (options_.reconnect && !recorded_) {
         assembler_.AddNotice("the source was lost: " + reason + NextAttempt());
-        told_ = now;
+        told_ = lost_;
+    }
+}
+
+void InputProducer::Fail(const ReceiverError& error) {
+    if (connection_) {
+        // What its decoders and encoders hold cannot be relied on any more.
+        assembler_.Finish();
+        Drop();
+    }
+    EndWith(error);
+}
+
+void InputProducer::Drop() {
+    lost_ = Clock::now();
+    if (lost_ - connected_ > kGood) {
+        attempts_ = 0;
     }
     KeepCounts();
     connection_.reset();
-    lost_ = now;
 }
 
 void InputProducer::KeepCounts() {

@@ -34,7 +34,13 @@ class InputProducer final : public ProducerInterface {
  private:
     using Clock = std::chrono::steady_clock;
 
+    /// One attempt, or one packet of the present connection. False at the end. Throws `ReceiverError` for a
+    /// connection that cannot be recorded any further.
+    bool Step();
     void Lose(const std::string& reason);
+    /// Ends a connection that cannot be recorded any further.
+    void Fail(const ReceiverError& error);
+    void Drop();
     /// Keeps the counts of the connection, which is over.
     void KeepCounts();
     void TryAgain();

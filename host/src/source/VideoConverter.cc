@@ -10,6 +10,21 @@ extern "C" {
 #include "source/TimecodeReader.h"
 
 namespace receiver {
+namespace {
+
+/// Null where nothing can be read of the pictures' timing: the decoder makes of them what it can.
+std::unique_ptr<ByteStreamFilter> FilterFor(const AVCodecParameters& parameters) {
+    if (parameters.codec_id != AV_CODEC_ID_H264) {
+        return nullptr;
+    }
+    try {
+        return std::make_unique<ByteStreamFilter>(parameters);
+    } catch (const ReceiverError&) {
+        return nullptr;
+    }
+}
+
+}  // namespace
 
 VideoConverter::VideoConverter(const AVCodecParameters& parameters, const VideoEncoding& encoding,
                                AVRational sourceRate, bool buildsUp)
@@ -17,6 +32,7 @@ VideoConverter::VideoConverter(const AVCodecParameters& parameters, const VideoE
       sourceRate_(sourceRate),
       period_(sourceRate.num > 0 ? av_rescale(90000, sourceRate.den, sourceRate.num) : 0),
       encoder_(encoding),
+      stream_(FilterFor(parameters)),
       frame_(libav::NewFrame()) {
     const AVCodec* const decoder = avcodec_find_decoder(parameters.codec_id);
     if (decoder == nullptr) {
@@ -24,8 +40,8 @@ VideoConverter::VideoConverter(const AVCodecParameters& parameters, const VideoE
                             "the video (" + std::string(avcodec_get_name(parameters.codec_id)) +
                                 ") cannot be decoded: set the encoder to H.264 without B frames");
     }
-    if (parameters.codec_id == AV_CODEC_ID_H264) {
-        timing_.emplace();
+    if (stream_) {
+        timing_.Look(stream_->OutOfBand());
     }
     decoder_ = libav::NewCodec(decoder);
     libav::Check(avcodec_parameters_to_context(decoder_.get(), &parameters),
@@ -41,8 +57,8 @@ VideoConverter::VideoConverter(const AVCodecParameters& parameters, const VideoE
 }
 
 void VideoConverter::Push(const AVPacket& packet, const PictureSink& sink) {
-    if (timing_) {
-        timing_->Look(NalUnits({packet.data, static_cast<std::size_t>(packet.size)}));
+    if (stream_) {
+        timing_.Look(NalUnits(BytesOf(stream_->Filter(packet))));
     }
     if (avcodec_send_packet(decoder_.get(), &packet) < 0) {
         ++damaged_;
@@ -109,8 +125,8 @@ void VideoConverter::Encode(const PictureSink& sink) {
             lastFrame_ = picture->pts;
             std::optional<Timecode> timecode =
                 sameRate ? TimecodeOf(*picture, sourceRate_) : std::optional<Timecode>();
-            if (timecode && timing_) {
-                timecode->dropFrame |= timing_->DropFrame();
+            if (timecode) {
+                timecode->dropFrame |= timing_.DropFrame();
             }
             picture->pict_type = AV_PICTURE_TYPE_NONE;
             encoder_.Encode(picture.get(), [&](const CodedPicture& coded) {

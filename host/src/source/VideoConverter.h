@@ -2,6 +2,7 @@
 
 #include <memory>
 
+#include "source/ByteStreamFilter.h"
 #include "source/FilterGraph.h"
 #include "source/PictureTiming.h"
 #include "source/VideoEncoder.h"
@@ -41,8 +42,9 @@ class VideoConverter final : public VideoPathInterface {
     int filterWidth_ = 0;
     int filterHeight_ = 0;
     int filterFormat_ = -1;
-    /// Of H.264 as byte stream.
-    std::optional<PictureTiming> timing_;
+    /// Of H.264.
+    std::unique_ptr<ByteStreamFilter> stream_;
+    PictureTiming timing_;
     libav::Owner<AVFrame> frame_;
     std::int64_t lastFrame_ = -1;
     /// Where the last picture that was decoded is over.

@@ -9,10 +9,6 @@
 namespace receiver {
 namespace {
 
-std::span<const unsigned char> BytesOf(const AVPacket& packet) {
-    return {packet.data, static_cast<std::size_t>(packet.size)};
-}
-
 /// A movie file tells the size of a parameter set in 16 bits (ISO/IEC 14496-15 5.3.3.1).
 constexpr std::size_t kLargestParameterSet = 65535;
 
@@ -32,42 +28,19 @@ void CheckParameterSets(const std::vector<NalUnit>& units) {
 }  // namespace
 
 VideoPass::VideoPass(const AVCodecParameters& parameters)
-    : packet_(libav::NewPacket()),
+    : filter_(parameters),
       width_(static_cast<std::uint32_t>(parameters.width)),
       height_(static_cast<std::uint32_t>(parameters.height)) {
-    AVBSFContext* filter = nullptr;
-    libav::Check(av_bsf_alloc(av_bsf_get_by_name("h264_mp4toannexb"), &filter),
-                 "convert the video's packets");
-    filter_.reset(filter);
-    libav::Check(avcodec_parameters_copy(filter_->par_in, &parameters), "read the parameters of the video");
-    libav::Check(av_bsf_init(filter_.get()), "read the parameter sets of the video");
-    const AVCodecParameters& stream = *filter_->par_out;
-    if (stream.extradata != nullptr) {
-        const auto units = NalUnits({stream.extradata, static_cast<std::size_t>(stream.extradata_size)});
-        CheckParameterSets(units);
-        sets_.Learn(units);
-        timing_.Look(units);
-    }
-    parser_ = std::make_unique<PictureParser>(stream);
-    timecodes_ = std::make_unique<TimecodeReader>(stream);
-}
-
-AVPacket& VideoPass::Filter(const AVPacket& packet) {
-    av_packet_unref(packet_.get());
-    libav::Check(av_packet_ref(packet_.get(), &packet), "hold a packet");
-    // One packet in, one out.
-    if (av_bsf_send_packet(filter_.get(), packet_.get()) < 0 ||
-        av_bsf_receive_packet(filter_.get(), packet_.get()) < 0) {
-        av_packet_unref(packet_.get());
-        av_bsf_flush(filter_.get());
-    }
-    return *packet_;
+    const auto units = filter_.OutOfBand();
+    CheckParameterSets(units);
+    sets_.Learn(units);
+    timing_.Look(units);
+    parser_ = std::make_unique<PictureParser>(filter_.Stream());
+    timecodes_ = std::make_unique<TimecodeReader>(filter_.Stream());
 }
 
 bool VideoPass::IsStart(const AVPacket& packet) {
-    // The filter has no memory that a second run would disturb.
-    const AVPacket& stream = Filter(packet);
-    return Contains(NalUnits(BytesOf(stream)), kNalIdr);
+    return Contains(NalUnits(BytesOf(filter_.Filter(packet))), kNalIdr);
 }
 
 void VideoPass::CheckFormat(const AVPacket& stream) {
@@ -88,7 +61,7 @@ void VideoPass::CheckFormat(const AVPacket& stream) {
 void VideoPass::CheckParameters(const AVPacket& packet) const {
     std::size_t size = 0;
     const std::uint8_t* const told = av_packet_get_side_data(&packet, AV_PKT_DATA_NEW_EXTRADATA, &size);
-    const AVCodecParameters& known = *filter_->par_in;
+    const AVCodecParameters& known = filter_.Source();
     if (told != nullptr && !std::equal(told, told + size, known.extradata,
                                        known.extradata + std::max(0, known.extradata_size))) {
         throw FormatChanged("the parameter sets of the video changed");
@@ -97,7 +70,7 @@ void VideoPass::CheckParameters(const AVPacket& packet) const {
 
 void VideoPass::Push(const AVPacket& packet, const PictureSink& sink) {
     CheckParameters(packet);
-    const AVPacket& stream = Filter(packet);
+    const AVPacket& stream = filter_.Filter(packet);
     if (stream.size == 0) {
         ++damaged_;
         return;

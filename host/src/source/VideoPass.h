@@ -2,7 +2,7 @@
 
 #include <memory>
 
-#include "source/AnnexB.h"
+#include "source/ByteStreamFilter.h"
 #include "source/PictureParser.h"
 #include "source/PictureTiming.h"
 #include "source/TimecodeReader.h"
@@ -23,15 +23,12 @@ class VideoPass final : public VideoPathInterface {
     std::uint64_t Damaged() const override { return damaged_; }
 
  private:
-    /// The packet as byte stream.
-    AVPacket& Filter(const AVPacket& packet);
     /// Throws `FormatChanged`.
     void CheckFormat(const AVPacket& stream);
     /// Parameter sets out of band that are not those of the beginning. Throws `FormatChanged`.
     void CheckParameters(const AVPacket& packet) const;
 
-    libav::Owner<AVBSFContext> filter_;
-    libav::Owner<AVPacket> packet_;
+    ByteStreamFilter filter_;
     ParameterSets sets_;
     std::unique_ptr<PictureParser> parser_;
     std::unique_ptr<TimecodeReader> timecodes_;

@@ -1,5 +1,6 @@
 #include <atomic>
 #include <chrono>
+#include <fstream>
 #include <future>
 
 #include "SourceTesting.h"
@@ -171,6 +172,50 @@ TEST_F(NetworkSource, ALostSourceComesBackWithTheTimeThatPassed) {
     EXPECT_LE(gap, passed.count() * 90 + 90000);
     EXPECT_EQ(gap % 3600, 0);
     EXPECT_EQ(video[first + 1].time - video[first].time, 3600);
+}
+
+TEST_F(NetworkSource, AParameterSetThatNoFileCanHoldEndsTheConnectionAlone) {
+    MakeMaterial("3");
+    Ffmpeg("-i a.ts -c copy a.h264");
+    const string plain = FileBytes(Path("a.h264"));
+    // The last of seven, behind 72 pictures. A picture parameter set with the number 2 that nobody refers to.
+    const std::size_t idr = plain.rfind(string("\0\0\1\x65", 4));
+    ASSERT_NE(idr, string::npos);
+    std::ofstream(Path("large.h264"), std::ios::binary)
+        << plain.substr(0, idr) << string("\0\0\1\x68\x6F", 5) << string(65534, '\x55') << plain.substr(idr);
+    Ffmpeg("-r 25 -i large.h264 -c copy large.ts");
+    StreamServer server({HttpStream(FileBytes(Path("large.ts"))), HttpStream(FileBytes(Path("a.ts")))});
+    const auto source = OpenSource(Live(server.Http()), notices_, nullptr);
+    const auto video = Of(Medium::kVideo, ReadPictures(*source, 72 + 10));
+    ASSERT_EQ(video.size(), 82u);
+    EXPECT_TRUE(video[72].keyFrame);
+    // The pause.
+    EXPECT_GE(video[72].time - video[71].time, 90000 - 3600);
+    EXPECT_EQ(source->Counts().reconnections, 1u);
+    EXPECT_EQ(
+        notices_.CountOf("the video has a parameter set of 65536 bytes, and a file holds none above "
+                         "65535: set the encoder to parameter sets without padding; trying again in 1 s"),
+        1u)
+        << testing::PrintToString(notices_.sentences);
+    EXPECT_EQ(notices_.CountOf("the source is back after 1 s"), 1u);
+}
+
+TEST_F(NetworkSource, WhatASourceBecomesIsTriedAgainWhereItCannotBeRecorded) {
+    MakeMaterial("1");
+    Ffmpeg(string(kPicture) + kTone +
+           " -pix_fmt yuv420p -c:v libx264 -preset ultrafast -g 12 -bf 2 -sc_threshold 0 " + kPlainAac +
+           "-muxdelay 0 -output_ts_offset 2.4 -mpegts_flags +initial_discontinuity reordered.ts");
+    const string plain = FileBytes(Path("a.ts"));
+    StreamServer server({HttpStream(plain + FileBytes(Path("reordered.ts"))), HttpStream(plain)});
+    const auto source = OpenSource(Live(server.Http()), notices_, nullptr);
+    // Of those that come reordered, one or two come before they are known to.
+    const auto video = Of(Medium::kVideo, ReadPictures(*source, 25 + 2 + 10));
+    EXPECT_EQ(source->Counts().reconnections, 1u);
+    EXPECT_EQ(notices_.CountOf("the video has reordered pictures (B frames): set the encoder to no B frames, "
+                               "or use --transcode; trying again in 1 s"),
+              1u)
+        << testing::PrintToString(notices_.sentences);
+    EXPECT_EQ(notices_.CountOf("the source is back after 1 s"), 1u);
 }
 
 TEST_F(NetworkSource, ALostSourceIsTriedAgainAfterGrowingPauses) {

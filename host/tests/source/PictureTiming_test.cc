@@ -183,10 +183,18 @@ TEST_F(PictureTimingOfFiles, TimecodesOfIdrFramesAreReadAndCountedOn) {
 
 TEST_F(PictureTimingOfFiles, TheCountingTypeTellsOfDropFrameWithoutADroppedNumber) {
     Make("30000/1001", {{10, 0, 59, 20, false}, {10, 1, 0, 4, false}, {10, 1, 0, 16, false}}, 4);
-    for (const bool transcode : {false, true}) {
-        SourceOptions options = Fast("timed.ts");
-        options.transcode = transcode;
-        options.width = transcode ? std::optional<std::uint32_t>(64) : std::nullopt;
+    // Its units have lengths in front of them, and the parameter sets stand in its header.
+    Ffmpeg("-i timed.ts -c copy -bsf:v 'filter_units=remove_types=7|8' timed.mp4");
+    struct Case {
+        const char* file;
+        bool transcode;
+    };
+    for (const Case& test : {Case{"timed.ts", false}, Case{"timed.ts", true}, Case{"timed.mp4", false},
+                             Case{"timed.mp4", true}}) {
+        SCOPED_TRACE(string(test.file) + (test.transcode ? " converted" : ""));
+        SourceOptions options = Fast(test.file);
+        options.transcode = test.transcode;
+        options.width = test.transcode ? std::optional<std::uint32_t>(64) : std::nullopt;
         const auto video = Of(Medium::kVideo, ReadAll(*OpenSource(options, notices_, nullptr)));
         ASSERT_GE(video.size(), 29u);
         EXPECT_EQ(video[0].timecode, (Timecode{10, 0, 59, 20, true}));
