@@ -56,6 +56,27 @@ TEST(SmbCredentials, TakeTheDomainFromEitherForm) {
     EXPECT_EQ(fields(""), "||p");
 }
 
+int resultOfLogon(const SambaServer& server, const std::string& user, const std::string& password) {
+    return SmbClient(library(), parsed(server.Path()), SmbCredentials::Of(user, password), kPatience)
+        .Connect();
+}
+
+TEST(SmbClientLogon, TakesNoGuestsRightsForAnUnknownUser) {
+    const SambaServer server(SambaServer::Shares{{"rec", {"guest ok = yes"}}}, {"map to guest = Bad User"});
+    EXPECT_EQ(resultOfLogon(server, "nobody-here", "x"), EACCES);
+    EXPECT_EQ(resultOfLogon(server, SambaServer::kUser, SambaServer::kPassword), 0);
+    EXPECT_EQ(resultOfLogon(server, "", ""), 0);
+    EXPECT_EQ(resultOfLogon(server, "nobody-here", "x"), EACCES);
+}
+
+TEST(SmbClientLogon, TakesNoGuestsRightsForAWrongPassword) {
+    const SambaServer server(SambaServer::Shares{{"rec", {"guest ok = yes"}}},
+                             {"map to guest = Bad Password"});
+    EXPECT_EQ(resultOfLogon(server, SambaServer::kUser, "wrong"), EACCES);
+    EXPECT_EQ(resultOfLogon(server, SambaServer::kUser, SambaServer::kPassword), 0);
+    EXPECT_EQ(resultOfLogon(server, "", ""), 0);
+}
+
 class SmbClientTest : public ::testing::Test {
  protected:
     std::unique_ptr<SmbClient> connect(const std::string& path) {

@@ -8,6 +8,7 @@
 #include <sys/statvfs.h>
 
 #include <algorithm>
+#include <array>
 #include <cerrno>
 #include <chrono>
 #include <cstdio>
@@ -57,6 +58,29 @@ class Turn {
 
  private:
     std::optional<MutexLock> lock_;
+};
+
+/// Connections that begin meanwhile are signed, whatever else smb.conf(5) says. A server that would rather
+/// make a guest of who it does not know has no key to sign with, and that logon fails. Under `ProcessLock`.
+class RequiredSigning {
+ public:
+    explicit RequiredSigning(const SmbLibrary& library)
+        : library_(library), before_(kNames.at(static_cast<std::size_t>(library.clientSigning() + 1))) {
+        set("required");
+    }
+    ~RequiredSigning() { set(before_); }
+    RequiredSigning(const RequiredSigning&) = delete;
+    RequiredSigning& operator=(const RequiredSigning&) = delete;
+
+ private:
+    /// From the number -1 on.
+    static constexpr std::array<const char*, 5> kNames{"default", "disabled", "if_required", "desired",
+                                                       "required"};
+
+    void set(const char* value) const { library_.setParameter(-1, "client signing", value); }
+
+    const SmbLibrary& library_;
+    const char* const before_;
 };
 
 /// Keeps what all contexts share alive. Under `ProcessLock`.
@@ -121,7 +145,7 @@ SMBCCTX* SmbClient::makeContext(std::chrono::milliseconds answerTimeout) {
     library_.setFunctionAuthDataWithContext(context, fillIn);
     library_.setUser(context, credentials_.user.c_str());
     library_.setWorkgroup(context, credentials_.domain.c_str());
-    // Credentials that are refused would else be followed by an attempt as a guest.
+    // Credentials that are refused would else be followed by an attempt as a guest, of the library's own.
     library_.setOptionNoAutoAnonymousLogin(context, ownRights ? 0 : 1);
     library_.setOptionUseKerberos(context, ownRights ? 1 : 0);
     library_.setOptionFallbackAfterKerberos(context, ownRights ? 1 : 0);
@@ -184,6 +208,10 @@ int SmbClient::Connect() {
         return lost_ = unreachable;
     }
     MutexLock lock(SmbLibrary::ProcessLock());
+    std::optional<RequiredSigning> signing;
+    if (!credentials_.user.empty()) {
+        signing.emplace(library_);
+    }
     struct stat status = {};
     errno = 0;
     const int result = library_.getFunctionStat(context_)(context_, share_.ShareUrl().c_str(), &status);

@@ -29,8 +29,9 @@ struct SmbStatus {
     std::uint64_t size = 0;
 };
 
-/// One connection to one share, over SMB 2 or later, signed and encrypted as the server asks for it. Never
-/// connects again by itself: a connection that is lost stays lost, and all operations fail from then on.
+/// One connection to one share, over SMB 2 or later, encrypted as the server asks for it. That of a user is
+/// signed, one with the process's own rights as the server asks for it. Never connects again by itself: a
+/// connection that is lost stays lost, and all operations fail from then on.
 ///
 /// Used by one thread from the constructor to the destructor; each operation may wait for the network, some
 /// for several of its time-outs. All return an error number, 0 for success. URLs are those of `SharePath`.

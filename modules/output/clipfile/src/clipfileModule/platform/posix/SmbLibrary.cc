@@ -58,7 +58,9 @@ bool findAll(void* handle, SmbLibrary& library) {
            find(handle, "smbc_getFunctionRead", library.getFunctionRead) &&
            find(handle, "smbc_getFunctionWrite", library.getFunctionWrite) &&
            find(handle, "smbc_getFunctionClose", library.getFunctionClose) &&
-           find(handle, "smbc_getFunctionUnlink", library.getFunctionUnlink);
+           find(handle, "smbc_getFunctionUnlink", library.getFunctionUnlink) &&
+           find(handle, "lp_client_signing", library.clientSigning) &&
+           find(handle, "lp_do_parameter", library.setParameter);
 }
 
 LoadResult load() {
