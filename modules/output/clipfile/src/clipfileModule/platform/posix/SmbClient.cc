@@ -138,7 +138,6 @@ SMBCCTX* SmbClient::makeContext(std::chrono::milliseconds answerTimeout) {
     if (context == nullptr) {
         return nullptr;
     }
-    const bool ownRights = credentials_.user.empty();
     library_.setDebug(context, 0);
     library_.setTimeout(context, static_cast<int>(answerTimeout.count()));
     library_.setOptionUserData(context, this);
@@ -146,9 +145,8 @@ SMBCCTX* SmbClient::makeContext(std::chrono::milliseconds answerTimeout) {
     library_.setUser(context, credentials_.user.c_str());
     library_.setWorkgroup(context, credentials_.domain.c_str());
     // Credentials that are refused would else be followed by an attempt as a guest, of the library's own.
-    library_.setOptionNoAutoAnonymousLogin(context, ownRights ? 0 : 1);
-    library_.setOptionUseKerberos(context, ownRights ? 1 : 0);
-    library_.setOptionFallbackAfterKerberos(context, ownRights ? 1 : 0);
+    library_.setOptionNoAutoAnonymousLogin(context, credentials_.user.empty() ? 0 : 1);
+    library_.setOptionUseKerberos(context, 0);
     library_.setOptionUseCCache(context, 0);
     library_.setFunctionCheckServer(context, trustServer);
     addServer_ = library_.getFunctionAddCachedServer(context);

@@ -11,8 +11,8 @@
 
 namespace clipfileModule {
 
-/// Who logs on to a server. An empty user stands for the process's own rights: its Kerberos ticket when it
-/// has one, else a guest.
+/// Who logs on to a server. An empty user stands for the process's own rights: those of a guest. A Kerberos
+/// ticket of the process is not used.
 struct SmbCredentials {
     /// `userName` as `DOMAIN\user`, `user@domain` or a user alone.
     static SmbCredentials Of(const std::string& userName, const std::string& password);

@@ -40,7 +40,6 @@ bool findAll(void* handle, SmbLibrary& library) {
            find(handle, "smbc_setOptionOpenShareMode", library.setOptionOpenShareMode) &&
            find(handle, "smbc_setOptionNoAutoAnonymousLogin", library.setOptionNoAutoAnonymousLogin) &&
            find(handle, "smbc_setOptionUseKerberos", library.setOptionUseKerberos) &&
-           find(handle, "smbc_setOptionFallbackAfterKerberos", library.setOptionFallbackAfterKerberos) &&
            find(handle, "smbc_setOptionUseCCache", library.setOptionUseCCache) &&
            find(handle, "smbc_setFunctionAuthDataWithContext", library.setFunctionAuthDataWithContext) &&
            find(handle, "smbc_setFunctionCheckServer", library.setFunctionCheckServer) &&

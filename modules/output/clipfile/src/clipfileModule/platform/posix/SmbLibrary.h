@@ -41,7 +41,6 @@ struct SmbLibrary {
     decltype(&smbc_setOptionOpenShareMode) setOptionOpenShareMode;
     decltype(&smbc_setOptionNoAutoAnonymousLogin) setOptionNoAutoAnonymousLogin;
     decltype(&smbc_setOptionUseKerberos) setOptionUseKerberos;
-    decltype(&smbc_setOptionFallbackAfterKerberos) setOptionFallbackAfterKerberos;
     decltype(&smbc_setOptionUseCCache) setOptionUseCCache;
     decltype(&smbc_setFunctionAuthDataWithContext) setFunctionAuthDataWithContext;
     decltype(&smbc_setFunctionCheckServer) setFunctionCheckServer;
