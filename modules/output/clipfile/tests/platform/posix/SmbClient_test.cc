@@ -8,10 +8,12 @@
 #include <filesystem>
 #include <fstream>
 #include <iterator>
+#include <limits>
 #include <memory>
 #include <string>
 
 #include "support/SambaServer.h"
+#include "support/TempDir.h"
 
 /// This program offers a lock, as a host does that uses libsmbclient itself.
 extern "C" {
@@ -151,6 +153,21 @@ TEST_F(SmbClientTest, TellsTheSpaceOfTheFileSystemBehindTheShare) {
     std::uint64_t bytes = 42;
     EXPECT_EQ(client->AvailableSpace(url("none"), nullptr, bytes), ENOENT);
     EXPECT_EQ(bytes, 42U);
+}
+
+TEST(SmbClientSpace, MoreThanTheNumberHoldsIsTheMostThatItHolds) {
+    // 2^54 KiB, which are 2^64 bytes.
+    const TempDir scripts;
+    const std::string script = (scripts.Path() / "dfree").string();
+    std::ofstream(script) << "#!/bin/sh\necho 18014398509481984 18014398509481984\n";
+    std::filesystem::permissions(script, std::filesystem::perms(0755));
+    const SambaServer server({{"rec", {}}}, {"dfree command = " + script});
+    SmbClient client(library(), parsed(server.Path()),
+                     SmbCredentials::Of(SambaServer::kUser, SambaServer::kPassword), kPatience);
+    ASSERT_EQ(client.Connect(), 0);
+    std::uint64_t bytes = 0;
+    ASSERT_EQ(client.AvailableSpace(parsed(server.Path()).Url(), nullptr, bytes), 0);
+    EXPECT_EQ(bytes, std::numeric_limits<std::uint64_t>::max());
 }
 
 TEST_F(SmbClientTest, TruncatesAFileAndKeepsOtherWritersOff) {

@@ -14,6 +14,7 @@
 #include <cstdio>
 #include <optional>
 
+#include "platform/posix/PosixPlatform.h"
 #include "platform/posix/TcpProbe.h"
 
 namespace clipfileModule {
@@ -271,7 +272,7 @@ int SmbClient::AvailableSpace(const std::string& url, SMBCFILE* file, std::uint6
         return lastError();
     }
     // Here the second one is sectors in a block (MS-FSCC 2.5.4), unlike in POSIX.
-    bytes = std::uint64_t{status.f_bavail} * status.f_frsize * status.f_bsize;
+    bytes = PosixPlatform::ToBytes(PosixPlatform::ToBytes(status.f_bavail, status.f_frsize), status.f_bsize);
     return 0;
 }
 
