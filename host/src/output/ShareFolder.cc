@@ -6,6 +6,7 @@
 #include <chrono>
 #include <cstring>
 #include <functional>
+#include <set>
 #include <system_error>
 #include <vector>
 
@@ -30,7 +31,7 @@ using clipfileModule::SmbStatus;
 
 using Clock = std::chrono::steady_clock;
 
-constexpr std::chrono::seconds kRestOfUnreachable{10};
+constexpr std::chrono::seconds kRestOfFailed{10};
 
 /// The server has answered; anything else tells of the way to it.
 bool IsAnswer(int error) {
@@ -52,21 +53,26 @@ class ShareFolder final : public OutputFolder {
 
  private:
     /// On a connection that a server has given up since, for its age or with its restart, it is tried once
-    /// more on a new one. Where there is no server, later ones fail at once for a while: a run that has many
-    /// files to look at ends all the same. Returns an error number.
+    /// more on a new one. Where that gets no answer either, or the logon is refused, later ones fail at once
+    /// for a while: a run that has many files to look at ends all the same, and servers count refused
+    /// passwords. Returns an error number.
     int run(const std::function<int(SmbSession&)>& operation);
     int connect();
+    void restFrom(int error);
     int look(const std::string& path, SmbStatus& status);
     void expectConnection();
     bool makeWhereMissing();
+    int tryFile(const std::string& folder);
     void expectWritable();
 
     const OutputPlace place_;
     const SmbCredentials credentials_;
     std::shared_ptr<SmbSession> session_;
-    /// Of the latest attempt to connect, when that got no answer.
-    int unreachable_ = 0;
-    Clock::time_point unreachableUntil_{};
+    /// What operations fail with until then, when they have no connection; 0 for nothing.
+    int resting_ = 0;
+    Clock::time_point restingUntil_{};
+    /// Folders in which a file was made.
+    std::set<std::string> writable_;
 };
 
 std::string UrlOf(const std::string& path) {
@@ -94,6 +100,12 @@ int ShareFolder::connect() {
     return session_->ConnectResult();
 }
 
+void ShareFolder::restFrom(int error) {
+    session_.reset();
+    resting_ = error;
+    restingUntil_ = Clock::now() + kRestOfFailed;
+}
+
 int ShareFolder::run(const std::function<int(SmbSession&)>& operation) {
     int error = ENOTCONN;
     if (session_ != nullptr) {
@@ -101,16 +113,15 @@ int ShareFolder::run(const std::function<int(SmbSession&)>& operation) {
     }
     if (!IsAnswer(error)) {
         session_.reset();
-        if (unreachable_ != 0 && Clock::now() < unreachableUntil_) {
-            return unreachable_;
+        if (resting_ != 0 && Clock::now() < restingUntil_) {
+            return resting_;
         }
-        error = connect();
-        unreachable_ = IsAnswer(error) ? 0 : error;
-        unreachableUntil_ = Clock::now() + kRestOfUnreachable;
-        error = error != 0 ? error : operation(*session_);
-    }
-    if (!IsAnswer(error) || (session_ != nullptr && session_->ConnectResult() != 0)) {
-        session_.reset();
+        resting_ = 0;
+        const int refused = connect();
+        error = refused != 0 ? refused : operation(*session_);
+        if (refused != 0 || !IsAnswer(error)) {
+            restFrom(error);
+        }
     }
     return error;
 }
@@ -165,11 +176,11 @@ bool ShareFolder::makeWhereMissing() {
     return true;
 }
 
-/// Whether rights of the server allow that can only be tried.
-void ShareFolder::expectWritable() {
-    const std::string probe = UrlOf(place_.folder) + "/.receiver-" + std::to_string(getpid()) + "-" +
+/// Whether rights of the server allow a file in a folder can only be tried. An error number.
+int ShareFolder::tryFile(const std::string& folder) {
+    const std::string probe = UrlOf(folder) + "/.receiver-" + std::to_string(getpid()) + "-" +
                               std::to_string(std::chrono::system_clock::now().time_since_epoch().count());
-    const int error = run([&probe](SmbSession& session) {
+    return run([&probe](SmbSession& session) {
         SMBCFILE* file = nullptr;
         int failure = session.Open(probe, file);
         if (failure == 0) {
@@ -178,7 +189,10 @@ void ShareFolder::expectWritable() {
         }
         return failure;
     });
-    if (error != 0) {
+}
+
+void ShareFolder::expectWritable() {
+    if (const int error = tryFile(place_.folder)) {
         throw ReceiverError(ExitCode::kOutput, "the output folder '" + place_.folder +
                                                    "' is not writable: " + std::strerror(error) +
                                                    "; change its rights, or name another one with --output.");
@@ -204,6 +218,7 @@ std::optional<std::uint64_t> ShareFolder::FreeBytes() {
 }
 
 std::string ShareFolder::Obstacle(const std::string& date, const std::string& prefix) {
+    // From the last folder up to the first one that is there: in it the module makes the rest, or the file.
     const std::string dated = place_.folder + "/" + date;
     for (const std::string& path : {prefix.empty() ? dated : dated + "/" + prefix, dated}) {
         SmbStatus status;
@@ -211,9 +226,24 @@ std::string ShareFolder::Obstacle(const std::string& date, const std::string& pr
         if (error == EACCES || error == EPERM) {
             return UnusableSentence(dated, std::string("cannot be entered: ") + std::strerror(error));
         }
-        if (error == 0 && !status.isFolder) {
+        if (error != 0) {
+            continue;
+        }
+        if (!status.isFolder) {
             return UnusableSentence(path, "is no folder");
         }
+        if (writable_.count(path) != 0) {
+            return {};
+        }
+        const int refused = tryFile(path);
+        if (refused == EACCES || refused == EPERM || refused == EROFS) {
+            return UnusableSentence(path, std::string("cannot be written: ") + std::strerror(refused));
+        }
+        if (refused == 0) {
+            // Asked again and again: once is enough for what others see of the file that comes and goes.
+            writable_.insert(path);
+        }
+        return {};
     }
     return {};
 }
@@ -235,16 +265,21 @@ RecordedFile ShareFolder::ReadBackFile(const std::string& path) {
         return recorded;
     }
     // On this connection alone: the file is open there.
+    int unread = 0;
     RecordedFile recorded =
-        ReadBack(path, bytes, [this, file](std::int64_t offset, unsigned char* data, int size) {
+        ReadBack(path, bytes, [this, file, &unread](std::int64_t offset, unsigned char* data, int size) {
             std::vector<char> read;
-            if (session_->Read(file, offset, static_cast<std::size_t>(size), read) != 0) {
+            unread = session_->Read(file, offset, static_cast<std::size_t>(size), read);
+            if (unread != 0) {
                 return -1;
             }
             std::copy(read.begin(), read.end(), data);
             return static_cast<int>(read.size());
         });
     session_->Close(file);
+    if (!IsAnswer(unread)) {
+        restFrom(unread);
+    }
     return recorded;
 }
 

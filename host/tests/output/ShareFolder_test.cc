@@ -8,6 +8,8 @@
 #include <algorithm>
 #include <filesystem>
 #include <fstream>
+#include <string>
+#include <vector>
 
 #include "common/ReceiverError.h"
 #include "output/OutputFolder.h"
@@ -90,6 +92,55 @@ TEST(ShareFolder, AServerThatDoesNotAnswerIsLeftAloneForAWhile) {
         EXPECT_NE(folder->ReadBackFile(server.Folder() + "/file").problem, "");
     }
     EXPECT_EQ(server.TakeConnections(), 0);
+}
+
+TEST(ShareFolder, AServerThatLogsOnAndDoesNotAnswerIsLeftAloneForAWhile) {
+    const std::string script = ::testing::TempDir() + "hanging_dfree_" + std::to_string(getpid());
+    const std::string asked = script + ".asked";
+    std::ofstream(script) << "#!/bin/sh\necho x >>'" << asked << "'\nexec sleep 600\n";
+    std::filesystem::permissions(script, std::filesystem::perms(0755));
+    {
+        const SambaServer server({{"rec", {}}}, {"dfree command = " + script});
+        const auto folder = OpenOutputFolder(PlaceAt(FolderOf(server)));
+        for (int i = 0; i < 3; ++i) {
+            EXPECT_EQ(folder->FreeBytes(), std::nullopt);
+        }
+    }
+    EXPECT_EQ(std::filesystem::file_size(asked), 2U);
+    std::filesystem::remove(script);
+    std::filesystem::remove(asked);
+}
+
+TEST(ShareFolder, ARefusedPasswordIsNotTriedAgainForAWhile) {
+    SambaServer server;
+    OutputPlace place = PlaceAt(FolderOf(server));
+    place.password = "wrong";
+    const auto folder = OpenOutputFolder(place);
+    const std::string file = FolderOf(server) + "/a.MP4";
+    EXPECT_EQ(folder->ReadBackFile(file).problem, "Permission denied");
+    // Another try would find nobody.
+    server.Kill();
+    EXPECT_EQ(folder->ReadBackFile(file).problem, "Permission denied");
+}
+
+TEST(ShareFolder, SeesADatedFolderOfSomebodyElse) {
+    namespace fs = std::filesystem;
+    std::vector<std::string> settings;
+    if (geteuid() == 0) {
+        settings = {"force user = nobody"};
+    }
+    const SambaServer server({{"rec", settings}});
+    fs::permissions(server.Folder().parent_path(), fs::perms(0755));
+    fs::permissions(server.Folder(), fs::perms(0777));
+    const auto folder = OpenOutputFolder(PlaceAt(FolderOf(server)));
+    EXPECT_FALSE(folder->Prepare());
+    fs::create_directory(server.Folder() / "20261121");
+    fs::permissions(server.Folder() / "20261121", fs::perms(0555));
+    EXPECT_THAT(folder->Obstacle("20261121", "CAM1"),
+                HasSubstr("/20261121' cannot be written: Permission denied; "));
+    fs::permissions(server.Folder() / "20261121", fs::perms(0777));
+    EXPECT_EQ(folder->Obstacle("20261121", "CAM1"), "");
+    EXPECT_TRUE(fs::is_empty(server.Folder() / "20261121"));
 }
 
 TEST(ShareFolder, TellsAboutItsDatedFoldersAndLeavesNothingBehind) {

@@ -8,10 +8,12 @@
 #include <filesystem>
 #include <fstream>
 #include <iterator>
+#include <limits>
 #include <memory>
 #include <string>
 
 #include "support/SambaServer.h"
+#include "support/TempDir.h"
 
 /// This program offers a lock, as a host does that uses libsmbclient itself.
 extern "C" {
@@ -54,6 +56,27 @@ TEST(SmbCredentials, TakeTheDomainFromEitherForm) {
     EXPECT_EQ(fields("user@domain.example"), "domain.example|user|p");
     EXPECT_EQ(fields("DOMAIN\\user@x"), "DOMAIN|user@x|p");
     EXPECT_EQ(fields(""), "||p");
+}
+
+int resultOfLogon(const SambaServer& server, const std::string& user, const std::string& password) {
+    return SmbClient(library(), parsed(server.Path()), SmbCredentials::Of(user, password), kPatience)
+        .Connect();
+}
+
+TEST(SmbClientLogon, TakesNoGuestsRightsForAnUnknownUser) {
+    const SambaServer server(SambaServer::Shares{{"rec", {"guest ok = yes"}}}, {"map to guest = Bad User"});
+    EXPECT_EQ(resultOfLogon(server, "nobody-here", "x"), EACCES);
+    EXPECT_EQ(resultOfLogon(server, SambaServer::kUser, SambaServer::kPassword), 0);
+    EXPECT_EQ(resultOfLogon(server, "", ""), 0);
+    EXPECT_EQ(resultOfLogon(server, "nobody-here", "x"), EACCES);
+}
+
+TEST(SmbClientLogon, TakesNoGuestsRightsForAWrongPassword) {
+    const SambaServer server(SambaServer::Shares{{"rec", {"guest ok = yes"}}},
+                             {"map to guest = Bad Password"});
+    EXPECT_EQ(resultOfLogon(server, SambaServer::kUser, "wrong"), EACCES);
+    EXPECT_EQ(resultOfLogon(server, SambaServer::kUser, SambaServer::kPassword), 0);
+    EXPECT_EQ(resultOfLogon(server, "", ""), 0);
 }
 
 class SmbClientTest : public ::testing::Test {
@@ -130,6 +153,21 @@ TEST_F(SmbClientTest, TellsTheSpaceOfTheFileSystemBehindTheShare) {
     std::uint64_t bytes = 42;
     EXPECT_EQ(client->AvailableSpace(url("none"), nullptr, bytes), ENOENT);
     EXPECT_EQ(bytes, 42U);
+}
+
+TEST(SmbClientSpace, MoreThanTheNumberHoldsIsTheMostThatItHolds) {
+    // 2^54 KiB, which are 2^64 bytes.
+    const TempDir scripts;
+    const std::string script = (scripts.Path() / "dfree").string();
+    std::ofstream(script) << "#!/bin/sh\necho 18014398509481984 18014398509481984\n";
+    std::filesystem::permissions(script, std::filesystem::perms(0755));
+    const SambaServer server({{"rec", {}}}, {"dfree command = " + script});
+    SmbClient client(library(), parsed(server.Path()),
+                     SmbCredentials::Of(SambaServer::kUser, SambaServer::kPassword), kPatience);
+    ASSERT_EQ(client.Connect(), 0);
+    std::uint64_t bytes = 0;
+    ASSERT_EQ(client.AvailableSpace(parsed(server.Path()).Url(), nullptr, bytes), 0);
+    EXPECT_EQ(bytes, std::numeric_limits<std::uint64_t>::max());
 }
 
 TEST_F(SmbClientTest, TruncatesAFileAndKeepsOtherWritersOff) {

@@ -23,6 +23,12 @@ using std::chrono::seconds;
 /// That no loaded machine reaches.
 constexpr SmbLimits kPatient{seconds(300), seconds(300), seconds(300)};
 
+TEST(SmbLimits, AnOperationEndsBeforeTheLibraryGivesTheServerUp) {
+    EXPECT_GT(SmbLimits{}.answer, SmbLimits{}.operation);
+    // The writer is told to stop, and has 3500 ms.
+    EXPECT_LT(SmbLimits{}.operation, std::chrono::milliseconds(3500));
+}
+
 class SmbSessionTest : public ::testing::Test {
  protected:
     std::shared_ptr<SmbSession> connect() const {

@@ -8,11 +8,13 @@
 #include <sys/statvfs.h>
 
 #include <algorithm>
+#include <array>
 #include <cerrno>
 #include <chrono>
 #include <cstdio>
 #include <optional>
 
+#include "platform/posix/PosixPlatform.h"
 #include "platform/posix/TcpProbe.h"
 
 namespace clipfileModule {
@@ -57,6 +59,29 @@ class Turn {
 
  private:
     std::optional<MutexLock> lock_;
+};
+
+/// Connections that begin meanwhile are signed, whatever else smb.conf(5) says. A server that would rather
+/// make a guest of who it does not know has no key to sign with, and that logon fails. Under `ProcessLock`.
+class RequiredSigning {
+ public:
+    explicit RequiredSigning(const SmbLibrary& library)
+        : library_(library), before_(kNames.at(static_cast<std::size_t>(library.clientSigning() + 1))) {
+        set("required");
+    }
+    ~RequiredSigning() { set(before_); }
+    RequiredSigning(const RequiredSigning&) = delete;
+    RequiredSigning& operator=(const RequiredSigning&) = delete;
+
+ private:
+    /// From the number -1 on.
+    static constexpr std::array<const char*, 5> kNames{"default", "disabled", "if_required", "desired",
+                                                       "required"};
+
+    void set(const char* value) const { library_.setParameter(-1, "client signing", value); }
+
+    const SmbLibrary& library_;
+    const char* const before_;
 };
 
 /// Keeps what all contexts share alive. Under `ProcessLock`.
@@ -114,17 +139,15 @@ SMBCCTX* SmbClient::makeContext(std::chrono::milliseconds answerTimeout) {
     if (context == nullptr) {
         return nullptr;
     }
-    const bool ownRights = credentials_.user.empty();
     library_.setDebug(context, 0);
     library_.setTimeout(context, static_cast<int>(answerTimeout.count()));
     library_.setOptionUserData(context, this);
     library_.setFunctionAuthDataWithContext(context, fillIn);
     library_.setUser(context, credentials_.user.c_str());
     library_.setWorkgroup(context, credentials_.domain.c_str());
-    // Credentials that are refused would else be followed by an attempt as a guest.
-    library_.setOptionNoAutoAnonymousLogin(context, ownRights ? 0 : 1);
-    library_.setOptionUseKerberos(context, ownRights ? 1 : 0);
-    library_.setOptionFallbackAfterKerberos(context, ownRights ? 1 : 0);
+    // Credentials that are refused would else be followed by an attempt as a guest, of the library's own.
+    library_.setOptionNoAutoAnonymousLogin(context, credentials_.user.empty() ? 0 : 1);
+    library_.setOptionUseKerberos(context, 0);
     library_.setOptionUseCCache(context, 0);
     library_.setFunctionCheckServer(context, trustServer);
     addServer_ = library_.getFunctionAddCachedServer(context);
@@ -184,6 +207,10 @@ int SmbClient::Connect() {
         return lost_ = unreachable;
     }
     MutexLock lock(SmbLibrary::ProcessLock());
+    std::optional<RequiredSigning> signing;
+    if (!credentials_.user.empty()) {
+        signing.emplace(library_);
+    }
     struct stat status = {};
     errno = 0;
     const int result = library_.getFunctionStat(context_)(context_, share_.ShareUrl().c_str(), &status);
@@ -245,7 +272,7 @@ int SmbClient::AvailableSpace(const std::string& url, SMBCFILE* file, std::uint6
         return lastError();
     }
     // Here the second one is sectors in a block (MS-FSCC 2.5.4), unlike in POSIX.
-    bytes = std::uint64_t{status.f_bavail} * status.f_frsize * status.f_bsize;
+    bytes = PosixPlatform::ToBytes(PosixPlatform::ToBytes(status.f_bavail, status.f_frsize), status.f_bsize);
     return 0;
 }
 

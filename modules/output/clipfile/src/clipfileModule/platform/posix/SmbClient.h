@@ -11,8 +11,8 @@
 
 namespace clipfileModule {
 
-/// Who logs on to a server. An empty user stands for the process's own rights: its Kerberos ticket when it
-/// has one, else a guest.
+/// Who logs on to a server. An empty user stands for the process's own rights: those of a guest. A Kerberos
+/// ticket of the process is not used.
 struct SmbCredentials {
     /// `userName` as `DOMAIN\user`, `user@domain` or a user alone.
     static SmbCredentials Of(const std::string& userName, const std::string& password);
@@ -29,8 +29,9 @@ struct SmbStatus {
     std::uint64_t size = 0;
 };
 
-/// One connection to one share, over SMB 2 or later, signed and encrypted as the server asks for it. Never
-/// connects again by itself: a connection that is lost stays lost, and all operations fail from then on.
+/// One connection to one share, over SMB 2 or later, encrypted as the server asks for it. That of a user is
+/// signed, one with the process's own rights as the server asks for it. Never connects again by itself: a
+/// connection that is lost stays lost, and all operations fail from then on.
 ///
 /// Used by one thread from the constructor to the destructor; each operation may wait for the network, some
 /// for several of its time-outs. All return an error number, 0 for success. URLs are those of `SharePath`.

@@ -40,7 +40,6 @@ bool findAll(void* handle, SmbLibrary& library) {
            find(handle, "smbc_setOptionOpenShareMode", library.setOptionOpenShareMode) &&
            find(handle, "smbc_setOptionNoAutoAnonymousLogin", library.setOptionNoAutoAnonymousLogin) &&
            find(handle, "smbc_setOptionUseKerberos", library.setOptionUseKerberos) &&
-           find(handle, "smbc_setOptionFallbackAfterKerberos", library.setOptionFallbackAfterKerberos) &&
            find(handle, "smbc_setOptionUseCCache", library.setOptionUseCCache) &&
            find(handle, "smbc_setFunctionAuthDataWithContext", library.setFunctionAuthDataWithContext) &&
            find(handle, "smbc_setFunctionCheckServer", library.setFunctionCheckServer) &&
@@ -58,7 +57,9 @@ bool findAll(void* handle, SmbLibrary& library) {
            find(handle, "smbc_getFunctionRead", library.getFunctionRead) &&
            find(handle, "smbc_getFunctionWrite", library.getFunctionWrite) &&
            find(handle, "smbc_getFunctionClose", library.getFunctionClose) &&
-           find(handle, "smbc_getFunctionUnlink", library.getFunctionUnlink);
+           find(handle, "smbc_getFunctionUnlink", library.getFunctionUnlink) &&
+           find(handle, "lp_client_signing", library.clientSigning) &&
+           find(handle, "lp_do_parameter", library.setParameter);
 }
 
 LoadResult load() {

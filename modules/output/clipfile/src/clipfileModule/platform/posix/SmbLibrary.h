@@ -41,7 +41,6 @@ struct SmbLibrary {
     decltype(&smbc_setOptionOpenShareMode) setOptionOpenShareMode;
     decltype(&smbc_setOptionNoAutoAnonymousLogin) setOptionNoAutoAnonymousLogin;
     decltype(&smbc_setOptionUseKerberos) setOptionUseKerberos;
-    decltype(&smbc_setOptionFallbackAfterKerberos) setOptionFallbackAfterKerberos;
     decltype(&smbc_setOptionUseCCache) setOptionUseCCache;
     decltype(&smbc_setFunctionAuthDataWithContext) setFunctionAuthDataWithContext;
     decltype(&smbc_setFunctionCheckServer) setFunctionCheckServer;
@@ -60,6 +59,11 @@ struct SmbLibrary {
     decltype(&smbc_getFunctionWrite) getFunctionWrite;
     decltype(&smbc_getFunctionClose) getFunctionClose;
     decltype(&smbc_getFunctionUnlink) getFunctionUnlink;
+
+    /// The settings of the process, of loadparm.h, which is not installed: "client signing" in force, and to
+    /// set one by its name in smb.conf(5) in a section, -1 for [global]. Under `ProcessLock`.
+    int (*clientSigning)();
+    bool (*setParameter)(int section, const char* name, const char* value);
 
     /// False when one thread at a time may be in it.
     bool takesThreads;

@@ -18,8 +18,9 @@ struct SmbLimits {
     /// By an operation. A writer that is told to stop in the middle of one still ends within the time that it
     /// is given.
     std::chrono::milliseconds operation{3000};
-    /// By one answer of the server.
-    std::chrono::milliseconds answer{3000};
+    /// By one answer of the server. Longer than an operation: a time-out of libsmbclient's own looks like
+    /// other errors, and does not make the operations that follow fail at once.
+    std::chrono::milliseconds answer{4000};
     /// By the farewell to the server.
     std::chrono::milliseconds end{300};
 };

@@ -3,11 +3,16 @@
 #include <chrono>
 #include <string>
 
+struct addrinfo;
+
 namespace clipfileModule {
 
-/// Whether a server takes connections at a port: 0, also when `host` cannot be resolved, for there are other
-/// ways to do that; else the error number of the last address tried, ETIMEDOUT after `limit`. The limit does
-/// not count for resolving.
+/// Whether one of `addresses` takes connections: 0, also when there are none; ETIMEDOUT when none did within
+/// `limit` and not all have refused; else the error number of the last one. All are tried at once: one that
+/// drops what is sent to it costs the others no time.
+int ProbeTcp(const addrinfo* addresses, std::chrono::milliseconds limit);
+/// The same for the addresses of `host`; 0 when it cannot be resolved, for there are other ways to do that.
+/// The limit does not count for resolving.
 int ProbeTcp(const std::string& host, const std::string& port, std::chrono::milliseconds limit);
 
 }  // namespace clipfileModule
