@@ -81,7 +81,7 @@ INSTANTIATE_TEST_SUITE_P(Tables, DamagedStreamTest,
                                            Case{"Stop", Remove(kTables, 0.2, 1), kUnharmed},
                                            Case{"MoveTheVideo",
                                                 Rename(kVideoPid, kVideoPid + 0x20, 0.5),
-                                                {.sentence = "the pictures ended", .pictures = 95}}),
+                                                {.sentence = "the video moved to another stream", .pictures = 95}}),
                          ::testing::PrintToStringParamName());
 
 INSTANTIATE_TEST_SUITE_P(
