@@ -97,7 +97,7 @@ INSTANTIATE_TEST_SUITE_P(
         Case{"VideoForAWhile", Remove(kVideo, 0.4, 0.6), {.sentence = kGaps, .pictures = 140}},
         Case{"VideoFromTheMiddleOn",
              Remove(kVideo, 0.5, 1),
-             {.sentence = "the video moved to another stream", .pictures = 95}},
+             {.sentence = "the pictures ended", .pictures = 95}},
         Case{"VideoAtFirst", Remove(kVideo, 0, 0.5), {.code = kEverything, .pictures = 80}},
         Case{"VideoAlways",
              Remove(kVideo),
