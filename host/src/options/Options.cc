@@ -88,6 +88,7 @@ void Interpret(const Texts& texts, Options& options) {
         options.password = PasswordOfService();
     }
     options.mode = texts.mode == "on" ? OutputMode::kOn : OutputMode::kSync;
+    options.source.continuous = options.mode == OutputMode::kOn;
     options.dropFrame = !texts.noDropFrame;
     options.source.reconnect = !texts.noReconnect;
 }

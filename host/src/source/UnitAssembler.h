@@ -16,7 +16,8 @@ namespace receiver {
 /// the timecode on from picture to picture. Times in are those of the source's time line.
 class UnitAssembler {
  public:
-    explicit UnitAssembler(const FrameRate& rate);
+    /// `continuous`: one recording goes on over all connections.
+    explicit UnitAssembler(const FrameRate& rate, bool continuous = false);
 
     /// A connection begins; `audio` tells whether it carries audio. A gap before its first picture is no loss
     /// of frames, since nobody knows what was sent.

@@ -24,6 +24,7 @@ std::int64_t AudioGrid::End() {
     while (!gaps_.empty() && gaps_.front().begin <= next_ + kFrame / 2) {
         remainder_ += gaps_.front().length;
         rejoining_ |= gaps_.front().rejoin;
+        origin_ = gaps_.front().begin + gaps_.front().length;
         gaps_.pop_front();
         const std::int64_t frames = Frames(remainder_);
         remainder_ -= frames * kFrame;
@@ -36,8 +37,17 @@ std::int64_t AudioGrid::End() {
 std::int64_t AudioGrid::Append() {
     const std::int64_t time = End();
     begun_ = true;
+    last_ = time;
     next_ += kFrame;
     return time;
+}
+
+std::int64_t AudioGrid::Earliest() const {
+    if (!rejoining_) {
+        return next_ - kTolerance;
+    }
+    return continuous_ ? next_ - joined_ - kFrame / 2
+                       : std::max(last_ + kFrame / 2, origin_.value_or(next_) - kFrame / 2);
 }
 
 AudioGrid::Place AudioGrid::Next(std::int64_t time) {
@@ -46,8 +56,7 @@ AudioGrid::Place AudioGrid::Next(std::int64_t time) {
         next_ = time - Frames(time) * kFrame;
     }
     End();
-    const std::int64_t earliest = rejoining_ ? next_ - joined_ - kFrame / 2 : next_ - kTolerance;
-    if (time < kEarliest || time < earliest) {
+    if (time < kEarliest || time < Earliest()) {
         const bool passedOver = time >= 0 && time < passedUntil_;
         return {passedOver ? Action::kVideoMissing : Action::kOverlap, time};
     }
@@ -55,13 +64,14 @@ AudioGrid::Place AudioGrid::Next(std::int64_t time) {
         Join(time);
     }
     const std::int64_t place = next_;
+    last_ = place;
     next_ += kFrame;
     return {time > place + kTolerance ? Action::kFill : Action::kAccept, place};
 }
 
 void AudioGrid::Join(std::int64_t time) {
     rejoining_ = false;
-    const std::int64_t counted = next_ - joined_;
+    const std::int64_t counted = continuous_ ? next_ - joined_ : origin_.value_or(next_);
     const std::int64_t silent = std::max<std::int64_t>(0, Frames(time - counted));
     next_ = time - silent * kFrame;
     joined_ = next_ - counted;

@@ -2,6 +2,7 @@
 
 #include <cstdint>
 #include <deque>
+#include <optional>
 
 namespace receiver {
 
@@ -22,6 +23,10 @@ class AudioGrid {
     /// The nearest frame to the first picture, which stands at 0, begins half a frame before it at the
     /// earliest.
     static constexpr std::int64_t kEarliest = -kFrame / 2;
+
+    /// `continuous`: what follows a source that begins anew goes on in the recording of what came before, so
+    /// that counts have to stay together over it. Else another recording begins there.
+    explicit AudioGrid(bool continuous = false) : continuous_(continuous) {}
 
     /// Video is missing from `begin` on for `length` samples. `rejoin`: what follows begins another
     /// recording, and audio rejoins there.
@@ -47,7 +52,10 @@ class AudioGrid {
 
     /// The source begins anew: its next frame stands where it is, as the first one did, and the others in
     /// line with it.
-    void Rejoin() { rejoining_ = true; }
+    void Rejoin() {
+        rejoining_ = true;
+        origin_.reset();
+    }
 
     /// Where the next frame would stand, the audio of missing video passed over.
     std::int64_t End();
@@ -61,9 +69,15 @@ class AudioGrid {
         bool rejoin = false;
     };
 
+    /// The earliest time at which the next frame can stand.
+    std::int64_t Earliest() const;
     void Join(std::int64_t time);
 
+    const bool continuous_;
     std::deque<Gap> gaps_;
+    /// Where the first picture behind the last gap stands, and the last frame that was entered.
+    std::optional<std::int64_t> origin_;
+    std::int64_t last_ = -2 * kFrame;
     /// What gaps left over that is less than half a frame, or was taken too much.
     std::int64_t remainder_ = 0;
     std::int64_t next_ = 0;

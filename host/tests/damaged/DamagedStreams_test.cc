@@ -77,19 +77,18 @@ INSTANTIATE_TEST_SUITE_P(
         StreamCase{"Erroneous", MarkAsErroneous(), kPicturesLost}),
     ::testing::PrintToStringParamName());
 
-INSTANTIATE_TEST_SUITE_P(
-    Tables, DamagedStreamTest,
-    ::testing::Values(
-        StreamCase{"NoPat", Remove({kTablePid}), kUnharmed},
-        StreamCase{"NoPmt", Remove({kMapPid}), kUnharmed}, StreamCase{"None", Remove(kTables), kUnharmed},
-        StreamCase{"LatePat", Remove({kTablePid}, 0, 0.4), kUnharmed},
-        StreamCase{"LatePmt", Remove({kMapPid}, 0, 0.4), kUnharmed},
-        StreamCase{"Stop", Remove(kTables, 0.2, 1), kUnharmed},
-        // Behind the move the sound is up to 16 ms off, which is not yet as near as it should be.
-        StreamCase{"MoveTheVideo",
-                   Rename(kVideoPid, kVideoPid + 0x20, 0.5),
-                   {.sentence = "the video moved to another stream", .pictures = 185, .outOfStep = 0.022}}),
-    ::testing::PrintToStringParamName());
+INSTANTIATE_TEST_SUITE_P(Tables, DamagedStreamTest,
+                         ::testing::Values(StreamCase{"NoPat", Remove({kTablePid}), kUnharmed},
+                                           StreamCase{"NoPmt", Remove({kMapPid}), kUnharmed},
+                                           StreamCase{"None", Remove(kTables), kUnharmed},
+                                           StreamCase{"LatePat", Remove({kTablePid}, 0, 0.4), kUnharmed},
+                                           StreamCase{"LatePmt", Remove({kMapPid}, 0, 0.4), kUnharmed},
+                                           StreamCase{"Stop", Remove(kTables, 0.2, 1), kUnharmed},
+                                           StreamCase{"MoveTheVideo",
+                                                      Rename(kVideoPid, kVideoPid + 0x20, 0.5),
+                                                      {.sentence = "the video moved to another stream",
+                                                       .pictures = 185}}),
+                         ::testing::PrintToStringParamName());
 
 INSTANTIATE_TEST_SUITE_P(
     Missing, DamagedStreamTest,

@@ -149,7 +149,7 @@ TEST(AudioGrid, ASourceThatBeginsAnewStandsWhereItIsAndSilenceLeadsUpToIt) {
 }
 
 TEST(AudioGrid, WhatOverlapsAndWhatIsLeftOutDoesNotMoveASourceThatBeginsAnew) {
-    AudioGrid grid;
+    AudioGrid grid(true);
     grid.Next(0);
     grid.Rejoin();
     EXPECT_EQ(grid.Next(511).action, Action::kOverlap);
@@ -157,7 +157,7 @@ TEST(AudioGrid, WhatOverlapsAndWhatIsLeftOutDoesNotMoveASourceThatBeginsAnew) {
 }
 
 TEST(AudioGrid, CountsStayTogetherHoweverOftenASourceBeginsAnew) {
-    AudioGrid grid;
+    AudioGrid grid(true);
     grid.Next(0);
     std::int64_t frames = 1;
     std::int64_t last = 0;
@@ -187,6 +187,34 @@ TEST(AudioGrid, BehindAGapThatEndsARecordingFramesStandWhereTheyAre) {
     EXPECT_EQ(grid.Next(1024).action, Action::kVideoMissing);
     EXPECT_EQ(grid.Next(25088 + 100), (Place{Action::kAccept, 25188}));
     EXPECT_EQ(grid.Next(26112 + 100), (Place{Action::kAccept, 26212}));
+}
+
+/// The recorder begins with the frame nearest to the picture, which must be there whatever was entered
+/// before.
+TEST(AudioGrid, TheFrameNearestToAPictureBehindAGapIsNeverLeftOut) {
+    for (std::int64_t silent = 1; silent <= 2; ++silent) {
+        for (std::int64_t begin = 8000; begin < 10100; begin += 100) {
+            AudioGrid grid;
+            grid.Next(0);
+            for (std::int64_t frame = 0; frame < silent; ++frame) {
+                grid.Append();
+            }
+            grid.Rejoin();
+            grid.AddVideoGap(1920, begin - 1920);
+            EXPECT_EQ(grid.Next(begin - 500), (Place{Action::kAccept, begin - 500}));
+        }
+    }
+}
+
+TEST(AudioGrid, SilenceBehindAGapBeginsNearestToThePicture) {
+    AudioGrid grid;
+    grid.Next(0);
+    grid.Append();
+    grid.Rejoin();
+    grid.AddVideoGap(1920, 8080);
+    EXPECT_EQ(grid.Next(12000), (Place{Action::kFill, 9952}));
+    EXPECT_EQ(grid.Next(12000), (Place{Action::kFill, 10976}));
+    EXPECT_EQ(grid.Next(12000), (Place{Action::kAccept, 12000}));
 }
 
 }  // namespace
