@@ -67,10 +67,14 @@ void BM_Stream(benchmark::State& state) {
             state.SkipWithError("the share cannot be written to");
             return;
         }
-        for (std::size_t left = kFileSize; left != 0;) {
+        std::size_t left = kFileSize;
+        while (left != 0 && std::ferror(file) == 0) {
             left -= std::fwrite(picture.data(), 1, std::min(left, picture.size()), file);
         }
-        std::fclose(file);
+        if (std::fclose(file) != 0 || left != 0) {
+            state.SkipWithError("the file cannot be written");
+            return;
+        }
     }
     report(state, processorSeconds(RUSAGE_SELF) - before);
 }

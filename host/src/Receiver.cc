@@ -119,7 +119,9 @@ void Running::PrepareOutput(const OutputPlace& place) {
         display_.Notice("made the output folder " + place.folder);
     }
     ExpectDatedFolders(*folder_, place.prefix, std::time(nullptr));
-    SetUpLog(options_, place);
+    if (const auto warning = SetUpLog(options_, place)) {
+        display_.Notice(*warning);
+    }
     watch_.emplace(OpenOutputFolder(place), place.prefix);
 }
 

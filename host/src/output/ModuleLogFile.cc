@@ -2,6 +2,7 @@
 
 #include <fcntl.h>
 #include <stdlib.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <cerrno>
@@ -29,19 +30,24 @@ std::string DefaultFolder(const OutputPlace& place) {
     return folders.empty() ? "" : folders.substr(0, folders.find(':')) + "/";
 }
 
-void ExpectWritable(const std::string& file) {
+/// A new one is made readable for its owner alone. Whether everybody can read it.
+bool ExpectWritable(const std::string& file) {
     const int descriptor =
         open(file.c_str(), O_WRONLY | O_APPEND | O_CREAT | O_CLOEXEC | O_NOCTTY | O_NONBLOCK, 0600);
     if (descriptor < 0) {
         throw ReceiverError(ExitCode::kOutput, "the log '" + file + "' cannot be written: " +
                                                    std::strerror(errno) + "; --log names another one.");
     }
+    struct stat status = {};
+    const bool readable =
+        fstat(descriptor, &status) == 0 && S_ISREG(status.st_mode) && (status.st_mode & S_IROTH) != 0;
     close(descriptor);
+    return readable;
 }
 
 }  // namespace
 
-void SetUpLog(const Options& options, const OutputPlace& place) {
+std::optional<std::string> SetUpLog(const Options& options, const OutputPlace& place) {
     if (options.log) {
         setenv(kVariable, *options.log == "-" ? "" : options.log->c_str(), 1);
     } else if (ValueOf(kVariable).empty()) {
@@ -52,8 +58,12 @@ void SetUpLog(const Options& options, const OutputPlace& place) {
     }
     const std::string file = ValueOf(kVariable);
     if (place.onShare && !place.password.empty() && !file.empty()) {
-        ExpectWritable(file);
+        if (ExpectWritable(file)) {
+            return "everybody on this machine can read the log '" + file +
+                   "', and a refused logon puts the password there; chmod o-r closes it";
+        }
     }
+    return std::nullopt;
 }
 
 }  // namespace receiver

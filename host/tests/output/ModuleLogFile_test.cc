@@ -5,6 +5,7 @@
 #include <stdlib.h>
 
 #include <filesystem>
+#include <fstream>
 
 #include "common/ReceiverError.h"
 
@@ -69,6 +70,21 @@ TEST_F(ModuleLogFileTest, OfAPasswordNeverFallsBackToStandardError) {
     }
     options_.log = folder_ + "/receiver.log";
     EXPECT_EQ(LogOf(share_), options_.log);
+}
+
+TEST_F(ModuleLogFileTest, WarnsOfAPasswordInAFileThatEverybodyCanRead) {
+    options_.log = folder_ + "/receiver.log";
+    std::ofstream(*options_.log) << "x";
+    std::filesystem::permissions(*options_.log, std::filesystem::perms(0644));
+    EXPECT_EQ(SetUpLog(options_, share_), std::nullopt);
+    share_.password = "secret";
+    EXPECT_EQ(SetUpLog(options_, share_), "everybody on this machine can read the log '" + *options_.log +
+                                              "', and a refused logon puts the password there; chmod o-r "
+                                              "closes it");
+    std::filesystem::permissions(*options_.log, std::filesystem::perms(0640));
+    EXPECT_EQ(SetUpLog(options_, share_), std::nullopt);
+    options_.log = folder_ + "/new.log";
+    EXPECT_EQ(SetUpLog(options_, share_), std::nullopt);
 }
 
 }  // namespace
