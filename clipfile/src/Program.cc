@@ -36,6 +36,30 @@ void PrintJson(std::ostream& out, const Json& json) {
     out << json.dump(-1, ' ', false, Json::error_handler_t::replace) << '\n';
 }
 
+void TellFault(const std::string& path, const std::string& sentence, const Options& options,
+               std::ostream& out, std::ostream& errors) {
+    if (options.json) {
+        PrintJson(out, {{"file", path}, {"error", sentence}});
+    } else {
+        errors << "clipfile: " << sentence << '\n';
+    }
+}
+
+/// Tells which folders could not be read.
+ExitCode TellFaults(const std::string& folder, const FolderListing& listing, const Options& options,
+                    std::ostream& out, std::ostream& errors) {
+    for (const std::string& fault : listing.faults) {
+        TellFault(folder, fault, options, out, errors);
+    }
+    return listing.faults.empty() ? ExitCode::kSuccess : ExitCode::kUnreadable;
+}
+
+/// What cannot be examined is none: whoever opens it tells why.
+bool IsFolder(const std::string& path) {
+    std::error_code ignored;
+    return std::filesystem::is_directory(path, ignored);
+}
+
 /// Does `work` on each file and goes on behind those that fail.
 ExitCode ForEachFile(const Options& options, std::ostream& out, std::ostream& errors,
                      const std::function<ExitCode(const std::string&)>& work) {
@@ -52,11 +76,10 @@ ExitCode ForEachFile(const Options& options, std::ostream& out, std::ostream& er
             code = ExitCode::kUnreadable;
             sentence = path + " cannot be worked on: " + error.what();
         }
-        if (!sentence.empty() && options.json) {
-            PrintJson(out, {{"file", path}, {"error", sentence}});
-        } else if (!sentence.empty()) {
-            errors << "clipfile: " << sentence << '\n';
+        if (!sentence.empty()) {
+            TellFault(path, sentence, options, out, errors);
         }
+        out.flush();  // an archive takes hours
         result = Worse(result, code);
     }
     return result;
@@ -80,8 +103,19 @@ std::string Plural(std::uint64_t count, const std::string& word) {
     return std::to_string(count) + " " + word + (count == 1 ? "" : "s");
 }
 
-ExitCode RecoverOne(const std::string& path, const Options& options, std::ostream& out) {
+/// Warns where nobody could tell whether the file was still recorded.
+void TellLockFault(const std::string& path, const RecoveryResult& result, const Options& options,
+                   std::ostream& errors) {
+    if (!result.lockFault.empty() && !options.json) {
+        errors << "clipfile: " << path << " could not be locked against a recorder: " << result.lockFault
+               << ".\n";
+    }
+}
+
+ExitCode RecoverOne(const std::string& path, const Options& options, std::ostream& out,
+                    std::ostream& errors) {
     const RecoveryResult result = RecoverFile(path, options.recovery);
+    TellLockFault(path, result, options, errors);
     if (options.json) {
         PrintJson(out, {{"file", path},
                         {"recovered", result.isRecovered},
@@ -90,7 +124,8 @@ ExitCode RecoverOne(const std::string& path, const Options& options, std::ostrea
                         {"audio_frames", result.audioFrames},
                         {"metadata_units", result.metadataUnits},
                         {"bytes_left", result.bytesLeft},
-                        {"parameter_sets", result.parameterSets}});
+                        {"parameter_sets", result.parameterSets},
+                        {"lock_fault", result.lockFault}});
     } else if (!result.isRecovered) {
         out << path << " is closed: nothing to recover.\n";
     } else {
@@ -105,52 +140,86 @@ ExitCode RecoverOne(const std::string& path, const Options& options, std::ostrea
     return ExitCode::kSuccess;
 }
 
-/// Files as they are, and of folders the recordings in them that are not closed.
-ExitCode Recover(const std::string& path, const Options& options, std::ostream& out, std::ostream& errors) {
-    if (!std::filesystem::is_directory(path)) {
-        return RecoverOne(path, options, out);
-    }
-    Options found = options;
-    found.files = UnfinishedIn(path);
-    std::erase_if(found.files, [&](const std::string& file) { return IsRecovered(file, options.recovery); });
-    if (found.files.empty() && !options.json) {
-        out << path << " has no unfinished recording.\n";
-    }
-    return ForEachFile(found, out, errors,
-                       [&](const std::string& file) { return RecoverOne(file, options, out); });
+/// Takes away and tells the files that stand recovered already.
+void PassOverRecovered(Options& found, std::ostream& out) {
+    std::erase_if(found.files, [&](const std::string& path) {
+        const auto target = RecoveredBefore(path, found.recovery);
+        if (target && found.json) {
+            PrintJson(out, {{"file", path}, {"recovered", false}, {"there_already", target->string()}});
+        } else if (target) {
+            out << path << " is passed over: " << target->string() << " is there already.\n";
+        }
+        return target.has_value();
+    });
 }
 
-ExitCode PrintDefects(const std::vector<Verification>& files, const Options& options, std::ostream& out) {
-    ExitCode result = ExitCode::kSuccess;
-    for (const Verification& file : files) {
-        if (options.json) {
-            PrintJson(out, {{"file", file.path.string()}, {"defects", file.defects}});
-        } else {
-            for (const std::string& defect : file.defects) {
-                out << file.path.string() << ": " << defect << '\n';
-            }
-        }
-        result = Worse(result, file.defects.empty() ? ExitCode::kSuccess : ExitCode::kDefects);
+/// Files as they are, and of folders the recordings in them that are not closed.
+ExitCode Recover(const std::string& path, const Options& options, std::ostream& out, std::ostream& errors) {
+    if (!IsFolder(path)) {
+        return RecoverOne(path, options, out, errors);
     }
+    FolderListing listing = UnfinishedIn(path);
+    const ExitCode searched = TellFaults(path, listing, options, out, errors);
+    Options found = options;
+    found.files = std::move(listing.files);
+    found.recovery.searched = path;
+    if (found.files.empty() && listing.faults.empty() && !options.json) {
+        out << path << " has no unfinished recording.\n";
+    }
+    PassOverRecovered(found, out);
+    return Worse(searched, ForEachFile(found, out, errors, [&](const std::string& file) {
+                     return RecoverOne(file, found, out, errors);
+                 }));
+}
+
+/// The files that are named, and those below the folders that are.
+ExitCode FindFiles(Options& options, std::ostream& out, std::ostream& errors) {
+    ExitCode result = ExitCode::kSuccess;
+    std::vector<std::string> files;
+    for (const std::string& path : options.files) {
+        if (IsFolder(path)) {
+            const FolderListing listing = FilesIn(path);
+            files.insert(files.end(), listing.files.begin(), listing.files.end());
+            result = Worse(result, TellFaults(path, listing, options, out, errors));
+        } else {
+            files.push_back(path);
+        }
+    }
+    options.files = std::move(files);
     return result;
 }
 
-/// All files are read before any is told of: neighbours are compared.
+ExitCode PrintDefects(const Verification& file, const Options& options, std::ostream& out) {
+    if (options.json) {
+        PrintJson(out, {{"file", file.path.string()}, {"defects", file.defects}});
+    } else {
+        for (const std::string& defect : file.defects) {
+            out << file.path.string() << ": " << defect << '\n';
+        }
+    }
+    return file.defects.empty() ? ExitCode::kSuccess : ExitCode::kDefects;
+}
+
+/// Lines come file by file, and in the end those about neighbours. An object has both, and comes in the end.
 ExitCode Verify(const Options& options, std::ostream& out, std::ostream& errors) {
     Options found = options;
-    found.files.clear();
-    for (const std::string& path : options.files) {
-        const bool isFolder = std::filesystem::is_directory(path);
-        const auto inside = isFolder ? FilesIn(path) : std::vector<std::string>{path};
-        found.files.insert(found.files.end(), inside.begin(), inside.end());
-    }
+    ExitCode result = FindFiles(found, out, errors);
     std::vector<Verification> files;
     const ExitCode read = ForEachFile(found, out, errors, [&](const std::string& path) {
-        files.push_back(VerifyFile(path, options.deep));
-        return ExitCode::kSuccess;
+        Verification& file = files.emplace_back(VerifyFile(path, options.deep));
+        if (options.json) {
+            return ExitCode::kSuccess;
+        }
+        const ExitCode code = PrintDefects(file, options, out);
+        file.defects.clear();
+        return code;
     });
+    result = Worse(result, read);
     VerifyNeighbours(files);
-    return Worse(read, PrintDefects(files, options, out));
+    for (const Verification& file : files) {
+        result = Worse(result, PrintDefects(file, options, out));
+    }
+    return result;
 }
 
 void AddInspect(CLI::App& app, Options& options) {

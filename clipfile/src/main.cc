@@ -1,4 +1,5 @@
 #include <cstdlib>
+#include <exception>
 #include <iostream>
 
 #include "Program.h"
@@ -7,5 +8,10 @@ int main(int count, char** arguments) {
     // The module's log is for those who look for faults: its lines would stand between those of the program.
     setenv("QX_LOG_PRIORITY", "0", 0);
     const std::vector<std::string> all(arguments, arguments + count);
-    return static_cast<int>(clipfile::RunProgram(all, std::cout, std::cerr));
+    try {
+        return static_cast<int>(clipfile::RunProgram(all, std::cout, std::cerr));
+    } catch (const std::exception& error) {
+        std::cerr << "clipfile: " << error.what() << '\n';
+        return static_cast<int>(clipfile::ExitCode::kUnreadable);
+    }
 }

@@ -141,7 +141,55 @@ TEST_F(ProgramTest, RecoveryOfAFolderPassesOverWhatIsRecoveredAlready) {
     EXPECT_EQ(run({"recover", "--json", folder_.Path().string()}), ExitCode::kSuccess);
     EXPECT_EQ(nlohmann::json::parse(out_.str()).at("pictures"), 256);
     EXPECT_EQ(run({"recover", folder_.Path().string()}), ExitCode::kSuccess);
+    EXPECT_EQ(out_.str(),
+              path("a.MP4") + " is passed over: " + path("a.recovered.MP4") + " is there already.\n");
+    EXPECT_EQ(run({"recover", "--json", folder_.Path().string()}), ExitCode::kSuccess);
+    EXPECT_EQ(out_.str(), "{\"file\":\"" + path("a.MP4") + "\",\"recovered\":false,\"there_already\":\"" +
+                              path("a.recovered.MP4") + "\"}\n");
+    std::filesystem::remove(path("a.MP4"));
+    EXPECT_EQ(run({"recover", folder_.Path().string()}), ExitCode::kSuccess);
     EXPECT_EQ(out_.str(), folder_.Path().string() + " has no unfinished recording.\n");
+}
+
+TEST_F(ProgramTest, RecoveryOfAFolderTellsOfEveryFileThatIsNotClosed) {
+    test_stream::WriteAll(path("empty.MP4"), {});
+    EXPECT_EQ(run({"recover", folder_.Path().string()}), ExitCode::kUnreadable);
+    EXPECT_EQ(out_.str(), "");
+    EXPECT_EQ(errors_.str(), "clipfile: " + path("empty.MP4") + " is empty.\n");
+}
+
+TEST_F(ProgramTest, FilesOfOneNameInTwoFoldersAreBothRecovered) {
+    for (const char* const day : {"in/20261120", "in/20261121", "out"}) {
+        std::filesystem::create_directories(path(day));
+    }
+    for (const char* const file : {"in/20261120/a.MP4", "in/20261121/a.MP4"}) {
+        test_stream::Record(path(file), {"fragment", clipfileModule::RecordRules::kExact, false},
+                            test_stream::MakePlainStream(32));
+    }
+    EXPECT_EQ(run({"recover", "--output", path("out"), path("in")}), ExitCode::kSuccess);
+    EXPECT_TRUE(std::filesystem::exists(path("out/20261120/a.MP4")));
+    EXPECT_TRUE(std::filesystem::exists(path("out/20261121/a.MP4")));
+}
+
+TEST_F(ProgramTest, ANameThatTheSystemRefusesIsTold) {
+    const std::string longName(300, 'a');
+    for (const char* const command : {"verify", "recover"}) {
+        EXPECT_EQ(run({command, longName}), ExitCode::kUnreadable) << command;
+        EXPECT_EQ(errors_.str(), "clipfile: " + longName + " cannot be opened: File name too long.\n");
+    }
+}
+
+TEST_F(ProgramTest, DefectsComeWithTheirFile) {
+    recordNormal("a.MP4", false);
+    recordNormal("b.MP4", false);
+    const std::string sentence =
+        ": It is not closed. The length of its samples and 'moov' were never written.\n";
+    // The error of the missing file is told behind the lines of the first one, on the same stream.
+    std::vector<std::string> arguments = {"clipfile", "verify", path("a.MP4"), path("missing.MP4"),
+                                          path("b.MP4")};
+    EXPECT_EQ(RunProgram(arguments, out_, out_), ExitCode::kUnreadable);
+    EXPECT_EQ(out_.str(), path("a.MP4") + sentence + "clipfile: " + path("missing.MP4") +
+                              " does not exist.\n" + path("b.MP4") + sentence);
 }
 
 TEST_F(ProgramTest, WhatCannotBeRecoveredIsToldWithTheReason) {

@@ -6,8 +6,15 @@
 
 namespace clipfile {
 
-/// Files below a folder that have a recording's extension, in the order of their paths. Folders that cannot
-/// be read are passed over, and symbolic links to folders are not followed.
-std::vector<std::string> FilesIn(const std::filesystem::path& folder);
+/// What was found below a folder.
+struct FolderListing {
+    /// Files that have a recording's extension, in the order of their paths.
+    std::vector<std::string> files;
+    /// A sentence for each folder that could not be read, or not to its end.
+    std::vector<std::string> faults;
+};
+
+/// Searches a folder and all below it. Symbolic links to folders are not followed.
+FolderListing FilesIn(const std::filesystem::path& folder);
 
 }  // namespace clipfile

@@ -40,9 +40,9 @@ void Complete(Recording& recording, const std::string& missing) {
 /// Reads `moov`. One that contradicts itself counts as none: what had not reached the disk when the power
 /// went reads as zeros in many file systems.
 void TakeMovie(const InputFile& file, const Box& moov, Recording& recording) {
+    recording.moov = moov;
     try {
         recording.movie = ReadMovie(file, moov);
-        recording.moov = moov;
     } catch (const FormatError& error) {
         Complete(recording, std::string("Its 'moov' is broken. ") + error.what());
     }

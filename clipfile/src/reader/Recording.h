@@ -29,7 +29,7 @@ struct Recording {
     std::string reason;
     /// Nothing when the file has no whole `moov`, or one that contradicts itself.
     std::optional<Movie> movie;
-    std::optional<Box> moov;
+    std::optional<Box> moov;  // whole, but it may contradict itself
     /// Sample bytes of a normal file, or of the part that `moov` of a fragmented one describes.
     std::uint64_t dataBegin = 0;
     std::uint64_t dataEnd = 0;

@@ -5,7 +5,6 @@
 
 #include "media/NalUnits.h"
 #include "reader/BigEndian.h"
-#include "reader/MetadataUnit.h"
 
 namespace clipfile {
 
@@ -14,6 +13,8 @@ namespace {
 /// A packet's first byte and the head of every universal label (SMPTE ST 298).
 constexpr std::array<unsigned char, 5> kKey = {0x01, 0x06, 0x0E, 0x2B, 0x34};
 constexpr std::size_t kWindow = 1024 * 1024;
+/// Bytes that nearly every unit of metadata has room in.
+constexpr std::size_t kUsualUnit = 4096;
 /// Above these the bytes are none of a recording.
 constexpr std::size_t kMaxUnit = 8 * 1024 * 1024;
 constexpr std::uint32_t kMaxNalUnit = 64 * 1024 * 1024;
@@ -86,11 +87,7 @@ std::vector<DataChunks::Extent> DataChunks::FindMetadata(std::uint64_t& offset) 
 std::optional<std::uint64_t> DataChunks::FindUnitEnd(std::uint64_t offset) {
     const std::uint64_t begin = offset;
     while (offset - begin < kMaxUnit) {
-        constexpr std::size_t kUsual = 4096;
-        auto packet = ReadKlvPacket(At(offset, kUsual));
-        if (!packet) {
-            packet = ReadKlvPacket(At(offset, kMaxUnit));
-        }
+        const auto packet = PacketAt(offset);
         if (!packet) {
             // Payloads may hold more than packets. The recorder's block ends them all the same.
             return FindBlockEnd(offset);
@@ -103,18 +100,29 @@ std::optional<std::uint64_t> DataChunks::FindUnitEnd(std::uint64_t offset) {
     return std::nullopt;
 }
 
+std::optional<KlvPacket> DataChunks::PacketAt(std::uint64_t offset) {
+    if (const auto packet = ReadKlvPacket(At(offset, kUsualUnit))) {
+        return packet;
+    }
+    // Bytes of another kind make no packet, however many are read.
+    return IsKeyAt(offset) ? ReadKlvPacket(At(offset, kMaxUnit)) : std::nullopt;
+}
+
 std::optional<std::uint64_t> DataChunks::FindBlockEnd(std::uint64_t offset) {
-    const Bytes bytes = At(offset, kWindow);
-    for (auto at = bytes.begin();; ++at) {
-        at = std::search(at, bytes.end(), kKey.begin(), kKey.end());
-        if (at == bytes.end()) {
-            return std::nullopt;
-        }
-        const auto packet = ReadKlvPacket(Bytes(at, bytes.end()));
-        if (packet && IsRecorderBlock(*packet)) {
-            return offset + static_cast<std::uint64_t>(at - bytes.begin()) + packet->size;
+    for (const std::size_t size : {kUsualUnit, kWindow}) {
+        const Bytes bytes = At(offset, size);
+        for (auto at = bytes.begin();; ++at) {
+            at = std::search(at, bytes.end(), kKey.begin(), kKey.end());
+            if (at == bytes.end()) {
+                break;
+            }
+            const auto packet = ReadKlvPacket(Bytes(at, bytes.end()));
+            if (packet && IsRecorderBlock(*packet)) {
+                return offset + static_cast<std::uint64_t>(at - bytes.begin()) + packet->size;
+            }
         }
     }
+    return std::nullopt;
 }
 
 std::optional<DataChunks::Pictures> DataChunks::FindAudioAndPictures(std::uint64_t& offset, std::size_t units,

@@ -7,6 +7,7 @@
 
 #include "media/Decoders.h"
 #include "reader/InputFile.h"
+#include "reader/MetadataUnit.h"
 #include "recover/ChunkSource.h"
 
 namespace clipfile {
@@ -41,6 +42,8 @@ class DataChunks : public ChunkSource {
     std::vector<Extent> FindMetadata(std::uint64_t& offset);
     /// End of the unit that begins at `offset`, or nothing when it is not whole.
     std::optional<std::uint64_t> FindUnitEnd(std::uint64_t offset);
+    /// The packet that begins at `offset`, valid until the next call of `At`.
+    std::optional<KlvPacket> PacketAt(std::uint64_t offset);
     std::optional<std::uint64_t> FindBlockEnd(std::uint64_t offset);
     /// Takes audio frames until pictures begin. Nothing when none do.
     std::optional<Pictures> FindAudioAndPictures(std::uint64_t& offset, std::size_t units,

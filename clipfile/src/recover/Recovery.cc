@@ -1,18 +1,16 @@
 #include "recover/Recovery.h"
 
-#include <fcntl.h>
-#include <sys/file.h>
-#include <unistd.h>
-
 #include <algorithm>
-#include <cerrno>
 #include <memory>
 #include <system_error>
 #include <vector>
 
 #include "common/ToolError.h"
 #include "reader/BigEndian.h"
+#include "reader/RecordingSamples.h"
 #include "recover/DataChunks.h"
+#include "recover/NewFile.h"
+#include "recover/OriginalFile.h"
 #include "recover/ParameterSetSource.h"
 #include "recover/RecordingWriter.h"
 #include "recover/TableChunks.h"
@@ -32,81 +30,14 @@ ToolError CannotRecover(const fs::path& path, const std::string& why) {
     return {ExitCode::kDefects, path.string() + " cannot be recovered: " + why + "."};
 }
 
-ToolError Unwritable(const fs::path& path, int error) {
-    return {ExitCode::kUnreadable,
-            path.string() + " cannot be written: " + std::generic_category().message(error) + "."};
-}
-
-/// Keeps recorders off a file, which lock what they write.
-class FileLock {
- public:
-    explicit FileLock(const fs::path& path) : descriptor_(open(path.c_str(), O_RDONLY | O_CLOEXEC)) {
-        if (descriptor_ >= 0 && flock(descriptor_, LOCK_SH | LOCK_NB) != 0 && errno == EWOULDBLOCK) {
-            close(descriptor_);
-            throw ToolError(ExitCode::kUnreadable, path.string() + " is still being recorded.");
-        }
-    }
-    ~FileLock() {
-        if (descriptor_ >= 0) {
-            close(descriptor_);
-        }
-    }
-    FileLock(const FileLock&) = delete;
-    FileLock& operator=(const FileLock&) = delete;
-
- private:
-    int descriptor_;
-};
-
-/// A file under a name of its own until it is complete. Removed when it never is.
-class NewFile {
- public:
-    explicit NewFile(const fs::path& target)
-        : target_(target),
-          path_(target.parent_path() / ("." + target.filename().string() + "." + std::to_string(getpid()))) {}
-    ~NewFile() {
-        std::error_code ignored;
-        fs::remove(path_, ignored);
-    }
-    NewFile(const NewFile&) = delete;
-    NewFile& operator=(const NewFile&) = delete;
-
-    const fs::path& Path() const { return path_; }
-    /// Gives it its name once it is on the disk. Another file of that name is replaced only if `replaces`.
-    void Keep(bool replaces) const {
-        Synchronize(path_);
-        const int result =
-            replaces ? rename(path_.c_str(), target_.c_str())
-                     : renameat2(AT_FDCWD, path_.c_str(), AT_FDCWD, target_.c_str(), RENAME_NOREPLACE);
-        if (result != 0) {
-            throw Unwritable(target_, errno);
-        }
-        Synchronize(target_.parent_path());
-    }
-
- private:
-    static void Synchronize(const fs::path& path) {
-        const int descriptor = open(path.c_str(), O_RDONLY | O_CLOEXEC);
-        const int result = descriptor < 0 ? -1 : fsync(descriptor);
-        const int error = errno;
-        if (descriptor >= 0) {
-            close(descriptor);
-        }
-        if (result != 0) {
-            throw Unwritable(path, error);
-        }
-    }
-
-    fs::path target_;
-    fs::path path_;
-};
-
 fs::path TargetOf(const fs::path& path, const RecoveryOptions& options) {
     if (options.inPlace) {
         return fs::absolute(path);
     }
     if (!options.output.empty()) {
-        return fs::absolute(options.output / path.filename());
+        const fs::path name =
+            options.searched.empty() ? path.filename() : path.lexically_relative(options.searched);
+        return fs::absolute(options.output / name);
     }
     return fs::absolute(path.parent_path() /
                         (path.stem().string() + ".recovered" + path.extension().string()));
@@ -181,42 +112,104 @@ std::optional<ParameterSets> OwnSets(const Recording& recording) {
     return ParameterSets{video->avc->sps.front(), video->avc->pps.front()};
 }
 
-void CopyChunks(Chunk first, ChunkSource& source, RecordingWriter& writer, RecoveryResult& result) {
+/// Returns the bytes of the longest chunk.
+std::uint64_t CopyChunks(Chunk first, ChunkSource& source, RecordingWriter& writer, RecoveryResult& result) {
+    std::uint64_t longest = 0;
     for (Chunk chunk = std::move(first); chunk != nullptr; chunk = source.Next()) {
         writer.Write(chunk);
         result.pictures += chunk->video.size();
         result.audioFrames += chunk->audio.size();
         result.metadataUnits += chunk->meta.size();
+        std::uint64_t bytes = 0;
+        for (const auto* const samples : {&chunk->meta, &chunk->audio, &chunk->video}) {
+            for (const auto& sample : *samples) {
+                bytes += sample->GetDataSize();
+            }
+        }
+        longest = std::max(longest, bytes);
     }
     writer.Close();
+    return longest;
+}
+
+std::uint64_t CountSamples(const InputFile& file, const Recording& recording, std::uint32_t handler) {
+    const std::vector<Track>& tracks = recording.movie->tracks;
+    std::uint64_t count = 0;
+    for (std::size_t i = 0; i < tracks.size(); ++i) {
+        if (tracks[i].handler == handler) {
+            RecordingSamples samples(file, recording, i);
+            while (samples.Next()) {
+                ++count;
+            }
+        }
+    }
+    return count;
 }
 
 /// Reads the new file as any other, before it gets its name.
 void CheckWritten(const fs::path& path, const RecoveryResult& result) {
     const InputFile file(path);
     const Recording recording = ReadRecording(file);
-    if (recording.completion != Completion::kClosed || !recording.movie || result.pictures == 0) {
+    if (recording.completion != Completion::kClosed || !recording.movie || result.pictures == 0 ||
+        CountSamples(file, recording, FourCc("vide")) != result.pictures ||
+        CountSamples(file, recording, FourCc("soun")) != result.audioFrames ||
+        CountSamples(file, recording, FourCc("meta")) != result.metadataUnits) {
         throw CannotRecover(path, "what was written is not whole");
+    }
+}
+
+/// A tear leaves less than a chunk behind. More than that may hold pictures, which replacing would lose.
+void CheckReplaceable(const InputFile& file, const Recording& recording, std::uint64_t position,
+                      std::uint64_t longestChunk) {
+    // Behind the samples of a normal file there is nothing but its index, which is made again.
+    const std::uint64_t end =
+        recording.kind == FileKind::kNormal ? std::min(recording.dataEnd, file.Size()) : file.Size();
+    const std::uint64_t left = end - std::min(end, position);
+    if (left > longestChunk) {
+        throw CannotRecover(file.Path(), "in place it would lose the " + std::to_string(left) +
+                                             " bytes behind its last whole picture, which are more than a "
+                                             "chunk; recover it without --in-place");
+    }
+}
+
+/// Fragments cannot be read without the tracks of `moov`.
+bool HasBrokenMovie(const Recording& recording) {
+    return recording.kind == FileKind::kFragmented && recording.moov &&
+           (!recording.movie || recording.movie->Find(FourCc("vide")) == nullptr);
+}
+
+/// The folders below the output's that a file goes to.
+void MakeFolders(const fs::path& target) {
+    std::error_code error;
+    fs::create_directories(target.parent_path(), error);
+    if (error) {
+        throw ToolError(ExitCode::kUnreadable,
+                        target.parent_path().string() + " cannot be made: " + error.message() + ".");
     }
 }
 
 }  // namespace
 
-bool IsRecovered(const fs::path& path, const RecoveryOptions& options) {
-    return !options.inPlace && fs::exists(TargetOf(path, options));
+std::optional<fs::path> RecoveredBefore(const fs::path& path, const RecoveryOptions& options) {
+    fs::path target = TargetOf(path, options);
+    return !options.inPlace && fs::exists(target) ? std::optional(std::move(target)) : std::nullopt;
 }
 
 RecoveryResult RecoverFile(const fs::path& path, const RecoveryOptions& options) {
+    // What the recorder writes until it lets go of the file belongs to it: its size is asked for behind that.
+    const OriginalFile original(path);
     const InputFile file(path);
-    const FileLock lock(path);
     const Recording recording = ReadRecording(file);
     RecoveryResult result;
     if (recording.completion == Completion::kClosed) {
         return result;
     }
     const fs::path target = TargetOf(path, options);
-    if (IsRecovered(path, options)) {
+    if (RecoveredBefore(path, options)) {
         throw ToolError(ExitCode::kUnreadable, target.string() + " is there already.");
+    }
+    if (HasBrokenMovie(recording)) {
+        throw CannotRecover(path, "its 'moov' is broken");
     }
 
     RecordingSetup setup = ReadSetup(file, recording, {});
@@ -234,18 +227,27 @@ RecoveryResult RecoverFile(const fs::path& path, const RecoveryOptions& options)
         result.parameterSets = name;
     }
 
+    if (!options.searched.empty()) {
+        MakeFolders(target);
+    }
     const NewFile written(target);
+    std::uint64_t longestChunk = 0;
     {
         RecordingWriter writer(written.Path(), setup, *sets);
-        CopyChunks(first, *source, writer, result);
+        longestChunk = CopyChunks(first, *source, writer, result);
     }
     CheckWritten(written.Path(), result);
-    std::error_code ignored;
-    fs::permissions(written.Path(), fs::status(path).permissions(), ignored);
+    if (options.inPlace) {
+        CheckReplaceable(file, recording, source->Position(), longestChunk);
+    }
+    original.CopyAccess(written.Path());
+    written.Synchronize();
+    original.CheckUnchanged();
     written.Keep(options.inPlace);
     result.isRecovered = true;
     result.written = target;
     result.bytesLeft = file.Size() - std::min(file.Size(), source->Position());
+    result.lockFault = original.LockFault();
     return result;
 }
 

@@ -15,6 +15,9 @@ struct RecoveryOptions {
     std::filesystem::path output;
     /// The recovered file takes the place of the original.
     bool inPlace = false;
+    /// The folder that files were searched in: below `output` they keep their path below it. Empty for the
+    /// name alone.
+    std::filesystem::path searched = {};
 };
 
 /// What became of a file.
@@ -29,17 +32,20 @@ struct RecoveryResult {
     std::uint64_t bytesLeft = 0;
     /// Where the parameter sets come from, when not from the file itself.
     std::string parameterSets;
+    /// Why the original could not be locked against a recorder, or empty.
+    std::string lockFault;
 };
 
 /// Makes a whole file of an unfinished one. The new file is complete on disk before it gets its name; the
 /// original is only read, and with `inPlace` replaced as a whole at the end.
 ///
 /// Throws `ToolError` with one sentence when nothing can be recovered, when no parameter sets fit, when the
-/// file is still being recorded, or when the new one is there already or cannot be written. Nothing is left
-/// behind then.
+/// file is still being recorded or changes meanwhile, when the new one is there already or cannot be written,
+/// or when `inPlace` would lose more than a torn chunk. No file is left behind then.
 RecoveryResult RecoverFile(const std::filesystem::path& path, const RecoveryOptions& options);
 
-/// Whether there is a file already where the recovered one would go.
-bool IsRecovered(const std::filesystem::path& path, const RecoveryOptions& options);
+/// The file that is already where the recovered one would go, or nothing.
+std::optional<std::filesystem::path> RecoveredBefore(const std::filesystem::path& path,
+                                                     const RecoveryOptions& options);
 
 }  // namespace clipfile

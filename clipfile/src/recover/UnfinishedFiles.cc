@@ -2,16 +2,15 @@
 
 #include <exception>
 
-#include "reader/Folder.h"
 #include "reader/Recording.h"
 
 namespace clipfile {
 
 namespace {
 
-bool IsUnfinished(const std::filesystem::path& path) {
+bool IsClosed(const std::filesystem::path& path) {
     try {
-        return ReadRecording(InputFile(path)).completion == Completion::kUnfinished;
+        return ReadRecording(InputFile(path)).completion == Completion::kClosed;
     } catch (const std::exception&) {
         return false;
     }
@@ -19,10 +18,10 @@ bool IsUnfinished(const std::filesystem::path& path) {
 
 }  // namespace
 
-std::vector<std::string> UnfinishedIn(const std::filesystem::path& folder) {
-    std::vector<std::string> files = FilesIn(folder);
-    std::erase_if(files, [](const std::string& path) { return !IsUnfinished(path); });
-    return files;
+FolderListing UnfinishedIn(const std::filesystem::path& folder) {
+    FolderListing listing = FilesIn(folder);
+    std::erase_if(listing.files, [](const std::string& path) { return IsClosed(path); });
+    return listing;
 }
 
 }  // namespace clipfile

@@ -1,13 +1,13 @@
 #pragma once
 
 #include <filesystem>
-#include <string>
-#include <vector>
+
+#include "reader/Folder.h"
 
 namespace clipfile {
 
-/// Recordings below a folder that are not closed, in the order of their paths. What cannot be read or is no
-/// recording is passed over; symbolic links to folders are not followed.
-std::vector<std::string> UnfinishedIn(const std::filesystem::path& folder);
+/// Files below a folder that are not known to be closed: unfinished recordings, and what cannot be read or is
+/// no recording, which recovery tells the reason of.
+FolderListing UnfinishedIn(const std::filesystem::path& folder);
 
 }  // namespace clipfile

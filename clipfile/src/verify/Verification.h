@@ -23,8 +23,8 @@ struct Verification {
 /// `ToolError` for a file that cannot be read or is no recording.
 Verification VerifyFile(const std::filesystem::path& path, bool deep);
 
-/// Compares the files of each folder with those that follow on them by timecode, and adds what is wrong to
-/// the defects of the file that comes first.
+/// Compares the files of each folder, or of that and the next day's, with those that follow on them by
+/// timecode, and adds what is wrong to the defects of the file that comes first.
 void VerifyNeighbours(std::vector<Verification>& files);
 
 }  // namespace clipfile

@@ -5,6 +5,7 @@
 #include <random>
 
 #include "support/ByteFile.h"
+#include "support/SystemCalls.h"
 #include "support/TestStream.h"
 
 namespace clipfile {
@@ -93,6 +94,29 @@ TEST(DataChunks, MetadataMayHoldMoreThanPackets) {
     const Data other = {0x55, 0x66, 0x77};
     unit.insert(unit.begin() + 52, other.begin(), other.end());
     EXPECT_EQ(ChunksOf(Join({unit, Units(1), kIdr, kPicture})), (std::vector<std::string>{"2/0/ 12i 12"}));
+}
+
+TEST(DataChunks, WhatIsNoPacketIsNotReadAgainForEachUnit) {
+    const SystemCallGuard guard;
+    Data unit = Units(1);
+    const Data other = {0x55, 0x66, 0x77};
+    unit.insert(unit.begin() + 52, other.begin(), other.end());
+    Data bytes;
+    constexpr std::size_t kUnits = 64;
+    for (std::size_t i = 0; i < kUnits; ++i) {
+        bytes = Join({bytes, unit});
+    }
+    // Pictures of 64 KiB, so that the file is longer than what is read at a time.
+    Data picture = kIdr;
+    picture.resize(64 * 1024, 0x91);
+    const Data length = Number(picture.size() - 4, 4);
+    std::copy(length.begin(), length.end(), picture.begin());
+    for (std::size_t i = 0; i < kUnits; ++i) {
+        bytes.insert(bytes.end(), picture.begin(), picture.end());
+    }
+    EXPECT_EQ(ChunksOf(bytes).size(), 1U);
+    // To find the samples, to read them, and what windows share.
+    EXPECT_LT(SystemCalls().bytesRead, 4 * bytes.size());
 }
 
 TEST(DataChunks, EndWhereOtherBytesFollow) {

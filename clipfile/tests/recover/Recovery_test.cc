@@ -140,6 +140,30 @@ TEST_F(RecoveryTest, AFragmentWhoseIndexIsBrokenEndsTheFile) {
     EXPECT_EQ(RecoverFile(original(), {}).pictures, 512U);
 }
 
+TEST_F(RecoveryTest, ABrokenIndexOfAFragmentedFileIsTold) {
+    Record(original(), {"fragment", kExact, false}, MakePlainStream(32));
+    const auto whole = ReadAll(original());
+    for (const char* const box : {"moov/mvhd", "moov/trak/mdia/minf/stbl/stsz"}) {
+        auto bytes = whole;
+        bytes[box_finder::Find(bytes, box).offset] = 0x7F;  // longer than what it lies in
+        WriteAll(original(), bytes);
+        EXPECT_EQ(failure(), original().string() + " cannot be recovered: its 'moov' is broken.") << box;
+    }
+}
+
+TEST_F(RecoveryTest, FilesOfOneNameKeepTheirFoldersBelowTheOutput) {
+    std::filesystem::create_directories(path("in/20261121/M"));
+    std::filesystem::create_directories(path("out"));
+    const std::filesystem::path file = path("in/20261121/M/a.MP4");
+    Record(file, {"fragment", kExact, false}, MakePlainStream(32));
+    RecoveryOptions options;
+    options.output = path("out");
+    options.searched = path("in");
+    EXPECT_EQ(RecoverFile(file, options).written, path("out/20261121/M/a.MP4"));
+    EXPECT_TRUE(std::filesystem::exists(path("out/20261121/M/a.MP4")));
+    EXPECT_EQ(RecoveredBefore(file, options), path("out/20261121/M/a.MP4"));
+}
+
 TEST_F(RecoveryTest, TheRecoveredFileIsForThoseWhoMayReadTheOriginal) {
     Record(original(), {"fragment", kExact, false}, MakePlainStream(32));
     const auto mode = std::filesystem::perms::owner_read | std::filesystem::perms::owner_write;

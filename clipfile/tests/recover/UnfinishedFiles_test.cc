@@ -8,7 +8,7 @@
 namespace clipfile {
 namespace {
 
-TEST(UnfinishedFiles, AreRecordingsThatAreNotClosed) {
+TEST(UnfinishedFiles, AreThoseThatAreNotKnownToBeClosed) {
     const TempDir folder;
     const std::filesystem::path day = folder.Path() / "20261121" / "CAM1";
     std::filesystem::create_directories(day);
@@ -18,9 +18,10 @@ TEST(UnfinishedFiles, AreRecordingsThatAreNotClosed) {
     test_stream::Record(day / "b.MP4", {"normal", kRules, false}, stream);
     test_stream::Record(folder.Path() / "a.MP4", {"fragment", kRules, false}, stream);
     test_stream::WriteAll(day / "other.MP4", {1, 2, 3});
-    EXPECT_EQ(UnfinishedIn(folder.Path()),
-              (std::vector<std::string>{(day / "b.MP4").string(), (folder.Path() / "a.MP4").string()}));
-    EXPECT_TRUE(UnfinishedIn(folder.Path() / "missing").empty());
+    test_stream::WriteAll(day / "empty.MP4", {});
+    EXPECT_EQ(UnfinishedIn(folder.Path()).files,
+              (std::vector<std::string>{(day / "b.MP4").string(), (day / "empty.MP4").string(),
+                                        (day / "other.MP4").string(), (folder.Path() / "a.MP4").string()}));
 }
 
 }  // namespace

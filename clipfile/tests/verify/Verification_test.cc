@@ -202,6 +202,22 @@ TEST_F(NeighboursTest, AFewMissingPicturesAreToldAndAPauseIsNone) {
     EXPECT_EQ(between(piece("a.MP4", 0, 80), piece("b.MP4", 671, 1)), Sentences());
 }
 
+TEST_F(NeighboursTest, AFileGoesOnInTheFolderOfTheNextDay) {
+    // At 29.97 frames a second with drop frame a day has 2589408 frames.
+    EXPECT_EQ(between(piece("out/20261231/M/a.MP4", 2589408 - 640, 80), piece("out/20270101/M/b.MP4", 7, 1)),
+              Sentences{"7 pictures are missing between it and b.MP4."});
+    EXPECT_EQ(between(piece("out/20261231/M/a.MP4", 2589408 - 640, 80), piece("out/20270102/M/b.MP4", 7, 1)),
+              Sentences());
+    EXPECT_EQ(between(piece("out/20261231/M/a.MP4", 2589408 - 640, 80), piece("out/20270101/N/b.MP4", 7, 1)),
+              Sentences());
+}
+
+TEST_F(NeighboursTest, ADayThatWasRecordedMuchLaterIsNotGoneOnWith) {
+    Verification next = piece("out/20270101/M/b.MP4", 7, 1);
+    next.inspection.recording.movie->creationTime += 24 * 60 * 60;
+    EXPECT_EQ(between(piece("out/20261231/M/a.MP4", 2589408 - 640, 80), next), Sentences());
+}
+
 TEST_F(NeighboursTest, TimecodesThatComeTwiceAreTold) {
     EXPECT_EQ(between(piece("a.MP4", 0, 2), piece("b.MP4", 13, 1)),
               Sentences{"Its last 3 pictures have timecodes of b.MP4."});

@@ -1,0 +1,65 @@
+#include "reader/Folder.h"
+
+#include <gtest/gtest.h>
+#include <unistd.h>
+
+#include <fstream>
+
+#include "support/TempDir.h"
+
+namespace clipfile {
+namespace {
+
+/// Root may read all folders: it is somebody else meanwhile.
+class AnotherUser {
+ public:
+    AnotherUser() : isRoot_(geteuid() == 0), isOther_(!isRoot_ || seteuid(65534) == 0) {}
+    ~AnotherUser() {
+        if (isRoot_ && seteuid(0) != 0) {
+            ADD_FAILURE() << "root stays another user";
+        }
+    }
+    AnotherUser(const AnotherUser&) = delete;
+    AnotherUser& operator=(const AnotherUser&) = delete;
+    bool IsOther() const { return isOther_; }
+
+ private:
+    bool isRoot_;
+    bool isOther_;
+};
+
+TEST(Folder, AFolderThatIsMissingIsToldWithTheReason) {
+    const TempDir folder;
+    const std::filesystem::path missing = folder.Path() / "missing";
+    const FolderListing listing = FilesIn(missing);
+    EXPECT_TRUE(listing.files.empty());
+    EXPECT_EQ(listing.faults,
+              std::vector<std::string>{missing.string() + " cannot be read: No such file or directory."});
+}
+
+TEST(Folder, AFolderThatIsDeniedIsToldAndTheOthersAreSearched) {
+    namespace fs = std::filesystem;
+    const TempDir folder;
+    const fs::path denied = folder.Path() / "a";
+    const fs::path open = folder.Path() / "b";
+    fs::create_directory(denied);
+    fs::create_directory(open);
+    std::ofstream(open / "1.MP4") << "x";
+    std::ofstream(open / "2.txt") << "x";
+    fs::permissions(folder.Path(), fs::perms(0755));
+    fs::permissions(denied, fs::perms::none);
+    {
+        const AnotherUser other;
+        if (!other.IsOther()) {
+            GTEST_SKIP() << "The system lets nobody be another user.";
+        }
+        const FolderListing listing = FilesIn(folder.Path());
+        EXPECT_EQ(listing.files, std::vector<std::string>{(open / "1.MP4").string()});
+        EXPECT_EQ(listing.faults,
+                  std::vector<std::string>{denied.string() + " cannot be read: Permission denied."});
+    }
+    fs::permissions(denied, fs::perms::owner_all);
+}
+
+}  // namespace
+}  // namespace clipfile

@@ -1,0 +1,122 @@
+// How a recovered file takes its name, and what keeps it from taking that of a good one.
+
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include "recover/RecoveryFixture.h"
+#include "support/BoxFinder.h"
+#include "support/SystemCalls.h"
+
+namespace clipfile {
+namespace {
+
+using test_stream::MakePlainStream;
+using test_stream::ReadAll;
+using test_stream::Record;
+using test_stream::WriteAll;
+
+const RecoveryOptions kInPlace = {{}, {}, true};
+
+bool IsFolderOpen(int descriptor) {
+    struct stat status = {};
+    return fstat(descriptor, &status) == 0 && S_ISDIR(status.st_mode);
+}
+
+class ReplacementTest : public RecoveryFixture {
+ protected:
+    void recordUnfinished(std::size_t chunks = 32) {
+        Record(original(), {"fragment", clipfileModule::RecordRules::kExact, false}, MakePlainStream(chunks));
+    }
+    std::size_t fileCount() const {
+        return static_cast<std::size_t>(
+            std::distance(std::filesystem::directory_iterator(folder_.Path()), {}));
+    }
+
+    SystemCallGuard guard_;
+};
+
+TEST_F(ReplacementTest, AFileThatIsClosedJustBeforeItIsLockedIsLeftAlone) {
+    recordUnfinished();
+    Record(path("closed.mp4"), {"fragment", clipfileModule::RecordRules::kExact, true}, MakePlainStream(70));
+    const Data closed = ReadAll(path("closed.mp4"));
+    SystemCalls().flock = [&] {
+        WriteAll(original(), closed);
+        return 0;
+    };
+    EXPECT_FALSE(RecoverFile(original(), kInPlace).isRecovered);
+    EXPECT_EQ(ReadAll(original()), closed);
+}
+
+TEST_F(ReplacementTest, AFileThatChangesMeanwhileIsNotReplaced) {
+    recordUnfinished();
+    Data longer = ReadAll(original());
+    longer.push_back(0);
+    SystemCalls().fsync = [&](int) {
+        WriteAll(original(), longer);
+        return 0;
+    };
+    EXPECT_EQ(failure(kInPlace), original().string() + " has changed while it was recovered.");
+    EXPECT_EQ(ReadAll(original()), longer);
+    EXPECT_EQ(fileCount(), 1U);
+}
+
+TEST_F(ReplacementTest, AFileWithMoreThanAChunkBehindADamageIsNotReplaced) {
+    recordUnfinished(96);
+    Data bytes = ReadAll(original());
+    const auto moof = box_finder::Find(bytes, "moof:2");
+    // The track of its first `tfhd`: moof, mfhd, traf, tfhd, version and flags.
+    bytes[moof.offset + 8 + 16 + 8 + 8 + 4 + 3] = 99;
+    WriteAll(original(), bytes);
+    const std::string left = std::to_string(bytes.size() - moof.offset);
+    EXPECT_EQ(failure(kInPlace), original().string() + " cannot be recovered: in place it would lose the " +
+                                     left +
+                                     " bytes behind its last whole picture, which are more than a chunk; "
+                                     "recover it without --in-place.");
+    EXPECT_EQ(ReadAll(original()), bytes);
+    EXPECT_EQ(fileCount(), 1U);
+    EXPECT_EQ(RecoverFile(original(), {}).pictures, 512U);
+}
+
+TEST_F(ReplacementTest, WhereNamesCannotBeTakenWithFlagsALinkGivesTheName) {
+    for (const int error : {EINVAL, ENOSYS}) {
+        recordUnfinished();
+        SystemCalls().renameWithFlags = [&] { return error; };
+        EXPECT_EQ(RecoverFile(original(), {}).written, recovered());
+        EXPECT_EQ(fileCount(), 2U);
+        std::filesystem::remove(recovered());
+    }
+}
+
+TEST_F(ReplacementTest, AFolderThatCannotBeSynchronizedIsNoFailure) {
+    recordUnfinished();
+    int error = EINVAL;
+    SystemCalls().fsync = [&](int descriptor) { return IsFolderOpen(descriptor) ? error : 0; };
+    EXPECT_TRUE(RecoverFile(original(), {}).isRecovered);
+    std::filesystem::remove(recovered());
+    error = EIO;
+    EXPECT_NE(failure(), "");
+}
+
+TEST_F(ReplacementTest, ALockThatTheSystemRefusesIsTold) {
+    recordUnfinished();
+    SystemCalls().flock = [] { return ENOLCK; };
+    EXPECT_EQ(RecoverFile(original(), {}).lockFault, "No locks available");
+    SystemCalls().flock = nullptr;
+    EXPECT_EQ(RecoverFile(original(), kInPlace).lockFault, "");
+}
+
+TEST_F(ReplacementTest, TheOwnerStaysTheSame) {
+    if (geteuid() != 0) {
+        GTEST_SKIP() << "Only root gives files away.";
+    }
+    recordUnfinished();
+    ASSERT_EQ(chown(original().c_str(), 4711, 4712), 0);
+    RecoverFile(original(), kInPlace);
+    struct stat status = {};
+    ASSERT_EQ(stat(original().c_str(), &status), 0);
+    EXPECT_EQ(status.st_uid, 4711U);
+    EXPECT_EQ(status.st_gid, 4712U);
+}
+
+}  // namespace
+}  // namespace clipfile
