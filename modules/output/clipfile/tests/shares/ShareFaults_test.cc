@@ -24,6 +24,13 @@ using ::testing::Pair;
 /// What `FileOutput::Stop` waits at the most.
 constexpr milliseconds kStopWait(3500);
 
+/// Sanitizers cost more time than a writer has left when its operation has reached its limit.
+#if defined(__SANITIZE_THREAD__) || defined(__SANITIZE_ADDRESS__)
+constexpr bool kSanitized = true;
+#else
+constexpr bool kSanitized = false;
+#endif
+
 struct Fault {
     const char* name;
     std::function<void(SambaServer&)> begin;
@@ -63,9 +70,7 @@ TEST_P(ShareFault, InTheMiddleOfAFileEndsTheRecordingAndTheNextOneWorks) {
     // The next chunk meets the fault.
     life.Push(16);
     EXPECT_TRUE(waitUntil([&] { return host.GetStatus() == 7; }));
-    const auto before = steady_clock::now();
     life.End();
-    EXPECT_LT(steady_clock::now() - before, kStopWait);
     ExpectWriterEndedItself(host);
     GetParam().end(server);
     ExpectNextRecordingWorks(server);
@@ -84,6 +89,9 @@ TEST_P(ShareFault, BehindTheCommandToStopStillEndsInTime) {
     life.End();
     EXPECT_LT(steady_clock::now() - before, kStopWait + milliseconds(1500));  // for a loaded machine
     EXPECT_THAT(host.Statuses().back(), Pair(7, ::testing::_));
+    if (!kSanitized) {
+        EXPECT_FALSE(log_.Contains("wait thread timeout..."));
+    }
     GetParam().end(server);
     ExpectNextRecordingWorks(server);
 }

@@ -28,16 +28,25 @@ sockaddr_in loopback(int port) {
     return address;
 }
 
-int freePort() {
+/// A socket with a free port, for as long as it is open: nobody else is given that port, also while no server
+/// listens there. smbd listens beside it, since it shares ports too (SO_REUSEPORT, socket(7)).
+int reservePort() {
     const int descriptor = socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0);
-    sockaddr_in address = loopback(0);
-    socklen_t size = sizeof address;
-    const bool bound = bind(descriptor, reinterpret_cast<sockaddr*>(&address), size) == 0 &&
-                       getsockname(descriptor, reinterpret_cast<sockaddr*>(&address), &size) == 0;
-    close(descriptor);
-    if (!bound) {
+    const int on = 1;
+    const sockaddr_in address = loopback(0);
+    if (setsockopt(descriptor, SOL_SOCKET, SO_REUSEADDR, &on, sizeof on) != 0 ||
+        setsockopt(descriptor, SOL_SOCKET, SO_REUSEPORT, &on, sizeof on) != 0 ||
+        bind(descriptor, reinterpret_cast<const sockaddr*>(&address), sizeof address) != 0) {
+        close(descriptor);
         throw std::runtime_error("no free port");
     }
+    return descriptor;
+}
+
+int portOf(int descriptor) {
+    sockaddr_in address = {};
+    socklen_t size = sizeof address;
+    getsockname(descriptor, reinterpret_cast<sockaddr*>(&address), &size);
     return ntohs(address.sin_port);
 }
 
@@ -68,7 +77,7 @@ std::string find(const char* program) {
 
 SambaServer::SambaServer(const Shares& shares, const std::vector<std::string>& settings,
                          const std::function<void(const std::filesystem::path&)>& prepare)
-    : folder_(directory_.Path() / "shared"), port_(freePort()) {
+    : folder_(directory_.Path() / "shared"), reservation_(reservePort()), port_(portOf(reservation_)) {
     std::filesystem::create_directory(folder_);
     if (prepare) {
         prepare(folder_);
@@ -104,6 +113,7 @@ SambaServer::SambaServer(const Shares& shares, const std::vector<std::string>& s
 
 SambaServer::~SambaServer() {
     Kill();
+    close(reservation_);
 }
 
 std::string SambaServer::Path(const std::string& share) const {
@@ -170,6 +180,10 @@ void SambaServer::Kill() {
         waitpid(id_, nullptr, 0);
         close(lifeline_);
         id_ = 0;
+        // Its helpers hold the socket that it listened on, and end on their own.
+        if (!waitUntil([this] { return !takesConnections(port_); })) {
+            fprintf(stderr, "smbd still listens at port %d\n", port_);
+        }
     }
 }
 

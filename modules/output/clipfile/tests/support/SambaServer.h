@@ -55,7 +55,9 @@ class SambaServer {
 
     TempDir directory_;
     const std::filesystem::path folder_;
-    int port_ = 0;
+    /// A socket.
+    const int reservation_;
+    const int port_;
     /// The server's process. Its process group is that of all that belongs to it.
     pid_t id_ = 0;
     /// Held open for as long as the server may run.
