@@ -106,9 +106,9 @@ TEST(DataChunks, WhatIsNoPacketIsNotReadAgainForEachUnit) {
     for (std::size_t i = 0; i < kUnits; ++i) {
         bytes = Join({bytes, unit});
     }
-    // Pictures of 64 KiB, so that the file is longer than what is read at a time.
+    // Pictures of 256 KiB, so that the file is longer than what is read at a time.
     Data picture = kIdr;
-    picture.resize(64 * 1024, 0x91);
+    picture.resize(256 * 1024, 0x91);
     const Data length = Number(picture.size() - 4, 4);
     std::copy(length.begin(), length.end(), picture.begin());
     for (std::size_t i = 0; i < kUnits; ++i) {
