@@ -9,11 +9,14 @@
 #include <filesystem>
 #include <fstream>
 #include <string>
+#include <thread>
 #include <vector>
 
 #include "common/ReceiverError.h"
 #include "output/OutputFolder.h"
 #include "support/SambaServer.h"
+#include "support/ThreadCount.h"
+#include "support/WaitUntil.h"
 
 namespace receiver {
 namespace {
@@ -68,7 +71,24 @@ std::string FolderOf(const SambaServer& server) {
     return folder;
 }
 
-TEST(ShareFolder, AConnectionThatTheServerHasGivenUpIsMadeAgain) {
+class ShareFolder : public ::testing::Test {
+ protected:
+    // With the first thread of a process a sanitizer starts one of its own.
+    ShareFolder() {
+        std::thread([] {}).join();
+        threads_ = threadCount();
+    }
+    /// A share thread that was given up ends when its server has gone. The end of the process would not wait
+    /// for it, and takes away the libraries that it is in.
+    void TearDown() override {
+        EXPECT_TRUE(waitUntil([this] { return threadCount() <= threads_; }));
+    }
+
+ private:
+    std::size_t threads_ = 0;
+};
+
+TEST_F(ShareFolder, AConnectionThatTheServerHasGivenUpIsMadeAgain) {
     SambaServer server;
     const auto folder = OpenOutputFolder(PlaceAt(FolderOf(server)));
     EXPECT_FALSE(folder->Prepare());
@@ -82,7 +102,7 @@ TEST(ShareFolder, AConnectionThatTheServerHasGivenUpIsMadeAgain) {
     EXPECT_TRUE(folder->Exists(FolderOf(server) + "/file"));
 }
 
-TEST(ShareFolder, AServerThatDoesNotAnswerIsLeftAloneForAWhile) {
+TEST_F(ShareFolder, AServerThatDoesNotAnswerIsLeftAloneForAWhile) {
     const SilentServer server;
     const auto folder = OpenOutputFolder(PlaceAt(server.Folder()));
     EXPECT_EQ(folder->FreeBytes(), std::nullopt);
@@ -94,7 +114,7 @@ TEST(ShareFolder, AServerThatDoesNotAnswerIsLeftAloneForAWhile) {
     EXPECT_EQ(server.TakeConnections(), 0);
 }
 
-TEST(ShareFolder, AServerThatLogsOnAndDoesNotAnswerIsLeftAloneForAWhile) {
+TEST_F(ShareFolder, AServerThatLogsOnAndDoesNotAnswerIsLeftAloneForAWhile) {
     const std::string script = ::testing::TempDir() + "hanging_dfree_" + std::to_string(getpid());
     const std::string asked = script + ".asked";
     std::ofstream(script) << "#!/bin/sh\necho x >>'" << asked << "'\nexec sleep 600\n";
@@ -111,7 +131,7 @@ TEST(ShareFolder, AServerThatLogsOnAndDoesNotAnswerIsLeftAloneForAWhile) {
     std::filesystem::remove(asked);
 }
 
-TEST(ShareFolder, ARefusedPasswordIsNotTriedAgainForAWhile) {
+TEST_F(ShareFolder, ARefusedPasswordIsNotTriedAgainForAWhile) {
     SambaServer server;
     OutputPlace place = PlaceAt(FolderOf(server));
     place.password = "wrong";
@@ -123,7 +143,7 @@ TEST(ShareFolder, ARefusedPasswordIsNotTriedAgainForAWhile) {
     EXPECT_EQ(folder->ReadBackFile(file).problem, "Permission denied");
 }
 
-TEST(ShareFolder, SeesADatedFolderOfSomebodyElse) {
+TEST_F(ShareFolder, SeesADatedFolderOfSomebodyElse) {
     namespace fs = std::filesystem;
     std::vector<std::string> settings;
     if (geteuid() == 0) {
@@ -143,7 +163,7 @@ TEST(ShareFolder, SeesADatedFolderOfSomebodyElse) {
     EXPECT_TRUE(fs::is_empty(server.Folder() / "20261121"));
 }
 
-TEST(ShareFolder, TellsAboutItsDatedFoldersAndLeavesNothingBehind) {
+TEST_F(ShareFolder, TellsAboutItsDatedFoldersAndLeavesNothingBehind) {
     const SambaServer server;
     const auto folder = OpenOutputFolder(PlaceAt(FolderOf(server)));
     EXPECT_FALSE(folder->Prepare());
@@ -158,7 +178,7 @@ TEST(ShareFolder, TellsAboutItsDatedFoldersAndLeavesNothingBehind) {
     EXPECT_THAT(folder->Obstacle("20261121", "CAM2"), HasSubstr("/20261121/CAM2' is no folder; "));
 }
 
-TEST(ShareFolder, AFileThatIsNoRecordingHasAProblemAndASize) {
+TEST_F(ShareFolder, AFileThatIsNoRecordingHasAProblemAndASize) {
     const SambaServer server;
     std::ofstream(server.Folder() / "a.MP4") << "no recording";
     const auto folder = OpenOutputFolder(PlaceAt(FolderOf(server)));
