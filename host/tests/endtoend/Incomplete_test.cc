@@ -60,7 +60,7 @@ TEST_F(IncompleteTest, AStreamWithoutAnIdrFrame) {
 TEST_F(IncompleteTest, ALiveStreamWithoutAnIdrFrame) {
     MaterialOptions options;
     options.seconds = 30;
-    options.pictureGroup = 500;
+    options.pictureGroup = 1000;
     options.more = {"-x264-params", "scenecut=0"};
     const std::filesystem::path tail = Tail(MakeMaterial(folder, options));
     const FreePorts ports;
