@@ -60,8 +60,8 @@ TEST_F(IncompleteTest, AStreamWithoutAnIdrFrame) {
 TEST_F(IncompleteTest, ALiveStreamWithoutAnIdrFrame) {
     MaterialOptions options;
     options.seconds = 30;
-    options.pictureGroup = 1000;
-    options.more = {"-x264-params", "scenecut=0"};
+    options.pictureGroup = 25;
+    options.more = {"-x264-params", "intra-refresh=1:scenecut=0"};
     const std::filesystem::path tail = Tail(MakeMaterial(folder, options));
     const FreePorts ports;
     const std::string url = "udp://127.0.0.1:" + std::to_string(ports.First());
