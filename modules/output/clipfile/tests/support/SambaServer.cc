@@ -29,14 +29,15 @@ sockaddr_in loopback(int port) {
 }
 
 /// A socket with a free port, for as long as it is open: nobody else is given that port, also while no server
-/// listens there. smbd listens beside it, since it shares ports too (SO_REUSEPORT, socket(7)).
+/// listens there. smbd listens beside it, since it shares ports too (SO_REUSEPORT, socket(7)). Who shares
+/// already when a port is chosen may be given one that another test shares.
 int reservePort() {
     const int descriptor = socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0);
     const int on = 1;
     const sockaddr_in address = loopback(0);
-    if (setsockopt(descriptor, SOL_SOCKET, SO_REUSEADDR, &on, sizeof on) != 0 ||
-        setsockopt(descriptor, SOL_SOCKET, SO_REUSEPORT, &on, sizeof on) != 0 ||
-        bind(descriptor, reinterpret_cast<const sockaddr*>(&address), sizeof address) != 0) {
+    if (bind(descriptor, reinterpret_cast<const sockaddr*>(&address), sizeof address) != 0 ||
+        setsockopt(descriptor, SOL_SOCKET, SO_REUSEADDR, &on, sizeof on) != 0 ||
+        setsockopt(descriptor, SOL_SOCKET, SO_REUSEPORT, &on, sizeof on) != 0) {
         close(descriptor);
         throw std::runtime_error("no free port");
     }

@@ -66,7 +66,8 @@ class Turn {
 class RequiredSigning {
  public:
     explicit RequiredSigning(const SmbLibrary& library)
-        : library_(library), before_(kNames.at(static_cast<std::size_t>(library.clientSigning() + 1))) {
+        // -1 wraps to the first name.
+        : library_(library), before_(kNames.at(static_cast<std::size_t>(library.clientSigning()) + 1)) {
         set("required");
     }
     ~RequiredSigning() { set(before_); }
