@@ -65,7 +65,7 @@ TEST_P(ShareFault, InTheMiddleOfAFileEndsTheRecordingAndTheNextOneWorks) {
     setUp(host, server.Path());
     Life life(*this, host);
     life.Push(kFrames);
-    ASSERT_TRUE(waitForPrefix(log_, "OP: FILE CREATE. "));
+    ASSERT_TRUE(life.RunUntil([&] { return countPrefix(log_, "OP: FILE CREATE. ") > 0; }));
     GetParam().begin(server);
     // The next chunk meets the fault.
     life.Push(16);
@@ -82,7 +82,7 @@ TEST_P(ShareFault, BehindTheCommandToStopStillEndsInTime) {
     setUp(host, server.Path());
     Life life(*this, host);
     life.Push(kFrames);
-    ASSERT_TRUE(waitForPrefix(log_, "OP: FILE CREATE. "));
+    ASSERT_TRUE(life.RunUntil([&] { return countPrefix(log_, "OP: FILE CREATE. ") > 0; }));
     GetParam().begin(server);
     life.Push(16);
     const auto before = steady_clock::now();

@@ -87,7 +87,7 @@ TEST_P(ShareRefuses, AndTheHostHearsWhyAndTheNextRecordingWorks) {
         Life life(*this, host);
         life.Push(kFrames);
         ASSERT_TRUE(logon.WaitReached());
-        ASSERT_TRUE(waitForPrefix(log_, "ST: [C]"));
+        ASSERT_TRUE(life.RunUntil([&] { return countPrefix(log_, "ST: [C]") > 0; }));
         logon.Release();
         EXPECT_TRUE(waitForEnd(host));
         life.End();

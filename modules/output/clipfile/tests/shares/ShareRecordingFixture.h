@@ -1,6 +1,7 @@
 #pragma once
 
 #include <gtest/gtest.h>
+#include <chrono>
 
 #include <cstdint>
 #include <cstdlib>
@@ -9,6 +10,7 @@
 #include <memory>
 #include <stdexcept>
 #include <string>
+#include <thread>
 #include <vector>
 
 #include "LogCapture.h"
@@ -55,6 +57,19 @@ class ShareRecording : public ::testing::Test {
                 push.Video(*stream_.Video(next_));
             }
         }
+        /// Pushes the next frames, 50 a second, until `done`: the chunk thread takes note of a unit that
+        /// comes while it works with the next one only. False when it never comes.
+        template <typename Done>
+        [[nodiscard]] bool RunUntil(Done done) {
+            return waitUntil([&] {
+                if (done()) {
+                    return true;
+                }
+                std::this_thread::sleep_for(std::chrono::milliseconds(20));
+                Push(1);
+                return false;
+            });
+        }
         void End() { library_.Module().Uninitialize(); }
         LoadedModule& Library() { return library_; }
 
@@ -90,7 +105,7 @@ class ShareRecording : public ::testing::Test {
     void Record(FakeHost& host) {
         Life life(*this, host);
         life.Push(kFrames);
-        EXPECT_TRUE(waitForEnd(host));
+        EXPECT_TRUE(life.RunUntil([&] { return hasEnded(host); }));
         life.End();
     }
     /// What the host heard of faults. The commands at the start of a life have statuses of their own.
@@ -107,7 +122,10 @@ class ShareRecording : public ::testing::Test {
     }
     /// Waits until a file is open or a fault has been reported.
     bool waitForEnd(FakeHost& host) const {
-        return waitUntil([&] { return host.GetStatus() == 7 || countPrefix(log_, "OP: FILE CREATE. ") > 0; });
+        return waitUntil([&] { return hasEnded(host); });
+    }
+    bool hasEnded(FakeHost& host) const {
+        return host.GetStatus() == 7 || countPrefix(log_, "OP: FILE CREATE. ") > 0;
     }
     /// The file of `Record`, as it stands at the server, holds what was pushed.
     void ExpectRecorded(const std::filesystem::path& root) const {
