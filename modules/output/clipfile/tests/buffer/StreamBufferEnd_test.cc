@@ -94,9 +94,7 @@ TEST(StreamBufferEnd, LimitsAreTestedBeforeTheEndOfTheRecord) {
     harness.buffer->SetStopTimestamp(0);
     gate.Release();
     idr.join();
-    std::uint64_t n = 900;
-    ASSERT_TRUE(harness.RunUntil([&](std::chrono::milliseconds wait) {
-        harness.buffer->PushAudio(harness.clock.Audio(n++));
+    ASSERT_TRUE(harness.RunAudioUntil(900, [&](std::chrono::milliseconds wait) {
         return log.WaitFor(
             [](const std::vector<CapturedLine>& lines) {
                 return std::any_of(lines.begin(), lines.end(), [](const CapturedLine& line) {

@@ -27,9 +27,7 @@ TEST(StreamBufferError, BeforeTheFirstChunkTheModuleFailsForGood) {
     for (std::uint64_t n = 0; n < 901; ++n) {
         harness.buffer->PushAudio(harness.clock.Audio(n));
     }
-    std::uint64_t n = 901;
-    ASSERT_TRUE(harness.RunUntil([&](std::chrono::milliseconds wait) {
-        harness.buffer->PushAudio(harness.clock.Audio(n++));
+    ASSERT_TRUE(harness.RunAudioUntil(901, [&](std::chrono::milliseconds wait) {
         return harness.controller.WaitForCall("status 7 26", wait);
     }));
     EXPECT_THAT(harness.controller.Calls(), ElementsAre("status 6 24", "status 7 26"));
@@ -54,14 +52,11 @@ TEST(StreamBufferError, AChunkOfARecordBeforeCountsAlsoAfterARestart) {
     ASSERT_TRUE(harness.RunUntilChunks(1));
     harness.buffer->Stop();
     harness.Start();
-    std::uint64_t n = 0;
-    for (; n < 901; ++n) {
+    for (std::uint64_t n = 0; n < 901; ++n) {
         harness.buffer->PushAudio(harness.clock.Audio(n));
     }
-    ASSERT_TRUE(harness.RunUntil([&](std::chrono::milliseconds wait) {
-        harness.buffer->PushAudio(harness.clock.Audio(n++));
-        return harness.controller.WaitForCall("post 4", wait);
-    }));
+    ASSERT_TRUE(harness.RunAudioUntil(
+        901, [&](std::chrono::milliseconds wait) { return harness.controller.WaitForCall("post 4", wait); }));
     EXPECT_THAT(harness.controller.Calls(), ElementsAre("status 6 24", "post 4"));
 }
 

@@ -95,9 +95,7 @@ TEST(StreamBufferTransition, WaitStateToErrorWhenAudioPassesItsLimit) {
     for (std::uint64_t n = 0; n < 900; ++n) {
         harness.buffer->PushAudio(harness.clock.Audio(n));
     }
-    std::uint64_t n = 900;
-    ASSERT_TRUE(harness.RunUntil([&](std::chrono::milliseconds wait) {
-        harness.buffer->PushAudio(harness.clock.Audio(n++));
+    ASSERT_TRUE(harness.RunAudioUntil(900, [&](std::chrono::milliseconds wait) {
         return log.WaitForText("OP: CHANGE STATE wait_state -> error.", 1, wait);
     }));
     ASSERT_TRUE(harness.controller.WaitForCall("status 7 26"));

@@ -92,6 +92,17 @@ class BufferHarness {
         return RunUntil(
             [&](std::chrono::milliseconds wait) { return recorder.WaitForChunks(count, output, wait); });
     }
+    /// Sends audio frames alone, from `frame` on, until `done`: no picture ends the wait for the IDR frame.
+    template <typename Done>
+    [[nodiscard]] bool RunAudioUntil(std::uint64_t frame, Done done) {
+        for (int i = 0; i < 500; ++i) {
+            if (done(std::chrono::milliseconds(20))) {
+                return true;
+            }
+            buffer->PushAudio(clock.Audio(frame++));
+        }
+        return done(std::chrono::seconds(10));
+    }
     /// Runs the stream until the line was logged.
     [[nodiscard]] bool RunUntilText(const LogCapture& log, const std::string& text) {
         return RunUntil([&](std::chrono::milliseconds wait) { return log.WaitForText(text, 1, wait); });
