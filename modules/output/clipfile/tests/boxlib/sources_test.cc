@@ -4,17 +4,18 @@
 #include <regex>
 #include <set>
 
-#include "fixture.h"
+#include "boxlib/support/fixture.h"
 
 namespace {
 
 namespace fs = std::filesystem;
 
+// All but those of `platform/`, which are there to call the system.
 std::vector<fs::path> sources() {
     std::vector<fs::path> paths;
-    for (const auto& entry : fs::directory_iterator(BOXLIB_SOURCE_DIR)) {
-        if (entry.path().extension() == ".cc" || entry.path().extension() == ".h")
-            paths.push_back(entry.path());
+    for (fs::recursive_directory_iterator i(BOXLIB_SOURCE_DIR), end; i != end; ++i) {
+        if (i->path().filename() == "platform") i.disable_recursion_pending();
+        if (i->path().extension() == ".cc" || i->path().extension() == ".h") paths.push_back(i->path());
     }
     return paths;
 }
@@ -73,7 +74,7 @@ TEST(SourcesTest, MemoryAndFilesAreReachedThroughTheCallbacksAlone) {
         scanned++;
         EXPECT_EQ(findings(readCode(path), path.filename(), kDirectCall), std::vector<std::string>());
     }
-    EXPECT_GE(scanned, 10U);
+    EXPECT_GE(scanned, 90U);
 }
 
 TEST(SourcesTest, NothingAllocatesThrowsOrLocksByItself) {
