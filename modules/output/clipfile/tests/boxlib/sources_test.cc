@@ -1,6 +1,8 @@
 // Rules that the library's sources keep, read from the sources themselves.
+#include <algorithm>
 #include <filesystem>
 #include <fstream>
+#include <iterator>
 #include <regex>
 #include <set>
 
@@ -106,6 +108,29 @@ TEST(SourcesTest, NothingIsIncludedFromAboveTheLibrary) {
             }
         }
     }
+}
+
+TEST(SourcesTest, AnInnerFunctionHasANameOfItsOwn) {
+    const std::regex declaration(R"(\nMbxStatus (Mbx\w+)\()");
+    const auto declared = [&](const fs::path& path) {
+        const std::string code = readCode(path);
+        std::set<std::string> names;
+        for (std::sregex_iterator i(code.begin(), code.end(), declaration), end; i != end; ++i)
+            names.insert((*i)[1]);
+        return names;
+    };
+    const fs::path face = fs::path(BOXLIB_SOURCE_DIR) / "mbx.h";
+    const std::set<std::string> operations = declared(face);
+    EXPECT_GE(operations.size(), 50U);
+    std::set<std::string> shared;
+    for (const fs::path& path : sources()) {
+        if (path.extension() != ".h" || path == face) continue;
+        const std::set<std::string> inner = declared(path);
+        std::set_intersection(inner.begin(), inner.end(), operations.begin(), operations.end(),
+                              std::inserter(shared, shared.end()));
+    }
+    EXPECT_EQ(shared, (std::set<std::string>{"MbxAddSample", "MbxAddTrackReference", "MbxEndChunk",
+                                             "MbxSetMovieTimes"}));
 }
 
 TEST(SourcesTest, FilesStayShort) {

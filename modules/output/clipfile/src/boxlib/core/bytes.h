@@ -6,13 +6,6 @@
 
 #include "boxlib/core/context.h"
 
-// A four-character code.
-consteval uint32_t MbxCode(const char (&code)[5]) {
-    uint32_t value = 0;
-    for (int i = 0; i < 4; i++) value = value << 8 | static_cast<unsigned char>(code[i]);
-    return value;
-}
-
 inline void MbxStore16(uint8_t* bytes, uint16_t value) {
     bytes[0] = static_cast<uint8_t>(value >> 8);
     bytes[1] = static_cast<uint8_t>(value);

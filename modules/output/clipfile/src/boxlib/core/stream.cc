@@ -3,7 +3,9 @@
 MbxStatus MbxSeek(MbxContext* context, MbxFile* file, uint64_t position) {
     if (file == nullptr) return MBX_OK;
     if (context == nullptr || position > INT64_MAX) return MBX_ERR_INVALID_ARG;
-    return context->callbacks.seek(file, static_cast<int64_t>(position), 0) == MBX_OK ? MBX_OK : MBX_ERR_IO;
+    return context->callbacks.seek(file, static_cast<int64_t>(position), MBX_SEEK_START) == MBX_OK
+               ? MBX_OK
+               : MBX_ERR_IO;
 }
 
 MbxStatus MbxWriteBytes(MbxContext* context, MbxFile* file, const void* data, uint64_t length,
@@ -48,13 +50,13 @@ MbxStatus MbxWriteBoxHeader(MbxContext* context, const MbxOptions* options, MbxF
     MBX_TRY(MbxSeek(context, file, position));
     bool large = false;
     switch (options->box_size_mode) {
-        case 0:
+        case MBX_SIZES_32:
             if (size > UINT32_MAX) return MBX_ERR_BAD_STATE;
             break;
-        case 1:
+        case MBX_SIZES_BY_VALUE:
             large = size > UINT32_MAX;
             break;
-        case 2:
+        case MBX_SIZES_64:
             large = true;
             break;
         default:
@@ -87,14 +89,14 @@ MbxStatus MbxWriteStandaloneHeader(MbxContext* context, uint32_t form, MbxFile* 
     MbxOptions options = {};
     // Contract: header-forms-renumbered. 1 and 2 change places.
     switch (form) {
-        case 0:
-            options.box_size_mode = 0;
+        case MBX_MDAT_HEADER_32:
+            options.box_size_mode = MBX_SIZES_32;
             break;
-        case 1:
-            options.box_size_mode = 2;
+        case MBX_MDAT_HEADER_64:
+            options.box_size_mode = MBX_SIZES_64;
             break;
-        case 2:
-            options.box_size_mode = 1;
+        case MBX_MDAT_HEADER_BY_VALUE:
+            options.box_size_mode = MBX_SIZES_BY_VALUE;
             break;
         default:
             return MBX_ERR_INTERNAL;

@@ -193,7 +193,7 @@ MbxStatus MbxWriteParameterSets(MbxContext* context, MbxFile* file, const MbxLis
     return MBX_OK;
 }
 
-MbxStatus MbxSetAvcConfig(MbxContext* context, MbxSampleEntry* entry, const MbxAvcConfigParams* params) {
+MbxStatus MbxEntrySetAvcConfig(MbxContext* context, MbxSampleEntry* entry, const MbxAvcConfigParams* params) {
     if (MbxAnyNull(context, entry, params) || params->lengthSizeMinusOne > 3) return MBX_ERR_INVALID_ARG;
     if (params->hasExtension != 0 && (params->chroma_format > 3 || params->bit_depth_luma_minus8 > 7 ||
                                       params->bit_depth_chroma_minus8 > 7)) {
@@ -205,19 +205,19 @@ MbxStatus MbxSetAvcConfig(MbxContext* context, MbxSampleEntry* entry, const MbxA
     return MBX_OK;
 }
 
-MbxStatus MbxAddAvcSps(MbxContext* context, MbxSampleEntry* entry, const uint8_t* data, uint64_t size) {
+MbxStatus MbxEntryAddAvcSps(MbxContext* context, MbxSampleEntry* entry, const uint8_t* data, uint64_t size) {
     MbxAvcConfig* config = nullptr;
     MBX_TRY(requireAvcConfig(context, entry, &config));
     return appendParameterSet(context, &config->sequenceSets, data, size);
 }
 
-MbxStatus MbxAddAvcPps(MbxContext* context, MbxSampleEntry* entry, const uint8_t* data, uint64_t size) {
+MbxStatus MbxEntryAddAvcPps(MbxContext* context, MbxSampleEntry* entry, const uint8_t* data, uint64_t size) {
     MbxAvcConfig* config = nullptr;
     MBX_TRY(requireAvcConfig(context, entry, &config));
     return appendParameterSet(context, &config->pictureSets, data, size);
 }
 
-MbxStatus MbxSetHvcConfig(MbxContext* context, MbxSampleEntry* entry, const MbxHvcCValues* params) {
+MbxStatus MbxEntrySetHvcConfig(MbxContext* context, MbxSampleEntry* entry, const MbxHvcCValues* params) {
     if (MbxAnyNull(context, entry, params) || !fitsFields(*params)) return MBX_ERR_INVALID_ARG;
     if (entry->kind != MBX_ENTRY_HVC1) return MBX_ERR_BAD_STATE;
     if (entry->visual.hvcConfig == nullptr) MBX_TRY(MbxNew(context, &entry->visual.hvcConfig));
@@ -225,8 +225,8 @@ MbxStatus MbxSetHvcConfig(MbxContext* context, MbxSampleEntry* entry, const MbxH
     return MBX_OK;
 }
 
-MbxStatus MbxAddHvcNalUnit(MbxContext* context, MbxSampleEntry* entry, uint8_t nalType, uint8_t completeness,
-                           const uint8_t* data, uint64_t size) {
+MbxStatus MbxEntryAddHvcNalUnit(MbxContext* context, MbxSampleEntry* entry, uint8_t nalType,
+                                uint8_t completeness, const uint8_t* data, uint64_t size) {
     if (MbxAnyNull(context, entry) || nalType > 63 || completeness > 1) return MBX_ERR_INVALID_ARG;
     MbxHvcCParams* config = entry->visual.hvcConfig;
     if (entry->kind != MBX_ENTRY_HVC1 || config == nullptr) return MBX_ERR_BAD_STATE;

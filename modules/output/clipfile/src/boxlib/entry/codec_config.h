@@ -43,12 +43,12 @@ MbxStatus MbxWriteParameterSets(MbxContext* context, MbxFile* file, const MbxLis
 // value out of its range or a length without a pointer, MBX_ERR_BAD_STATE for an entry of another kind; a
 // call that fails leaves the entry as it was. Sets and NAL units need the configuration to be set before
 // (MBX_ERR_BAD_STATE).
-MbxStatus MbxSetAvcConfig(MbxContext* context, MbxSampleEntry* entry, const MbxAvcConfigParams* params);
-MbxStatus MbxAddAvcSps(MbxContext* context, MbxSampleEntry* entry, const uint8_t* data, uint64_t size);
-MbxStatus MbxAddAvcPps(MbxContext* context, MbxSampleEntry* entry, const uint8_t* data, uint64_t size);
-MbxStatus MbxSetHvcConfig(MbxContext* context, MbxSampleEntry* entry, const MbxHvcCValues* params);
-MbxStatus MbxAddHvcNalUnit(MbxContext* context, MbxSampleEntry* entry, uint8_t nalType, uint8_t completeness,
-                           const uint8_t* data, uint64_t size);
+MbxStatus MbxEntrySetAvcConfig(MbxContext* context, MbxSampleEntry* entry, const MbxAvcConfigParams* params);
+MbxStatus MbxEntryAddAvcSps(MbxContext* context, MbxSampleEntry* entry, const uint8_t* data, uint64_t size);
+MbxStatus MbxEntryAddAvcPps(MbxContext* context, MbxSampleEntry* entry, const uint8_t* data, uint64_t size);
+MbxStatus MbxEntrySetHvcConfig(MbxContext* context, MbxSampleEntry* entry, const MbxHvcCValues* params);
+MbxStatus MbxEntryAddHvcNalUnit(MbxContext* context, MbxSampleEntry* entry, uint8_t nalType,
+                                uint8_t completeness, const uint8_t* data, uint64_t size);
 
 // Release a configuration with its sets. MBX_ERR_INVALID_ARG for a null context; a null record is MBX_OK.
 MbxStatus MbxFreeAvcConfig(MbxContext* context, MbxAvcConfig* config);

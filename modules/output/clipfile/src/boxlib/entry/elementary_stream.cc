@@ -4,21 +4,18 @@
 
 namespace {
 
-// What `form` says about which part of the parameters counts.
-enum Form : uint32_t { kFields = 0, kRawBytes = 1 };
-
 bool isRange(const uint8_t* data, uint64_t size) {
     return data != nullptr || size == 0;
 }
 
 MbxStatus checkParams(const MbxEsdsParams& params) {
     switch (params.form) {
-        case kFields:
+        case MBX_ESDS_FIELDS:
             return params.streamType < 64 && params.upStream < 2 && params.bufferSizeDB < 0x1000000 &&
                            isRange(params.decoderSpecificInfo, params.decoderSpecificInfoSize)
                        ? MBX_OK
                        : MBX_ERR_INVALID_ARG;
-        case kRawBytes:
+        case MBX_ESDS_RAW:
             return isRange(params.raw, params.rawSize) ? MBX_OK : MBX_ERR_INVALID_ARG;
         default:
             return MBX_ERR_INTERNAL;
@@ -41,7 +38,7 @@ bool takesDescriptor(const MbxSampleEntry& entry) {
 
 MbxStatus copyParams(MbxContext* context, const MbxEsdsParams& params, MbxEsdsValues* values) {
     values->form = params.form;
-    if (params.form == kRawBytes)
+    if (params.form == MBX_ESDS_RAW)
         return MbxBufferAssign(context, 0, &values->raw, params.raw, params.rawSize);
     values->objectTypeIndication = params.objectTypeIndication;
     values->streamType = params.streamType;
@@ -129,10 +126,10 @@ MbxStatus MbxWriteEsdsPayload(MbxContext* context, MbxFile* file, uint64_t posit
     MBX_TRY(MbxSeek(context, file, position));
     MBX_TRY(MbxWriteComposed(context, file, &bytes, &count));
     switch (values.form) {
-        case kFields:
+        case MBX_ESDS_FIELDS:
             MBX_TRY(writeEsDescriptor(context, file, position + count, values, &count));  // ES_Descriptor ES
             break;
-        case kRawBytes:
+        case MBX_ESDS_RAW:
             MBX_TRY(MbxWriteBuffer(context, file, &values.raw, &count));
             break;
         default:
@@ -179,7 +176,7 @@ MbxStatus MbxFreeBtrt(MbxContext* context, MbxBtrtBox* box) {
     return MbxFreeBox(context, box);
 }
 
-MbxStatus MbxSetEsds(MbxContext* context, MbxSampleEntry* entry, const MbxEsdsParams* params) {
+MbxStatus MbxEntrySetEsds(MbxContext* context, MbxSampleEntry* entry, const MbxEsdsParams* params) {
     if (MbxAnyNull(context, entry, params)) return MBX_ERR_INVALID_ARG;
     MBX_TRY(checkParams(*params));
     if (!takesDescriptor(*entry)) return MBX_ERR_BAD_STATE;

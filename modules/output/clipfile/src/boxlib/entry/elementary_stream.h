@@ -37,7 +37,7 @@ MbxStatus MbxFreeBtrt(MbxContext* context, MbxBtrtBox* box);
 // was. MBX_ERR_INVALID_ARG for a value out of its range or a length without a pointer, MBX_ERR_INTERNAL for
 // an unknown form. MBX_ERR_BAD_STATE for an entry of another kind than 1, 3 and 4, and for one of kind 3 that
 // has a raw tail or the configuration of another codec.
-MbxStatus MbxSetEsds(MbxContext* context, MbxSampleEntry* entry, const MbxEsdsParams* params);
+MbxStatus MbxEntrySetEsds(MbxContext* context, MbxSampleEntry* entry, const MbxEsdsParams* params);
 
 // Releases the values with their bytes.
 MbxStatus MbxFreeEsdsValues(MbxContext* context, MbxEsdsValues* values);

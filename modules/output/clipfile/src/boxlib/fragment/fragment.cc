@@ -2,15 +2,16 @@
 
 #include "boxlib/core/row_table.h"
 
-MbxStatus MbxShiftFragmentOffsets(MbxContext* context, const MbxOptions* options, MbxMovie* movie,
-                                  uint32_t fragment, uint32_t track, uint32_t chunk, int64_t delta) {
+MbxStatus MbxMovieShiftFragmentOffsets(MbxContext* context, const MbxOptions* options, MbxMovie* movie,
+                                       uint32_t fragment, uint32_t track, uint32_t chunk, int64_t delta) {
     if (MbxAnyNull(context, options, movie)) return MBX_ERR_INVALID_ARG;
     const MbxStatus status = MbxApplyOffsetDelta(context, 1, track, fragment, chunk, delta, &movie->tracks);
     // Contract: offset-overflow-forgiven. Offsets that count from `moof` may lie behind it.
-    return status == MBX_ERR_OVERFLOW && options->base_offset_mode != 0 ? MBX_OK : status;
+    return status == MBX_ERR_OVERFLOW && options->base_offset_mode != MBX_BASE_EXPLICIT ? MBX_OK : status;
 }
 
-MbxStatus MbxSetFragmentBase(MbxContext* context, MbxMovie* movie, uint32_t fragment, uint64_t position) {
+MbxStatus MbxMovieSetFragmentBase(MbxContext* context, MbxMovie* movie, uint32_t fragment,
+                                  uint64_t position) {
     if (MbxAnyNull(context, movie) || fragment == 0) return MBX_ERR_INVALID_ARG;
     for (const MbxTrack* track = movie->tracks.first; track != nullptr; track = track->next) {
         MbxSampleSegment* segment = MbxFindSegment(track, fragment);
@@ -68,17 +69,17 @@ MbxStatus releaseFragment(MbxContext* context, MbxMovie* movie, uint32_t fragmen
 
 }  // namespace
 
-MbxStatus MbxSealFirstFragment(MbxContext* context, MbxMovie* movie) {
+MbxStatus MbxMovieSealFirstFragment(MbxContext* context, MbxMovie* movie) {
     if (MbxAnyNull(context, movie)) return MBX_ERR_INVALID_ARG;
     return movie->fragmentCount == 0 ? seal(context, movie) : MBX_ERR_BAD_STATE;
 }
 
-MbxStatus MbxSealFragment(MbxContext* context, MbxMovie* movie) {
+MbxStatus MbxMovieSealFragment(MbxContext* context, MbxMovie* movie) {
     if (MbxAnyNull(context, movie)) return MBX_ERR_INVALID_ARG;
     return movie->fragmentCount != 0 ? seal(context, movie) : MBX_ERR_BAD_STATE;
 }
 
-MbxStatus MbxReleaseFragment(MbxContext* context, MbxMovie* movie, uint32_t fragment) {
+MbxStatus MbxMovieReleaseFragment(MbxContext* context, MbxMovie* movie, uint32_t fragment) {
     if (MbxAnyNull(context, movie)) return MBX_ERR_INVALID_ARG;
     if (fragment != 0) {
         MBX_TRY(requireSealed(movie, fragment));
@@ -95,9 +96,9 @@ MbxStatus MbxReleaseFragment(MbxContext* context, MbxMovie* movie, uint32_t frag
     return MBX_OK;
 }
 
-MbxStatus MbxWriteMoof(MbxContext* context, const MbxScratch* scratch, const MbxOptions* options,
-                       const MbxMovie* movie, MbxFile* file, uint32_t fragment, uint64_t position,
-                       uint64_t* size) {
+MbxStatus MbxMovieWriteMoof(MbxContext* context, const MbxScratch* scratch, const MbxOptions* options,
+                            const MbxMovie* movie, MbxFile* file, uint32_t fragment, uint64_t position,
+                            uint64_t* size) {
     if (MbxAnyNull(context, options, movie, size) || fragment == 0) return MBX_ERR_INVALID_ARG;
     MBX_TRY(requireSealed(movie, fragment));
     for (const MbxTrack* track = movie->tracks.first; track != nullptr; track = track->next) {

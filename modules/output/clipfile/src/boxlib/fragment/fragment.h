@@ -13,21 +13,21 @@
 //
 // What the operations of the same names do to the movie. MBX_ERR_INVALID_ARG for a null argument.
 
-MbxStatus MbxShiftFragmentOffsets(MbxContext* context, const MbxOptions* options, MbxMovie* movie,
-                                  uint32_t fragment, uint32_t track, uint32_t chunk, int64_t delta);
-MbxStatus MbxSetFragmentBase(MbxContext* context, MbxMovie* movie, uint32_t fragment, uint64_t position);
+MbxStatus MbxMovieShiftFragmentOffsets(MbxContext* context, const MbxOptions* options, MbxMovie* movie,
+                                       uint32_t fragment, uint32_t track, uint32_t chunk, int64_t delta);
+MbxStatus MbxMovieSetFragmentBase(MbxContext* context, MbxMovie* movie, uint32_t fragment, uint64_t position);
 
 // Nothing changes on failure.
-MbxStatus MbxSealFirstFragment(MbxContext* context, MbxMovie* movie);
-MbxStatus MbxSealFragment(MbxContext* context, MbxMovie* movie);
+MbxStatus MbxMovieSealFirstFragment(MbxContext* context, MbxMovie* movie);
+MbxStatus MbxMovieSealFragment(MbxContext* context, MbxMovie* movie);
 
-MbxStatus MbxReleaseFragment(MbxContext* context, MbxMovie* movie, uint32_t fragment);
+MbxStatus MbxMovieReleaseFragment(MbxContext* context, MbxMovie* movie, uint32_t fragment);
 
 // In base_offset_mode 0 the chunk offsets of a fragment are positions in the file; in modes 1 and 2 they
 // count from the first byte of its `moof`.
-MbxStatus MbxWriteMoof(MbxContext* context, const MbxScratch* scratch, const MbxOptions* options,
-                       const MbxMovie* movie, MbxFile* file, uint32_t fragment, uint64_t position,
-                       uint64_t* size);
+MbxStatus MbxMovieWriteMoof(MbxContext* context, const MbxScratch* scratch, const MbxOptions* options,
+                            const MbxMovie* movie, MbxFile* file, uint32_t fragment, uint64_t position,
+                            uint64_t* size);
 
 // ---- Boxes
 // ---------------------------------------------------------------------------------------------------------

@@ -4,8 +4,8 @@
 #include "boxlib/model/version.h"
 #include "boxlib/sample/sample_segment.h"
 
-MbxStatus MbxWriteMfra(MbxContext* context, const MbxScratch* scratch, const MbxOptions* options,
-                       const MbxMovie* movie, MbxFile* file, uint64_t position, uint64_t* size) {
+MbxStatus MbxMovieWriteMfra(MbxContext* context, const MbxScratch* scratch, const MbxOptions* options,
+                            const MbxMovie* movie, MbxFile* file, uint64_t position, uint64_t* size) {
     if (MbxAnyNull(context, options, movie, size)) return MBX_ERR_INVALID_ARG;
     return MbxWriteTemporary<MbxMfraBox>(
         context, file, size,

@@ -5,8 +5,8 @@
 #include "boxlib/model/model.h"
 
 // What the session's operation of the same name does to the movie. MBX_ERR_INVALID_ARG for a null argument.
-MbxStatus MbxWriteMfra(MbxContext* context, const MbxScratch* scratch, const MbxOptions* options,
-                       const MbxMovie* movie, MbxFile* file, uint64_t position, uint64_t* size);
+MbxStatus MbxMovieWriteMfra(MbxContext* context, const MbxScratch* scratch, const MbxOptions* options,
+                            const MbxMovie* movie, MbxFile* file, uint64_t position, uint64_t* size);
 
 struct MbxTfraParams {
     const MbxMovie* movie;

@@ -25,8 +25,8 @@ MbxStatus MbxBuildMehd(MbxContext* context, const MbxOptions* options, const Mbx
                        MbxMehdBox* box) {
     if (MbxAnyNull(context, options, params, box)) return MBX_ERR_INVALID_ARG;
     const bool needsWide = params->fragmentDuration > UINT32_MAX;
-    if (options->mehd_mode == 2 && needsWide) return MBX_ERR_BAD_STATE;
-    box->version = options->mehd_mode == 3 || needsWide ? 1 : 0;
+    if (options->mehd_mode == MBX_MEHD_32 && needsWide) return MBX_ERR_BAD_STATE;
+    box->version = options->mehd_mode == MBX_MEHD_64 || needsWide ? 1 : 0;
     box->params = *params;
     return MbxMeasureBox(context, options, box, MbxWriteMehdPayload);
 }
@@ -155,7 +155,7 @@ MbxStatus MbxFreeLeva(MbxContext* context, MbxLevaBox* box) {
 MbxStatus MbxBuildMvex(MbxContext* context, const MbxOptions* options, const MbxMovie* params,
                        MbxMvexBox* box) {
     if (MbxAnyNull(context, options, params, box)) return MBX_ERR_INVALID_ARG;
-    if (options->mehd_mode != 0) {
+    if (options->mehd_mode != MBX_MEHD_NONE) {
         MbxMehdParams mehd = {};
         MBX_TRY(MbxComputeFragmentDuration(params, &mehd.fragmentDuration));
         MBX_TRY(MbxMakeBox(context, options, &box->mehd, &mehd, MbxBuildMehd, MbxFreeMehd));

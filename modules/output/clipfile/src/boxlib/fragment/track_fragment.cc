@@ -68,7 +68,7 @@ MbxStatus MbxBuildTraf(MbxContext* context, const MbxScratch* scratch, const Mbx
     const MbxSampleSegment& segment = *params->segment;
     const MbxTfhdParams tfhd = {params->track, params->segment, *params->runningBase};
     MBX_TRY(MbxMakeBox(context, options, &box->tfhd, &tfhd, MbxBuildTfhd, MbxFreeTfhd));
-    if (options->tfdt_mode == 1) {
+    if (options->tfdt_mode == MBX_TFDT_ALWAYS) {
         const MbxTfdtParams tfdt = {segment.firstDecodeTime};
         MBX_TRY(MbxMakeBox(context, options, &box->tfdt, &tfdt, MbxBuildTfdt, MbxFreeTfdt));
     }

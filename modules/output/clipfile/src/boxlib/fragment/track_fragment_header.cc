@@ -8,7 +8,7 @@ namespace {
 MbxStatus chooseBase(const MbxOptions* options, const MbxTfhdParams& params, MbxTfhdValues* values) {
     const MbxSampleSegment& segment = *params.segment;
     switch (options->base_offset_mode) {
-        case 0: {
+        case MBX_BASE_EXPLICIT: {
             values->flags |= MBX_TFHD_BASE_DATA_OFFSET;
             values->baseDataOffset = segment.overrides.baseDataOffset;
             if ((segment.overridesSet & MBX_OVERRIDE_BASE_OFFSET) != 0) return MBX_OK;
@@ -17,10 +17,10 @@ MbxStatus chooseBase(const MbxOptions* options, const MbxTfhdParams& params, Mbx
             values->baseDataOffset = *first;
             return MBX_OK;
         }
-        case 1:
+        case MBX_BASE_RUNS_ON:
             values->baseDataOffset = params.runningBase;
             return MBX_OK;
-        case 2:
+        case MBX_BASE_MOOF:
             values->flags |= MBX_TFHD_BASE_IS_MOOF;
             values->baseDataOffset = 0;
             return MBX_OK;

@@ -59,7 +59,7 @@ MbxStatus composeRows(MbxSampleCursor cursor, const MbxTrunValues& values, uint8
 MbxStatus computeDataOffset(const MbxOptions* options, uint64_t offset, uint64_t base, int32_t* dataOffset) {
     const uint64_t distance = offset >= base ? offset - base : base - offset;
     const uint64_t limit = offset >= base ? 0x7FFFFFFF : 0x80000000;
-    if (options->base_offset_mode == 0 && distance > limit) return MBX_ERR_OVERFLOW;
+    if (options->base_offset_mode == MBX_BASE_EXPLICIT && distance > limit) return MBX_ERR_OVERFLOW;
     // Contract: data-offset-cut. Silently, in the other modes.
     *dataOffset = static_cast<int32_t>(static_cast<uint32_t>(offset - base));
     return MBX_OK;
@@ -72,7 +72,8 @@ MbxStatus inspectRun(const MbxOptions* options, const MbxTfhdValues& defaults, M
     uint64_t offset = 0;
     MBX_TRY(MbxStepChunkOffset(cursor, &offset));
     MBX_TRY(MbxStepChunk(cursor, &values->sampleCount));
-    if (options->trun_offset_mode == 0 || offset != *position) values->flags |= MBX_TRUN_DATA_OFFSET;
+    if (options->trun_offset_mode == MBX_TRUN_OFFSET_ALWAYS || offset != *position)
+        values->flags |= MBX_TRUN_DATA_OFFSET;
     MBX_TRY(computeDataOffset(options, offset, defaults.baseDataOffset, &values->dataOffset));
     *position = offset;
     MBX_TRY(inspectSamples(defaults, cursor, position, values));
@@ -85,7 +86,7 @@ MbxStatus inspectRun(const MbxOptions* options, const MbxTfhdValues& defaults, M
 
 // Version 1 makes the composition offsets of the run signed.
 uint32_t versionOf(const MbxOptions* options, const MbxSampleSegment* segment) {
-    return options->trun_version_mode == 1 ? 1 : segment->compositionOffsets.signedOffsets;
+    return options->trun_version_mode == MBX_TRUN_VERSION_1 ? 1 : segment->compositionOffsets.signedOffsets;
 }
 
 }  // namespace

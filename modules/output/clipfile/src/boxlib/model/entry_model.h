@@ -6,22 +6,6 @@
 
 struct MbxSinfParams;
 
-// The kinds of sample entry. Code and body of each stand in `stsd`'s dispatchers.
-enum MbxEntryKind : uint32_t {
-    MBX_ENTRY_MP4V = 1,
-    MBX_ENTRY_AVC1 = 2,
-    MBX_ENTRY_MP4A = 3,
-    MBX_ENTRY_SYSTEMS = 4,  // code given: a bare entry with an optional `esds`
-    MBX_ENTRY_PLAIN = 5,    // code given: head and four zero bytes
-    MBX_ENTRY_RTMD = 6,
-    MBX_ENTRY_PLAIN2 = 7,       // code given: as kind 5
-    MBX_ENTRY_GRAPHICS = 8,     // code given: a 32-byte body
-    MBX_ENTRY_GRAPHICS_3D = 9,  // code given: as kind 8, with a `3STP`
-    MBX_ENTRY_TEXT = 10,        // code given: three texts
-    MBX_ENTRY_HVC1 = 11,
-    MBX_ENTRY_TMCD = 12,
-};
-
 // A parameter set or NAL unit: bytes of `avcC` and `hvcC`.
 struct MbxParameterSet {
     MbxBuffer bytes;

@@ -188,14 +188,6 @@ struct MbxSampleDefaults {
     uint32_t flags;
 };
 
-// Bits of MbxTrack::defaultsMask, and the places in defaultsForced.
-enum MbxSampleDefault : uint32_t {
-    MBX_DEFAULT_DESCRIPTION = 0,
-    MBX_DEFAULT_DURATION = 1,
-    MBX_DEFAULT_SIZE = 2,
-    MBX_DEFAULT_FLAGS = 3,
-};
-
 struct MbxTrack {
     MbxTrackHeader header;
     MbxList<MbxReferenceGroup> references;

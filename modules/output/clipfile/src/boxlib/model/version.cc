@@ -11,15 +11,15 @@ bool isWide(uint64_t value) {
 // What the time boxes and `elst` share: they differ in what makes version 1 needed and what is refused.
 MbxStatus chooseLoosely(const MbxOptions* options, bool any, bool refused, uint32_t* version) {
     switch (options->time_version_mode) {
-        case 0:
-        case 2:
+        case MBX_TIMES_32:
+        case MBX_TIMES_32_WITH_TFRA:
             if (refused) return MBX_ERR_BAD_STATE;
             *version = 0;
             return MBX_OK;
-        case 1:
+        case MBX_TIMES_BY_VALUE:
             *version = any ? 1 : 0;
             return MBX_OK;
-        case 3:
+        case MBX_TIMES_64:
             *version = 1;
             return MBX_OK;
         default:
@@ -54,7 +54,7 @@ MbxStatus MbxChooseIndexVersion(const MbxOptions* options, uint64_t time, uint64
                                 uint32_t* version) {
     if (options == nullptr || version == nullptr) return MBX_ERR_INVALID_ARG;
     // Contract: tfra-version-1. Mode 0 is not "as mode 2" here.
-    if (options->time_version_mode == 0) {
+    if (options->time_version_mode == MBX_TIMES_32) {
         *version = 1;
         return MBX_OK;
     }
@@ -64,10 +64,10 @@ MbxStatus MbxChooseIndexVersion(const MbxOptions* options, uint64_t time, uint64
 MbxStatus MbxChooseValueVersion(const MbxOptions* options, bool needsWide, uint32_t* version) {
     if (options == nullptr || version == nullptr) return MBX_ERR_INVALID_ARG;
     switch (options->time_version_mode) {
-        case 1:
+        case MBX_TIMES_BY_VALUE:
             *version = needsWide ? 1 : 0;
             return MBX_OK;
-        case 3:
+        case MBX_TIMES_64:
             *version = 1;
             return MBX_OK;
         default:

@@ -1,6 +1,7 @@
 // Choice of version 0 or 1 for boxes whose fields are 32 or 64 bits wide, by time_version_mode.
 //
-// The choosers do not agree with each other at the edges. Files in the field depend on each as it is.
+// Modes are told by their numbers (MbxTimeVersionMode). The choosers do not agree with each other at the
+// edges. Files in the field depend on each as it is.
 #pragma once
 
 #include "boxlib/core/list.h"

@@ -78,8 +78,8 @@ MbxStatus MbxChooseOffsetWidth(const MbxOptions* options, const MbxChunkOffsetLi
         const auto* entries = MbxBlockEntries<uint64_t>(block);
         for (uint32_t i = 0; i < block->count; i++) bits |= entries[i];
     }
-    const bool wide = options->chunk_offset_mode == 2 || bits > UINT32_MAX;
-    if (wide && options->chunk_offset_mode == 0) return MBX_ERR_BAD_STATE;
+    const bool wide = options->chunk_offset_mode == MBX_OFFSETS_64 || bits > UINT32_MAX;
+    if (wide && options->chunk_offset_mode == MBX_OFFSETS_32) return MBX_ERR_BAD_STATE;
     *width = wide ? 8 : 4;
     return MBX_OK;
 }

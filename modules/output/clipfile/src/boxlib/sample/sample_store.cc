@@ -227,7 +227,7 @@ MbxStatus MbxEndChunk(MbxContext* context, MbxSession* session, uint32_t trackIn
     return MbxCloseChunk(context, &track->segments.last->chunks);
 }
 
-MbxStatus MbxSetSignedOffsets(MbxContext* context, MbxTrack* track, uint32_t signedOffsets) {
+MbxStatus MbxTrackSetSignedOffsets(MbxContext* context, MbxTrack* track, uint32_t signedOffsets) {
     if (context == nullptr || track == nullptr || signedOffsets > 1) return MBX_ERR_INVALID_ARG;
     MBX_TRY(MbxRequireSegment(context, track));
     MbxCompositionList* offsets = &track->segments.last->compositionOffsets;

@@ -36,4 +36,4 @@ MbxStatus MbxEndChunk(MbxContext* context, MbxSession* session, uint32_t trackIn
 
 // Makes composition offsets of the track signed, or not. MBX_ERR_INVALID_ARG for a word above 1,
 // MBX_ERR_BAD_STATE once the track has a fragment or a sample with a composition offset.
-MbxStatus MbxSetSignedOffsets(MbxContext* context, MbxTrack* track, uint32_t signedOffsets);
+MbxStatus MbxTrackSetSignedOffsets(MbxContext* context, MbxTrack* track, uint32_t signedOffsets);

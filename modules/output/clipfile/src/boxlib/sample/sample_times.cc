@@ -39,7 +39,7 @@ MbxStatus MbxFreeStts(MbxContext* context, MbxSttsBox* box) {
 MbxStatus MbxBuildCtts(MbxContext* context, const MbxOptions* options, const MbxCompositionList* params,
                        MbxCttsBox* box) {
     if (MbxAnyNull(context, options, params, box)) return MBX_ERR_INVALID_ARG;
-    box->version = options->trun_version_mode == 1 || params->signedOffsets == 1 ? 1 : 0;
+    box->version = options->trun_version_mode == MBX_TRUN_VERSION_1 || params->signedOffsets == 1 ? 1 : 0;
     box->offsets = params;
     return MbxMeasureBox(context, options, box, MbxWriteCttsPayload);
 }

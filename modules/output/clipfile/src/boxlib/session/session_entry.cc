@@ -37,7 +37,7 @@ MbxStatus MbxAddVideoEntry(MbxSession* session, uint32_t track, const MbxVisualE
     request.kind = params->kind;
     request.dataReferenceIndex = params->dataReferenceIndex;
     request.visual = *params;
-    return addEntry(session, track, MbxCode("vide"), request, index);
+    return addEntry(session, track, MBX_HANDLER_VIDEO, request, index);
 }
 
 MbxStatus MbxAddSoundEntry(MbxSession* session, uint32_t track, const MbxAudioEntryParams* params,
@@ -47,7 +47,7 @@ MbxStatus MbxAddSoundEntry(MbxSession* session, uint32_t track, const MbxAudioEn
     request.kind = MBX_ENTRY_MP4A;
     request.dataReferenceIndex = params->dataReferenceIndex;
     request.audio = *params;
-    return addEntry(session, track, MbxCode("soun"), request, index);
+    return addEntry(session, track, MBX_HANDLER_SOUND, request, index);
 }
 
 MbxStatus MbxAddTimecodeEntry(MbxSession* session, uint32_t track, const MbxTimecodeEntryParams* params,
@@ -57,7 +57,7 @@ MbxStatus MbxAddTimecodeEntry(MbxSession* session, uint32_t track, const MbxTime
     request.kind = MBX_ENTRY_TMCD;
     request.dataReferenceIndex = params->dataReferenceIndex;
     request.timecode = *params;
-    return addEntry(session, track, MbxCode("tmcd"), request, index);
+    return addEntry(session, track, MBX_HANDLER_TIMECODE, request, index);
 }
 
 MbxStatus MbxAddMetaEntry(MbxSession* session, uint32_t track, const MbxMetaEntryParams* params,
@@ -66,46 +66,46 @@ MbxStatus MbxAddMetaEntry(MbxSession* session, uint32_t track, const MbxMetaEntr
     MbxSampleEntryRequest request = {};
     request.kind = MBX_ENTRY_RTMD;
     request.dataReferenceIndex = params->dataReferenceIndex;
-    return addEntry(session, track, MbxCode("meta"), request, index);
+    return addEntry(session, track, MBX_HANDLER_META, request, index);
 }
 
 MbxStatus MbxSetAvcConfig(MbxSession* session, uint32_t track, uint32_t entry,
                           const MbxAvcConfigParams* params) {
     MbxSampleEntry* found = nullptr;
     MBX_TRY(requireEntry(session, track, entry, &found));
-    return MbxSetAvcConfig(session->context, found, params);
+    return MbxEntrySetAvcConfig(session->context, found, params);
 }
 
 MbxStatus MbxAddAvcSps(MbxSession* session, uint32_t track, uint32_t entry, const uint8_t* data,
                        uint64_t size) {
     MbxSampleEntry* found = nullptr;
     MBX_TRY(requireEntry(session, track, entry, &found));
-    return MbxAddAvcSps(session->context, found, data, size);
+    return MbxEntryAddAvcSps(session->context, found, data, size);
 }
 
 MbxStatus MbxAddAvcPps(MbxSession* session, uint32_t track, uint32_t entry, const uint8_t* data,
                        uint64_t size) {
     MbxSampleEntry* found = nullptr;
     MBX_TRY(requireEntry(session, track, entry, &found));
-    return MbxAddAvcPps(session->context, found, data, size);
+    return MbxEntryAddAvcPps(session->context, found, data, size);
 }
 
 // Contract: operations-for-others. The module records AVC alone.
 MbxStatus MbxSetHvcConfig(MbxSession* session, uint32_t track, uint32_t entry, const MbxHvcCValues* params) {
     MbxSampleEntry* found = nullptr;
     MBX_TRY(requireEntry(session, track, entry, &found));
-    return MbxSetHvcConfig(session->context, found, params);
+    return MbxEntrySetHvcConfig(session->context, found, params);
 }
 
 MbxStatus MbxAddHvcNalUnit(MbxSession* session, uint32_t track, uint32_t entry, uint8_t nalType,
                            uint8_t completeness, const uint8_t* data, uint64_t size) {
     MbxSampleEntry* found = nullptr;
     MBX_TRY(requireEntry(session, track, entry, &found));
-    return MbxAddHvcNalUnit(session->context, found, nalType, completeness, data, size);
+    return MbxEntryAddHvcNalUnit(session->context, found, nalType, completeness, data, size);
 }
 
 MbxStatus MbxSetEsds(MbxSession* session, uint32_t track, uint32_t entry, const MbxEsdsParams* params) {
     MbxSampleEntry* found = nullptr;
     MBX_TRY(requireEntry(session, track, entry, &found));
-    return MbxSetEsds(session->context, found, params);
+    return MbxEntrySetEsds(session->context, found, params);
 }

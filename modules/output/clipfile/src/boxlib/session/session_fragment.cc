@@ -17,41 +17,41 @@ MbxStatus MbxForceDefaults(MbxSession* session, uint32_t track, const uint32_t f
 MbxStatus MbxShiftFragmentOffsets(MbxSession* session, uint32_t fragment, uint32_t track, uint32_t chunk,
                                   int64_t delta) {
     MBX_TRY(MbxRequireMovie(session));
-    return MbxShiftFragmentOffsets(session->context, &session->config, session->movie, fragment, track, chunk,
-                                   delta);
+    return MbxMovieShiftFragmentOffsets(session->context, &session->config, session->movie, fragment, track,
+                                        chunk, delta);
 }
 
 MbxStatus MbxSetFragmentBase(MbxSession* session, uint32_t fragment, uint64_t position) {
     MBX_TRY(MbxRequireMovie(session));
-    return MbxSetFragmentBase(session->context, session->movie, fragment, position);
+    return MbxMovieSetFragmentBase(session->context, session->movie, fragment, position);
 }
 
 MbxStatus MbxSealFirstFragment(MbxSession* session) {
     MBX_TRY(MbxRequireMovie(session));
-    return MbxSealFirstFragment(session->context, session->movie);
+    return MbxMovieSealFirstFragment(session->context, session->movie);
 }
 
 MbxStatus MbxSealFragment(MbxSession* session) {
     MBX_TRY(MbxRequireMovie(session));
-    return MbxSealFragment(session->context, session->movie);
+    return MbxMovieSealFragment(session->context, session->movie);
 }
 
 MbxStatus MbxReleaseFragment(MbxSession* session, uint32_t fragment) {
     MBX_TRY(MbxRequireMovie(session));
-    return MbxReleaseFragment(session->context, session->movie, fragment);
+    return MbxMovieReleaseFragment(session->context, session->movie, fragment);
 }
 
 MbxStatus MbxWriteMoof(MbxSession* session, MbxFile* file, uint32_t fragment, uint64_t position,
                        uint64_t* size) {
     if (MbxAnyNull(session, size)) return MBX_ERR_INVALID_ARG;
     MBX_TRY(MbxRequireMovie(session));
-    return MbxWriteMoof(session->context, &session->scratch, &session->config, session->movie, file, fragment,
-                        position, size);
+    return MbxMovieWriteMoof(session->context, &session->scratch, &session->config, session->movie, file,
+                             fragment, position, size);
 }
 
 MbxStatus MbxWriteMfra(MbxSession* session, MbxFile* file, uint64_t position, uint64_t* size) {
     if (MbxAnyNull(session, size)) return MBX_ERR_INVALID_ARG;
     MBX_TRY(MbxRequireMovie(session));
-    return MbxWriteMfra(session->context, &session->scratch, &session->config, session->movie, file, position,
-                        size);
+    return MbxMovieWriteMfra(session->context, &session->scratch, &session->config, session->movie, file,
+                             position, size);
 }

@@ -21,19 +21,19 @@ MbxStatus addTrack(MbxSession* session, uint32_t handler, const MbxTrackParams* 
 }  // namespace
 
 MbxStatus MbxAddVideoTrack(MbxSession* session, const MbxTrackParams* params, uint32_t* track) {
-    return addTrack(session, MbxCode("vide"), params, track);
+    return addTrack(session, MBX_HANDLER_VIDEO, params, track);
 }
 
 MbxStatus MbxAddSoundTrack(MbxSession* session, const MbxTrackParams* params, uint32_t* track) {
-    return addTrack(session, MbxCode("soun"), params, track);
+    return addTrack(session, MBX_HANDLER_SOUND, params, track);
 }
 
 MbxStatus MbxAddTimecodeTrack(MbxSession* session, const MbxTrackParams* params, uint32_t* track) {
-    return addTrack(session, MbxCode("tmcd"), params, track);
+    return addTrack(session, MBX_HANDLER_TIMECODE, params, track);
 }
 
 MbxStatus MbxAddMetaTrack(MbxSession* session, const MbxTrackParams* params, uint32_t* track) {
-    return addTrack(session, MbxCode("meta"), params, track);
+    return addTrack(session, MBX_HANDLER_META, params, track);
 }
 
 MbxStatus MbxGetNextTrackId(MbxSession* session, uint32_t* trackId) {
@@ -81,7 +81,7 @@ MbxStatus MbxAddTrackReference(MbxSession* session, uint32_t track, const MbxTra
 MbxStatus MbxAddEdit(MbxSession* session, uint32_t track, uint32_t fromZero) {
     MbxTrack* found = nullptr;
     MBX_TRY(MbxRequireTrack(session, track, &found));
-    return MbxAddEdit(session->context, &session->config, session->movie, found, fromZero);
+    return MbxTrackAddEdit(session->context, &session->config, session->movie, found, fromZero);
 }
 
 MbxStatus MbxSetMovieTimes(MbxSession* session, uint32_t track, uint32_t selector, uint64_t creation,
@@ -95,7 +95,7 @@ MbxStatus MbxSetMovieTimes(MbxSession* session, uint32_t track, uint32_t selecto
 MbxStatus MbxSetSignedOffsets(MbxSession* session, uint32_t track, uint32_t signedOffsets) {
     MbxTrack* found = nullptr;
     MBX_TRY(MbxRequireTrack(session, track, &found));
-    return MbxSetSignedOffsets(session->context, found, signedOffsets);
+    return MbxTrackSetSignedOffsets(session->context, found, signedOffsets);
 }
 
 MbxStatus MbxWriteMoov(MbxSession* session, MbxFile* file, uint64_t position, uint64_t* size) {

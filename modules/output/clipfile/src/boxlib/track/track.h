@@ -41,11 +41,6 @@ constexpr uint32_t MBX_TRACK_ID_HIGH_END = 63487;
 // Metadata tracks of the movie have identifiers up to 65535.
 constexpr uint32_t MBX_METADATA_TRACK_ID_END = 65535;
 
-// Usage item of a new track: type, language ("und"), and bytes of data, of which the first four are
-// `enable_mode`.
-constexpr uint32_t MBX_USAGE_TYPE = 10;
-constexpr uint16_t MBX_LANGUAGE_UNDETERMINED = 0x55C4;
-
 // Appends a track to the movie; `trackIndex` receives the new number of tracks. MBX_ERR_INVALID_ARG for a
 // null argument, a timescale of 0 or a language of 32768 or more (of handlers too that take neither), an
 // identifier outside the ordinary ranges or in use, or an unknown enable_mode. MBX_ERR_INTERNAL for an
@@ -67,8 +62,8 @@ MbxStatus MbxAddTrackReference(MbxContext* context, const MbxMovie* movie, MbxTr
 
 // Appends an edit over the track's media at rate 1. MBX_ERR_BAD_STATE in time_version_mode 0 and 2 when the
 // duration exceeds 32 bits or the media time the signed 32-bit range.
-MbxStatus MbxAddEdit(MbxContext* context, const MbxOptions* options, const MbxMovie* movie, MbxTrack* track,
-                     uint32_t fromZero);
+MbxStatus MbxTrackAddEdit(MbxContext* context, const MbxOptions* options, const MbxMovie* movie,
+                          MbxTrack* track, uint32_t fromZero);
 
 // Sets those of the two times that the bits `creationBit` and the next one of `selector` name, and the same
 // two bits from `creationField` on in `fieldsSet`. MBX_ERR_BAD_STATE for a time above 32 bits in

@@ -35,23 +35,23 @@ constexpr HandlerRow row(uint32_t handler, const char (&name)[size], uint32_t en
 
 // Contract: tracks-without-operation. `subt`, `odsm`, `BKDT`, `PKDT`, `GRAP`.
 constexpr HandlerRow kHandlers[] = {
-    row(MbxCode("vide"), "Video Media Handler", kNoFixedMode, MbxCode("vmhd"), 20, Timescale::kParameter,
+    row(MBX_HANDLER_VIDEO, "Video Media Handler", kNoFixedMode, MbxCode("vmhd"), 20, Timescale::kParameter,
         true, 0, 0, true),
-    row(MbxCode("soun"), "Sound Media Handler", 1, MbxCode("smhd"), 20, Timescale::kParameter, false, 0,
+    row(MBX_HANDLER_SOUND, "Sound Media Handler", 1, MbxCode("smhd"), 20, Timescale::kParameter, false, 0,
         0x0100, true),
-    row(MbxCode("subt"), "", 1, MbxCode("sthd"), 20, Timescale::kParameter, true, -1, 0, false),
-    row(MbxCode("meta"), "Timed Metadata Media Handler", 16, MbxCode("nmhd"), 20, Timescale::kParameter,
+    row(MBX_HANDLER_SUBTITLE, "", 1, MbxCode("sthd"), 20, Timescale::kParameter, true, -1, 0, false),
+    row(MBX_HANDLER_META, "Timed Metadata Media Handler", 16, MbxCode("nmhd"), 20, Timescale::kParameter,
         false, 0, 0, true),
     // Contract: timecode-with-nmhd. Not `gmhd`.
-    row(MbxCode("tmcd"), "Time Code Media Handler", 1, MbxCode("nmhd"), 20, Timescale::kParameter, false, 0,
-        0, false),
-    row(MbxCode("odsm"), "ObjectDescriptor Media Handler", 1, MbxCode("nmhd"), 0, Timescale::kMovie, false, 0,
-        0, true),
-    row(MbxCode("BKDT"), "Book Media Handler", 1, MbxCode("nmhd"), 16, Timescale::kOne, false, 0, 0, true),
-    row(MbxCode("PKDT"), "Packed Data Media Handler", 1, MbxCode("nmhd"), 16, Timescale::kOne, false, 0, 0,
-        true),
-    row(MbxCode("GRAP"), "Graphics Media Handler", 8, MbxCode("nmhd"), 20, Timescale::kParameter, true, -1, 0,
-        true),
+    row(MBX_HANDLER_TIMECODE, "Time Code Media Handler", 1, MbxCode("nmhd"), 20, Timescale::kParameter, false,
+        0, 0, false),
+    row(MBX_HANDLER_OBJECT_DESCRIPTOR, "ObjectDescriptor Media Handler", 1, MbxCode("nmhd"), 0,
+        Timescale::kMovie, false, 0, 0, true),
+    row(MBX_HANDLER_BOOK, "Book Media Handler", 1, MbxCode("nmhd"), 16, Timescale::kOne, false, 0, 0, true),
+    row(MBX_HANDLER_PACKED_DATA, "Packed Data Media Handler", 1, MbxCode("nmhd"), 16, Timescale::kOne, false,
+        0, 0, true),
+    row(MBX_HANDLER_GRAPHICS, "Graphics Media Handler", 8, MbxCode("nmhd"), 20, Timescale::kParameter, true,
+        -1, 0, true),
 };
 
 // Contract: track-id-ranges. 1 to 639 and 1024 to 63487.
@@ -137,13 +137,13 @@ MbxStatus fillTrack(MbxContext* context, const MbxMovie* movie, const HandlerRow
             track->mediaHeader.timescale = 1;
             break;
     }
-    track->mediaHeader.language =
-        handler.handler == MbxCode("odsm") ? MBX_LANGUAGE_UNDETERMINED : params.language & 0x7FFF;
+    track->mediaHeader.language = handler.handler == MBX_HANDLER_OBJECT_DESCRIPTOR ? MBX_LANGUAGE_UNDETERMINED
+                                                                                   : params.language & 0x7FFF;
 
     track->handler.type = handler.handler;
     MBX_TRY(MbxBufferAssign(context, 1, &track->handler.name, handler.name, handler.nameSize));
     track->mediaInformation.code = handler.mediaHeader;
-    if (handler.handler == MbxCode("soun")) track->sampleEntries.version = params.stsdVersion;
+    if (handler.handler == MBX_HANDLER_SOUND) track->sampleEntries.version = params.stsdVersion;
     track->auxEnabled = params.auxEnabled;
     track->trickEnabled = params.trickEnabled;
     fillFragmentDefaults(params, track);
@@ -168,6 +168,10 @@ MbxStatus freeEditList(MbxContext* context, MbxEditList* editList) {
     });
 }
 
+bool hasNarrowTimes(const MbxOptions* options) {
+    return options->time_version_mode == MBX_TIMES_32 || options->time_version_mode == MBX_TIMES_32_WITH_TFRA;
+}
+
 // Rescales a presentation time, which may be negative, towards zero.
 MbxStatus rescaleSigned(int64_t value, uint64_t divisor, uint64_t multiplier, int64_t* result) {
     const bool isNegative = value < 0;
@@ -184,16 +188,16 @@ MbxStatus rescaleSigned(int64_t value, uint64_t divisor, uint64_t multiplier, in
 // Contract: enable-modes. Seven numbers for three sets of flags.
 MbxStatus MbxEnableModeFlags(uint32_t enableMode, uint32_t* flags) {
     switch (enableMode) {
-        case 0:
+        case MBX_ENABLE_NONE:
         case UINT32_MAX:
             *flags = 0;
             return MBX_OK;
-        case 1:
+        case MBX_ENABLE_ALL:
         case 8:
         case 16:
             *flags = 7;  // enabled, in movie, in preview
             return MBX_OK;
-        case 2:
+        case MBX_ENABLE_HIDDEN:
         case 6:
             *flags = 6;  // in movie, in preview
             return MBX_OK;
@@ -282,8 +286,8 @@ MbxStatus MbxAddTrackReference(MbxContext* context, const MbxMovie* movie, MbxTr
     return MbxListFind(group->targets.first, isTarget, &found, index);
 }
 
-MbxStatus MbxAddEdit(MbxContext* context, const MbxOptions* options, const MbxMovie* movie, MbxTrack* track,
-                     uint32_t fromZero) {
+MbxStatus MbxTrackAddEdit(MbxContext* context, const MbxOptions* options, const MbxMovie* movie,
+                          MbxTrack* track, uint32_t fromZero) {
     if (MbxAnyNull(context, options, movie, track)) return MBX_ERR_INVALID_ARG;
     const uint64_t mediaTimescale = track->mediaHeader.timescale;
     const uint64_t movieTimescale = movie->header.timescale;
@@ -297,7 +301,7 @@ MbxStatus MbxAddEdit(MbxContext* context, const MbxOptions* options, const MbxMo
         // Contract: edit-in-movie-time. The standard counts this field in media time.
         MBX_TRY(rescaleSigned(segment->earliestPresentation, mediaTimescale, movieTimescale, &mediaTime));
     }
-    if (options->time_version_mode == 0 || options->time_version_mode == 2) {
+    if (hasNarrowTimes(options)) {
         // Contract: edit-test-is-wider. One wide value is enough here.
         if (duration > UINT32_MAX || mediaTime > INT32_MAX || mediaTime < INT32_MIN) return MBX_ERR_BAD_STATE;
     }
@@ -320,7 +324,7 @@ MbxStatus MbxAddEdit(MbxContext* context, const MbxOptions* options, const MbxMo
 
 MbxStatus MbxSetTimePair(const MbxOptions* options, const MbxTimePair& pair, uint32_t selector,
                          uint64_t creation, uint64_t modification) {
-    const bool isNarrow = options->time_version_mode == 0 || options->time_version_mode == 2;
+    const bool isNarrow = hasNarrowTimes(options);
     if ((selector & pair.creationBit) != 0) {
         if (isNarrow && creation > UINT32_MAX) return MBX_ERR_BAD_STATE;
         *pair.creationTime = creation;

@@ -123,10 +123,10 @@ class CodecConfigTest : public EntryTest {
 
 TEST_F(CodecConfigTest, AvcCWithoutExtensionEndsBehindThePictureParameterSets) {
     MbxSampleEntry* entry = add(MBX_ENTRY_AVC1);
-    ASSERT_EQ(MbxSetAvcConfig(context, entry, &kAvcValues), MBX_OK);
-    ASSERT_EQ(MbxAddAvcSps(context, entry, kSpsBytes, sizeof(kSpsBytes)), MBX_OK);
-    ASSERT_EQ(MbxAddAvcPps(context, entry, kPpsBytes, sizeof(kPpsBytes)), MBX_OK);
-    ASSERT_EQ(MbxAddAvcPps(context, entry, kPpsBytes, 1), MBX_OK);
+    ASSERT_EQ(MbxEntrySetAvcConfig(context, entry, &kAvcValues), MBX_OK);
+    ASSERT_EQ(MbxEntryAddAvcSps(context, entry, kSpsBytes, sizeof(kSpsBytes)), MBX_OK);
+    ASSERT_EQ(MbxEntryAddAvcPps(context, entry, kPpsBytes, sizeof(kPpsBytes)), MBX_OK);
+    ASSERT_EQ(MbxEntryAddAvcPps(context, entry, kPpsBytes, 1), MBX_OK);
     EXPECT_BYTES(writeAvcC(entry->visual.avcConfig), Hex("0000001C 'avcC'"
                                                          "01 42 C0 1E FF"
                                                          "E1 0004 6742001E"
@@ -135,12 +135,12 @@ TEST_F(CodecConfigTest, AvcCWithoutExtensionEndsBehindThePictureParameterSets) {
 
 TEST_F(CodecConfigTest, ThirtyOneSpsPassAndThirtyTwoOverflowAtBuildNotWhenAdded) {
     MbxSampleEntry* entry = add(MBX_ENTRY_AVC1);
-    ASSERT_EQ(MbxSetAvcConfig(context, entry, &kAvcValues), MBX_OK);
-    for (int i = 0; i < 31; i++) ASSERT_EQ(MbxAddAvcSps(context, entry, kSpsBytes, 1), MBX_OK);
+    ASSERT_EQ(MbxEntrySetAvcConfig(context, entry, &kAvcValues), MBX_OK);
+    for (int i = 0; i < 31; i++) ASSERT_EQ(MbxEntryAddAvcSps(context, entry, kSpsBytes, 1), MBX_OK);
     const Bytes written = writeAvcC(entry->visual.avcConfig);
     ASSERT_EQ(written.size(), 8 + 6 + 31 * 3 + 1U);
     EXPECT_EQ(written[13], 0xFF);  // reserved bits and 31
-    ASSERT_EQ(MbxAddAvcSps(context, entry, kSpsBytes, 1), MBX_OK);
+    ASSERT_EQ(MbxEntryAddAvcSps(context, entry, kSpsBytes, 1), MBX_OK);
     EXPECT_EQ(buildAvcC(entry->visual.avcConfig), MBX_ERR_OVERFLOW);
 }
 
@@ -178,32 +178,32 @@ TEST_F(CodecConfigTest, SetAvcConfigRefusesValuesOutOfRange) {
     MbxSampleEntry* entry = add(MBX_ENTRY_AVC1);
     MbxAvcConfigParams params = kAvcExtended;
     params.lengthSizeMinusOne = 4;
-    EXPECT_EQ(MbxSetAvcConfig(context, entry, &params), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxEntrySetAvcConfig(context, entry, &params), MBX_ERR_INVALID_ARG);
     params = kAvcExtended;
     params.chroma_format = 4;
-    EXPECT_EQ(MbxSetAvcConfig(context, entry, &params), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxEntrySetAvcConfig(context, entry, &params), MBX_ERR_INVALID_ARG);
     params = kAvcExtended;
     params.bit_depth_luma_minus8 = 8;
-    EXPECT_EQ(MbxSetAvcConfig(context, entry, &params), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxEntrySetAvcConfig(context, entry, &params), MBX_ERR_INVALID_ARG);
     params = kAvcExtended;
     params.bit_depth_chroma_minus8 = 8;
-    EXPECT_EQ(MbxSetAvcConfig(context, entry, &params), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxEntrySetAvcConfig(context, entry, &params), MBX_ERR_INVALID_ARG);
     EXPECT_EQ(entry->visual.avcConfig, nullptr);
     params = {1, 2, 3, 4, 3, 1, 3, 7, 7};
-    EXPECT_EQ(MbxSetAvcConfig(context, entry, &params), MBX_OK);
+    EXPECT_EQ(MbxEntrySetAvcConfig(context, entry, &params), MBX_OK);
 }
 
 TEST_F(CodecConfigTest, SetAvcConfigReadsTheExtensionOnlyWhenThereIsOne) {
     MbxSampleEntry* entry = add(MBX_ENTRY_AVC1);
     const MbxAvcConfigParams params = {1, 2, 3, 4, 3, 0, 99, 99, 99};
-    EXPECT_EQ(MbxSetAvcConfig(context, entry, &params), MBX_OK);
+    EXPECT_EQ(MbxEntrySetAvcConfig(context, entry, &params), MBX_OK);
 }
 
 TEST_F(CodecConfigTest, SetAvcConfigOverwritesTheValuesAndKeepsTheSets) {
     MbxSampleEntry* entry = add(MBX_ENTRY_AVC1);
-    ASSERT_EQ(MbxSetAvcConfig(context, entry, &kAvcExtended), MBX_OK);
-    ASSERT_EQ(MbxAddAvcSps(context, entry, kSpsBytes, sizeof(kSpsBytes)), MBX_OK);
-    ASSERT_EQ(MbxSetAvcConfig(context, entry, &kAvcValues), MBX_OK);
+    ASSERT_EQ(MbxEntrySetAvcConfig(context, entry, &kAvcExtended), MBX_OK);
+    ASSERT_EQ(MbxEntryAddAvcSps(context, entry, kSpsBytes, sizeof(kSpsBytes)), MBX_OK);
+    ASSERT_EQ(MbxEntrySetAvcConfig(context, entry, &kAvcValues), MBX_OK);
     EXPECT_BYTES(writeAvcC(entry->visual.avcConfig), Hex("00000015 'avcC'"
                                                          "01 42 C0 1E FF"
                                                          "E1 0004 6742001E"
@@ -214,39 +214,39 @@ TEST_F(CodecConfigTest, AvcOperationsRefuseEntriesOfAnotherKind) {
     for (uint32_t kind = 1; kind <= 12; kind++) {
         if (kind == MBX_ENTRY_AVC1) continue;
         MbxSampleEntry* entry = add(kind);
-        EXPECT_EQ(MbxSetAvcConfig(context, entry, &kAvcValues), MBX_ERR_BAD_STATE) << kind;
-        EXPECT_EQ(MbxAddAvcSps(context, entry, kSpsBytes, 1), MBX_ERR_BAD_STATE) << kind;
-        EXPECT_EQ(MbxAddAvcPps(context, entry, kPpsBytes, 1), MBX_ERR_BAD_STATE) << kind;
+        EXPECT_EQ(MbxEntrySetAvcConfig(context, entry, &kAvcValues), MBX_ERR_BAD_STATE) << kind;
+        EXPECT_EQ(MbxEntryAddAvcSps(context, entry, kSpsBytes, 1), MBX_ERR_BAD_STATE) << kind;
+        EXPECT_EQ(MbxEntryAddAvcPps(context, entry, kPpsBytes, 1), MBX_ERR_BAD_STATE) << kind;
     }
 }
 
 TEST_F(CodecConfigTest, ParameterSetsNeedTheConfigurationFirst) {
     MbxSampleEntry* avc = add(MBX_ENTRY_AVC1);
-    EXPECT_EQ(MbxAddAvcSps(context, avc, kSpsBytes, 1), MBX_ERR_BAD_STATE);
-    EXPECT_EQ(MbxAddAvcPps(context, avc, kPpsBytes, 1), MBX_ERR_BAD_STATE);
+    EXPECT_EQ(MbxEntryAddAvcSps(context, avc, kSpsBytes, 1), MBX_ERR_BAD_STATE);
+    EXPECT_EQ(MbxEntryAddAvcPps(context, avc, kPpsBytes, 1), MBX_ERR_BAD_STATE);
     MbxSampleEntry* hevc = add(MBX_ENTRY_HVC1);
-    EXPECT_EQ(MbxAddHvcNalUnit(context, hevc, 32, 1, kVpsBytes, 1), MBX_ERR_BAD_STATE);
+    EXPECT_EQ(MbxEntryAddHvcNalUnit(context, hevc, 32, 1, kVpsBytes, 1), MBX_ERR_BAD_STATE);
 }
 
 TEST_F(CodecConfigTest, NullArgumentsAndLengthsWithoutAPointerAreRefused) {
     MbxSampleEntry* entry = add(MBX_ENTRY_AVC1);
-    EXPECT_EQ(MbxSetAvcConfig(nullptr, entry, &kAvcValues), MBX_ERR_INVALID_ARG);
-    EXPECT_EQ(MbxSetAvcConfig(context, nullptr, &kAvcValues), MBX_ERR_INVALID_ARG);
-    EXPECT_EQ(MbxSetAvcConfig(context, entry, nullptr), MBX_ERR_INVALID_ARG);
-    ASSERT_EQ(MbxSetAvcConfig(context, entry, &kAvcValues), MBX_OK);
-    EXPECT_EQ(MbxAddAvcSps(context, nullptr, kSpsBytes, 1), MBX_ERR_INVALID_ARG);
-    EXPECT_EQ(MbxAddAvcSps(context, entry, nullptr, 1), MBX_ERR_INVALID_ARG);
-    EXPECT_EQ(MbxAddAvcPps(nullptr, entry, kPpsBytes, 1), MBX_ERR_INVALID_ARG);
-    EXPECT_EQ(MbxAddAvcPps(context, entry, nullptr, 1), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxEntrySetAvcConfig(nullptr, entry, &kAvcValues), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxEntrySetAvcConfig(context, nullptr, &kAvcValues), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxEntrySetAvcConfig(context, entry, nullptr), MBX_ERR_INVALID_ARG);
+    ASSERT_EQ(MbxEntrySetAvcConfig(context, entry, &kAvcValues), MBX_OK);
+    EXPECT_EQ(MbxEntryAddAvcSps(context, nullptr, kSpsBytes, 1), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxEntryAddAvcSps(context, entry, nullptr, 1), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxEntryAddAvcPps(nullptr, entry, kPpsBytes, 1), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxEntryAddAvcPps(context, entry, nullptr, 1), MBX_ERR_INVALID_ARG);
     EXPECT_EQ(entry->visual.avcConfig->sequenceSets.first, nullptr);
     EXPECT_EQ(entry->visual.avcConfig->pictureSets.first, nullptr);
 
     MbxSampleEntry* hevc = add(MBX_ENTRY_HVC1);
-    EXPECT_EQ(MbxSetHvcConfig(context, nullptr, &kHvcValues), MBX_ERR_INVALID_ARG);
-    EXPECT_EQ(MbxSetHvcConfig(context, hevc, nullptr), MBX_ERR_INVALID_ARG);
-    ASSERT_EQ(MbxSetHvcConfig(context, hevc, &kHvcValues), MBX_OK);
-    EXPECT_EQ(MbxAddHvcNalUnit(context, nullptr, 32, 1, kVpsBytes, 1), MBX_ERR_INVALID_ARG);
-    EXPECT_EQ(MbxAddHvcNalUnit(context, hevc, 32, 1, nullptr, 1), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxEntrySetHvcConfig(context, nullptr, &kHvcValues), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxEntrySetHvcConfig(context, hevc, nullptr), MBX_ERR_INVALID_ARG);
+    ASSERT_EQ(MbxEntrySetHvcConfig(context, hevc, &kHvcValues), MBX_OK);
+    EXPECT_EQ(MbxEntryAddHvcNalUnit(context, nullptr, 32, 1, kVpsBytes, 1), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxEntryAddHvcNalUnit(context, hevc, 32, 1, nullptr, 1), MBX_ERR_INVALID_ARG);
     EXPECT_EQ(hevc->visual.hvcConfig->arrays.first, nullptr);
 }
 
@@ -264,29 +264,29 @@ TEST_F(CodecConfigTest, BuildersRefuseNullArguments) {
 TEST_F(CodecConfigTest, RefusedAllocationLeavesTheConfigurationAsItWas) {
     MbxSampleEntry* entry = add(MBX_ENTRY_AVC1);
     host.failAllocation = host.allocations + 1;
-    EXPECT_EQ(MbxSetAvcConfig(context, entry, &kAvcValues), MBX_ERR_NO_MEMORY);
+    EXPECT_EQ(MbxEntrySetAvcConfig(context, entry, &kAvcValues), MBX_ERR_NO_MEMORY);
     EXPECT_EQ(entry->visual.avcConfig, nullptr);
-    ASSERT_EQ(MbxSetAvcConfig(context, entry, &kAvcValues), MBX_OK);
+    ASSERT_EQ(MbxEntrySetAvcConfig(context, entry, &kAvcValues), MBX_OK);
     for (uint64_t n = 1; n <= 2; n++) {
         host.failAllocation = host.allocations + n;
-        EXPECT_EQ(MbxAddAvcSps(context, entry, kSpsBytes, 4), MBX_ERR_NO_MEMORY) << n;
+        EXPECT_EQ(MbxEntryAddAvcSps(context, entry, kSpsBytes, 4), MBX_ERR_NO_MEMORY) << n;
         EXPECT_EQ(entry->visual.avcConfig->sequenceSets.first, nullptr);
     }
     MbxSampleEntry* hevc = add(MBX_ENTRY_HVC1);
-    ASSERT_EQ(MbxSetHvcConfig(context, hevc, &kHvcValues), MBX_OK);
+    ASSERT_EQ(MbxEntrySetHvcConfig(context, hevc, &kHvcValues), MBX_OK);
     for (uint64_t n = 1; n <= 3; n++) {
         host.failAllocation = host.allocations + n;
-        EXPECT_EQ(MbxAddHvcNalUnit(context, hevc, 32, 1, kVpsBytes, 3), MBX_ERR_NO_MEMORY) << n;
+        EXPECT_EQ(MbxEntryAddHvcNalUnit(context, hevc, 32, 1, kVpsBytes, 3), MBX_ERR_NO_MEMORY) << n;
         EXPECT_EQ(hevc->visual.hvcConfig->arrays.first, nullptr);
     }
 }
 
 TEST_F(CodecConfigTest, HvcNalUnitsAreGroupedByTypeInOrderOfFirstUse) {
     MbxSampleEntry* entry = add(MBX_ENTRY_HVC1);
-    ASSERT_EQ(MbxSetHvcConfig(context, entry, &kHvcValues), MBX_OK);
-    ASSERT_EQ(MbxAddHvcNalUnit(context, entry, 32, 1, kVpsBytes, 3), MBX_OK);
-    ASSERT_EQ(MbxAddHvcNalUnit(context, entry, 33, 1, kHevcSpsBytes, 2), MBX_OK);
-    ASSERT_EQ(MbxAddHvcNalUnit(context, entry, 33, 0, kShortBytes, 1),
+    ASSERT_EQ(MbxEntrySetHvcConfig(context, entry, &kHvcValues), MBX_OK);
+    ASSERT_EQ(MbxEntryAddHvcNalUnit(context, entry, 32, 1, kVpsBytes, 3), MBX_OK);
+    ASSERT_EQ(MbxEntryAddHvcNalUnit(context, entry, 33, 1, kHevcSpsBytes, 2), MBX_OK);
+    ASSERT_EQ(MbxEntryAddHvcNalUnit(context, entry, 33, 0, kShortBytes, 1),
               MBX_OK);  // the last completeness holds
     const Bytes written = writeHvcC(entry->visual.hvcConfig);
     ASSERT_EQ(written.size(), 0x31U);
@@ -297,11 +297,11 @@ TEST_F(CodecConfigTest, HvcNalUnitsAreGroupedByTypeInOrderOfFirstUse) {
 
 TEST_F(CodecConfigTest, SetHvcConfigOverwritesTheValuesAndKeepsTheArrays) {
     MbxSampleEntry* entry = add(MBX_ENTRY_HVC1);
-    ASSERT_EQ(MbxSetHvcConfig(context, entry, &kHvcValues), MBX_OK);
-    ASSERT_EQ(MbxAddHvcNalUnit(context, entry, 32, 1, kVpsBytes, 3), MBX_OK);
+    ASSERT_EQ(MbxEntrySetHvcConfig(context, entry, &kHvcValues), MBX_OK);
+    ASSERT_EQ(MbxEntryAddHvcNalUnit(context, entry, 32, 1, kVpsBytes, 3), MBX_OK);
     MbxHvcCValues values = kHvcValues;
     values.general_level_idc = 120;
-    ASSERT_EQ(MbxSetHvcConfig(context, entry, &values), MBX_OK);
+    ASSERT_EQ(MbxEntrySetHvcConfig(context, entry, &values), MBX_OK);
     const Bytes written = writeHvcC(entry->visual.hvcConfig);
     ASSERT_EQ(written.size(), 8 + 23 + 8U);
     EXPECT_EQ(written[20], 120);
@@ -313,7 +313,7 @@ TEST_F(CodecConfigTest, SetHvcConfigRefusesValuesWiderThanTheirFields) {
     const auto refused = [&](auto member, uint16_t value) {
         MbxHvcCValues values = kHvcValues;
         values.*member = static_cast<std::remove_reference_t<decltype(values.*member)>>(value);
-        return MbxSetHvcConfig(context, entry, &values) == MBX_ERR_INVALID_ARG;
+        return MbxEntrySetHvcConfig(context, entry, &values) == MBX_ERR_INVALID_ARG;
     };
     EXPECT_TRUE(refused(&MbxHvcCValues::general_profile_space, 4));
     EXPECT_TRUE(refused(&MbxHvcCValues::general_tier_flag, 2));
@@ -330,14 +330,14 @@ TEST_F(CodecConfigTest, SetHvcConfigRefusesValuesWiderThanTheirFields) {
     EXPECT_EQ(entry->visual.hvcConfig, nullptr);
     const MbxHvcCValues widest = {255,   3, 1, 31, UINT32_MAX, 0xFFFFFFFFFFFF, 255, 0xFFF, 3, 3, 7, 7,
                                   65535, 3, 7, 1,  3};
-    EXPECT_EQ(MbxSetHvcConfig(context, entry, &widest), MBX_OK);
+    EXPECT_EQ(MbxEntrySetHvcConfig(context, entry, &widest), MBX_OK);
 }
 
 TEST_F(CodecConfigTest, ConstraintFlagsAreWrittenInTheirLow48Bits) {
     MbxSampleEntry* entry = add(MBX_ENTRY_HVC1);
     MbxHvcCValues values = kHvcValues;
     values.general_constraint_indicator_flags = 0xFFFF112233445566;
-    ASSERT_EQ(MbxSetHvcConfig(context, entry, &values), MBX_OK);
+    ASSERT_EQ(MbxEntrySetHvcConfig(context, entry, &values), MBX_OK);
     const Bytes written = writeHvcC(entry->visual.hvcConfig);
     ASSERT_EQ(written.size(), 31U);
     EXPECT_BYTES(Bytes(written.begin() + 14, written.begin() + 20), Hex("112233445566"));
@@ -345,13 +345,13 @@ TEST_F(CodecConfigTest, ConstraintFlagsAreWrittenInTheirLow48Bits) {
 
 TEST_F(CodecConfigTest, HvcOperationsRefuseOtherKindsAndValuesOutOfRange) {
     MbxSampleEntry* avc = add(MBX_ENTRY_AVC1);
-    EXPECT_EQ(MbxSetHvcConfig(context, avc, &kHvcValues), MBX_ERR_BAD_STATE);
-    EXPECT_EQ(MbxAddHvcNalUnit(context, avc, 32, 1, kVpsBytes, 1), MBX_ERR_BAD_STATE);
+    EXPECT_EQ(MbxEntrySetHvcConfig(context, avc, &kHvcValues), MBX_ERR_BAD_STATE);
+    EXPECT_EQ(MbxEntryAddHvcNalUnit(context, avc, 32, 1, kVpsBytes, 1), MBX_ERR_BAD_STATE);
     MbxSampleEntry* hevc = add(MBX_ENTRY_HVC1);
-    ASSERT_EQ(MbxSetHvcConfig(context, hevc, &kHvcValues), MBX_OK);
-    EXPECT_EQ(MbxAddHvcNalUnit(context, hevc, 64, 1, kVpsBytes, 1), MBX_ERR_INVALID_ARG);
-    EXPECT_EQ(MbxAddHvcNalUnit(context, hevc, 32, 2, kVpsBytes, 1), MBX_ERR_INVALID_ARG);
-    EXPECT_EQ(MbxAddHvcNalUnit(context, hevc, 63, 1, kVpsBytes, 1), MBX_OK);
+    ASSERT_EQ(MbxEntrySetHvcConfig(context, hevc, &kHvcValues), MBX_OK);
+    EXPECT_EQ(MbxEntryAddHvcNalUnit(context, hevc, 64, 1, kVpsBytes, 1), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxEntryAddHvcNalUnit(context, hevc, 32, 2, kVpsBytes, 1), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxEntryAddHvcNalUnit(context, hevc, 63, 1, kVpsBytes, 1), MBX_OK);
 }
 
 TEST_F(CodecConfigTest, HvcCCountsThatTheirFieldsCannotCarryOverflowAtBuild) {

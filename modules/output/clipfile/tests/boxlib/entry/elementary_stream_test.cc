@@ -77,7 +77,7 @@ class ElementaryStreamTest : public EntryTest {
     }
 
     MbxStatus setEsds(const MbxEsdsParams& params) {
-        return MbxSetEsds(context, add(MBX_ENTRY_MP4A), &params);
+        return MbxEntrySetEsds(context, add(MBX_ENTRY_MP4A), &params);
     }
 };
 
@@ -150,7 +150,7 @@ TEST_F(ElementaryStreamTest, SetEsdsCopiesTheValuesAndTheirBytes) {
     uint8_t info[] = {0x11, 0x90};
     MbxEsdsParams params = fields();
     params.decoderSpecificInfo = info;
-    ASSERT_EQ(MbxSetEsds(context, entry, &params), MBX_OK);
+    ASSERT_EQ(MbxEntrySetEsds(context, entry, &params), MBX_OK);
     info[0] = 0;
     EXPECT_BYTES(writeEsds(entry->esds), Hex("00000027 'esds' 00000000 03190000 00041140 15000600"
                                              "0001F400 0001E9C0 05021190 060102"));
@@ -159,12 +159,12 @@ TEST_F(ElementaryStreamTest, SetEsdsCopiesTheValuesAndTheirBytes) {
 TEST_F(ElementaryStreamTest, SetEsdsAgainReplacesTheParameters) {
     MbxSampleEntry* entry = add(MBX_ENTRY_MP4V);
     MbxEsdsParams params = fields();
-    ASSERT_EQ(MbxSetEsds(context, entry, &params), MBX_OK);
+    ASSERT_EQ(MbxEntrySetEsds(context, entry, &params), MBX_OK);
     const uint8_t raw[] = {0xAA};
     params.form = 1;
     params.raw = raw;
     params.rawSize = 1;
-    ASSERT_EQ(MbxSetEsds(context, entry, &params), MBX_OK);
+    ASSERT_EQ(MbxEntrySetEsds(context, entry, &params), MBX_OK);
     EXPECT_BYTES(writeEsds(entry->esds), Hex("0000000D 'esds' 00000000 AA"));
 }
 
@@ -198,7 +198,7 @@ TEST_F(ElementaryStreamTest, SetEsdsIsForKinds1And3And4) {
     const MbxEsdsParams params = fields();
     for (uint32_t kind = 1; kind <= 12; kind++) {
         const bool taken = kind == 1 || kind == 3 || kind == 4;
-        EXPECT_EQ(MbxSetEsds(context, add(kind), &params), taken ? MBX_OK : MBX_ERR_BAD_STATE) << kind;
+        EXPECT_EQ(MbxEntrySetEsds(context, add(kind), &params), taken ? MBX_OK : MBX_ERR_BAD_STATE) << kind;
     }
 }
 
@@ -206,40 +206,40 @@ TEST_F(ElementaryStreamTest, SetEsdsRefusesSoundThatHasARawTailOrAnotherCodec) {
     const MbxEsdsParams params = fields();
     MbxSampleEntry* entry = add(MBX_ENTRY_MP4A);
     assign(&entry->rawTail, Hex("00"));
-    EXPECT_EQ(MbxSetEsds(context, entry, &params), MBX_ERR_BAD_STATE);
+    EXPECT_EQ(MbxEntrySetEsds(context, entry, &params), MBX_ERR_BAD_STATE);
     entry = add(MBX_ENTRY_MP4A);
     give(&entry->audio.ddts, MbxDdtsParams{});
-    EXPECT_EQ(MbxSetEsds(context, entry, &params), MBX_ERR_BAD_STATE);
+    EXPECT_EQ(MbxEntrySetEsds(context, entry, &params), MBX_ERR_BAD_STATE);
     entry = add(MBX_ENTRY_MP4A);
     give(&entry->audio.dac3, MbxDac3Params{});
-    EXPECT_EQ(MbxSetEsds(context, entry, &params), MBX_ERR_BAD_STATE);
+    EXPECT_EQ(MbxEntrySetEsds(context, entry, &params), MBX_ERR_BAD_STATE);
     entry = add(MBX_ENTRY_MP4A);
     give(&entry->audio.dec3, MbxDec3Params{});
-    EXPECT_EQ(MbxSetEsds(context, entry, &params), MBX_ERR_BAD_STATE);
+    EXPECT_EQ(MbxEntrySetEsds(context, entry, &params), MBX_ERR_BAD_STATE);
     entry = add(MBX_ENTRY_MP4A);
     give(&entry->audio.fcfg, MbxFcfgParams{});
-    EXPECT_EQ(MbxSetEsds(context, entry, &params), MBX_ERR_BAD_STATE);
+    EXPECT_EQ(MbxEntrySetEsds(context, entry, &params), MBX_ERR_BAD_STATE);
     entry = add(MBX_ENTRY_MP4A);
     give(&entry->audio.srat, MbxSratParams{});
-    EXPECT_EQ(MbxSetEsds(context, entry, &params), MBX_OK);
+    EXPECT_EQ(MbxEntrySetEsds(context, entry, &params), MBX_OK);
 }
 
 TEST_F(ElementaryStreamTest, SetEsdsRefusesNullArguments) {
     const MbxEsdsParams params = fields();
     MbxSampleEntry* entry = add(MBX_ENTRY_MP4A);
-    EXPECT_EQ(MbxSetEsds(nullptr, entry, &params), MBX_ERR_INVALID_ARG);
-    EXPECT_EQ(MbxSetEsds(context, nullptr, &params), MBX_ERR_INVALID_ARG);
-    EXPECT_EQ(MbxSetEsds(context, entry, nullptr), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxEntrySetEsds(nullptr, entry, &params), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxEntrySetEsds(context, nullptr, &params), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxEntrySetEsds(context, entry, nullptr), MBX_ERR_INVALID_ARG);
 }
 
 TEST_F(ElementaryStreamTest, SetEsdsThatRunsOutOfMemoryKeepsTheOldOne) {
     MbxSampleEntry* entry = add(MBX_ENTRY_MP4A);
     MbxEsdsParams params = fields();
-    ASSERT_EQ(MbxSetEsds(context, entry, &params), MBX_OK);
+    ASSERT_EQ(MbxEntrySetEsds(context, entry, &params), MBX_OK);
     const MbxEsdsValues* before = entry->esds;
     for (uint64_t n = 1; n <= 2; n++) {
         host.failAllocation = host.allocations + n;
-        EXPECT_EQ(MbxSetEsds(context, entry, &params), MBX_ERR_NO_MEMORY) << n;
+        EXPECT_EQ(MbxEntrySetEsds(context, entry, &params), MBX_ERR_NO_MEMORY) << n;
         EXPECT_EQ(entry->esds, before);
     }
 }

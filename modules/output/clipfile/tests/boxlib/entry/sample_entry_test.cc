@@ -145,15 +145,15 @@ TEST_F(SampleEntryTest, EveryRefusedAllocationLeavesTheListAsItWas) {
 TEST_F(SampleEntryTest, ReleaseTakesEverythingThatAnEntryOwns) {
     MbxSampleEntry* avc = add(request(MBX_ENTRY_AVC1));
     const MbxAvcConfigParams avcParams = {};
-    ASSERT_EQ(MbxSetAvcConfig(context, avc, &avcParams), MBX_OK);
+    ASSERT_EQ(MbxEntrySetAvcConfig(context, avc, &avcParams), MBX_OK);
     const uint8_t nal[] = {0x67};
-    ASSERT_EQ(MbxAddAvcSps(context, avc, nal, 1), MBX_OK);
+    ASSERT_EQ(MbxEntryAddAvcSps(context, avc, nal, 1), MBX_OK);
     assign(&avc->visual.stereo, Hex("01"));
     assign(&avc->visual.restricted, Hex("02"));
     MbxSampleEntry* hevc = add(request(MBX_ENTRY_HVC1));
     const MbxHvcCValues hevcValues = {};
-    ASSERT_EQ(MbxSetHvcConfig(context, hevc, &hevcValues), MBX_OK);
-    ASSERT_EQ(MbxAddHvcNalUnit(context, hevc, 1, 1, nal, 1), MBX_OK);
+    ASSERT_EQ(MbxEntrySetHvcConfig(context, hevc, &hevcValues), MBX_OK);
+    ASSERT_EQ(MbxEntryAddHvcNalUnit(context, hevc, 1, 1, nal, 1), MBX_OK);
     MbxSampleEntry* sound = add(request(MBX_ENTRY_MP4A));
     give(&sound->audio.srat, MbxSratParams{});
     give(&sound->audio.ddts, MbxDdtsParams{});
@@ -166,7 +166,7 @@ TEST_F(SampleEntryTest, ReleaseTakesEverythingThatAnEntryOwns) {
     MbxListAppend(&sound->sinf, sinf);
     MbxSampleEntry* systems = add(request(MBX_ENTRY_SYSTEMS));
     const MbxEsdsParams esds = {};
-    ASSERT_EQ(MbxSetEsds(context, systems, &esds), MBX_OK);
+    ASSERT_EQ(MbxEntrySetEsds(context, systems, &esds), MBX_OK);
 
     EXPECT_EQ(MbxReleaseSampleEntries(context, &list), MBX_OK);
     EXPECT_EQ(host.live.size(), 1U);  // the context

@@ -112,7 +112,7 @@ class FragmentIndexTest : public SampleTest {
 
     MbxStatus write() {
         file.bytes.clear();
-        return MbxWriteMfra(context, &session.scratch, &options, &movie, &file, 0, &size);
+        return MbxMovieWriteMfra(context, &session.scratch, &options, &movie, &file, 0, &size);
     }
 
     // The only `tfra` of the movie.
@@ -129,7 +129,7 @@ TEST_F(FragmentIndexTest, AMovieWithoutRowsHasAnMfraOfItsSizeAlone) {
     addTrack();
     ASSERT_EQ(write(), MBX_OK);
     EXPECT_BYTES(file.bytes, Hex("00000018 'mfra' 00000010 'mfro' 00000000 00000018"));
-    ASSERT_EQ(MbxWriteMfra(context, nullptr, &options, &movie, nullptr, 0, &size), MBX_OK);
+    ASSERT_EQ(MbxMovieWriteMfra(context, nullptr, &options, &movie, nullptr, 0, &size), MBX_OK);
     EXPECT_EQ(size, 24U);
 }
 
@@ -336,10 +336,11 @@ TEST_F(FragmentIndexTest, AnMfraAbove32BitsIsBadState) {
 }
 
 TEST_F(FragmentIndexTest, MfraRefusesNullArguments) {
-    EXPECT_EQ(MbxWriteMfra(nullptr, nullptr, &options, &movie, nullptr, 0, &size), MBX_ERR_INVALID_ARG);
-    EXPECT_EQ(MbxWriteMfra(context, nullptr, nullptr, &movie, nullptr, 0, &size), MBX_ERR_INVALID_ARG);
-    EXPECT_EQ(MbxWriteMfra(context, nullptr, &options, nullptr, nullptr, 0, &size), MBX_ERR_INVALID_ARG);
-    EXPECT_EQ(MbxWriteMfra(context, nullptr, &options, &movie, nullptr, 0, nullptr), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxMovieWriteMfra(nullptr, nullptr, &options, &movie, nullptr, 0, &size), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxMovieWriteMfra(context, nullptr, nullptr, &movie, nullptr, 0, &size), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxMovieWriteMfra(context, nullptr, &options, nullptr, nullptr, 0, &size), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxMovieWriteMfra(context, nullptr, &options, &movie, nullptr, 0, nullptr),
+              MBX_ERR_INVALID_ARG);
     MbxTfraBox box = {};
     EXPECT_EQ(MbxBuildTfra(context, nullptr, &options, nullptr, &box), MBX_ERR_INVALID_ARG);
     EXPECT_EQ(MbxBuildMfro(context, &options, nullptr, nullptr), MBX_ERR_INVALID_ARG);

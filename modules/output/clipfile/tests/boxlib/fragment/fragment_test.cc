@@ -39,16 +39,17 @@ class FragmentTest : public SampleTest {
  protected:
     MbxStatus writeMoof(uint32_t fragment, uint64_t position = 0) {
         file.bytes.clear();
-        return MbxWriteMoof(context, &session.scratch, &options, &movie, &file, fragment, position, &size);
+        return MbxMovieWriteMoof(context, &session.scratch, &options, &movie, &file, fragment, position,
+                                 &size);
     }
 
     MbxStatus measureMoof(uint32_t fragment) {
-        return MbxWriteMoof(context, &session.scratch, &options, &movie, nullptr, fragment, 0, &size);
+        return MbxMovieWriteMoof(context, &session.scratch, &options, &movie, nullptr, fragment, 0, &size);
     }
 
-    MbxStatus sealFirst() { return MbxSealFirstFragment(context, &movie); }
-    MbxStatus seal() { return MbxSealFragment(context, &movie); }
-    MbxStatus release(uint32_t fragment) { return MbxReleaseFragment(context, &movie, fragment); }
+    MbxStatus sealFirst() { return MbxMovieSealFirstFragment(context, &movie); }
+    MbxStatus seal() { return MbxMovieSealFragment(context, &movie); }
+    MbxStatus release(uint32_t fragment) { return MbxMovieReleaseFragment(context, &movie, fragment); }
 
     static std::vector<uint32_t> defaultsOf(const MbxTrack& track) {
         return {track.defaults.descriptionIndex, track.defaults.duration, track.defaults.size,
@@ -143,7 +144,7 @@ TEST_F(FragmentTest, DefaultsGivenByTheCallerAreLeftAlone) {
         MbxMovie copy = {};
         copy.tracks = {&track, &track};
         const MbxSampleSegment* shared = track.segments.last;
-        ASSERT_EQ(MbxSealFirstFragment(context, &copy), MBX_OK);
+        ASSERT_EQ(MbxMovieSealFirstFragment(context, &copy), MBX_OK);
         EXPECT_EQ(defaultsOf(track), (Words4{(mask & 1) != 0 ? 11U : 1U, (mask & 2) != 0 ? 12U : 6U,
                                              (mask & 4) != 0 ? 13U : 5U, (mask & 8) != 0 ? 14U : 0U}));
         MbxFree(context, shared->next);
@@ -311,12 +312,12 @@ TEST_F(FragmentTest, ShiftingAFragmentMovesItsOffsetsAlone) {
     ASSERT_EQ(sealFirst(), MBX_OK);
     addChunk(1, 2);
     ASSERT_EQ(seal(), MBX_OK);
-    EXPECT_EQ(MbxShiftFragmentOffsets(context, &options, &movie, 1, 0, 0, 10), MBX_OK);
+    EXPECT_EQ(MbxMovieShiftFragmentOffsets(context, &options, &movie, 1, 0, 0, 10), MBX_OK);
     EXPECT_EQ(MbxApplyOffsetDelta(context, 0, 0, 0, 0, 100, &movie.tracks), MBX_OK);
     EXPECT_EQ(Entries<uint64_t>(MbxFindSegment(&tracks[0], 0)->chunkOffsets.list),
               std::vector<uint64_t>{101});
     EXPECT_EQ(Entries<uint64_t>(MbxFindSegment(&tracks[0], 1)->chunkOffsets.list), std::vector<uint64_t>{12});
-    EXPECT_EQ(MbxShiftFragmentOffsets(context, &options, &movie, 3, 0, 0, 10), MBX_ERR_NOT_FOUND);
+    EXPECT_EQ(MbxMovieShiftFragmentOffsets(context, &options, &movie, 3, 0, 0, 10), MBX_ERR_NOT_FOUND);
 }
 
 TEST_F(FragmentTest, AShiftThatWrapsIsForgivenUnlessBaseOffsetModeIsZero) {
@@ -324,15 +325,15 @@ TEST_F(FragmentTest, AShiftThatWrapsIsForgivenUnlessBaseOffsetModeIsZero) {
     ASSERT_EQ(sealFirst(), MBX_OK);
     addChunk(1, 5);
     ASSERT_EQ(seal(), MBX_OK);
-    EXPECT_EQ(MbxShiftFragmentOffsets(context, &options, &movie, 1, 0, 0, -6), MBX_ERR_OVERFLOW);
-    EXPECT_EQ(MbxShiftFragmentOffsets(context, &options, &movie, 1, 0, 0, 6), MBX_ERR_OVERFLOW);
+    EXPECT_EQ(MbxMovieShiftFragmentOffsets(context, &options, &movie, 1, 0, 0, -6), MBX_ERR_OVERFLOW);
+    EXPECT_EQ(MbxMovieShiftFragmentOffsets(context, &options, &movie, 1, 0, 0, 6), MBX_ERR_OVERFLOW);
     for (const uint32_t mode : {1U, 2U}) {
         options.base_offset_mode = mode;
-        EXPECT_EQ(MbxShiftFragmentOffsets(context, &options, &movie, 1, 0, 0, -6), MBX_OK);
+        EXPECT_EQ(MbxMovieShiftFragmentOffsets(context, &options, &movie, 1, 0, 0, -6), MBX_OK);
         ASSERT_EQ(writeMoof(1), MBX_OK);
         EXPECT_BYTES(Bytes(file.bytes.end() - 4, file.bytes.end()), Hex("FFFFFFFF"));
-        EXPECT_EQ(MbxShiftFragmentOffsets(context, &options, &movie, 1, 0, 0, 6), MBX_OK);
-        EXPECT_EQ(MbxShiftFragmentOffsets(context, &options, &movie, 9, 0, 0, 6), MBX_ERR_NOT_FOUND);
+        EXPECT_EQ(MbxMovieShiftFragmentOffsets(context, &options, &movie, 1, 0, 0, 6), MBX_OK);
+        EXPECT_EQ(MbxMovieShiftFragmentOffsets(context, &options, &movie, 9, 0, 0, 6), MBX_ERR_NOT_FOUND);
     }
 }
 
@@ -340,14 +341,14 @@ TEST_F(FragmentTest, TheBaseIsSetOnEveryTrackAndATrackThatLacksTheFragmentIsNotF
     addTrack();
     addTrack();
     ASSERT_EQ(sealFirst(), MBX_OK);
-    EXPECT_EQ(MbxSetFragmentBase(context, &movie, 1, 4711), MBX_OK);
+    EXPECT_EQ(MbxMovieSetFragmentBase(context, &movie, 1, 4711), MBX_OK);
     EXPECT_EQ(tracks[0].segments.last->fragmentOffset, 4711U);
     EXPECT_EQ(tracks[1].segments.last->fragmentOffset, 4711U);
     EXPECT_EQ(tracks[0].segments.first->fragmentOffset, 0U);
-    EXPECT_EQ(MbxSetFragmentBase(context, &movie, 2, 1), MBX_ERR_NOT_FOUND);
-    EXPECT_EQ(MbxSetFragmentBase(context, &movie, 0, 1), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxMovieSetFragmentBase(context, &movie, 2, 1), MBX_ERR_NOT_FOUND);
+    EXPECT_EQ(MbxMovieSetFragmentBase(context, &movie, 0, 1), MBX_ERR_INVALID_ARG);
     addTrack();
-    EXPECT_EQ(MbxSetFragmentBase(context, &movie, 1, 1), MBX_ERR_NOT_FOUND);
+    EXPECT_EQ(MbxMovieSetFragmentBase(context, &movie, 1, 1), MBX_ERR_NOT_FOUND);
 }
 
 // ---- Releasing
@@ -402,9 +403,9 @@ TEST_F(FragmentTest, MemoryOverTenThousandFragmentsGrowsWithIndexRowsAndSegmentR
             ASSERT_EQ(add(sample(fragment + i, i + 1, i == 0), 1, i == 0), MBX_OK);
         ASSERT_EQ(endChunk(), MBX_OK);
         ASSERT_EQ(seal(), MBX_OK);
-        ASSERT_EQ(MbxSetFragmentBase(context, &movie, fragment, fragment), MBX_OK);
+        ASSERT_EQ(MbxMovieSetFragmentBase(context, &movie, fragment, fragment), MBX_OK);
         MemoryFile target;
-        ASSERT_EQ(MbxWriteMoof(context, &session.scratch, &options, &movie, &target, fragment, 0, &size),
+        ASSERT_EQ(MbxMovieWriteMoof(context, &session.scratch, &options, &movie, &target, fragment, 0, &size),
                   MBX_OK);
         ASSERT_EQ(release(fragment), MBX_OK);
     }
@@ -415,7 +416,7 @@ TEST_F(FragmentTest, MemoryOverTenThousandFragmentsGrowsWithIndexRowsAndSegmentR
         newRowBlocks * (sizeof(MbxBlock) + kHeader + 1000 * sizeof(MbxFragmentIndexEntry) + kHeader);
     EXPECT_EQ(newRowBlocks, 9U);
     EXPECT_EQ(host.liveBytes - before, segments + rows);
-    ASSERT_EQ(MbxWriteMfra(context, &session.scratch, &options, &movie, nullptr, 0, &size), MBX_OK);
+    ASSERT_EQ(MbxMovieWriteMfra(context, &session.scratch, &options, &movie, nullptr, 0, &size), MBX_OK);
     EXPECT_EQ(size, 8U + 8 + 16 + 10000 * 19 + 16);  // rows of version 1
 }
 
@@ -454,7 +455,8 @@ class FragmentFailureTest : public FragmentTest {
         ASSERT_EQ(seal(), MBX_OK);
         ASSERT_EQ(writeMoof(1), MBX_OK);
         expected = file.bytes;
-        const MbxStatus status = MbxWriteMfra(context, &session.scratch, &options, &movie, &mfra, 0, &size);
+        const MbxStatus status =
+            MbxMovieWriteMfra(context, &session.scratch, &options, &movie, &mfra, 0, &size);
         ASSERT_EQ(status, MBX_OK);
     }
 
@@ -465,7 +467,8 @@ class FragmentFailureTest : public FragmentTest {
         ASSERT_EQ(writeMoof(1), MBX_OK);
         EXPECT_TRUE(file.bytes == expected);
         MemoryFile again;
-        const MbxStatus status = MbxWriteMfra(context, &session.scratch, &options, &movie, &again, 0, &size);
+        const MbxStatus status =
+            MbxMovieWriteMfra(context, &session.scratch, &options, &movie, &again, 0, &size);
         ASSERT_EQ(status, MBX_OK);
         EXPECT_TRUE(again.bytes == mfra.bytes);
     }
@@ -524,7 +527,8 @@ TEST_F(FragmentFailureTest, EveryFailureOfMfraLeavesAValidTree) {
         ASSERT_LT(n, 1000U);
         host.allocations = 0;
         host.failAllocation = n;
-        const MbxStatus status = MbxWriteMfra(context, &session.scratch, &options, &movie, nullptr, 0, &size);
+        const MbxStatus status =
+            MbxMovieWriteMfra(context, &session.scratch, &options, &movie, nullptr, 0, &size);
         host.failAllocation = 0;
         if (host.allocations < n) break;
         EXPECT_EQ(status, MBX_ERR_NO_MEMORY) << n;
@@ -533,7 +537,8 @@ TEST_F(FragmentFailureTest, EveryFailureOfMfraLeavesAValidTree) {
     for (uint64_t n = 1; n <= writes; n++) {
         MemoryFile failing;
         failing.failWrite = n;
-        EXPECT_EQ(MbxWriteMfra(context, &session.scratch, &options, &movie, &failing, 0, &size), MBX_ERR_IO);
+        EXPECT_EQ(MbxMovieWriteMfra(context, &session.scratch, &options, &movie, &failing, 0, &size),
+                  MBX_ERR_IO);
         expectIntact(live);
     }
 }
@@ -555,18 +560,20 @@ TEST_F(FragmentFailureTest, AQuotaOneByteTooSmallIsNoMemoryAndLeavesAValidTree) 
 }
 
 TEST_F(FragmentTest, OperationsRefuseNullArguments) {
-    EXPECT_EQ(MbxSealFirstFragment(nullptr, &movie), MBX_ERR_INVALID_ARG);
-    EXPECT_EQ(MbxSealFirstFragment(context, nullptr), MBX_ERR_INVALID_ARG);
-    EXPECT_EQ(MbxSealFragment(nullptr, &movie), MBX_ERR_INVALID_ARG);
-    EXPECT_EQ(MbxSealFragment(context, nullptr), MBX_ERR_INVALID_ARG);
-    EXPECT_EQ(MbxReleaseFragment(nullptr, &movie, 1), MBX_ERR_INVALID_ARG);
-    EXPECT_EQ(MbxReleaseFragment(context, nullptr, 1), MBX_ERR_INVALID_ARG);
-    EXPECT_EQ(MbxSetFragmentBase(nullptr, &movie, 1, 0), MBX_ERR_INVALID_ARG);
-    EXPECT_EQ(MbxSetFragmentBase(context, nullptr, 1, 0), MBX_ERR_INVALID_ARG);
-    EXPECT_EQ(MbxShiftFragmentOffsets(context, nullptr, &movie, 1, 0, 0, 0), MBX_ERR_INVALID_ARG);
-    EXPECT_EQ(MbxShiftFragmentOffsets(context, &options, nullptr, 1, 0, 0, 0), MBX_ERR_INVALID_ARG);
-    EXPECT_EQ(MbxWriteMoof(nullptr, nullptr, &options, &movie, nullptr, 1, 0, &size), MBX_ERR_INVALID_ARG);
-    EXPECT_EQ(MbxWriteMoof(context, nullptr, &options, &movie, nullptr, 1, 0, nullptr), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxMovieSealFirstFragment(nullptr, &movie), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxMovieSealFirstFragment(context, nullptr), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxMovieSealFragment(nullptr, &movie), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxMovieSealFragment(context, nullptr), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxMovieReleaseFragment(nullptr, &movie, 1), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxMovieReleaseFragment(context, nullptr, 1), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxMovieSetFragmentBase(nullptr, &movie, 1, 0), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxMovieSetFragmentBase(context, nullptr, 1, 0), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxMovieShiftFragmentOffsets(context, nullptr, &movie, 1, 0, 0, 0), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxMovieShiftFragmentOffsets(context, &options, nullptr, 1, 0, 0, 0), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxMovieWriteMoof(nullptr, nullptr, &options, &movie, nullptr, 1, 0, &size),
+              MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxMovieWriteMoof(context, nullptr, &options, &movie, nullptr, 1, 0, nullptr),
+              MBX_ERR_INVALID_ARG);
     EXPECT_EQ(MbxBuildMoof(context, nullptr, &options, nullptr, nullptr), MBX_ERR_INVALID_ARG);
 }
 

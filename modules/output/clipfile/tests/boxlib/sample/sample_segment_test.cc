@@ -45,10 +45,10 @@ TEST_F(SampleSegmentTest, AppendGivesEveryTrackOneMoreAndTheFirstWhereThereIsNon
 
 TEST_F(SampleSegmentTest, AppendCarriesTheSignOfTheOffsetsOn) {
     MbxTrack* track = addTrack();
-    ASSERT_EQ(MbxSetSignedOffsets(context, track, 1), MBX_OK);
+    ASSERT_EQ(MbxTrackSetSignedOffsets(context, track, 1), MBX_OK);
     appendSegments();
     EXPECT_EQ(track->segments.last->compositionOffsets.signedOffsets, 1U);
-    EXPECT_EQ(MbxSetSignedOffsets(context, track, 0), MBX_ERR_BAD_STATE);
+    EXPECT_EQ(MbxTrackSetSignedOffsets(context, track, 0), MBX_ERR_BAD_STATE);
 }
 
 TEST_F(SampleSegmentTest, ADecodeTimeThatWrapsOverflowsAndChangesNothing) {
@@ -116,7 +116,7 @@ TEST_F(SampleSegmentTest, ReleaseEmptiesTheTablesAndKeepsTimesPositionAndCount) 
     MbxTrack* track = addTrack();
     track->auxEnabled = 1;
     track->trickEnabled = 1;
-    ASSERT_EQ(MbxSetSignedOffsets(context, track, 1), MBX_OK);
+    ASSERT_EQ(MbxTrackSetSignedOffsets(context, track, 1), MBX_OK);
     const uint8_t bytes[] = {1, 2};
     MbxSampleInfo info = sample();
     info.auxSize = 2;

@@ -117,7 +117,7 @@ TEST_F(SampleStoreTest, ACompositionTimeBeyond64BitsOverflows) {
 }
 
 TEST_F(SampleStoreTest, ANegativeOffsetOfASignedSegmentCannotOverflow) {
-    ASSERT_EQ(MbxSetSignedOffsets(context, track, 1), MBX_OK);
+    ASSERT_EQ(MbxTrackSetSignedOffsets(context, track, 1), MBX_OK);
     track->segments.last->decodeDuration = UINT64_MAX - 10;
     MbxSampleInfo info = sample(100, 0);
     info.compositionOffset = -1;
@@ -173,7 +173,7 @@ TEST_F(SampleStoreTest, EarliestPresentationIsTheSmallestDecodeTimeAndOffset) {
 }
 
 TEST_F(SampleStoreTest, ASignedOffsetCanPutPresentationBeforeZero) {
-    ASSERT_EQ(MbxSetSignedOffsets(context, track, 1), MBX_OK);
+    ASSERT_EQ(MbxTrackSetSignedOffsets(context, track, 1), MBX_OK);
     MbxSampleInfo info = sample();
     ASSERT_EQ(add(info), MBX_OK);
     info.compositionOffset = -25;  // decoded at 10
@@ -191,16 +191,16 @@ TEST_F(SampleStoreTest, PresentationStaysAtTheEndOfItsRange) {
 }
 
 TEST_F(SampleStoreTest, SignedOffsetsCanBeSetUntilASampleHasAnOffset) {
-    EXPECT_EQ(MbxSetSignedOffsets(nullptr, track, 1), MBX_ERR_INVALID_ARG);
-    EXPECT_EQ(MbxSetSignedOffsets(context, nullptr, 1), MBX_ERR_INVALID_ARG);
-    EXPECT_EQ(MbxSetSignedOffsets(context, track, 2), MBX_ERR_INVALID_ARG);
-    EXPECT_EQ(MbxSetSignedOffsets(context, track, 1), MBX_OK);
+    EXPECT_EQ(MbxTrackSetSignedOffsets(nullptr, track, 1), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxTrackSetSignedOffsets(context, nullptr, 1), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxTrackSetSignedOffsets(context, track, 2), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxTrackSetSignedOffsets(context, track, 1), MBX_OK);
     ASSERT_EQ(add(sample()), MBX_OK);
-    EXPECT_EQ(MbxSetSignedOffsets(context, track, 0), MBX_OK);
+    EXPECT_EQ(MbxTrackSetSignedOffsets(context, track, 0), MBX_OK);
     MbxSampleInfo info = sample();
     info.compositionOffset = 1;
     ASSERT_EQ(add(info), MBX_OK);
-    EXPECT_EQ(MbxSetSignedOffsets(context, track, 1), MBX_ERR_BAD_STATE);
+    EXPECT_EQ(MbxTrackSetSignedOffsets(context, track, 1), MBX_ERR_BAD_STATE);
 }
 
 // ---- Chunks ----

@@ -207,7 +207,7 @@ TEST_F(TrackTest, ATimescaleOfZeroIsRefusedForEveryHandler) {
 
 TEST_F(TrackTest, ATrackAfterTheFirstSealIsBadState) {
     ASSERT_EQ(create(MbxCode("vide"), TrackParams(1, 1000)), MBX_OK);
-    ASSERT_EQ(MbxSealFirstFragment(context, movie), MBX_OK);
+    ASSERT_EQ(MbxMovieSealFirstFragment(context, movie), MBX_OK);
     const uint64_t before = host.allocations;
     EXPECT_EQ(create(MbxCode("soun"), TrackParams(2, 1000)), MBX_ERR_BAD_STATE);
     EXPECT_EQ(create(MbxCode("soun"), TrackParams(1, 1000)), MBX_ERR_INVALID_ARG);
@@ -447,7 +447,7 @@ class EditTest : public MovieTest {
         ASSERT_EQ(create(MbxCode("soun"), params), MBX_OK);
     }
 
-    MbxStatus add(uint32_t fromZero) { return MbxAddEdit(context, &options, movie, last(), fromZero); }
+    MbxStatus add(uint32_t fromZero) { return MbxTrackAddEdit(context, &options, movie, last(), fromZero); }
 };
 
 TEST_F(EditTest, EditSpansTheMediaInTicksOfTheMovie) {
