@@ -13,7 +13,7 @@ namespace {
 
 namespace fs = std::filesystem;
 
-constexpr std::chrono::milliseconds kEndPatience{2000};
+constexpr std::chrono::milliseconds kRecoveryPatience{2000};
 
 // Exit codes of the program.
 constexpr int kDone = 0;
@@ -130,7 +130,7 @@ BackgroundRecovery::~BackgroundRecovery() {
         state_->ending = true;
         state_->child.End();
         state_->changed.notify_all();
-        ended = state_->changed.wait_for(lock, kEndPatience, [this] { return state_->ended; });
+        ended = state_->changed.wait_for(lock, kRecoveryPatience, [this] { return state_->ended; });
     }
     if (ended) {
         thread_.join();
