@@ -194,6 +194,7 @@ ExitCode Running::Record(const SourceOpener& open) {
     commands_.Close("the run is over");
     plan_.Finish();
     TellMissed();
+    recovery_->End(report_);
     Summary summary = Summarise(*source, *recorderSettings.past);
     if (failure) {
         summary.exitCode = failure->Code();
@@ -286,6 +287,7 @@ bool Running::QuitAsked() {
         return false;
     }
     run->TakeKeys();
+    run->recovery_->Follow(run->report_);
     return run->quit_ || run->signals_.QuitRequested();
 }
 
