@@ -9,7 +9,7 @@ namespace clipfileModule {
 namespace {
 
 template <typename Function>
-void find(void* handle, const char* name, Function& function) {
+void findIn(void* handle, const char* name, Function& function) {
     function = reinterpret_cast<Function>(dlsym(handle, name));
 }
 
@@ -17,14 +17,14 @@ void find(void* handle, const char* name, Function& function) {
 
 KerberosTicket::KerberosTicket(void* libsmbclient) {
     // Looks in the libraries behind that one too.
-    find(libsmbclient, "krb5_init_context", initContext_);
-    find(libsmbclient, "krb5_free_context", freeContext_);
-    find(libsmbclient, "krb5_cc_default", openDefaultCache_);
-    find(libsmbclient, "krb5_cc_close", closeCache_);
-    find(libsmbclient, "krb5_cc_get_principal", getPrincipal_);
-    find(libsmbclient, "krb5_free_principal", freePrincipal_);
-    find(libsmbclient, "krb5_unparse_name", toText_);
-    find(libsmbclient, "krb5_cc_get_lifetime", getLifetime_);
+    findIn(libsmbclient, "krb5_init_context", initContext_);
+    findIn(libsmbclient, "krb5_free_context", freeContext_);
+    findIn(libsmbclient, "krb5_cc_default", openDefaultCache_);
+    findIn(libsmbclient, "krb5_cc_close", closeCache_);
+    findIn(libsmbclient, "krb5_cc_get_principal", getPrincipal_);
+    findIn(libsmbclient, "krb5_free_principal", freePrincipal_);
+    findIn(libsmbclient, "krb5_unparse_name", toText_);
+    findIn(libsmbclient, "krb5_cc_get_lifetime", getLifetime_);
 }
 
 std::string KerberosTicket::User() const {
