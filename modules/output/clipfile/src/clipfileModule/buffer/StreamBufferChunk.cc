@@ -95,10 +95,29 @@ void StreamBuffer::makeChunk() {
     // for a worker that adds to a cache: the lock of the caches had to be given back first.
     if (result == kRecordEnded) {
         endSync();
+    } else if (result == kWriterMissing) {
+        endWithoutThread();
     } else if (result != kGoOn) {
         CLIPFILE_LOG(LOG_PRIORITY_ERROR, "%s", messageOf(result));
         setError(result);
     }
+}
+
+bool StreamBuffer::isPassDue() const {
+    if (findPassedLimit() != kGoOn) {
+        return true;
+    }
+    if (videoBuffer.empty()) {
+        return false;
+    }
+    if (videoBuffer.size() >= kMinimumVideoUnits) {
+        return true;
+    }
+    if (isExact()) {
+        // What comes before the first chunk may head the record, and is cut back pass by pass.
+        return chunkedVideo == 0 || findEnd() <= videoBuffer.back()->rtp_timestamp;
+    }
+    return static_cast<std::uint64_t>(stopTimestamp.load()) < videoBuffer.front()->rtp_timestamp;
 }
 
 PassResult StreamBuffer::makePass() {

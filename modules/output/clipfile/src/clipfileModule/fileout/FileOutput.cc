@@ -221,9 +221,13 @@ bool FileOutput::outputFile(Work& work, std::deque<std::shared_ptr<ChunkData>>& 
         // Contract: unmeasured-boxes-are-cause-23. The closing boxes must still find room. What could not be
         // measured counts 2^64 - 1 bytes, which no disk has: the sum must not run over.
         if (freeSpace < Work::minFreeSpaceWrite || freeSpace - Work::minFreeSpaceWrite < boxSize) {
-            // Contract: free-space-two-spellings. "freespace" for a chunk, "free space" for a file.
-            CLIPFILE_LOG(LOG_PRIORITY_ERROR, "no disk freespace. %llu.",
-                         static_cast<unsigned long long>(freeSpace));
+            if (boxSize == Mp4Muxer::kUnmeasured && work.settings.recordRules == RecordRules::kExact) {
+                CLIPFILE_LOG(LOG_PRIORITY_ERROR, "mp4 box size could not be measured.");
+            } else {
+                // Contract: free-space-two-spellings. "freespace" for a chunk, "free space" for a file.
+                CLIPFILE_LOG(LOG_PRIORITY_ERROR, "no disk freespace. %llu.",
+                             static_cast<unsigned long long>(freeSpace));
+            }
             work.owner.SetStatus(kStatusFailed, kCauseDiskFull);
             return true;
         }
