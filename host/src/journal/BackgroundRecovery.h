@@ -3,9 +3,9 @@
 #include <filesystem>
 #include <memory>
 #include <string>
-#include <thread>
 #include <vector>
 
+#include "common/PatientThread.h"
 #include "options/Options.h"
 
 namespace receiver {
@@ -18,18 +18,20 @@ class BackgroundRecovery {
     /// Begins at once. With `kAsk` files are recovered once `Agree` is called, with `kNo` never.
     BackgroundRecovery(const std::filesystem::path& folder, RecoverMode mode,
                        const std::filesystem::path& program = DefaultProgram());
-    /// Stops a recovery that is going on; the next receiver begins it again. One that a disk holds up is left
-    /// to itself.
     ~BackgroundRecovery();
     BackgroundRecovery(const BackgroundRecovery&) = delete;
     BackgroundRecovery& operator=(const BackgroundRecovery&) = delete;
 
+    /// Stops a recovery that is going on; the next receiver begins it again. One that a disk holds up is left
+    /// to itself. All sentences are there then. So the destructor does too.
+    void End();
     /// The operator wants what was asked. False when nothing was.
     bool Agree();
     /// What an operator should know, since the last call: sentences without full stop.
     std::vector<std::string> TakeSentences();
 
-    /// The program `clipfile` that belongs to this build. It may be missing.
+    /// The program `clipfile` that belongs to this build. It may be missing; empty when nobody can tell where
+    /// it would be.
     static std::filesystem::path DefaultProgram();
 
  private:
@@ -38,7 +40,7 @@ class BackgroundRecovery {
     static void run(State& state);
 
     const std::shared_ptr<State> state_;
-    std::thread thread_;
+    PatientThread thread_;
 };
 
 }  // namespace receiver
