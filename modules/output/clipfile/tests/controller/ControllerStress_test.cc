@@ -23,8 +23,8 @@
 #include <vector>
 
 #include "LogSink.h"
+#include "common/Status.h"
 #include "controller/Controller.h"
-#include "controller/Status.h"
 #include "message_handler/QxMessageHandler.h"
 #include "support/ChunkFollower.h"
 #include "support/ControllerPeer.h"

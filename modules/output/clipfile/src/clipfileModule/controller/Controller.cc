@@ -6,7 +6,7 @@
 #include "QxRegistry.h"
 #include "buffer/StreamBuffer.h"
 #include "common/Log.h"
-#include "controller/Status.h"
+#include "common/Status.h"
 
 namespace clipfileModule {
 

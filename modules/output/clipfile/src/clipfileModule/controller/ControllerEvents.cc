@@ -3,8 +3,8 @@
 #include <utility>
 
 #include "common/Log.h"
+#include "common/Status.h"
 #include "controller/Controller.h"
-#include "controller/Status.h"
 
 namespace clipfileModule {
 

@@ -7,8 +7,8 @@
 
 #include "buffer/StreamBuffer.h"
 #include "common/Log.h"
+#include "common/Status.h"
 #include "controller/Controller.h"
-#include "controller/Status.h"
 
 namespace clipfileModule {
 

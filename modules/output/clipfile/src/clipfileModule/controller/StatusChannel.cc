@@ -5,7 +5,7 @@
 #include <utility>
 
 #include "common/Log.h"
-#include "controller/Status.h"
+#include "common/Status.h"
 
 namespace clipfileModule {
 

@@ -5,10 +5,10 @@
 #include <mutex>
 #include <utility>
 
+#include "common/Event.h"
 #include "common/JoinThread.h"
 #include "common/Log.h"
-#include "controller/Event.h"
-#include "controller/Status.h"
+#include "common/Status.h"
 #include "fileout/FileOutputWork.h"
 
 namespace clipfileModule {

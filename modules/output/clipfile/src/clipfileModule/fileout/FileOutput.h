@@ -7,10 +7,10 @@
 #include <string>
 #include <thread>
 
-#include "buffer/ChunkData.h"
-#include "buffer/state/StreamBufferInterface.h"
-#include "controller/ControllerInterface.h"
-#include "controller/OutputSettings.h"
+#include "buffer/chunk/ChunkData.h"
+#include "common/ControllerInterface.h"
+#include "common/OutputSettings.h"
+#include "common/StreamBufferInterface.h"
 #include "platform/PlatformInterface.h"
 
 namespace clipfileModule {

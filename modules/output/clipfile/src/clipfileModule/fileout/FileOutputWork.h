@@ -8,10 +8,10 @@
 #include <mutex>
 #include <string>
 
-#include "buffer/ChunkData.h"
+#include "buffer/chunk/ChunkData.h"
 #include "common/Mutex.h"
+#include "common/OutputSettings.h"
 #include "common/RecursiveTimedMutex.h"
-#include "controller/OutputSettings.h"
 #include "fileout/FileOutput.h"
 #include "fileout/OwnerLink.h"
 #include "mp4/Mp4Muxer.h"

@@ -5,7 +5,7 @@
 #include <string>
 
 #include "common/Log.h"
-#include "controller/Status.h"
+#include "common/Status.h"
 #include "fileout/FileOutput.h"
 #include "fileout/FileOutputWork.h"
 #include "mp4/Mp4MuxerFactory.h"

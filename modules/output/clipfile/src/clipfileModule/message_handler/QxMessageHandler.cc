@@ -4,7 +4,7 @@
 #include <memory>
 
 #include "common/Log.h"
-#include "controller/Status.h"
+#include "common/Status.h"
 
 namespace clipfileModule {
 
