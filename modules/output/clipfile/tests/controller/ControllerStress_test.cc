@@ -23,7 +23,7 @@
 #include <vector>
 
 #include "LogSink.h"
-#include "common/Status.h"
+#include "QxModuleStatus.h"
 #include "controller/Controller.h"
 #include "message_handler/QxMessageHandler.h"
 #include "support/ChunkFollower.h"
@@ -104,7 +104,7 @@ class WatchedHost : public FakeHost {
             ++late_;
         }
         FakeHost::SetStatus(status, cause);
-        if (status == kStatusFailed) {
+        if (status == QxStatus::kFailed) {
             // The module drops from now on what is pushed, without a line.
             losses_.Lose();
             failed_ = true;

@@ -323,10 +323,10 @@ void StreamBuffer::setError(int code) {
         }
         changeState(std::make_shared<ErrorCacheState>(this));
     }
-    controller->SetStatus(6, code);
+    controller->SetStatus(QxStatus::kStreamFault, code);
     if (!chunkProduced) {
         // Contract: fault-before-first-chunk. Ends the module for good, whatever the cause was.
-        controller->SetStatus(7, 26);
+        controller->SetStatus(QxStatus::kFailed, QxFailure::kNoFirstChunk);
         return;
     }
     MutexLock lock(stateMutex);

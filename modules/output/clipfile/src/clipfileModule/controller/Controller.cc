@@ -3,10 +3,10 @@
 #include <algorithm>
 #include <utility>
 
+#include "QxModuleStatus.h"
 #include "QxRegistry.h"
 #include "buffer/StreamBuffer.h"
 #include "common/Log.h"
-#include "common/Status.h"
 
 namespace clipfileModule {
 
@@ -88,7 +88,7 @@ bool Controller::Initialize(QxModuleHostInterface* moduleHost) {
     // Contract: static-config-never-fails. A guard that nothing reaches.
     if (!getStaticConfig()) {
         CLIPFILE_LOG(LOG_PRIORITY_ERROR, "end. static config error.");
-        SetStatus(kStatusFailed, kCauseInitialize);
+        SetStatus(QxStatus::kFailed, QxFailure::kInitialize);
         endStatusChannel();
         return false;
     }
@@ -98,7 +98,7 @@ bool Controller::Initialize(QxModuleHostInterface* moduleHost) {
     }
     if (!getStartParameters()) {
         CLIPFILE_LOG(LOG_PRIORITY_ERROR, "end. file output path is none.");
-        SetStatus(kStatusFailed, kCauseInitialize);
+        SetStatus(QxStatus::kFailed, QxFailure::kInitialize);
         endStatusChannel();
         return false;
     }
@@ -291,7 +291,7 @@ void Controller::Execute() {
     }
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
     PostEvent(std::make_shared<TransferStatusNotifyEvent>(
-        std::map<std::string, std::string>{{kFileOutputStatusKey, kFileOutputStatusStandby}}));
+        std::map<std::string, std::string>{{QxStatusMap::kFileOutput, QxStatusMap::kStandby}}));
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 

@@ -3,7 +3,6 @@
 #include <utility>
 
 #include "common/Log.h"
-#include "common/Status.h"
 #include "controller/Controller.h"
 
 namespace clipfileModule {

@@ -5,9 +5,9 @@
 #include <system_error>
 #include <utility>
 
+#include "QxModuleStatus.h"
 #include "buffer/StreamBuffer.h"
 #include "common/Log.h"
-#include "common/Status.h"
 #include "controller/Controller.h"
 
 namespace clipfileModule {
@@ -50,7 +50,7 @@ bool Controller::pushUnit(Medium medium, const std::shared_ptr<StreamData>& unit
     }
     // Contract: silent-after-status-7. Dropped units are not logged. Both are asked: the host's status may be
     // older than the module's 7, and a host may hold a 7 of its own.
-    if (channel->IsFinal() || host->GetStatus() == kStatusFailed) {
+    if (channel->IsFinal() || host->GetStatus() == QxStatus::kFailed) {
         return true;
     }
     return queues[static_cast<std::size_t>(medium)]->Push(unit);
@@ -230,7 +230,7 @@ void Controller::BufferingStart() {
         CLIPFILE_LOG(LOG_PRIORITY_TRACE, "process is terminated.");
         return;
     }
-    SetStatus(kStatusBufferingStarted, kCauseNone);
+    SetStatus(QxStatus::kBufferingStarted, QxStatus::kNoCause);
     const StatusChannel::Hold hold(getStatusChannel());
     MutexLock lock(streamBuffersMutex);
     removeOverBuffers();
@@ -278,7 +278,7 @@ void Controller::BufferingStop() {
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "stream buffering stop.");
     std::exception_ptr fault;
     try {
-        SetStatus(kStatusBufferingStopped, kCauseNone);
+        SetStatus(QxStatus::kBufferingStopped, QxStatus::kNoCause);
     } catch (...) {
         // What a host throws keeps nothing recording.
         fault = std::current_exception();

@@ -5,10 +5,10 @@
 #include <mutex>
 #include <utility>
 
+#include "QxModuleStatus.h"
 #include "common/Event.h"
 #include "common/JoinThread.h"
 #include "common/Log.h"
-#include "common/Status.h"
 #include "fileout/FileOutputWork.h"
 
 namespace clipfileModule {
@@ -90,7 +90,7 @@ void FileOutput::Stop() {
         work->owner.Cut(kOwnerCallWait);
         // Contract: time-out-line-is-trace. The one fault whose line is no error.
         CLIPFILE_LOG(LOG_PRIORITY_TRACE, "wait thread timeout...");
-        controller->SetStatus(kStatusFailed, kCauseFileClose);
+        controller->SetStatus(QxStatus::kFailed, QxFailure::kWriterHangs);
         // Contract: writer-given-up. A thread cannot be ended from outside without harm.
         GetPlatform().GiveUp(*thread);
         thread.reset();
@@ -123,7 +123,7 @@ void FileOutput::outputThread(Work& work) {
     work.chunkCondition.notify_all();
 
     // Contract: output-means-a-writer. No file is open yet.
-    notifyTransferStatus(work, kFileOutputStatusOutput);
+    notifyTransferStatus(work, QxStatusMap::kOutput);
     const LogonToken token = useNetDrive(work);
     const auto takeChunks = [&work](bool wait) {
         std::deque<std::shared_ptr<ChunkData>> taken;
@@ -147,7 +147,7 @@ void FileOutput::outputThread(Work& work) {
     }
     if (!work.owner.IsCut() && work.IsFileOpen() && !work.CloseFile() && !work.owner.IsCut()) {
         CLIPFILE_LOG(LOG_PRIORITY_ERROR, "mp4 file close error.");
-        work.owner.SetStatus(kStatusFailed, kCauseFileClose);
+        work.owner.SetStatus(QxStatus::kFailed, QxFailure::kFileClose);
     }
     if (token != kNoLogon) {
         GetPlatform().CloseLogon(token);
@@ -158,7 +158,7 @@ void FileOutput::outputThread(Work& work) {
         work.muxer.reset();
     }
     // Contract: standby-while-recording. Others may still write.
-    notifyTransferStatus(work, kFileOutputStatusStandby);
+    notifyTransferStatus(work, QxStatusMap::kStandby);
     run.unlock();
     if (!work.owner.IsCut()) {
         CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "end.");
@@ -215,7 +215,7 @@ bool FileOutput::outputFile(Work& work, std::deque<std::shared_ptr<ChunkData>>& 
         }
         if (error != 0) {
             CLIPFILE_LOG(LOG_PRIORITY_ERROR, "disk size could not be obtained. error = %d.", error);
-            work.owner.SetStatus(kStatusFailed, kCauseFreeSpaceUnknown);
+            work.owner.SetStatus(QxStatus::kFailed, QxFailure::kFreeSpaceUnknown);
             return true;
         }
         // Contract: unmeasured-boxes-are-cause-23. The closing boxes must still find room. What could not be
@@ -224,7 +224,7 @@ bool FileOutput::outputFile(Work& work, std::deque<std::shared_ptr<ChunkData>>& 
             // Contract: free-space-two-spellings. "freespace" for a chunk, "free space" for a file.
             CLIPFILE_LOG(LOG_PRIORITY_ERROR, "no disk freespace. %llu.",
                          static_cast<unsigned long long>(freeSpace));
-            work.owner.SetStatus(kStatusFailed, kCauseDiskFull);
+            work.owner.SetStatus(QxStatus::kFailed, QxFailure::kDiskFull);
             return true;
         }
 
@@ -237,7 +237,7 @@ bool FileOutput::outputFile(Work& work, std::deque<std::shared_ptr<ChunkData>>& 
         }
         if (!written) {
             CLIPFILE_LOG(LOG_PRIORITY_ERROR, "mp4 file write error.");
-            work.owner.SetStatus(kStatusFailed, kCauseFileWrite);
+            work.owner.SetStatus(QxStatus::kFailed, QxFailure::kFileWrite);
             return true;
         }
         work.lastChunk = chunk;
@@ -255,7 +255,7 @@ bool FileOutput::waitsForIdrFrame(const Work& work, const ChunkData& chunk, std:
 
 void FileOutput::notifyTransferStatus(Work& work, const std::string& value) {
     work.owner.PostEvent(std::make_shared<TransferStatusNotifyEvent>(
-        std::map<std::string, std::string>{{kFileOutputStatusKey, value}}));
+        std::map<std::string, std::string>{{QxStatusMap::kFileOutput, value}}));
 }
 
 }  // namespace clipfileModule

@@ -18,22 +18,6 @@
 
 namespace clipfileModule {
 
-/// Causes that file output reports with status 7, besides `kCauseInitialize`.
-enum FileOutputCause : int {
-    /// The logon for a share failed.
-    kCauseLogon = 21,
-    /// The free space cannot be told.
-    kCauseFreeSpaceUnknown = 22,
-    /// There is not enough of it.
-    kCauseDiskFull = 23,
-    /// The dated directory cannot be made.
-    kCauseDirectory = 24,
-    kCauseFileOpen = 25,
-    kCauseFileWrite = 26,
-    /// Closing the file failed, or the writer hung.
-    kCauseFileClose = 27,
-};
-
 /// Everything that the file output thread works on. The thread and its `FileOutput` own it together, and the
 /// one that lets go last destroys it.
 struct FileOutput::Work {

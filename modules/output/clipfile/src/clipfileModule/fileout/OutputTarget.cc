@@ -4,8 +4,8 @@
 #include <cstdio>
 #include <string>
 
+#include "QxModuleStatus.h"
 #include "common/Log.h"
-#include "common/Status.h"
 #include "fileout/FileOutput.h"
 #include "fileout/FileOutputWork.h"
 #include "mp4/Mp4MuxerFactory.h"
@@ -20,7 +20,7 @@ bool FileOutput::newFile(Work& work, const std::shared_ptr<ChunkData>& chunk) {
         return result;
     };
     const auto fail = [&](int cause) {
-        work.owner.SetStatus(kStatusFailed, cause);
+        work.owner.SetStatus(QxStatus::kFailed, cause);
         return end(false);
     };
 
@@ -30,7 +30,7 @@ bool FileOutput::newFile(Work& work, const std::shared_ptr<ChunkData>& chunk) {
     }
     if (!closed) {
         CLIPFILE_LOG(LOG_PRIORITY_ERROR, "mp4 file close error.");
-        return fail(kCauseFileClose);
+        return fail(QxFailure::kFileClose);
     }
 
     // Contract: free-space-of-the-root. The directory for today need not exist yet.
@@ -41,13 +41,13 @@ bool FileOutput::newFile(Work& work, const std::shared_ptr<ChunkData>& chunk) {
     }
     if (error != 0) {
         CLIPFILE_LOG(LOG_PRIORITY_ERROR, "disk size could not be obtained. error = %d.", error);
-        return fail(kCauseFreeSpaceUnknown);
+        return fail(QxFailure::kFreeSpaceUnknown);
     }
     if (freeSpace < Work::minFreeSpaceOpen) {
         // Contract: free-space-two-spellings. Two words here.
         CLIPFILE_LOG(LOG_PRIORITY_ERROR, "no disk free space. %llu.",
                      static_cast<unsigned long long>(freeSpace));
-        return fail(kCauseDiskFull);
+        return fail(QxFailure::kDiskFull);
     }
 
     OutputSettings local = work.settings;
@@ -57,7 +57,7 @@ bool FileOutput::newFile(Work& work, const std::shared_ptr<ChunkData>& chunk) {
     }
     if (!made) {
         CLIPFILE_LOG(LOG_PRIORITY_ERROR, "mp4 mkdir error. %s.", local.outputPath.c_str());
-        return fail(kCauseDirectory);
+        return fail(QxFailure::kDirectory);
     }
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "output path = \"%s\".", local.outputPath.c_str());
 
@@ -72,7 +72,7 @@ bool FileOutput::newFile(Work& work, const std::shared_ptr<ChunkData>& chunk) {
 
     if (!createMp4FileObject(work)) {
         CLIPFILE_LOG(LOG_PRIORITY_ERROR, "create mp4 file object failed.");
-        return fail(kCauseFileOpen);
+        return fail(QxFailure::kFileOpen);
     }
     const bool opened = work.muxer->Open(local, hasTimecode ? timecode.data() : nullptr, dropFrame);
     if (work.owner.IsCut()) {
@@ -80,7 +80,7 @@ bool FileOutput::newFile(Work& work, const std::shared_ptr<ChunkData>& chunk) {
     }
     if (!opened) {
         CLIPFILE_LOG(LOG_PRIORITY_ERROR, "mp4 file open error.");
-        return fail(kCauseFileOpen);
+        return fail(QxFailure::kFileOpen);
     }
     return end(true);
 }
@@ -153,13 +153,13 @@ LogonToken FileOutput::useNetDrive(Work& work) {
                      static_cast<unsigned int>(logonError), settings.outputPath.c_str(),
                      settings.userName.c_str(), settings.password.c_str());
         // Contract: logon-failure-goes-on. Later faults decide.
-        work.owner.SetStatus(kStatusFailed, kCauseLogon);
+        work.owner.SetStatus(QxStatus::kFailed, QxFailure::kLogon);
         return token;
     }
     if (const int error = GetPlatform().Impersonate(token)) {
         CLIPFILE_LOG(LOG_PRIORITY_ERROR, "ImpersonateLoggedOnUser call failed. %d, %x.", 0,
                      static_cast<unsigned int>(error));
-        work.owner.SetStatus(kStatusFailed, kCauseLogon);
+        work.owner.SetStatus(QxStatus::kFailed, QxFailure::kLogon);
     }
     return token;
 }
@@ -178,7 +178,7 @@ bool FileOutput::createMp4FileObject(Work& work) {
     const bool result = work.muxer != nullptr && work.muxer->Initialize();
     if (!result) {
         CLIPFILE_LOG(LOG_PRIORITY_ERROR, "mp4 file initialize error.");
-        work.owner.SetStatus(kStatusFailed, kCauseInitialize);
+        work.owner.SetStatus(QxStatus::kFailed, QxFailure::kInitialize);
     }
     CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "end. func_result = %d.", result ? 1 : 0);
     return result;

@@ -3,8 +3,8 @@
 #include <boost/thread/lock_types.hpp>
 #include <memory>
 
+#include "QxModuleStatus.h"
 #include "common/Log.h"
-#include "common/Status.h"
 
 namespace clipfileModule {
 
@@ -139,7 +139,7 @@ void QxMessageHandler::NotifyOfflineStatus() {
     }
     if (changed && fileOutputStarted) {
         // Contract: offline-is-a-fault. Also when it was meant.
-        controller->SetStatus(kStatusStreamFault, kCauseOffline);
+        controller->SetStatus(QxStatus::kStreamFault, QxStreamFault::kOffline);
         stopFileOutput();
     }
 }
