@@ -12,6 +12,7 @@
 #include "buffer/state/WaitStartCacheState.h"
 #include "common/JoinThread.h"
 #include "common/Log.h"
+#include "common/LogScope.h"
 
 namespace clipfileModule {
 
@@ -56,10 +57,9 @@ StreamBuffer::~StreamBuffer() {
 }
 
 void StreamBuffer::Start(const OutputSettings& recordSettings) {
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
     MutexLock control(controlMutex);
     if (stateId != kStopState) {
-        CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
         return;
     }
     if (stopPending) {
@@ -111,11 +111,10 @@ void StreamBuffer::Start(const OutputSettings& recordSettings) {
         });
     }
     chunkThread = std::make_shared<std::thread>(&StreamBuffer::makeChunk, this);
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
 void StreamBuffer::Stop() {
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
     MutexLock control(controlMutex);
     std::vector<std::shared_ptr<StreamQueue>> stopped(kMediumCount);
     {
@@ -123,7 +122,6 @@ void StreamBuffer::Stop() {
         // that the worker waits for waits for this lock, so the push gets its room and the lock comes free.
         MutexLock lock(stateMutex);
         if (stateId == kStopState && !stopPending) {
-            CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
             return;
         }
         if (stateId != kStopState) {
@@ -146,7 +144,6 @@ void StreamBuffer::Stop() {
         }
     }
     finishStop();
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
 void StreamBuffer::finishStop() {
@@ -175,7 +172,7 @@ void StreamBuffer::finishStop() {
 }
 
 void StreamBuffer::Cancel() {
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
     if (chunkThread != nullptr) {
         if (chunkThread->joinable()) {
             CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start join...");
@@ -190,7 +187,6 @@ void StreamBuffer::Cancel() {
         }
         chunkThread.reset();
     }
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
 void StreamBuffer::PushReserved(const std::shared_ptr<StreamData>& /*unit*/) {}
@@ -269,7 +265,7 @@ void StreamBuffer::addToCache(const std::shared_ptr<StreamData>& unit, UnitList 
 
 void StreamBuffer::SetVideoSequenceHeader(const nal_access::NalUnit& sps, const nal_access::NalUnit& pps,
                                           const std::shared_ptr<StreamData>& unit) {
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
     const double frameMilliSec = static_cast<double>(streamInfo.audio_sample_duration) /
                                  static_cast<double>(streamInfo.audio_track_timescale) * 1000;
     // Contract: half-an-audio-frame-is-10-ms. Cut twice: 21.3 to 21, and 10.5 to 10.
@@ -291,7 +287,6 @@ void StreamBuffer::SetVideoSequenceHeader(const nal_access::NalUnit& sps, const 
     if (isExact()) {
         startInStep();
     }
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
 void StreamBuffer::removeBefore(UnitList& cache, std::uint64_t limit) {

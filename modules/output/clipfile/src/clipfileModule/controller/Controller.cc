@@ -7,6 +7,7 @@
 #include "QxRegistry.h"
 #include "buffer/StreamBuffer.h"
 #include "common/Log.h"
+#include "common/LogScope.h"
 
 namespace clipfileModule {
 
@@ -74,7 +75,7 @@ bool Controller::Initialize(QxModuleHostInterface* moduleHost) {
         CLIPFILE_LOG(LOG_PRIORITY_WARNING, "initialize is called twice.");
         return true;
     }
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
     recFlag = -1;
     strayUnitNoted = false;
     host = moduleHost;
@@ -87,7 +88,7 @@ bool Controller::Initialize(QxModuleHostInterface* moduleHost) {
     }
     // Contract: static-config-never-fails. A guard that nothing reaches.
     if (!getStaticConfig()) {
-        CLIPFILE_LOG(LOG_PRIORITY_ERROR, "end. static config error.");
+        scope.EndAs(LOG_PRIORITY_ERROR, "end. static config error.");
         SetStatus(QxStatus::kFailed, QxFailure::kInitialize);
         endStatusChannel();
         return false;
@@ -97,7 +98,7 @@ bool Controller::Initialize(QxModuleHostInterface* moduleHost) {
         analyzer = std::make_shared<nal_access::StreamAnalyzer>();
     }
     if (!getStartParameters()) {
-        CLIPFILE_LOG(LOG_PRIORITY_ERROR, "end. file output path is none.");
+        scope.EndAs(LOG_PRIORITY_ERROR, "end. file output path is none.");
         SetStatus(QxStatus::kFailed, QxFailure::kInitialize);
         endStatusChannel();
         return false;
@@ -136,7 +137,6 @@ bool Controller::Initialize(QxModuleHostInterface* moduleHost) {
         CLIPFILE_LOG(LOG_PRIORITY_TRACE, "count = %d.", static_cast<int>(i));
     }
     intake = channel.get();
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
     return true;
 }
 
@@ -244,7 +244,7 @@ void Controller::Uninitialize() {
         CLIPFILE_LOG(LOG_PRIORITY_WARNING, "uninitialize is called without initialize.");
         return;
     }
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
     terminated = true;
     if (eventThread->joinable()) {
         PostEvent(std::make_shared<TerminateEvent>());
@@ -281,7 +281,6 @@ void Controller::Uninitialize() {
     }
     undelivered.clear();
     endStatusChannel();
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
 void Controller::Execute() {
@@ -289,10 +288,9 @@ void Controller::Execute() {
         CLIPFILE_LOG(LOG_PRIORITY_WARNING, "execute is called without initialize.");
         return;
     }
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
     PostEvent(std::make_shared<TransferStatusNotifyEvent>(
         std::map<std::string, std::string>{{QxStatusMap::kFileOutput, QxStatusMap::kStandby}}));
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
 void Controller::SetStatus(int status, int cause) {

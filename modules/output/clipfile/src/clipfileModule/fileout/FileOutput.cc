@@ -9,6 +9,7 @@
 #include "common/Event.h"
 #include "common/JoinThread.h"
 #include "common/Log.h"
+#include "common/LogScope.h"
 #include "fileout/FileOutputWork.h"
 
 namespace clipfileModule {
@@ -28,30 +29,28 @@ FileOutput::~FileOutput() = default;
 
 bool FileOutput::Initialize(ControllerInterface* owner, StreamBufferInterface* streamBuffer,
                             const std::string& fileType) {
-    CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_DETAIL);
     controller = owner;
     buffer = streamBuffer;
     type = fileType;
     work = std::make_shared<Work>(owner, streamBuffer, fileType);
     // Contract: first-muxer-unused. Each file gets a new one.
     const bool result = createMp4FileObject(*work);
-    CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "end. func_result = %d.", result ? 1 : 0);
-    return result;
+    return scope.Return("func_result", result);
 }
 
 bool FileOutput::Uninitialize() {
-    CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_DETAIL);
     work->running = false;
     leaveWork();
     // Contract: delete-until-true. It is true the first time.
     while (!deleteMp4FileObject(*work)) {
     }
-    CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "end. func_result = %d.", 1);
-    return true;
+    return scope.Return("func_result", true);
 }
 
 void FileOutput::Start(const OutputSettings& outputSettings) {
-    CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_DETAIL);
     leaveWork();
     work->settings = outputSettings;
     work->lastChunk.reset();
@@ -66,18 +65,16 @@ void FileOutput::Start(const OutputSettings& outputSettings) {
     while (!work->started) {
         lock.Wait(work->chunkCondition);
     }
-    CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "end.");
 }
 
 void FileOutput::Stop() {
-    CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_DETAIL);
     {
         // Either the thread sees the flag before it waits, or it waits and gets the signal below.
         MutexLock lock(work->chunkMutex);
         work->running = false;
     }
     if (thread == nullptr) {
-        CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "end.");
         return;
     }
     work->chunkCondition.notify_one();
@@ -97,7 +94,6 @@ void FileOutput::Stop() {
         CLIPFILE_LOG(LOG_PRIORITY_TRACE, "terminate thread...");
     }
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "wait thread end...");
-    CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "end.");
 }
 
 void FileOutput::leaveWork() {

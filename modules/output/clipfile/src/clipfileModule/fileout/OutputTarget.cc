@@ -6,6 +6,7 @@
 
 #include "QxModuleStatus.h"
 #include "common/Log.h"
+#include "common/LogScope.h"
 #include "fileout/FileOutput.h"
 #include "fileout/FileOutputWork.h"
 #include "mp4/Mp4MuxerFactory.h"
@@ -14,19 +15,19 @@
 namespace clipfileModule {
 
 bool FileOutput::newFile(Work& work, const std::shared_ptr<ChunkData>& chunk) {
-    CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "start.");
-    const auto end = [](bool result) {
-        CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "end. result = %d.", result ? 1 : 0);
-        return result;
-    };
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_DETAIL);
     const auto fail = [&](int cause) {
         work.owner.SetStatus(QxStatus::kFailed, cause);
-        return end(false);
+        return scope.Return("result", false);
+    };
+    const auto giveUp = [&] {
+        scope.Dismiss();
+        return false;
     };
 
     const bool closed = !work.IsFileOpen() || work.CloseFile();
     if (work.owner.IsCut()) {
-        return false;
+        return giveUp();
     }
     if (!closed) {
         CLIPFILE_LOG(LOG_PRIORITY_ERROR, "mp4 file close error.");
@@ -37,7 +38,7 @@ bool FileOutput::newFile(Work& work, const std::shared_ptr<ChunkData>& chunk) {
     std::uint64_t freeSpace = 0;
     const int error = GetPlatform().AvailableSpace(work.settings.outputPath, freeSpace);
     if (work.owner.IsCut()) {
-        return false;
+        return giveUp();
     }
     if (error != 0) {
         CLIPFILE_LOG(LOG_PRIORITY_ERROR, "disk size could not be obtained. error = %d.", error);
@@ -53,7 +54,7 @@ bool FileOutput::newFile(Work& work, const std::shared_ptr<ChunkData>& chunk) {
     OutputSettings local = work.settings;
     const bool made = makeOutputPath(work, local, local.outputPath);
     if (work.owner.IsCut()) {
-        return false;
+        return giveUp();
     }
     if (!made) {
         CLIPFILE_LOG(LOG_PRIORITY_ERROR, "mp4 mkdir error. %s.", local.outputPath.c_str());
@@ -76,13 +77,13 @@ bool FileOutput::newFile(Work& work, const std::shared_ptr<ChunkData>& chunk) {
     }
     const bool opened = work.muxer->Open(local, hasTimecode ? timecode.data() : nullptr, dropFrame);
     if (work.owner.IsCut()) {
-        return false;
+        return giveUp();
     }
     if (!opened) {
         CLIPFILE_LOG(LOG_PRIORITY_ERROR, "mp4 file open error.");
         return fail(QxFailure::kFileOpen);
     }
-    return end(true);
+    return scope.Return("result", true);
 }
 
 bool FileOutput::makeOutputPath(Work& work, const OutputSettings& settings, std::string& path) {
@@ -165,7 +166,7 @@ LogonToken FileOutput::useNetDrive(Work& work) {
 }
 
 bool FileOutput::createMp4FileObject(Work& work) {
-    CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_DETAIL);
     if (work.muxer != nullptr) {
         deleteMp4FileObject(work);
     }
@@ -180,12 +181,11 @@ bool FileOutput::createMp4FileObject(Work& work) {
         CLIPFILE_LOG(LOG_PRIORITY_ERROR, "mp4 file initialize error.");
         work.owner.SetStatus(QxStatus::kFailed, QxFailure::kInitialize);
     }
-    CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "end. func_result = %d.", result ? 1 : 0);
-    return result;
+    return scope.Return("func_result", result);
 }
 
 bool FileOutput::deleteMp4FileObject(Work& work) {
-    CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_DETAIL);
     // There is none after a thread was given up: its muxer is its own.
     if (work.muxer != nullptr) {
         if (!work.muxer->Uninitialize()) {
@@ -194,8 +194,7 @@ bool FileOutput::deleteMp4FileObject(Work& work) {
         }
         work.muxer.reset();
     }
-    CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "end. func_result = %d.", 1);
-    return true;
+    return scope.Return("func_result", true);
 }
 
 }  // namespace clipfileModule
