@@ -12,6 +12,7 @@
 #include "inspect/TextReport.h"
 #include "reader/Folder.h"
 #include "recover/Recovery.h"
+#include "recover/Unattended.h"
 #include "recover/UnfinishedFiles.h"
 #include "verify/Verification.h"
 
@@ -19,6 +20,7 @@ namespace clipfile {
 
 namespace {
 
+namespace fs = std::filesystem;
 using Json = nlohmann::ordered_json;
 
 /// Options as they stand on the command line.
@@ -28,6 +30,7 @@ struct Options {
     bool boxes = false;
     std::size_t rows = 4;
     RecoveryOptions recovery;
+    bool unattended = false;
     bool deep = false;
 };
 
@@ -112,8 +115,26 @@ void TellLockFault(const std::string& path, const RecoveryResult& result, const 
     }
 }
 
+/// Why a file that was to take the place of its original stands beside it.
+void TellDefects(const std::string& path, const RecoveryResult& result, const Options& options,
+                 std::ostream& out) {
+    if (!options.unattended || options.json || !result.isRecovered || result.written == fs::absolute(path)) {
+        return;
+    }
+    out << path << " stays beside it: ";
+    if (result.defects.empty()) {
+        out << "behind its last whole picture there is more than a chunk.\n";
+    } else {
+        out << "the recovered file has " << Plural(result.defects.size(), "defect")
+            << ", the first is: " << result.defects.front() << '\n';
+    }
+}
+
 ExitCode RecoverOne(const std::string& path, const Options& options, std::ostream& out,
                     std::ostream& errors) {
+    if (options.unattended) {
+        CheckRoom(path);
+    }
     const RecoveryResult result = RecoverFile(path, options.recovery);
     TellLockFault(path, result, options, errors);
     if (options.json) {
@@ -125,7 +146,8 @@ ExitCode RecoverOne(const std::string& path, const Options& options, std::ostrea
                         {"metadata_units", result.metadataUnits},
                         {"bytes_left", result.bytesLeft},
                         {"parameter_sets", result.parameterSets},
-                        {"lock_fault", result.lockFault}});
+                        {"lock_fault", result.lockFault},
+                        {"defects", result.defects}});
     } else if (!result.isRecovered) {
         out << path << " is closed: nothing to recover.\n";
     } else {
@@ -137,6 +159,7 @@ ExitCode RecoverOne(const std::string& path, const Options& options, std::ostrea
         }
         out << "; " << Plural(result.bytesLeft, "byte") << " behind them belong to nothing whole.\n";
     }
+    TellDefects(path, result, options, out);
     return ExitCode::kSuccess;
 }
 
@@ -156,7 +179,12 @@ void PassOverRecovered(Options& found, std::ostream& out) {
 /// Files as they are, and of folders the recordings in them that are not closed.
 ExitCode Recover(const std::string& path, const Options& options, std::ostream& out, std::ostream& errors) {
     if (!IsFolder(path)) {
-        return RecoverOne(path, options, out, errors);
+        Options one = options;
+        one.files = {path};
+        if (options.unattended) {
+            PassOverRecovered(one, out);
+        }
+        return one.files.empty() ? ExitCode::kSuccess : RecoverOne(path, options, out, errors);
     }
     FolderListing listing = UnfinishedIn(path);
     const ExitCode searched = TellFaults(path, listing, options, out, errors);
@@ -253,10 +281,16 @@ CLI::App* AddRecover(CLI::App& app, Options& options) {
     CLI::Option* const output =
         command->add_option("--output", options.recovery.output, "Folder for the recovered files")
             ->check(CLI::ExistingDirectory);
+    CLI::Option* const inPlace = command
+                                     ->add_flag("--in-place", options.recovery.inPlace,
+                                                "Put each recovered file in the place of its original")
+                                     ->excludes(output);
     command
-        ->add_flag("--in-place", options.recovery.inPlace,
-                   "Put each recovered file in the place of its original")
-        ->excludes(output);
+        ->add_flag("--unattended", options.unattended,
+                   "Beside a running recorder: give way to it, and put a recovered file in the place of its "
+                   "original when verify --deep finds nothing wrong with it, else beside")
+        ->excludes(output)
+        ->excludes(inPlace);
     command->add_flag("--json", options.json, "One JSON object a file and line");
     return command;
 }
@@ -275,6 +309,10 @@ ExitCode RunProgram(const std::vector<std::string>& arguments, std::ostream& out
         app.parse(reversed);
     } catch (const CLI::ParseError& error) {
         return app.exit(error, out, errors) == 0 ? ExitCode::kSuccess : ExitCode::kUsage;
+    }
+    if (options.unattended) {
+        GiveWay();
+        options.recovery.verify = [](const fs::path& path) { return VerifyFile(path, true).defects; };
     }
     if (verify->parsed()) {
         return Verify(options, out, errors);

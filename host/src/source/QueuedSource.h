@@ -33,10 +33,14 @@ class QueuedSource final : public SourceInterface {
 
  private:
     void Run();
+    /// The unit in front, out of the queue. Under the lock.
+    SourceUnit Take();
 
     const std::unique_ptr<ProducerInterface> producer_;
     const std::shared_ptr<Interrupt> interrupt_;
     const std::size_t capacity_;
+    /// Units that must wait before the reader who found none goes on.
+    const std::size_t refill_;
     SourceListenerInterface& listener_;
     /// Of the reading thread alone.
     Pacer pacer_;
@@ -44,7 +48,12 @@ class QueuedSource final : public SourceInterface {
 
     /// Guards what follows.
     std::mutex mutex_;
-    std::condition_variable changed_;
+    /// For the reader: units came, the producer ended, or a stop.
+    std::condition_variable arrived_;
+    /// For the producer: half of the queue was taken, or a stop.
+    std::condition_variable room_;
+    /// The producer waits for room.
+    bool full_ = false;
     Batch queue_;
     /// Bytes of the units in the queue.
     std::size_t queued_ = 0;

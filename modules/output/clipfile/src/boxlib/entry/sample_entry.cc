@@ -104,7 +104,7 @@ void releaseAudio(MbxContext* context, MbxAudioEntry* audio) {
     MbxFree(context, audio->fcfg);
 }
 
-MbxStatus freeEntry(MbxContext* context, MbxSampleEntry* entry) {
+MbxStatus freeModelEntry(MbxContext* context, MbxSampleEntry* entry) {
     return MbxFreeBox(context, entry, [&] {
         MBX_TRY(MbxFreeAvcConfig(context, entry->visual.avcConfig));
         MBX_TRY(MbxFreeHvcConfig(context, entry->visual.hvcConfig));
@@ -126,11 +126,11 @@ MbxStatus MbxAddSampleEntry(MbxContext* context, MbxSampleEntryList* list,
     if (MbxAnyNull(context, list, request, index)) return MBX_ERR_INVALID_ARG;
     MBX_TRY(MbxMakeListItem(
         context, &list->entries, [&](MbxSampleEntry* entry) { return fillEntry(context, *request, entry); },
-        freeEntry));
+        freeModelEntry));
     return MbxListCount<MbxSampleEntry>(list->entries.first, index);
 }
 
 MbxStatus MbxReleaseSampleEntries(MbxContext* context, MbxSampleEntryList* list) {
     if (MbxAnyNull(context, list)) return MBX_ERR_INVALID_ARG;
-    return MbxFreeList(context, &list->entries, freeEntry);
+    return MbxFreeList(context, &list->entries, freeModelEntry);
 }
