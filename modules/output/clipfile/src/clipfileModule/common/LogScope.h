@@ -68,7 +68,7 @@ class LogScope {
 
 /// Logs "start." and defines `scope`, which logs "end." when the function is left. What is given behind the
 /// priority goes on the first line: CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE, " event_id = %d.", id).
-#define CLIPFILE_LOG_SCOPE(scope, priority, ...)                                            \
-    static constexpr ::clipfileModule::FunctionName kScopeFunction(__PRETTY_FUNCTION__);    \
-    ::Logger::Put(priority, __FILE__, kScopeFunction.text, __LINE__, "start." __VA_ARGS__); \
+#define CLIPFILE_LOG_SCOPE(scope, priority, ...)                                                           \
+    static constexpr auto kScopeFunction = ::clipfileModule::NameFunction(__PRETTY_FUNCTION__, kLogClass); \
+    ::Logger::Put(priority, __FILE__, kScopeFunction.text, __LINE__, "start." __VA_ARGS__);                \
     ::clipfileModule::LogScope scope(priority, __FILE__, kScopeFunction.text, __LINE__)
