@@ -1,15 +1,22 @@
 #include "Program.h"
 
 #include <CLI/CLI.hpp>
+#include <cerrno>
+#include <cstdio>
 #include <exception>
 #include <filesystem>
 #include <functional>
 #include <nlohmann/json.hpp>
+#include <sstream>
+#include <string_view>
+#include <system_error>
 
 #include "inspect/BoxTree.h"
 #include "inspect/Inspection.h"
 #include "inspect/JsonReport.h"
+#include "inspect/Plot.h"
 #include "inspect/TextReport.h"
+#include "inspect/Thumbnails.h"
 #include "reader/Folder.h"
 #include "recover/Recovery.h"
 #include "recover/Unattended.h"
@@ -29,6 +36,8 @@ struct Options {
     bool json = false;
     bool boxes = false;
     std::size_t rows = 4;
+    std::string plot;
+    std::string thumbnails;
     RecoveryOptions recovery;
     bool unattended = false;
     bool deep = false;
@@ -88,16 +97,40 @@ ExitCode ForEachFile(const Options& options, std::ostream& out, std::ostream& er
     return result;
 }
 
+/// Writes a file that is not there yet.
+void WriteNew(const std::string& path, std::string_view bytes) {
+    std::FILE* const file = std::fopen(path.c_str(), "wbxe");
+    bool isWritten = file != nullptr && std::fwrite(bytes.data(), 1, bytes.size(), file) == bytes.size();
+    isWritten = (file == nullptr || std::fclose(file) == 0) && isWritten;
+    if (!isWritten) {
+        throw ToolError(ExitCode::kUnreadable,
+                        path + " cannot be written: " + std::generic_category().message(errno) + ".");
+    }
+}
+
+/// What `inspect` draws, besides what it tells.
+void Draw(const InputFile& file, const Inspection& inspection, const Options& options) {
+    if (!options.plot.empty()) {
+        std::ostringstream plot;
+        PrintPlot(plot, file, inspection);
+        WriteNew(options.plot, plot.str());
+    }
+    if (!options.thumbnails.empty()) {
+        const std::vector<unsigned char> png = MakeThumbnails(file, inspection);
+        WriteNew(options.thumbnails, {reinterpret_cast<const char*>(png.data()), png.size()});
+    }
+}
+
 ExitCode InspectFile(const std::string& path, const Options& options, std::ostream& out) {
     const InputFile file(path);
     if (options.boxes && options.json) {
         PrintJson(out, {{"file", path}, {"boxes", BoxesToJson(file, options.rows)}});
     } else if (options.boxes) {
         PrintBoxes(out, file, options.rows);
-    } else if (options.json) {
-        PrintJson(out, ToJson(Inspect(file)));
     } else {
-        PrintText(out, Inspect(file));
+        const Inspection inspection = Inspect(file);
+        options.json ? PrintJson(out, ToJson(inspection)) : PrintText(out, inspection);
+        Draw(file, inspection, options);
     }
     return ExitCode::kSuccess;
 }
@@ -254,11 +287,17 @@ void AddInspect(CLI::App& app, Options& options) {
     CLI::App* const command =
         app.add_subcommand("inspect", "Tell what is in recordings, closed or unfinished.");
     command->add_option("FILE", options.files, "Recordings")->required();
-    command->add_flag(
+    CLI::Option* const boxes = command->add_flag(
         "--boxes", options.boxes,
         "List the boxes of any MP4 file, with offsets, and fields by their names in the standard");
     command->add_option("--rows", options.rows, "Rows of each table that --boxes shows")
         ->capture_default_str();
+    command
+        ->add_option("--plot", options.plot,
+                     "Draw sizes of pictures, groups, and times of chunks into a new file (SVG)")
+        ->excludes(boxes);
+    command->add_option("--thumbnails", options.thumbnails, "Put pictures of the file into a new file (PNG)")
+        ->excludes(boxes);
     command->add_flag("--json", options.json, "One JSON object a file and line");
 }
 
@@ -309,6 +348,10 @@ ExitCode RunProgram(const std::vector<std::string>& arguments, std::ostream& out
         app.parse(reversed);
     } catch (const CLI::ParseError& error) {
         return app.exit(error, out, errors) == 0 ? ExitCode::kSuccess : ExitCode::kUsage;
+    }
+    if (options.files.size() > 1 && !(options.plot + options.thumbnails).empty()) {
+        errors << "clipfile: --plot and --thumbnails go with one file.\n";
+        return ExitCode::kUsage;
     }
     if (options.unattended) {
         GiveWay();

@@ -8,6 +8,8 @@
 #include <algorithm>
 #include <fstream>
 #include <nlohmann/json.hpp>
+#include <regex>
+#include <set>
 #include <sstream>
 
 #include "support/ByteFile.h"
@@ -60,6 +62,27 @@ class ProgramTest : public testing::Test {
     std::ostringstream out_;
     std::ostringstream errors_;
 };
+
+TEST_F(ProgramTest, TheManPageHasEachOption) {
+    std::string help;
+    for (const char* const command : {"inspect", "verify", "recover"}) {
+        EXPECT_EQ(run({command, "--help"}), ExitCode::kSuccess);
+        help += out_.str();
+    }
+    const test_stream::Data bytes = test_stream::ReadAll(CLIPFILE_MAN_PAGE);
+    std::string page(bytes.begin(), bytes.end());
+    // Its hyphens are "\-".
+    std::erase(page, '\\');
+    const std::regex option("--[a-z][-a-z]*");
+    const auto optionsIn = [&](const std::string& text) {
+        return std::set<std::string>(std::sregex_token_iterator(text.begin(), text.end(), option),
+                                     std::sregex_token_iterator());
+    };
+    std::set<std::string> expected = optionsIn(help);
+    expected.erase("--help");
+    EXPECT_EQ(optionsIn(page), expected);
+    EXPECT_GT(expected.size(), 9U);
+}
 
 TEST_F(ProgramTest, MistakesOfTheCommandLineHaveACodeOfTheirOwn) {
     EXPECT_EQ(run({}), ExitCode::kUsage);
@@ -180,6 +203,22 @@ TEST_F(ProgramTest, BoxesOfARecordingNameTheirFields) {
           "number_of_frames 30", "      15 more rows"}) {
         EXPECT_NE(out_.str().find(text), std::string::npos) << text;
     }
+}
+
+TEST_F(ProgramTest, DrawingsAreNewFilesBesideTheReport) {
+    test_stream::Record(path("a.MP4"), {"normal", clipfileModule::RecordRules::kExact, true},
+                        test_stream::MakeCodedStream(4));
+    EXPECT_EQ(run({"inspect", "--plot", path("a.svg"), "--thumbnails", path("a.png"), path("a.MP4")}),
+              ExitCode::kSuccess)
+        << errors_.str();
+    EXPECT_TRUE(out_.str().starts_with(path("a.MP4") + ": normal, closed"));
+    EXPECT_TRUE(std::filesystem::exists(path("a.svg")));
+    EXPECT_TRUE(std::filesystem::exists(path("a.png")));
+    const test_stream::Data before = test_stream::ReadAll(path("a.MP4"));
+    EXPECT_EQ(run({"inspect", "--plot", path("a.MP4"), path("a.MP4")}), ExitCode::kUnreadable);
+    EXPECT_EQ(errors_.str(), "clipfile: " + path("a.MP4") + " cannot be written: File exists.\n");
+    EXPECT_EQ(test_stream::ReadAll(path("a.MP4")), before);
+    EXPECT_EQ(run({"inspect", "--plot", path("b.svg"), path("a.MP4"), path("a.MP4")}), ExitCode::kUsage);
 }
 
 TEST_F(ProgramTest, DefectsAreALineEachAndACode) {

@@ -24,7 +24,7 @@ constexpr const char* kExtension = ".journal";
 /// Of a journal that does not have its name yet.
 constexpr const char* kNew = ".new";
 /// More than any journal has.
-constexpr off_t kMaxSize = 2 * 1024 * 1024;
+constexpr off_t kMaxSize = 2'000'000;
 
 [[noreturn]] void Fail(const fs::path& path) {
     throw std::system_error(errno, std::generic_category(), path.string());

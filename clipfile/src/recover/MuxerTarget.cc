@@ -34,7 +34,7 @@ MbxStatus Note(MbxStatus status) {
 
 /// Lets no more wait in memory for the disk than this, in bytes. Where much waits, the system holds up all
 /// who write to it, and a recorder may be among them.
-constexpr std::uint64_t kMaxUnsynchronized = 8 * 1024 * 1024;
+constexpr std::uint64_t kMaxUnsynchronized = 8'000'000;
 
 MbxStatus WriteFile(MbxFile* file, const void* buffer, std::uint64_t size, std::uint64_t* count) {
     const MbxStatus status = Note(MbxStdioWrite(file, buffer, size, count));

@@ -16,7 +16,7 @@ namespace receiver {
 namespace {
 
 /// What is kept of what a program says.
-constexpr std::size_t kMaxText = 16 * 1024;
+constexpr std::size_t kMaxText = 16'000;
 /// How often `End` is looked for, in milliseconds.
 constexpr int kLook = 50;
 

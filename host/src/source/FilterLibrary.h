@@ -1,5 +1,8 @@
 #pragma once
 
+// In front of FFmpeg's headers, which want its macros.
+#include <cstdint>
+
 extern "C" {
 #include <libavfilter/avfilter.h>
 #include <libavfilter/buffersink.h>

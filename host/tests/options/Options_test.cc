@@ -5,6 +5,11 @@
 #include <stdlib.h>
 #include <unistd.h>
 
+#include <fstream>
+#include <iterator>
+#include <regex>
+#include <set>
+
 #include "common/ReceiverError.h"
 
 namespace receiver {
@@ -198,6 +203,23 @@ TEST(Options, HelpTellsOfEveryOptionOfTheExamplesAndOfTheExitCodes) {
                                    "receiver.password"}) {
         EXPECT_THAT(text, HasSubstr(part));
     }
+}
+
+/// The long options in a text.
+std::set<std::string> OptionsIn(std::string text) {
+    // A man page has its hyphens as "\-".
+    std::erase(text, '\\');
+    const std::regex option("--[a-z][-a-z]*");
+    return {std::sregex_token_iterator(text.begin(), text.end(), option), std::sregex_token_iterator()};
+}
+
+TEST(Options, TheManPageHasEachOfThem) {
+    std::string help;
+    EXPECT_FALSE(Parse({"--help"}, help));
+    std::ifstream in(RECEIVER_MAN_PAGE);
+    const std::string page{std::istreambuf_iterator<char>(in), {}};
+    EXPECT_EQ(OptionsIn(page), OptionsIn(help));
+    EXPECT_GT(OptionsIn(help).size(), 30U);
 }
 
 TEST(Options, VersionIsPrinted) {

@@ -4,6 +4,7 @@
 #include <cmath>
 #include <cstring>
 #include <iterator>
+#include <system_error>
 #include <utility>
 
 #include "buffer/state/EndSyncRecState.h"
@@ -78,6 +79,7 @@ void StreamBuffer::Start(const OutputSettings& recordSettings) {
         audioBuffer.clear();
         metaBuffer.clear();
         firstPicture.reset();
+        writerMissing = false;
         metaBlock.assign(std::begin(kMetaBlock), std::end(kMetaBlock));
         chunkedVideo = 0;
         chunkedAudio = 0;
@@ -102,15 +104,31 @@ void StreamBuffer::Start(const OutputSettings& recordSettings) {
         queues = started;
         changeState(std::make_shared<WaitStartCacheState>(this, settings.recordRules));
     }
+    if (!startThreads(started)) {
+        control.Unlock();
+        endWithoutThread();
+    }
+}
+
+bool StreamBuffer::startThreads(const std::vector<std::shared_ptr<StreamQueue>>& started) {
     UnitList StreamBuffer::*const caches[] = {&StreamBuffer::videoBuffer, &StreamBuffer::audioBuffer,
                                               &StreamBuffer::metaBuffer};
-    for (std::size_t medium = 0; medium < kMediumCount; ++medium) {
-        started[medium]->Start([this, cache = caches[medium],
-                                mediaType = kMediaTypes[medium]](std::shared_ptr<StreamData>& unit) {
-            addToCache(unit, cache, mediaType);
-        });
+    try {
+        for (std::size_t medium = 0; medium < kMediumCount; ++medium) {
+            started[medium]->Start([this, cache = caches[medium],
+                                    mediaType = kMediaTypes[medium]](std::shared_ptr<StreamData>& unit) {
+                addToCache(unit, cache, mediaType);
+            });
+        }
+        chunkThread = std::make_shared<std::thread>(&StreamBuffer::makeChunk, this);
+        return true;
+    } catch (const std::system_error& error) {
+        if (!isExact()) {
+            throw;
+        }
+        CLIPFILE_LOG(LOG_PRIORITY_ERROR, "recording cannot be started. %s.", error.what());
+        return false;
     }
-    chunkThread = std::make_shared<std::thread>(&StreamBuffer::makeChunk, this);
 }
 
 void StreamBuffer::Stop() {
@@ -284,12 +302,26 @@ void StreamBuffer::SetVideoSequenceHeader(const nal_access::NalUnit& sps, const 
     }
     settings.sps = sps;
     settings.pps = pps;
-    fileOutput->Start(settings);
+    startWriter();
     // Contract: idr-frame-unsorted. The cache is empty here.
     videoBuffer.push_back(unit);
     firstPicture = unit;
     if (isExact()) {
         startInStep();
+    }
+}
+
+void StreamBuffer::startWriter() {
+    try {
+        fileOutput->Start(settings);
+    } catch (const std::system_error& error) {
+        if (!isExact()) {
+            throw;
+        }
+        CLIPFILE_LOG(LOG_PRIORITY_ERROR, "recording cannot be started. %s.", error.what());
+        // The chunk thread ends the recording: no status may leave here, under the locks of states and list.
+        writerMissing = true;
+        bufferCondition.notify_one();
     }
 }
 
@@ -333,6 +365,18 @@ void StreamBuffer::setError(int code) {
     if (stateId == kErrorState) {
         controller->PostEvent(std::make_shared<RestartStreamingEvent>(shared_from_this()));
     }
+}
+
+void StreamBuffer::endWithoutThread() {
+    {
+        MutexLock lock(stateMutex);
+        if (stateId != kWaitStartState && stateId != kStartState) {
+            return;
+        }
+        changeState(std::make_shared<ErrorCacheState>(this));
+    }
+    controller->SetStatus(QxStatus::kFailed, QxFailure::kNoFirstChunk);
+    NotifyEndSync();
 }
 
 bool StreamBuffer::MakeFileTimecode(const std::shared_ptr<ChunkData>& chunk) {

@@ -96,6 +96,8 @@ void StreamBuffer::makeChunk() {
     // for a worker that adds to a cache: the lock of the caches had to be given back first.
     if (result == kRecordEnded) {
         endSync();
+    } else if (result == kWriterMissing) {
+        endWithoutThread();
     } else if (result != kGoOn) {
         CLIPFILE_LOG(LOG_PRIORITY_ERROR, "%s", messageOf(result));
         setError(result);

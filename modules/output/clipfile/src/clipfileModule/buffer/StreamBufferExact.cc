@@ -10,6 +10,9 @@
 namespace clipfileModule {
 
 PassResult StreamBuffer::makeExactPass() {
+    if (writerMissing) {
+        return kWriterMissing;
+    }
     // More than one chunk may be complete: what comes while the thread works wakes nobody.
     while (!videoBuffer.empty()) {
         const bool inStep = startInStep();
@@ -37,7 +40,7 @@ PassResult StreamBuffer::makeExactPass() {
 
 void StreamBuffer::cutRest() {
     const std::uint64_t end = findEnd();
-    while (!videoBuffer.empty() && hasTimeline() && startInStep()) {
+    while (!writerMissing && !videoBuffer.empty() && hasTimeline() && startInStep()) {
         std::size_t pictures = std::min<std::size_t>(chunkFrames, countBefore(videoBuffer, end));
         std::optional<ChunkCounts> counts;
         for (; pictures > 0 && !counts; --pictures) {

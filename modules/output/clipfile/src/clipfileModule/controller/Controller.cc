@@ -1,6 +1,7 @@
 #include "controller/Controller.h"
 
 #include <algorithm>
+#include <system_error>
 #include <utility>
 
 #include "QxModuleStatus.h"
@@ -40,10 +41,15 @@ constexpr const char* kNoOutputPath = "none";
 constexpr const char* kRecordRulesKept = "kept";
 constexpr const char* kRecordRulesExact = "exact";
 
+// Contract: text-ends-at-zero. A host may give a padded buffer; a path would be cut there by the system.
+std::string upToFirstZero(const std::string& text) {
+    return text.substr(0, text.find('\0'));
+}
+
 std::string readText(QxModuleHostInterface& host, const std::string& key, const std::string& defaultValue) {
     std::string value;
     host.GetParameter(key, value, defaultValue);
-    return value;
+    return upToFirstZero(value);
 }
 
 std::uint32_t readNumber(QxModuleHostInterface& host, const std::string& key, std::uint32_t defaultValue) {
@@ -123,21 +129,42 @@ bool Controller::Initialize(QxModuleHostInterface* moduleHost) {
         {kTransferStatusNotify, [this](std::shared_ptr<Event> event) { OnTransferStatusNotify(event); }},
         {kTerminate, [this](std::shared_ptr<Event> event) { OnTerminate(event); }},
     };
-    eventThread = std::make_shared<std::thread>(&Controller::EventLoop, this);
+    try {
+        eventThread = std::make_shared<std::thread>(&Controller::EventLoop, this);
 
-    queueThreads.resize(kQueueCount);
-    queues.resize(kQueueCount);
-    const UnitConsumer consumers[kQueueCount] = {
-        [this](const std::shared_ptr<StreamData>& unit) { pushToBuffers(Medium::kVideo, unit); },
-        [this](const std::shared_ptr<StreamData>& unit) { pushToBuffers(Medium::kAudio, unit); },
-        [this](const std::shared_ptr<StreamData>& unit) { processMeta(unit); },
-    };
-    for (std::size_t i = 0; i < kQueueCount; ++i) {
-        startQueueThread(i, consumers[i]);
-        CLIPFILE_LOG(LOG_PRIORITY_TRACE, "count = %d.", static_cast<int>(i));
+        queueThreads.resize(kQueueCount);
+        queues.resize(kQueueCount);
+        const UnitConsumer consumers[kQueueCount] = {
+            [this](const std::shared_ptr<StreamData>& unit) { pushToBuffers(Medium::kVideo, unit); },
+            [this](const std::shared_ptr<StreamData>& unit) { pushToBuffers(Medium::kAudio, unit); },
+            [this](const std::shared_ptr<StreamData>& unit) { processMeta(unit); },
+        };
+        for (std::size_t i = 0; i < kQueueCount; ++i) {
+            startQueueThread(i, consumers[i]);
+            CLIPFILE_LOG(LOG_PRIORITY_TRACE, "count = %d.", static_cast<int>(i));
+        }
+    } catch (const std::system_error& error) {
+        if (!isExact) {
+            throw;
+        }
+        CLIPFILE_LOG(LOG_PRIORITY_ERROR, "end. threads cannot be started. %s.", error.what());
+        scope.Dismiss();
+        SetStatus(QxStatus::kFailed, QxFailure::kInitialize);
+        endFailedStart();
+        return false;
     }
     intake = channel.get();
     return true;
+}
+
+void Controller::endFailedStart() {
+    terminated = true;
+    if (eventThread != nullptr) {
+        PostEvent(std::make_shared<TerminateEvent>());
+        eventThread->join();
+        eventThread.reset();
+    }
+    endLife();
 }
 
 bool Controller::getStaticConfig() {
@@ -156,7 +183,7 @@ bool Controller::getStaticConfig() {
                 // Contract: missing-text-is-empty. Only a missing number is logged.
                 value.clear();
             }
-            *field = value;
+            *field = upToFirstZero(value);
         }
         unsigned int maxFileSize = 0;
         if (!registry->getValue(kSettingsSection, kKeyMaxFileSize, maxFileSize)) {
@@ -253,12 +280,17 @@ void Controller::Uninitialize() {
         CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end join");
     }
     eventThread.reset();
+    endLife();
+}
+
+/// What is left behind the event thread. Not all of the others need have been started.
+void Controller::endLife() {
     stopAndRemoveBuffers();
-    for (std::size_t i = 0; i < queueThreads.size(); ++i) {
+    for (std::size_t i = 0; i < queueThreads.size() && queues[i] != nullptr; ++i) {
         queues[i]->Clear();
         // Contract: closed-queues. Closing wakes the thread, which then finds `terminated`.
         queues[i]->Close();
-        if (queueThreads[i]->joinable()) {
+        if (queueThreads[i] != nullptr && queueThreads[i]->joinable()) {
             queueThreads[i]->join();
         }
     }

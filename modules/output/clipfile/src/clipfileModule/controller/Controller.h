@@ -77,6 +77,8 @@ class Controller : public ControllerInterface, public QxModuleStreamInterface {
     // Configuration (Controller.cc).
     bool getStaticConfig();
     bool getStartParameters();
+    void endFailedStart();
+    void endLife();
     void startQueueThread(std::size_t index, const UnitConsumer& consumer);
     void endStatusChannel() EXCLUDES(statusMutex);
     std::shared_ptr<StatusChannel> getStatusChannel() const EXCLUDES(statusMutex);
@@ -121,6 +123,7 @@ class Controller : public ControllerInterface, public QxModuleStreamInterface {
     // What exact rules add (ControllerExact.cc). Nothing happens in them with kept rules.
     void followCommand(const StreamData& unit) EXCLUDES(streamBuffersMutex);
     void endRecordings(std::int64_t end) EXCLUDES(streamBuffersMutex);
+    void limitWaiting() EXCLUDES(streamBuffersMutex);
     void replayInto(const Recording& recording, std::int64_t start) REQUIRES(streamBuffersMutex);
     bool keepsStop(const Recording& recording) const REQUIRES(streamBuffersMutex);
     void startBehindStream(Recording& recording) REQUIRES(streamBuffersMutex);

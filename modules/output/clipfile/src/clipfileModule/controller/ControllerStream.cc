@@ -153,6 +153,7 @@ void Controller::StartStream(const std::shared_ptr<StreamData>& unit) {
         CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: REC START. 00:00:00:00. RTPTS = %lld. -> %lld",
                            wide(rtp), wide(kOpenStop));
     }
+    limitWaiting();
     const StatusChannel::Hold hold(getStatusChannel());
     MutexLock lock(streamBuffersMutex);
     // A new recording closes every open one at the same instant. One that has an end of its own waits for the

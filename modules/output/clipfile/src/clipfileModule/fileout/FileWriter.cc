@@ -163,9 +163,13 @@ bool FileWriter::outputFile(std::deque<std::shared_ptr<ChunkData>>& deque) {
         // measured counts 2^64 - 1 bytes, which no disk has: the sum must not run over.
         const bool hasRoom = freeSpace >= minFreeSpaceWrite && freeSpace - minFreeSpaceWrite >= boxSize;
         if (failed(hasRoom, QxFailure::kDiskFull, [&] {
-                // Contract: free-space-two-spellings. "freespace" for a chunk, "free space" for a file.
-                CLIPFILE_LOG(LOG_PRIORITY_ERROR, "no disk freespace. %llu.",
-                             static_cast<unsigned long long>(freeSpace));
+                if (boxSize == Mp4Muxer::kUnmeasured && settings_.recordRules == RecordRules::kExact) {
+                    CLIPFILE_LOG(LOG_PRIORITY_ERROR, "mp4 box size could not be measured.");
+                } else {
+                    // Contract: free-space-two-spellings. "freespace" for a chunk, "free space" for a file.
+                    CLIPFILE_LOG(LOG_PRIORITY_ERROR, "no disk freespace. %llu.",
+                                 static_cast<unsigned long long>(freeSpace));
+                }
             })) {
             return true;
         }
