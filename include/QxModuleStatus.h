@@ -38,7 +38,7 @@ inline constexpr int kOffline = 26;
 
 /// Causes of status 7.
 namespace QxFailure {
-/// No output path is known, or there is no memory for a file.
+/// No output path is known, or there is no memory for a file; with exact record rules also no thread.
 inline constexpr int kInitialize = 2;
 /// The logon for a share failed.
 inline constexpr int kLogon = 21;

@@ -52,4 +52,11 @@ void CrashRecovery::Follow(const ModuleReport& report) {
     }
 }
 
+void CrashRecovery::End(const ModuleReport& report) {
+    if (recovery_) {
+        recovery_->Stop();
+    }
+    Follow(report);
+}
+
 }  // namespace receiver

@@ -24,6 +24,8 @@ class CrashRecovery {
     void LookAt(const SourceUnit& unit);
     /// Follows the files of the run, and tells what there is to tell.
     void Follow(const ModuleReport& report);
+    /// The run is over: stops what goes on in the background, and tells the rest.
+    void End(const ModuleReport& report);
     /// The operator agrees to what was asked. False when nothing was.
     bool Agree() { return recovery_ && recovery_->Agree(); }
 

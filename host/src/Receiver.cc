@@ -121,6 +121,9 @@ void Running::PrepareOutput(const OutputPlace& place) {
         display_.Notice("made the output folder " + place.folder);
     }
     ExpectDatedFolders(*folder_, place.prefix, std::time(nullptr));
+    if (const std::string leftover = folder_->TakeLeftover(); !leftover.empty()) {
+        display_.Notice(leftover);
+    }
     if (const auto warning = SetUpLog(options_, place)) {
         display_.Notice(*warning);
     }
@@ -191,6 +194,7 @@ ExitCode Running::Record(const SourceOpener& open) {
     commands_.Close("the run is over");
     plan_.Finish();
     TellMissed();
+    recovery_->End(report_);
     Summary summary = Summarise(*source, *recorderSettings.past);
     if (failure) {
         summary.exitCode = failure->Code();
@@ -248,6 +252,9 @@ void Running::CheckFolder() {
     if (const std::optional<std::string> warning = watch_->TakeWarning()) {
         display_.Notice("tomorrow nothing can be recorded: " + *warning);
     }
+    if (const std::optional<std::string> leftover = watch_->TakeLeftover()) {
+        display_.Notice(*leftover);
+    }
     const std::string obstacle = watch_->Obstacle();
     if (!obstacle.empty()) {
         throw ReceiverError(ExitCode::kOutput, obstacle);
@@ -280,6 +287,7 @@ bool Running::QuitAsked() {
         return false;
     }
     run->TakeKeys();
+    run->recovery_->Follow(run->report_);
     return run->quit_ || run->signals_.QuitRequested();
 }
 

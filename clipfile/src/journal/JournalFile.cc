@@ -121,7 +121,10 @@ std::optional<Journal> ReadJournal(const fs::path& path) {
 JournalFile::JournalFile(const fs::path& folder) : path_(folder / RandomName()) {}
 
 std::optional<JournalFile> JournalFile::Claim(const fs::path& path) {
-    Descriptor descriptor(OpenJournal(path, O_RDONLY));
+    // Some file systems lock what may be written alone (flock(2), NFS).
+    Descriptor writable(OpenJournal(path, O_RDWR));
+    Descriptor descriptor(writable.Get() < 0 && errno == EACCES ? OpenJournal(path, O_RDONLY)
+                                                                : writable.Release());
     // Its holder may have put another one in its place between opening and locking.
     if (descriptor.Get() < 0 || flock(descriptor.Get(), LOCK_EX | LOCK_NB) != 0 ||
         !IsFileAt(descriptor.Get(), path)) {

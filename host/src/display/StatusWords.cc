@@ -23,7 +23,7 @@ const std::map<std::pair<int, int>, const char*>& Words() {
          "more than 600 metadata units wait for the other media"},
         {{QxStatus::kStreamFault, QxStreamFault::kOffline}, "the host went offline while a recording ran"},
         {{QxStatus::kFailed, QxFailure::kInitialize},
-         "no output path is set, or there is no memory for a file"},
+         "no output path is set, or there is no memory or no thread"},
         {{QxStatus::kFailed, QxFailure::kLogon}, "the credentials for a share were refused"},
         {{QxStatus::kFailed, QxFailure::kFreeSpaceUnknown},
          "the free space of the output path cannot be read"},

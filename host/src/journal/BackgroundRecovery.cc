@@ -124,6 +124,13 @@ BackgroundRecovery::BackgroundRecovery(const fs::path& folder, RecoverMode mode,
     : state_(std::make_shared<State>(folder, mode, program)), thread_([state = state_] { run(*state); }) {}
 
 BackgroundRecovery::~BackgroundRecovery() {
+    Stop();
+}
+
+void BackgroundRecovery::Stop() {
+    if (!thread_.joinable()) {
+        return;
+    }
     bool ended = false;
     {
         std::unique_lock lock(state_->mutex);

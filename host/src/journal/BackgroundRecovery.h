@@ -18,12 +18,13 @@ class BackgroundRecovery {
     /// Begins at once. With `kAsk` files are recovered once `Agree` is called, with `kNo` never.
     BackgroundRecovery(const std::filesystem::path& folder, RecoverMode mode,
                        const std::filesystem::path& program = DefaultProgram());
-    /// Stops a recovery that is going on; the next receiver begins it again. One that a disk holds up is left
-    /// to itself.
     ~BackgroundRecovery();
     BackgroundRecovery(const BackgroundRecovery&) = delete;
     BackgroundRecovery& operator=(const BackgroundRecovery&) = delete;
 
+    /// Stops a recovery that is going on; the next receiver begins it again. One that a disk holds up is left
+    /// to itself. The destructor does so too.
+    void Stop();
     /// The operator wants what was asked. False when nothing was.
     bool Agree();
     /// What an operator should know, since the last call: sentences without full stop.
