@@ -4,6 +4,7 @@
 #include <algorithm>
 #include <system_error>
 
+#include "QxModuleStatus.h"
 #include "buffer/ChunkTimeline.h"
 #include "buffer/StartInStep.h"
 #include "buffer/StreamBuffer.h"
@@ -34,7 +35,7 @@ void StreamBuffer::endWithoutThread() {
         }
         changeState(std::make_shared<ErrorCacheState>(this));
     }
-    controller->SetStatus(7, 26);
+    controller->SetStatus(QxStatus::kFailed, QxFailure::kNoFirstChunk);
     NotifyEndSync();
 }
 
