@@ -10,7 +10,7 @@
 #include <cstring>
 #include <vector>
 
-#include "boxlib/context.h"
+#include "boxlib/core/context.h"
 #include "boxlib/mbx.h"
 #include "boxlib/mbx_stdio.h"
 

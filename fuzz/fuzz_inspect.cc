@@ -5,7 +5,9 @@
 #include "inspect/BoxTree.h"
 #include "inspect/Inspection.h"
 #include "inspect/JsonReport.h"
+#include "inspect/Plot.h"
 #include "inspect/TextReport.h"
+#include "inspect/Thumbnails.h"
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
     const MemoryFile memory(data, size);
@@ -18,6 +20,8 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
         const clipfile::Inspection inspection = clipfile::Inspect(file);
         clipfile::PrintText(out, inspection);
         clipfile::ToJson(inspection);
+        clipfile::PrintPlot(out, file, inspection);
+        clipfile::MakeThumbnails(file, inspection);
     } catch (const clipfile::ToolError&) {
         return 0;
     }

@@ -1,17 +1,25 @@
 #include "Program.h"
 
 #include <CLI/CLI.hpp>
+#include <cerrno>
+#include <cstdio>
 #include <exception>
 #include <filesystem>
 #include <functional>
 #include <nlohmann/json.hpp>
+#include <sstream>
+#include <string_view>
+#include <system_error>
 
 #include "inspect/BoxTree.h"
 #include "inspect/Inspection.h"
 #include "inspect/JsonReport.h"
+#include "inspect/Plot.h"
 #include "inspect/TextReport.h"
+#include "inspect/Thumbnails.h"
 #include "reader/Folder.h"
 #include "recover/Recovery.h"
+#include "recover/Unattended.h"
 #include "recover/UnfinishedFiles.h"
 #include "verify/Verification.h"
 
@@ -19,6 +27,7 @@ namespace clipfile {
 
 namespace {
 
+namespace fs = std::filesystem;
 using Json = nlohmann::ordered_json;
 
 /// Options as they stand on the command line.
@@ -27,7 +36,10 @@ struct Options {
     bool json = false;
     bool boxes = false;
     std::size_t rows = 4;
+    std::string plot;
+    std::string thumbnails;
     RecoveryOptions recovery;
+    bool unattended = false;
     bool deep = false;
 };
 
@@ -85,16 +97,40 @@ ExitCode ForEachFile(const Options& options, std::ostream& out, std::ostream& er
     return result;
 }
 
+/// Writes a file that is not there yet.
+void WriteNew(const std::string& path, std::string_view bytes) {
+    std::FILE* const file = std::fopen(path.c_str(), "wbxe");
+    bool isWritten = file != nullptr && std::fwrite(bytes.data(), 1, bytes.size(), file) == bytes.size();
+    isWritten = (file == nullptr || std::fclose(file) == 0) && isWritten;
+    if (!isWritten) {
+        throw ToolError(ExitCode::kUnreadable,
+                        path + " cannot be written: " + std::generic_category().message(errno) + ".");
+    }
+}
+
+/// What `inspect` draws, besides what it tells.
+void Draw(const InputFile& file, const Inspection& inspection, const Options& options) {
+    if (!options.plot.empty()) {
+        std::ostringstream plot;
+        PrintPlot(plot, file, inspection);
+        WriteNew(options.plot, plot.str());
+    }
+    if (!options.thumbnails.empty()) {
+        const std::vector<unsigned char> png = MakeThumbnails(file, inspection);
+        WriteNew(options.thumbnails, {reinterpret_cast<const char*>(png.data()), png.size()});
+    }
+}
+
 ExitCode InspectFile(const std::string& path, const Options& options, std::ostream& out) {
     const InputFile file(path);
     if (options.boxes && options.json) {
         PrintJson(out, {{"file", path}, {"boxes", BoxesToJson(file, options.rows)}});
     } else if (options.boxes) {
         PrintBoxes(out, file, options.rows);
-    } else if (options.json) {
-        PrintJson(out, ToJson(Inspect(file)));
     } else {
-        PrintText(out, Inspect(file));
+        const Inspection inspection = Inspect(file);
+        options.json ? PrintJson(out, ToJson(inspection)) : PrintText(out, inspection);
+        Draw(file, inspection, options);
     }
     return ExitCode::kSuccess;
 }
@@ -112,8 +148,26 @@ void TellLockFault(const std::string& path, const RecoveryResult& result, const 
     }
 }
 
+/// Why a file that was to take the place of its original stands beside it.
+void TellDefects(const std::string& path, const RecoveryResult& result, const Options& options,
+                 std::ostream& out) {
+    if (!options.unattended || options.json || !result.isRecovered || result.written == fs::absolute(path)) {
+        return;
+    }
+    out << path << " stays beside it: ";
+    if (result.defects.empty()) {
+        out << "behind its last whole picture there is more than a chunk.\n";
+    } else {
+        out << "the recovered file has " << Plural(result.defects.size(), "defect")
+            << ", the first is: " << result.defects.front() << '\n';
+    }
+}
+
 ExitCode RecoverOne(const std::string& path, const Options& options, std::ostream& out,
                     std::ostream& errors) {
+    if (options.unattended) {
+        CheckRoom(path);
+    }
     const RecoveryResult result = RecoverFile(path, options.recovery);
     TellLockFault(path, result, options, errors);
     if (options.json) {
@@ -125,7 +179,8 @@ ExitCode RecoverOne(const std::string& path, const Options& options, std::ostrea
                         {"metadata_units", result.metadataUnits},
                         {"bytes_left", result.bytesLeft},
                         {"parameter_sets", result.parameterSets},
-                        {"lock_fault", result.lockFault}});
+                        {"lock_fault", result.lockFault},
+                        {"defects", result.defects}});
     } else if (!result.isRecovered) {
         out << path << " is closed: nothing to recover.\n";
     } else {
@@ -137,6 +192,7 @@ ExitCode RecoverOne(const std::string& path, const Options& options, std::ostrea
         }
         out << "; " << Plural(result.bytesLeft, "byte") << " behind them belong to nothing whole.\n";
     }
+    TellDefects(path, result, options, out);
     return ExitCode::kSuccess;
 }
 
@@ -156,7 +212,12 @@ void PassOverRecovered(Options& found, std::ostream& out) {
 /// Files as they are, and of folders the recordings in them that are not closed.
 ExitCode Recover(const std::string& path, const Options& options, std::ostream& out, std::ostream& errors) {
     if (!IsFolder(path)) {
-        return RecoverOne(path, options, out, errors);
+        Options one = options;
+        one.files = {path};
+        if (options.unattended) {
+            PassOverRecovered(one, out);
+        }
+        return one.files.empty() ? ExitCode::kSuccess : RecoverOne(path, options, out, errors);
     }
     FolderListing listing = UnfinishedIn(path);
     const ExitCode searched = TellFaults(path, listing, options, out, errors);
@@ -226,11 +287,17 @@ void AddInspect(CLI::App& app, Options& options) {
     CLI::App* const command =
         app.add_subcommand("inspect", "Tell what is in recordings, closed or unfinished.");
     command->add_option("FILE", options.files, "Recordings")->required();
-    command->add_flag(
+    CLI::Option* const boxes = command->add_flag(
         "--boxes", options.boxes,
         "List the boxes of any MP4 file, with offsets, and fields by their names in the standard");
     command->add_option("--rows", options.rows, "Rows of each table that --boxes shows")
         ->capture_default_str();
+    command
+        ->add_option("--plot", options.plot,
+                     "Draw sizes of pictures, groups, and times of chunks into a new file (SVG)")
+        ->excludes(boxes);
+    command->add_option("--thumbnails", options.thumbnails, "Put pictures of the file into a new file (PNG)")
+        ->excludes(boxes);
     command->add_flag("--json", options.json, "One JSON object a file and line");
 }
 
@@ -253,10 +320,16 @@ CLI::App* AddRecover(CLI::App& app, Options& options) {
     CLI::Option* const output =
         command->add_option("--output", options.recovery.output, "Folder for the recovered files")
             ->check(CLI::ExistingDirectory);
+    CLI::Option* const inPlace = command
+                                     ->add_flag("--in-place", options.recovery.inPlace,
+                                                "Put each recovered file in the place of its original")
+                                     ->excludes(output);
     command
-        ->add_flag("--in-place", options.recovery.inPlace,
-                   "Put each recovered file in the place of its original")
-        ->excludes(output);
+        ->add_flag("--unattended", options.unattended,
+                   "Beside a running recorder: give way to it, and put a recovered file in the place of its "
+                   "original when verify --deep finds nothing wrong with it, else beside")
+        ->excludes(output)
+        ->excludes(inPlace);
     command->add_flag("--json", options.json, "One JSON object a file and line");
     return command;
 }
@@ -275,6 +348,14 @@ ExitCode RunProgram(const std::vector<std::string>& arguments, std::ostream& out
         app.parse(reversed);
     } catch (const CLI::ParseError& error) {
         return app.exit(error, out, errors) == 0 ? ExitCode::kSuccess : ExitCode::kUsage;
+    }
+    if (options.files.size() > 1 && !(options.plot + options.thumbnails).empty()) {
+        errors << "clipfile: --plot and --thumbnails go with one file.\n";
+        return ExitCode::kUsage;
+    }
+    if (options.unattended) {
+        GiveWay();
+        options.recovery.verify = [](const fs::path& path) { return VerifyFile(path, true).defects; };
     }
     if (verify->parsed()) {
         return Verify(options, out, errors);

@@ -1,9 +1,15 @@
 #include "Program.h"
 
 #include <gtest/gtest.h>
+#include <sys/resource.h>
+#include <sys/wait.h>
+#include <unistd.h>
 
+#include <algorithm>
 #include <fstream>
 #include <nlohmann/json.hpp>
+#include <regex>
+#include <set>
 #include <sstream>
 
 #include "support/ByteFile.h"
@@ -21,6 +27,28 @@ class ProgramTest : public testing::Test {
         errors_.str("");
         return RunProgram(arguments, out_, errors_);
     }
+    /// In a process of its own, which writes into a file.
+    ExitCode runApart(const std::vector<std::string>& arguments) {
+        const pid_t child = fork();
+        if (child == 0) {
+            const ExitCode code = run(arguments);
+            std::ofstream(log_) << out_.str() << errors_.str();
+            _exit(static_cast<int>(code));
+        }
+        int status = 0;
+        EXPECT_EQ(wait4(child, &status, 0, &usage_), child);
+        EXPECT_TRUE(WIFEXITED(status));
+        return static_cast<ExitCode>(WEXITSTATUS(status));
+    }
+    /// Kilobytes in memory at most, those of this process included.
+    long memoryOf(const std::vector<std::string>& arguments) {
+        runApart(arguments);
+        return usage_.ru_maxrss;
+    }
+    std::string said() const {
+        std::ifstream in(log_);
+        return {std::istreambuf_iterator<char>(in), {}};
+    }
     std::string path(const std::string& name) const { return (folder_.Path() / name).string(); }
     void recordNormal(const std::string& name, bool close = true) const {
         test_stream::Record(path(name), {"normal", clipfileModule::RecordRules::kExact, close},
@@ -28,9 +56,33 @@ class ProgramTest : public testing::Test {
     }
 
     TempDir folder_;
+    TempDir logs_;
+    rusage usage_ = {};
+    std::filesystem::path log_ = logs_.Path() / "said";
     std::ostringstream out_;
     std::ostringstream errors_;
 };
+
+TEST_F(ProgramTest, TheManPageHasEachOption) {
+    std::string help;
+    for (const char* const command : {"inspect", "verify", "recover"}) {
+        EXPECT_EQ(run({command, "--help"}), ExitCode::kSuccess);
+        help += out_.str();
+    }
+    const test_stream::Data bytes = test_stream::ReadAll(CLIPFILE_MAN_PAGE);
+    std::string page(bytes.begin(), bytes.end());
+    // Its hyphens are "\-".
+    std::erase(page, '\\');
+    const std::regex option("--[a-z][-a-z]*");
+    const auto optionsIn = [&](const std::string& text) {
+        return std::set<std::string>(std::sregex_token_iterator(text.begin(), text.end(), option),
+                                     std::sregex_token_iterator());
+    };
+    std::set<std::string> expected = optionsIn(help);
+    expected.erase("--help");
+    EXPECT_EQ(optionsIn(page), expected);
+    EXPECT_GT(expected.size(), 9U);
+}
 
 TEST_F(ProgramTest, MistakesOfTheCommandLineHaveACodeOfTheirOwn) {
     EXPECT_EQ(run({}), ExitCode::kUsage);
@@ -41,29 +93,73 @@ TEST_F(ProgramTest, MistakesOfTheCommandLineHaveACodeOfTheirOwn) {
     EXPECT_NE(out_.str().find("inspect"), std::string::npos);
 }
 
-TEST_F(ProgramTest, WhatIsNoRecordingIsToldInASentence) {
+class HostileInputTest : public ProgramTest, public testing::WithParamInterface<const char*> {};
+
+INSTANTIATE_TEST_SUITE_P(Commands, HostileInputTest, testing::Values("inspect", "verify", "recover"),
+                         [](const auto& instance) { return std::string(instance.param); });
+
+TEST_P(HostileInputTest, WhatIsNoRecordingIsToldInASentence) {
     const std::string empty = path("empty.MP4");
-    const std::string zeros = path("zeros.MP4");
+    const std::string text = path("text.MP4");
     const std::string foreign = path("foreign.MP4");
+    const std::string broken = path("broken.MP4");
     const std::string missing = path("missing.MP4");
     std::ofstream(empty).close();
-    std::ofstream(zeros).close();
-    std::filesystem::resize_file(zeros, 10'000'000'000);
+    std::ofstream(text) << "This is the text of a person, and longer than the head of a box.";
     test_stream::WriteAll(foreign, byte_file::Join({byte_file::MakeBox("ftyp", {byte_file::Text("isom")}),
                                                     byte_file::MakeBox("mdat", {byte_file::Words({1})})}));
+    recordNormal("broken.MP4", false);
+    // The length of `VPRF` in the profile: 10 bytes, where it has 52.
+    test_stream::Data bytes = test_stream::ReadAll(broken);
+    const std::string type = "VPRF";
+    const auto at = std::search(bytes.begin(), bytes.end(), type.begin(), type.end());
+    ASSERT_NE(at, bytes.end());
+    *(at - 1) = 10;
+    test_stream::WriteAll(broken, bytes);
+    const std::string place = std::to_string(at - bytes.begin() - 4);
     const std::pair<std::string, std::string> cases[] = {
         {empty, empty + " is empty."},
-        {folder_.Path().string(), folder_.Path().string() + " is a folder, not a file."},
-        {zeros, zeros + " is no MP4 file."},
+        {text, text + " is no MP4 file."},
         {foreign, foreign + " is an MP4 file, but none of this recorder: it lacks its profile."},
+        {broken, broken + " has a broken profile: 'VPRF' at " + place + " is too short."},
         {missing, missing + " does not exist."},
         {"/dev/null", "/dev/null is no regular file."},
     };
     for (const auto& [file, sentence] : cases) {
-        EXPECT_EQ(run({"inspect", file}), ExitCode::kUnreadable) << file;
+        EXPECT_EQ(run({GetParam(), file}), ExitCode::kUnreadable) << file;
         EXPECT_EQ(out_.str(), "");
         EXPECT_EQ(errors_.str(), "clipfile: " + sentence + "\n");
     }
+}
+
+TEST_P(HostileInputTest, GigabytesOfZerosTakeNoMemory) {
+    const std::string zeros = path("zeros.MP4");
+    const std::string torn = path("01_02_03_04.MP4");
+    std::ofstream(zeros).close();
+    recordNormal("01_02_03_04.MP4", false);
+    const long unused = memoryOf({"--help"});
+    for (const std::string& file : {zeros, torn}) {
+        std::filesystem::resize_file(file, 10'000'000'000);
+        // What the address sanitizer keeps of freed memory comes on top.
+        constexpr long kFlat = 300'000;
+        EXPECT_LT(memoryOf({GetParam(), file}) - unused, kFlat) << file;
+        EXPECT_NE(said(), "");
+    }
+    EXPECT_EQ(runApart({GetParam(), zeros}), ExitCode::kUnreadable);
+    EXPECT_EQ(said(), "clipfile: " + zeros + " is no MP4 file.\n");
+}
+
+TEST_F(ProgramTest, AFolderIsNoFileToInspect) {
+    EXPECT_EQ(run({"inspect", folder_.Path().string()}), ExitCode::kUnreadable);
+    EXPECT_EQ(errors_.str(), "clipfile: " + folder_.Path().string() + " is a folder, not a file.\n");
+}
+
+TEST_F(ProgramTest, ReadingAllZerosTakesNoMemoryEither) {
+    recordNormal("01_02_03_04.MP4");
+    const long unused = memoryOf({"--help"});
+    std::filesystem::resize_file(path("01_02_03_04.MP4"), 10'000'000'000);
+    EXPECT_LT(memoryOf({"verify", "--deep", path("01_02_03_04.MP4")}) - unused, 300'000);
+    EXPECT_NE(said(), "");
 }
 
 TEST_F(ProgramTest, AFileThatCannotBeReadDoesNotKeepTheOthersBack) {
@@ -109,6 +205,22 @@ TEST_F(ProgramTest, BoxesOfARecordingNameTheirFields) {
     }
 }
 
+TEST_F(ProgramTest, DrawingsAreNewFilesBesideTheReport) {
+    test_stream::Record(path("a.MP4"), {"normal", clipfileModule::RecordRules::kExact, true},
+                        test_stream::MakeCodedStream(4));
+    EXPECT_EQ(run({"inspect", "--plot", path("a.svg"), "--thumbnails", path("a.png"), path("a.MP4")}),
+              ExitCode::kSuccess)
+        << errors_.str();
+    EXPECT_TRUE(out_.str().starts_with(path("a.MP4") + ": normal, closed"));
+    EXPECT_TRUE(std::filesystem::exists(path("a.svg")));
+    EXPECT_TRUE(std::filesystem::exists(path("a.png")));
+    const test_stream::Data before = test_stream::ReadAll(path("a.MP4"));
+    EXPECT_EQ(run({"inspect", "--plot", path("a.MP4"), path("a.MP4")}), ExitCode::kUnreadable);
+    EXPECT_EQ(errors_.str(), "clipfile: " + path("a.MP4") + " cannot be written: File exists.\n");
+    EXPECT_EQ(test_stream::ReadAll(path("a.MP4")), before);
+    EXPECT_EQ(run({"inspect", "--plot", path("b.svg"), path("a.MP4"), path("a.MP4")}), ExitCode::kUsage);
+}
+
 TEST_F(ProgramTest, DefectsAreALineEachAndACode) {
     recordNormal("01_02_03_04.MP4");
     EXPECT_EQ(run({"verify", path("01_02_03_04.MP4")}), ExitCode::kSuccess);
@@ -133,6 +245,43 @@ TEST_F(ProgramTest, RecoveryTellsWhatItHasWritten) {
                               path("a.recovered.MP4") + "; 0 bytes behind them belong to nothing whole.\n");
     EXPECT_EQ(run({"recover", path("a.recovered.MP4")}), ExitCode::kSuccess);
     EXPECT_EQ(out_.str(), path("a.recovered.MP4") + " is closed: nothing to recover.\n");
+}
+
+TEST_F(ProgramTest, UnattendedRecoveryPutsAVerifiedFileInThePlaceOfItsOriginal) {
+    const std::string file = path("01_02_03_04.MP4");
+    test_stream::Record(file, {"fragment", clipfileModule::RecordRules::kExact, false},
+                        test_stream::MakeCodedStream(32));
+    // A process of its own, since it gives way for good.
+    EXPECT_EQ(runApart({"recover", "--unattended", file}), ExitCode::kSuccess);
+    EXPECT_EQ(run({"verify", "--deep", file}), ExitCode::kSuccess);
+    EXPECT_EQ(out_.str(), "");
+    EXPECT_EQ(std::distance(std::filesystem::directory_iterator(folder_.Path()), {}), 1);
+}
+
+TEST_F(ProgramTest, UnattendedRecoveryLeavesAFileWithDefectsBesideItsOriginal) {
+    // No decoder takes its audio.
+    test_stream::Record(path("01_02_03_04.MP4"), {"fragment", clipfileModule::RecordRules::kExact, false},
+                        test_stream::MakePlainStream(32));
+    EXPECT_EQ(runApart({"recover", "--unattended", path("01_02_03_04.MP4")}), ExitCode::kSuccess);
+    EXPECT_NE(said().find(path("01_02_03_04.MP4") + " stays beside it: the recovered file has "),
+              std::string::npos)
+        << said();
+    EXPECT_TRUE(std::filesystem::exists(path("01_02_03_04.recovered.MP4")));
+    EXPECT_EQ(run({"verify", path("01_02_03_04.MP4")}), ExitCode::kDefects);
+    EXPECT_EQ(runApart({"recover", "--unattended", path("01_02_03_04.MP4")}), ExitCode::kSuccess);
+    EXPECT_EQ(said(), path("01_02_03_04.MP4") + " is passed over: " + path("01_02_03_04.recovered.MP4") +
+                          " is there already.\n");
+}
+
+TEST_F(ProgramTest, UnattendedRecoveryGivesWay) {
+    int level = 0;
+    const pid_t child = fork();
+    if (child == 0) {
+        run({"recover", "--unattended", path("missing.MP4")});
+        _exit(getpriority(PRIO_PROCESS, 0));
+    }
+    ASSERT_EQ(waitpid(child, &level, 0), child);
+    EXPECT_EQ(WEXITSTATUS(level), 19);
 }
 
 TEST_F(ProgramTest, RecoveryOfAFolderPassesOverWhatIsRecoveredAlready) {

@@ -10,6 +10,7 @@
 #include <utility>
 #include <vector>
 
+#include "CrashRecovery.h"
 #include "GroupWatch.h"
 #include "ModuleReport.h"
 #include "Recorder.h"
@@ -90,6 +91,7 @@ class Running final : public SourceListenerInterface {
     Keyboard keyboard_;
     std::unique_ptr<OutputFolder> folder_;
     std::optional<FolderWatch> watch_;
+    std::optional<CrashRecovery> recovery_;
     ModuleLog* log_ = nullptr;
     Host* host_ = nullptr;
     RecordPlan plan_{options_.record};
@@ -126,6 +128,7 @@ void Running::PrepareOutput(const OutputPlace& place) {
         display_.Notice(*warning);
     }
     watch_.emplace(OpenOutputFolder(place), place.prefix);
+    recovery_.emplace(options_, place, display_, keyboard_.IsThere());
 }
 
 ExitCode Running::Record(const SourceOpener& open) {
@@ -157,6 +160,7 @@ ExitCode Running::Record(const SourceOpener& open) {
         recorderSettings.frameRate = source->Description().frameRate;
         hosts.push_back(std::make_unique<Host>(ParametersOf(options_, place, source->Description())));
         host_ = hosts.back().get();
+        recovery_->Describe(source->Description());
         ModuleSession session(library.Module(), *host_);
         if (options_.mode == OutputMode::kSync) {
             session.GoOnline();
@@ -182,6 +186,7 @@ ExitCode Running::Record(const SourceOpener& open) {
         session.End();
         report_.Tell(log.TakeEvents());
         report_.Tell(host_->TakeStatuses(), true);
+        recovery_->Follow(report_);
         recorderSettings.past = recorder.Past();
         plan_.Interrupt();
     } while (changed_ && !host_->Failed());
@@ -189,6 +194,7 @@ ExitCode Running::Record(const SourceOpener& open) {
     commands_.Close("the run is over");
     plan_.Finish();
     TellMissed();
+    recovery_->End(report_);
     Summary summary = Summarise(*source, *recorderSettings.past);
     if (failure) {
         summary.exitCode = failure->Code();
@@ -209,6 +215,7 @@ void Running::Loop(SourceInterface& source, Recorder& recorder) {
         }
         if (result == SourceInterface::Result::kUnit) {
             rates_.Count(unit);
+            recovery_->LookAt(unit);
             if (const auto notice = groups_ ? groups_->Look(unit) : std::nullopt) {
                 display_.Notice(*notice);
             }
@@ -227,6 +234,8 @@ void Running::Loop(SourceInterface& source, Recorder& recorder) {
         TakeCommands(recorder);
         TellChanges(recorder);
         TellMissed();
+        report_.Tell(log_->TakeEvents());
+        recovery_->Follow(report_);
         if (recorder.Finishing()) {
             finishSince_ = finishSince_.value_or(Clock::now());
             if (recorder.Done() || Clock::now() - *finishSince_ > kFinishPatience) {
@@ -278,6 +287,7 @@ bool Running::QuitAsked() {
         return false;
     }
     run->TakeKeys();
+    run->recovery_->Follow(run->report_);
     return run->quit_ || run->signals_.QuitRequested();
 }
 
@@ -301,6 +311,11 @@ void Running::TakeKey(char key) {
         case 'q':
             quit_ = true;
             break;
+        case 'y':
+            if (recovery_ && recovery_->Agree()) {
+                break;
+            }
+            [[fallthrough]];
         default:
             display_.Notice("keys: r records, s stops, n goes on in a new file, q ends");
             break;
@@ -345,7 +360,6 @@ void Running::TellLateStops(const Recorder& recorder) {
 
 void Running::Show(const SourceInterface& source, const Recorder& recorder) {
     shown_ = Clock::now();
-    report_.Tell(log_->TakeEvents());
     report_.Tell(host_->TakeStatuses(), false);
     Snapshot snapshot;
     snapshot.timecode = recorder.LastTimecode();

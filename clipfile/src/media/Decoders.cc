@@ -1,64 +1,12 @@
 #include "media/Decoders.h"
 
 #include <algorithm>
-#include <cstring>
-#include <new>
 
-#include "media/NalUnits.h"
-
-extern "C" {
-#include <libavcodec/avcodec.h>
-}
+#include "media/Libav.h"
 
 namespace clipfile {
 
-// Not in the unnamed namespace: `AudioFrameFinder::Decoder` holds them.
-struct FreeContext {
-    void operator()(AVCodecContext* context) const { avcodec_free_context(&context); }
-};
-struct FreePacket {
-    void operator()(AVPacket* packet) const { av_packet_free(&packet); }
-};
-struct FreeFrame {
-    void operator()(AVFrame* frame) const { av_frame_free(&frame); }
-};
-using Context = std::unique_ptr<AVCodecContext, FreeContext>;
-using Packet = std::unique_ptr<AVPacket, FreePacket>;
-using Frame = std::unique_ptr<AVFrame, FreeFrame>;
-
 namespace {
-
-/// A decoder that calls every fault a failure.
-Context OpenDecoder(AVCodecID id, Bytes extradata) {
-    // What does not decode is an answer here, nothing to report.
-    av_log_set_level(AV_LOG_QUIET);
-    const AVCodec* const codec = avcodec_find_decoder(id);
-    Context context(avcodec_alloc_context3(codec));
-    if (codec == nullptr || context == nullptr) {
-        throw std::bad_alloc();
-    }
-    context->extradata =
-        static_cast<std::uint8_t*>(av_mallocz(extradata.size() + AV_INPUT_BUFFER_PADDING_SIZE));
-    if (context->extradata == nullptr) {
-        throw std::bad_alloc();
-    }
-    std::copy(extradata.begin(), extradata.end(), context->extradata);
-    context->extradata_size = static_cast<int>(extradata.size());
-    context->err_recognition = AV_EF_EXPLODE | AV_EF_BITSTREAM | AV_EF_BUFFER;
-    context->thread_count = 1;
-    if (avcodec_open2(context.get(), codec, nullptr) < 0) {
-        return nullptr;
-    }
-    return context;
-}
-
-void Fill(AVPacket& packet, Bytes bytes) {
-    av_packet_unref(&packet);
-    if (av_new_packet(&packet, static_cast<int>(bytes.size())) < 0) {
-        throw std::bad_alloc();
-    }
-    std::copy(bytes.begin(), bytes.end(), packet.data);
-}
 
 /// Bytes that were left in front of the decoder when it began with the frame.
 std::size_t LeftBefore(const AVFrame& frame) {
@@ -120,26 +68,9 @@ std::size_t AudioFrameFinder::FindEnd(Bytes bytes) {
 }
 
 bool DecodesWith(const ParameterSets& sets, Bytes picture, int width, int height) {
-    static constexpr unsigned char kStartCode[] = {0, 0, 0, 1};
-    std::vector<unsigned char> extradata;
-    for (const auto* const set : {&sets.sps, &sets.pps}) {
-        extradata.insert(extradata.end(), std::begin(kStartCode), std::end(kStartCode));
-        extradata.insert(extradata.end(), set->begin(), set->end());
-    }
-    const Context context = OpenDecoder(AV_CODEC_ID_H264, extradata);
-    const Packet packet(av_packet_alloc());
-    const Frame frame(av_frame_alloc());
-    if (context == nullptr) {
-        return false;
-    }
-    Fill(*packet, ToByteStream(picture));
-    if (avcodec_send_packet(context.get(), packet.get()) < 0 ||
-        avcodec_send_packet(context.get(), nullptr) < 0 ||
-        avcodec_receive_frame(context.get(), frame.get()) < 0) {
-        return false;
-    }
-    return frame->decode_error_flags == 0 && (frame->flags & AV_FRAME_FLAG_CORRUPT) == 0 &&
-           frame->width == width && frame->height == height;
+    const Frame frame = DecodePicture(sets, picture);
+    return frame != nullptr && frame->decode_error_flags == 0 &&
+           (frame->flags & AV_FRAME_FLAG_CORRUPT) == 0 && frame->width == width && frame->height == height;
 }
 
 }  // namespace clipfile

@@ -12,6 +12,15 @@ ToolError NotOurs(const InputFile& file, const std::string& what) {
     return {ExitCode::kUnreadable, file.Path().string() + " " + what + "."};
 }
 
+std::optional<Profile> ProfileOf(const InputFile& file, const Box& uuid) {
+    try {
+        return ReadProfile(file, uuid);
+    } catch (const FormatError& error) {
+        throw ToolError(ExitCode::kUnreadable,
+                        file.Path().string() + " has a broken profile: " + error.what());
+    }
+}
+
 /// Reads what stands in front of the samples and returns where it ends.
 std::uint64_t ReadHead(const InputFile& file, Recording& recording) {
     BoxCursor cursor(file, 0, file.Size());
@@ -23,7 +32,7 @@ std::uint64_t ReadHead(const InputFile& file, Recording& recording) {
     if (ftyp->IsTorn() || !uuid || uuid->IsTorn()) {
         throw NotOurs(file, "ends before its first sample: nothing was recorded in it");
     }
-    const auto profile = ReadProfile(file, *uuid);
+    const auto profile = ProfileOf(file, *uuid);
     if (!profile || (profile->format != kNormalProfile && profile->format != kFragmentedProfile)) {
         throw NotOurs(file, "is an MP4 file, but none of this recorder: it lacks its profile");
     }

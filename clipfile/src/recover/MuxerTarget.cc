@@ -1,5 +1,7 @@
 #include "recover/MuxerTarget.h"
 
+#include <fcntl.h>
+
 #include <cerrno>
 #include <cstdlib>
 #include <ctime>
@@ -18,6 +20,7 @@ struct Target {
     std::filesystem::path path;
     clipfileModule::LocalTime opened;
     int error = 0;
+    std::uint64_t unsynchronized = 0;  // bytes
 };
 
 Target currentTarget;
@@ -29,8 +32,20 @@ MbxStatus Note(MbxStatus status) {
     return status;
 }
 
+/// Lets no more wait in memory for the disk than this, in bytes. Where much waits, the system holds up all
+/// who write to it, and a recorder may be among them.
+constexpr std::uint64_t kMaxUnsynchronized = 8'000'000;
+
 MbxStatus WriteFile(MbxFile* file, const void* buffer, std::uint64_t size, std::uint64_t* count) {
-    return Note(MbxStdioWrite(file, buffer, size, count));
+    const MbxStatus status = Note(MbxStdioWrite(file, buffer, size, count));
+    currentTarget.unsynchronized += size;
+    if (currentTarget.unsynchronized > kMaxUnsynchronized) {
+        currentTarget.unsynchronized = 0;
+        // A file system that cannot do this goes on without.
+        sync_file_range(fileno(file->stream), 0, 0,
+                        SYNC_FILE_RANGE_WAIT_BEFORE | SYNC_FILE_RANGE_WRITE | SYNC_FILE_RANGE_WAIT_AFTER);
+    }
+    return status;
 }
 
 MbxStatus SeekFile(MbxFile* file, std::int64_t offset, std::uint32_t origin) {
@@ -83,7 +98,7 @@ clipfileModule::LocalTime FromParts(const std::tm& parts) {
 }  // namespace
 
 MuxerTarget::MuxerTarget(const std::filesystem::path& path, const clipfileModule::LocalTime& opened) {
-    currentTarget = {path, opened, 0};
+    currentTarget = {path, opened, 0, 0};
 }
 
 MuxerTarget::~MuxerTarget() {

@@ -1,11 +1,14 @@
 #include "recover/NewFile.h"
 
 #include <fcntl.h>
+#include <signal.h>
 #include <unistd.h>
 
 #include <cerrno>
+#include <charconv>
 #include <cstdio>
 #include <string>
+#include <string_view>
 #include <system_error>
 
 #include "common/ToolError.h"
@@ -30,6 +33,41 @@ int SynchronizeDisk(const std::filesystem::path& path) {
     return error;
 }
 
+/// Some file systems cannot synchronize folders (fsync(2), EINVAL).
+void SynchronizeFolder(const std::filesystem::path& folder) {
+    if (const int error = SynchronizeDisk(folder); error != 0 && error != EINVAL) {
+        throw Unwritable(folder, error);
+    }
+}
+
+/// Its name, in front of the number of the process.
+std::string NameInWork(const std::filesystem::path& target) {
+    return "." + target.filename().string() + ".";
+}
+
+/// Whether a process has this number, as far as can be told.
+bool IsAlive(std::string_view number) {
+    pid_t process = 0;
+    const auto [end, error] = std::from_chars(number.data(), number.data() + number.size(), process);
+    const bool isNumber = error == std::errc() && end == number.data() + number.size() && process > 0;
+    return !isNumber || kill(process, 0) == 0 || errno != ESRCH;
+}
+
+/// What processes have left that were killed over the same work: as much as a recording, each time.
+void RemoveAbandoned(const std::filesystem::path& target) {
+    const std::string head = NameInWork(target);
+    std::error_code error;
+    const std::filesystem::path folder = target.has_parent_path() ? target.parent_path() : ".";
+    for (auto entry = std::filesystem::directory_iterator(folder, error);
+         !error && entry != std::filesystem::directory_iterator(); entry.increment(error)) {
+        const std::string name = entry->path().filename().string();
+        std::error_code ignored;
+        if (name.starts_with(head) && !IsAlive(std::string_view(name).substr(head.size()))) {
+            std::filesystem::remove(entry->path(), ignored);
+        }
+    }
+}
+
 /// As rename, but never over a file that is there.
 int RenameToFreeName(const char* path, const char* target) {
     const int result = renameat2(AT_FDCWD, path, AT_FDCWD, target, RENAME_NOREPLACE);
@@ -43,8 +81,9 @@ int RenameToFreeName(const char* path, const char* target) {
 }  // namespace
 
 NewFile::NewFile(const std::filesystem::path& target)
-    : target_(target),
-      path_(target.parent_path() / ("." + target.filename().string() + "." + std::to_string(getpid()))) {}
+    : target_(target), path_(target.parent_path() / (NameInWork(target) + std::to_string(getpid()))) {
+    RemoveAbandoned(target);
+}
 
 NewFile::~NewFile() {
     std::error_code ignored;
@@ -57,16 +96,22 @@ void NewFile::Synchronize() const {
     }
 }
 
+void MoveOver(const std::filesystem::path& path, const std::filesystem::path& target) {
+    if (std::rename(path.c_str(), target.c_str()) != 0) {
+        throw Unwritable(target, errno);
+    }
+    SynchronizeFolder(target.parent_path());
+}
+
 void NewFile::Keep(bool replaces) const {
-    const int result = replaces ? std::rename(path_.c_str(), target_.c_str())
-                                : RenameToFreeName(path_.c_str(), target_.c_str());
-    if (result != 0) {
+    if (replaces) {
+        MoveOver(path_, target_);
+        return;
+    }
+    if (RenameToFreeName(path_.c_str(), target_.c_str()) != 0) {
         throw Unwritable(target_, errno);
     }
-    // Some file systems cannot synchronize folders (fsync(2), EINVAL).
-    if (const int error = SynchronizeDisk(target_.parent_path()); error != 0 && error != EINVAL) {
-        throw Unwritable(target_.parent_path(), error);
-    }
+    SynchronizeFolder(target_.parent_path());
 }
 
 }  // namespace clipfile

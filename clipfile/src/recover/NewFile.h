@@ -4,7 +4,8 @@
 
 namespace clipfile {
 
-/// A file under a name of its own, beside its target, until it is complete. Removed when it never is.
+/// A file under a name of its own, beside its target, until it is complete. Removed when it never is: with
+/// this object, or, where its process was killed, by the next one for the same target.
 class NewFile {
  public:
     explicit NewFile(const std::filesystem::path& target);
@@ -23,5 +24,9 @@ class NewFile {
     std::filesystem::path target_;
     std::filesystem::path path_;
 };
+
+/// Puts a file in the place of another one of the same folder, for good. Throws `ToolError` when the system
+/// refuses.
+void MoveOver(const std::filesystem::path& path, const std::filesystem::path& target);
 
 }  // namespace clipfile

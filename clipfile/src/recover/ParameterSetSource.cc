@@ -4,6 +4,7 @@
 #include <exception>
 
 #include "common/ToolError.h"
+#include "journal/JournalFile.h"
 #include "reader/BigEndian.h"
 #include "reader/Recording.h"
 
@@ -12,6 +13,8 @@ namespace clipfile {
 namespace {
 
 constexpr std::size_t kSpsHead = 4;  // NAL header, profile, compatibility, level
+/// From a file up to the output folder of its receiver: prefix, date.
+constexpr int kFoldersAbove = 3;
 
 std::optional<ParameterSets> ReadSets(const InputFile& file) {
     const Recording recording = ReadRecording(file);
@@ -23,6 +26,32 @@ std::optional<ParameterSets> ReadSets(const InputFile& file) {
 }
 
 }  // namespace
+
+JournalSets::JournalSets(const std::filesystem::path& file) {
+    const std::filesystem::path absolute = std::filesystem::absolute(file).lexically_normal();
+    std::filesystem::path folder = absolute;
+    for (int i = 0; i < kFoldersAbove && folder.has_relative_path() && sets_.empty(); ++i) {
+        folder = folder.parent_path();
+        const std::string name = absolute.lexically_relative(folder).string();
+        for (const std::filesystem::path& path : JournalsIn(folder)) {
+            const auto journal = ReadJournal(path);
+            if (journal &&
+                std::find(journal->files.begin(), journal->files.end(), name) != journal->files.end()) {
+                journal_ = path;
+                sets_.assign(journal->sets.rbegin(), journal->sets.rend());
+            }
+        }
+    }
+}
+
+std::optional<ParameterSets> JournalSets::Next(const Profile&) {
+    if (sets_.empty()) {
+        return std::nullopt;
+    }
+    ParameterSets sets = std::move(sets_.back());
+    sets_.pop_back();
+    return sets;
+}
 
 std::optional<ParameterSets> LikeFile::Next(const Profile&) {
     if (isTaken_) {

@@ -20,6 +20,20 @@ class ParameterSetSource {
     virtual std::string Name() const = 0;
 };
 
+/// The sets that a receiver has noted about a file while it recorded it, in a journal in one of the folders
+/// above.
+class JournalSets : public ParameterSetSource {
+ public:
+    explicit JournalSets(const std::filesystem::path& file);
+    std::optional<ParameterSets> Next(const Profile& profile) override;
+    std::string Name() const override { return "the journal " + journal_.string(); }
+    bool IsEmpty() const { return sets_.empty(); }
+
+ private:
+    std::filesystem::path journal_;
+    std::vector<ParameterSets> sets_;  // the next at the back
+};
+
 /// The sets of one file, which a person has named.
 class LikeFile : public ParameterSetSource {
  public:

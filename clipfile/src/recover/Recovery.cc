@@ -73,6 +73,21 @@ std::vector<std::shared_ptr<nal_access::SampleData>> FirstPictures(ChunkSource& 
     return pictures;
 }
 
+/// Where parameter sets may be found, in the order in which they are tried.
+std::vector<std::unique_ptr<ParameterSetSource>> SetSources(const fs::path& path,
+                                                            const RecoveryOptions& options) {
+    std::vector<std::unique_ptr<ParameterSetSource>> sources;
+    if (auto journal = std::make_unique<JournalSets>(path); !journal->IsEmpty()) {
+        sources.push_back(std::move(journal));
+    }
+    if (!options.like.empty()) {
+        sources.push_back(std::make_unique<LikeFile>(options.like));
+    } else {
+        sources.push_back(std::make_unique<FolderFiles>(fs::absolute(path).parent_path(), path));
+    }
+    return sources;
+}
+
 /// Parameter sets that the pictures decode with, and where they were found.
 std::pair<ParameterSets, std::string> FindSets(const InputFile& file, const Recording& recording,
                                                ChunkSource& source, const RecoveryOptions& options) {
@@ -80,25 +95,24 @@ std::pair<ParameterSets, std::string> FindSets(const InputFile& file, const Reco
     if (pictures.empty()) {
         throw CannotRecover(file.Path(), "it has no picture that can be decoded by itself");
     }
-    std::unique_ptr<ParameterSetSource> sets;
-    if (!options.like.empty()) {
-        sets = std::make_unique<LikeFile>(options.like);
-    } else {
-        sets = std::make_unique<FolderFiles>(fs::absolute(file.Path()).parent_path(), file.Path());
-    }
-    while (auto candidate = sets->Next(recording.profile)) {
-        const bool fits =
-            FitsProfile(*candidate, recording.profile) &&
-            std::any_of(pictures.begin(), pictures.end(), [&](const auto& picture) {
-                return DecodesWith(
-                    *candidate, Bytes(picture->GetData(), static_cast<std::size_t>(picture->GetDataSize())),
-                    recording.profile.video->width, recording.profile.video->height);
-            });
-        if (fits) {
-            return {std::move(*candidate), sets->Name()};
+    const auto fits = [&](const ParameterSets& candidate) {
+        return FitsProfile(candidate, recording.profile) &&
+               std::any_of(pictures.begin(), pictures.end(), [&](const auto& picture) {
+                   return DecodesWith(
+                       candidate, Bytes(picture->GetData(), static_cast<std::size_t>(picture->GetDataSize())),
+                       recording.profile.video->width, recording.profile.video->height);
+               });
+    };
+    std::string tried;
+    for (const auto& sets : SetSources(file.Path(), options)) {
+        while (auto candidate = sets->Next(recording.profile)) {
+            if (fits(*candidate)) {
+                return {std::move(*candidate), sets->Name()};
+            }
         }
+        tried += (tried.empty() ? "" : " and of ") + sets->Name();
     }
-    throw CannotRecover(file.Path(), "the parameter sets of " + sets->Name() +
+    throw CannotRecover(file.Path(), "the parameter sets of " + tried +
                                          " fit none of its pictures; name a closed recording of the same "
                                          "stream with --like");
 }
@@ -158,17 +172,25 @@ void CheckWritten(const fs::path& path, const RecoveryResult& result) {
     }
 }
 
-/// A tear leaves less than a chunk behind. More than that may hold pictures, which replacing would lose.
-void CheckReplaceable(const InputFile& file, const Recording& recording, std::uint64_t position,
-                      std::uint64_t longestChunk) {
+/// Bytes behind the last whole picture which replacing the original would lose, where they are more than a
+/// tear leaves: less than a chunk. Else 0.
+std::uint64_t BytesAtRisk(const InputFile& file, const Recording& recording, std::uint64_t position,
+                          std::uint64_t longestChunk) {
     // Behind the samples of a normal file there is nothing but its index, which is made again.
     const std::uint64_t end =
         recording.kind == FileKind::kNormal ? std::min(recording.dataEnd, file.Size()) : file.Size();
     const std::uint64_t left = end - std::min(end, position);
-    if (left > longestChunk) {
-        throw CannotRecover(file.Path(), "in place it would lose the " + std::to_string(left) +
-                                             " bytes behind its last whole picture, which are more than a "
-                                             "chunk; recover it without --in-place");
+    return left > longestChunk ? left : 0;
+}
+
+/// Gives a file that was written beside its original the name of that, once nothing is wrong with it.
+void ReplaceWhenVerified(const OriginalFile& original, const fs::path& path, std::uint64_t bytesAtRisk,
+                         const RecoveryOptions& options, RecoveryResult& result) {
+    result.defects = options.verify(result.written);
+    if (result.defects.empty() && bytesAtRisk == 0) {
+        original.CheckUnchanged();
+        MoveOver(result.written, fs::absolute(path));
+        result.written = fs::absolute(path);
     }
 }
 
@@ -237,8 +259,11 @@ RecoveryResult RecoverFile(const fs::path& path, const RecoveryOptions& options)
         longestChunk = CopyChunks(first, *source, writer, result);
     }
     CheckWritten(written.Path(), result);
-    if (options.inPlace) {
-        CheckReplaceable(file, recording, source->Position(), longestChunk);
+    const std::uint64_t bytesAtRisk = BytesAtRisk(file, recording, source->Position(), longestChunk);
+    if (options.inPlace && bytesAtRisk != 0) {
+        throw CannotRecover(path, "in place it would lose the " + std::to_string(bytesAtRisk) +
+                                      " bytes behind its last whole picture, which are more than a chunk; "
+                                      "recover it without --in-place");
     }
     original.CopyAccess(written.Path());
     written.Synchronize();
@@ -248,6 +273,9 @@ RecoveryResult RecoverFile(const fs::path& path, const RecoveryOptions& options)
     result.written = target;
     result.bytesLeft = file.Size() - std::min(file.Size(), source->Position());
     result.lockFault = original.LockFault();
+    if (options.verify) {
+        ReplaceWhenVerified(original, path, bytesAtRisk, options, result);
+    }
     return result;
 }
 

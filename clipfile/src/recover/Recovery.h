@@ -2,14 +2,16 @@
 
 #include <cstdint>
 #include <filesystem>
+#include <functional>
 #include <optional>
 #include <string>
+#include <vector>
 
 namespace clipfile {
 
 struct RecoveryOptions {
-    /// A recording of the same stream, for the parameter sets of a normal file; empty for the newest other
-    /// file in the same folder whose sets fit.
+    /// A recording of the same stream, for the parameter sets of a normal file that no journal has; empty for
+    /// the newest other file in the same folder whose sets fit.
     std::filesystem::path like;
     /// Folder for recovered files; empty for that of the original.
     std::filesystem::path output;
@@ -18,6 +20,9 @@ struct RecoveryOptions {
     /// The folder that files were searched in: below `output` they keep their path below it. Empty for the
     /// name alone.
     std::filesystem::path searched = {};
+    /// Tells what is wrong with a file. Where it is given, the recovered file is written beside the original,
+    /// and takes its place when nothing is wrong and no more than a torn chunk would be lost.
+    std::function<std::vector<std::string>(const std::filesystem::path&)> verify = {};
 };
 
 /// What became of a file.
@@ -34,6 +39,8 @@ struct RecoveryResult {
     std::string parameterSets;
     /// Why the original could not be locked against a recorder, or empty.
     std::string lockFault;
+    /// What `RecoveryOptions::verify` has told.
+    std::vector<std::string> defects;
 };
 
 /// Makes a whole file of an unfinished one. The new file is complete on disk before it gets its name; the

@@ -4,6 +4,7 @@
 
 #include <fstream>
 
+#include "journal/JournalFile.h"
 #include "recover/RecoveryFixture.h"
 #include "support/BoxFinder.h"
 #include "support/CodedMedia.h"
@@ -17,6 +18,13 @@ using test_stream::ReadAll;
 using test_stream::Record;
 using test_stream::WithoutTimes;
 using test_stream::WriteAll;
+
+ParameterSets SetsOf(const test_stream::Stream& stream) {
+    const auto bytes = [](const nal_access::NalUnit& unit) {
+        return std::vector<unsigned char>(unit.data.get(), unit.data.get() + unit.size);
+    };
+    return {bytes(stream.settings.sps), bytes(stream.settings.pps)};
+}
 
 constexpr auto kExact = clipfileModule::RecordRules::kExact;
 
@@ -47,6 +55,51 @@ TEST_F(RecoveryTest, ANormalFileBecomesWhatClosingWouldHaveMade) {
     EXPECT_EQ(result.parameterSets, like().string());
     EXPECT_EQ(WithoutTimes(recovered()), WithoutTimes(like()));
     EXPECT_EQ(ReadAll(original()), before);
+}
+
+TEST_F(RecoveryTest, TheJournalOfTheReceiverHasTheParameterSets) {
+    const test_stream::Stream stream = MakeCodedStream(4);
+    recordUnfinished(stream);
+    // Two folders above the file, as a receiver keeps it.
+    const auto file = path("20261121") / "CAM1" / original().filename();
+    std::filesystem::create_directories(file.parent_path());
+    std::filesystem::rename(original(), file);
+    Journal journal;
+    journal.sets = {{{0x67, 1, 2, 3}, {0x68, 4}}, SetsOf(stream)};
+    journal.files = {"20261121/CAM1/other.MP4", "20261121/CAM1/01_02_03_04.MP4"};
+    JournalFile kept(folder_.Path());
+    kept.Write(journal);
+    const RecoveryResult result = RecoverFile(file, {});
+    EXPECT_EQ(result.parameterSets, "the journal " + kept.Path().string());
+    EXPECT_EQ(WithoutTimes(result.written), WithoutTimes(like()));
+}
+
+TEST_F(RecoveryTest, AJournalWhoseSetsFitNothingGivesWayToTheFileThatIsNamed) {
+    recordUnfinished(MakeCodedStream(4));
+    Journal journal;
+    journal.sets = {{{0x67, 1, 2, 3}, {0x68, 4}}};
+    journal.files = {"01_02_03_04.MP4"};
+    JournalFile kept(folder_.Path());
+    kept.Write(journal);
+    EXPECT_EQ(failure(), original().string() + " cannot be recovered: the parameter sets of the journal " +
+                             kept.Path().string() + " and of the folder " + folder_.Path().string() +
+                             " fit none of its pictures; name a closed recording of the same stream with "
+                             "--like.");
+    EXPECT_EQ(RecoverFile(original(), {like(), {}, false}).parameterSets, like().string());
+}
+
+TEST_F(RecoveryTest, AJournalThatNamesOtherFilesAndOneThatIsTornAreNotAsked) {
+    const test_stream::Stream stream = MakeCodedStream(4);
+    recordUnfinished(stream);
+    Journal journal;
+    journal.sets = {SetsOf(stream)};
+    journal.files = {"elsewhere/01_02_03_04.MP4"};
+    JournalFile other(folder_.Path());
+    other.Write(journal);
+    journal.files = {"01_02_03_04.MP4"};
+    const std::string text = ToText(journal);
+    std::ofstream(path(".receiver-torn.journal")) << text.substr(0, text.size() - 5);
+    EXPECT_NE(failure().find("the parameter sets of the folder"), std::string::npos);
 }
 
 TEST_F(RecoveryTest, ANormalFileThatDiedWhileItWasClosedKeepsItsTimecode) {

@@ -1,6 +1,7 @@
 // How a recovered file takes its name, and what keeps it from taking that of a good one.
 
 #include <sys/stat.h>
+#include <sys/wait.h>
 #include <unistd.h>
 
 #include "recover/RecoveryFixture.h"
@@ -103,6 +104,77 @@ TEST_F(ReplacementTest, ALockThatTheSystemRefusesIsTold) {
     EXPECT_EQ(RecoverFile(original(), {}).lockFault, "No locks available");
     SystemCalls().flock = nullptr;
     EXPECT_EQ(RecoverFile(original(), kInPlace).lockFault, "");
+}
+
+TEST_F(ReplacementTest, AFileThatIsVerifiedTakesThePlaceOfItsOriginal) {
+    recordUnfinished();
+    const Data before = ReadAll(original());
+    RecoveryOptions options;
+    options.verify = [&](const std::filesystem::path& file) {
+        EXPECT_EQ(file, recovered());
+        EXPECT_EQ(ReadAll(original()), before) << "the original is kept until then";
+        return std::vector<std::string>();
+    };
+    const RecoveryResult result = RecoverFile(original(), options);
+    EXPECT_EQ(result.written, original());
+    EXPECT_EQ(result.defects, std::vector<std::string>());
+    Record(path("closed.mp4"), {"fragment", clipfileModule::RecordRules::kExact, true}, MakePlainStream(32));
+    EXPECT_EQ(ReadAll(original()), ReadAll(path("closed.mp4")));
+    EXPECT_EQ(fileCount(), 2U);
+}
+
+TEST_F(ReplacementTest, AFileWithDefectsStaysBesideItsOriginal) {
+    recordUnfinished();
+    const Data before = ReadAll(original());
+    RecoveryOptions options;
+    options.verify = [](const auto&) { return std::vector<std::string>{"Something is wrong."}; };
+    const RecoveryResult result = RecoverFile(original(), options);
+    EXPECT_EQ(result.written, recovered());
+    EXPECT_EQ(result.defects, std::vector<std::string>{"Something is wrong."});
+    EXPECT_EQ(ReadAll(original()), before);
+}
+
+TEST_F(ReplacementTest, AVerifiedFileThatLacksMoreThanAChunkStaysBesideItsOriginal) {
+    recordUnfinished(96);
+    Data bytes = ReadAll(original());
+    bytes[box_finder::Find(bytes, "moof:2").offset + 8 + 16 + 8 + 8 + 4 + 3] = 99;
+    WriteAll(original(), bytes);
+    RecoveryOptions options;
+    options.verify = [](const auto&) { return std::vector<std::string>(); };
+    EXPECT_EQ(RecoverFile(original(), options).written, recovered());
+    EXPECT_EQ(ReadAll(original()), bytes);
+}
+
+TEST_F(ReplacementTest, AnOriginalThatChangesWhileTheNewFileIsVerifiedIsNotReplaced) {
+    recordUnfinished();
+    Data longer = ReadAll(original());
+    longer.push_back(0);
+    RecoveryOptions options;
+    options.verify = [&](const auto&) {
+        WriteAll(original(), longer);
+        return std::vector<std::string>();
+    };
+    EXPECT_EQ(failure(options), original().string() + " has changed while it was recovered.");
+    EXPECT_EQ(ReadAll(original()), longer);
+}
+
+TEST_F(ReplacementTest, WhatAKilledRecoveryHasLeftIsRemoved) {
+    recordUnfinished();
+    const pid_t gone = fork();
+    if (gone == 0) {
+        _exit(0);
+    }
+    ASSERT_EQ(waitpid(gone, nullptr, 0), gone);
+    const auto work = [&](const std::string& number) {
+        return path("." + recovered().filename().string() + "." + number);
+    };
+    WriteAll(work(std::to_string(gone)), {1});
+    WriteAll(work(std::to_string(getppid())), {1});
+    WriteAll(work("1x"), {1});
+    RecoverFile(original(), {});
+    EXPECT_FALSE(std::filesystem::exists(work(std::to_string(gone))));
+    EXPECT_TRUE(std::filesystem::exists(work(std::to_string(getppid()))));
+    EXPECT_TRUE(std::filesystem::exists(work("1x")));
 }
 
 TEST_F(ReplacementTest, TheOwnerStaysTheSame) {

@@ -9,8 +9,10 @@ namespace {
 /// Where the timeline of a run begins. Not 0, which the module takes for "from the beginning of everything".
 constexpr std::int64_t kOriginSeconds = 10;
 
-/// A queue of the module holds 50; above this one the feed waits.
+/// A queue of the module holds 50; above this one the feed waits, until it is half empty: a feed that waits
+/// for room for a single unit and the module would wake each other for each.
 constexpr std::uint64_t kQueueBound = 40;
+constexpr std::uint64_t kQueueRefill = 20;
 /// Units from one mark to the next.
 constexpr int kUnitsPerMark = 8;
 
@@ -58,7 +60,9 @@ void StreamFeed::PushMeta(std::int64_t time, const std::vector<unsigned char>& b
 
 void StreamFeed::Push(Queue& queue, const std::shared_ptr<StreamData>& unit) {
     // One place for the unit, one for the mark behind it.
-    WaitFor(queue, kQueueBound - 2);
+    if (queue.gauge.Bound() > kQueueBound - 2) {
+        WaitFor(queue, kQueueRefill);
+    }
     queue.gauge.Enter();
     (stream_.*queue.push)(unit);
     if (++queue.sinceMark >= kUnitsPerMark) {

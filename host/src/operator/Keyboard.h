@@ -20,6 +20,8 @@ class Keyboard {
     Keyboard(const Keyboard&) = delete;
     Keyboard& operator=(const Keyboard&) = delete;
 
+    /// Somebody may press keys.
+    bool IsThere() const { return isTerminal_; }
     /// The next key that was pressed, without waiting. Nothing when there is none.
     std::optional<char> Take();
     /// The terminal is gone: it is neither read nor restored any more.

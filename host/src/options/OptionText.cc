@@ -12,6 +12,7 @@ const char* const kHelpFooter =
     "Keys on a terminal and signals\n"
     "  r, SIGUSR1          begin a recording        s, SIGUSR2   end it\n"
     "  n, SIGRTMIN         split it: go on in a new file from the next IDR frame on\n"
+    "  y                   recover what a crash has left open, when --recover ask has asked\n"
     "  q, Ctrl-C, SIGTERM  end in order, with every file closed; a second signal ends at once\n"
     "  SIGHUP              the terminal is gone: recording goes on\n"
     "\n"

@@ -29,6 +29,7 @@ struct Texts {
     std::string record;
     std::string timecode;
     std::string mode = "sync";
+    std::string recover = "yes";
     std::string passwordFile;
     bool noDropFrame = false;
     bool noReconnect = false;
@@ -89,6 +90,9 @@ void Interpret(const Texts& texts, Options& options) {
     }
     options.mode = texts.mode == "on" ? OutputMode::kOn : OutputMode::kSync;
     options.source.continuous = options.mode == OutputMode::kOn;
+    options.recover = texts.recover == "no"    ? RecoverMode::kNo
+                      : texts.recover == "ask" ? RecoverMode::kAsk
+                                               : RecoverMode::kYes;
     options.dropFrame = !texts.noDropFrame;
     options.source.reconnect = !texts.noReconnect;
 }
@@ -223,6 +227,14 @@ void AddFileOptions(CLI::App& app, Options& options, Texts& texts) {
         ->group(group);
     app.add_flag("--group-write", options.groupWrite,
                  "Give files and folders to the group too: others may record to the same folder")
+        ->group(group);
+    app.add_option(
+           "--recover", texts.recover,
+           "Files that a crash has left open in the output folder: recover them in the background, ask "
+           "on the terminal first, or only tell them")
+        ->check(CLI::IsMember({"no", "ask", "yes"}))
+        ->type_name("no|ask|yes")
+        ->capture_default_str()
         ->group(group);
     app.add_option("--user", options.user, "User name for a network share: NAME, DOMAIN\\NAME or NAME@DOMAIN")
         ->type_name("NAME")

@@ -15,6 +15,9 @@ namespace receiver {
 /// Where record commands come from: the record flag in the metadata, or the host going online.
 enum class OutputMode { kSync, kOn };
 
+/// What becomes of files that a crash has left open.
+enum class RecoverMode { kNo, kAsk, kYes };
+
 /// What the operator asked for. Options that are not set leave the matter to the settings store and to the
 /// module.
 struct Options {
@@ -31,6 +34,7 @@ struct Options {
     std::string naluType = "normal";
     OutputMode mode = OutputMode::kSync;
     std::optional<unsigned int> maxMinutes;
+    RecoverMode recover = RecoverMode::kYes;
 
     /// Empty: from the start. Only in mode "sync".
     std::vector<RecordRange> record;

@@ -2,16 +2,12 @@
 
 #include <new>
 
-extern "C" {
-#include <libavfilter/buffersink.h>
-#include <libavfilter/buffersrc.h>
-}
-
 #include "common/ReceiverError.h"
 
 namespace receiver {
 
-FilterGraph::FilterGraph(const std::string& chain, bool video) : graph_(avfilter_graph_alloc()) {
+FilterGraph::FilterGraph(const std::string& chain, bool video)
+    : library_(libav::FilterLibrary::Get()), graph_(library_.graphAlloc(), Free{library_.graphFree}) {
     if (!graph_) {
         throw std::bad_alloc();
     }
@@ -20,19 +16,19 @@ FilterGraph::FilterGraph(const std::string& chain, bool video) : graph_(avfilter
     const std::string whole = chain + (video ? ",buffersink@out" : ",abuffersink@out");
     AVFilterInOut* inputs = nullptr;
     AVFilterInOut* outputs = nullptr;
-    const int result = avfilter_graph_parse2(graph_.get(), whole.c_str(), &inputs, &outputs);
-    avfilter_inout_free(&inputs);
-    avfilter_inout_free(&outputs);
+    const int result = library_.graphParse(graph_.get(), whole.c_str(), &inputs, &outputs);
+    library_.inoutFree(&inputs);
+    library_.inoutFree(&outputs);
     libav::Check(result, "make a chain of filters");
-    libav::Check(avfilter_graph_config(graph_.get(), nullptr), "set up a chain of filters");
-    sink_ = avfilter_graph_get_filter(graph_.get(), video ? "buffersink@out" : "abuffersink@out");
+    libav::Check(library_.graphConfig(graph_.get(), nullptr), "set up a chain of filters");
+    sink_ = library_.graphGetFilter(graph_.get(), video ? "buffersink@out" : "abuffersink@out");
     if (sink_ == nullptr) {
         throw ReceiverError(ExitCode::kInternal, "cannot find the end of a chain of filters");
     }
 }
 
 bool FilterGraph::Pull(AVFrame& frame) {
-    const int result = av_buffersink_get_frame(sink_, &frame);
+    const int result = library_.sinkGetFrame(sink_, &frame);
     if (result == AVERROR(EAGAIN) || result == AVERROR_EOF) {
         return false;
     }
@@ -41,7 +37,7 @@ bool FilterGraph::Pull(AVFrame& frame) {
 }
 
 AVFilterContext* FilterGraph::SourceOf(const char* name) {
-    AVFilterContext* const source = avfilter_graph_get_filter(graph_.get(), name);
+    AVFilterContext* const source = library_.graphGetFilter(graph_.get(), name);
     if (source == nullptr) {
         throw ReceiverError(ExitCode::kInternal, "cannot find the beginning of a chain of filters");
     }
@@ -49,15 +45,15 @@ AVFilterContext* FilterGraph::SourceOf(const char* name) {
 }
 
 void FilterGraph::Feed(const char* name, AVFrame& frame) {
-    libav::Check(av_buffersrc_add_frame(SourceOf(name), &frame), "filter a frame");
+    libav::Check(library_.sourceAddFrame(SourceOf(name), &frame), "filter a frame");
 }
 
 void FilterGraph::End(const char* name, std::int64_t pts) {
-    libav::Check(av_buffersrc_close(SourceOf(name), pts, 0), "filter a frame");
+    libav::Check(library_.sourceClose(SourceOf(name), pts, 0), "filter a frame");
 }
 
 AVRational FilterGraph::TimeBase() const {
-    return av_buffersink_get_time_base(sink_);
+    return library_.sinkGetTimeBase(sink_);
 }
 
 }  // namespace receiver

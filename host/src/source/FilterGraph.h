@@ -1,7 +1,9 @@
 #pragma once
 
+#include <memory>
 #include <string>
 
+#include "source/FilterLibrary.h"
 #include "source/Libav.h"
 
 namespace receiver {
@@ -25,7 +27,13 @@ class FilterGraph {
  private:
     AVFilterContext* SourceOf(const char* name);
 
-    libav::Owner<AVFilterGraph> graph_;
+    struct Free {
+        decltype(&avfilter_graph_free) function;
+        void operator()(AVFilterGraph* graph) const { function(&graph); }
+    };
+
+    const libav::FilterLibrary& library_;
+    std::unique_ptr<AVFilterGraph, Free> graph_;
     AVFilterContext* sink_ = nullptr;
 };
 

@@ -25,6 +25,11 @@ constexpr int kLongestDrain = 100;
 constexpr double kLongestShortfall = 1;
 /// Bytes in front of a picture in which its program's tables stand: ten packets of a transport stream.
 constexpr std::int64_t kTables = 1880;
+/// Bytes of a live stream in which its tables are found, and to whose beginning it can go back: at 100 Mb/s
+/// the second in which another frame rate shows.
+constexpr std::int64_t kOpening = std::int64_t{16} << 20;
+/// Bytes that are looked at to find out what its media are: at high bit rates as many as that time may hold.
+constexpr std::int64_t kAnalysed = std::int64_t{64} << 20;
 
 bool EndsWith(const std::string& text, const std::string& end) {
     return text.size() >= end.size() && text.compare(text.size() - end.size(), end.size(), end) == 0;
@@ -132,8 +137,9 @@ AVFormatContext* Input::NewFormat() {
     format->interrupt_callback = {OnWait, this};
     // Wraps are undone by the time line, which knows any number of them.
     format->correct_ts_overflow = 0;
-    // High bit rates: as many bytes as the time that is looked at may hold.
-    format->probesize = std::int64_t{64} << 20;
+    // Opening a live transport stream keeps room for so many bytes, so that it can go back.
+    const std::string scheme = SchemeOf(url_);
+    format->probesize = scheme.empty() || scheme == "file" ? kAnalysed : kOpening;
     return format;
 }
 
@@ -170,6 +176,7 @@ void Input::Classify() {
 
 void Input::FindStreams() {
     Expect(patience_ + kAnalysis);
+    format_->probesize = kAnalysed;
     const int result = avformat_find_stream_info(format_.get(), nullptr);
     if (result < 0) {
         FailOpening(result);

@@ -3,7 +3,6 @@
 extern "C" {
 #include <libavcodec/avcodec.h>
 #include <libavcodec/bsf.h>
-#include <libavfilter/avfilter.h>
 #include <libavformat/avformat.h>
 #include <libavutil/audio_fifo.h>
 #include <libavutil/avutil.h>
@@ -23,7 +22,6 @@ struct Free {
     void operator()(AVBSFContext* filter) const { av_bsf_free(&filter); }
     void operator()(AVCodecContext* codec) const { avcodec_free_context(&codec); }
     void operator()(AVCodecParserContext* parser) const { av_parser_close(parser); }
-    void operator()(AVFilterGraph* graph) const { avfilter_graph_free(&graph); }
     void operator()(AVFormatContext* format) const { avformat_close_input(&format); }
     void operator()(AVFrame* frame) const { av_frame_free(&frame); }
     void operator()(AVPacket* packet) const { av_packet_free(&packet); }

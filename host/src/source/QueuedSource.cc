@@ -1,5 +1,6 @@
 #include "source/QueuedSource.h"
 
+#include <algorithm>
 #include <chrono>
 #include <utility>
 
@@ -10,6 +11,9 @@ namespace {
 constexpr std::chrono::milliseconds kIdle{100};
 /// Bytes that may wait for the reader.
 constexpr std::size_t kQueueBytes = std::size_t{64} << 20;
+/// Units of a recorded source that must wait before the reader, who found none, goes on: two threads that
+/// hand over unit by unit would wake each other for each.
+constexpr std::size_t kRefill = 24;
 
 Pacer::Duration TimeOf(const SourceUnit& unit) {
     const std::int64_t clock = unit.medium == Medium::kAudio ? kAudioClock : kVideoClock;
@@ -23,6 +27,9 @@ QueuedSource::QueuedSource(std::unique_ptr<ProducerInterface> producer, std::sha
     : producer_(std::move(producer)),
       interrupt_(std::move(interrupt)),
       capacity_(capacity),
+      refill_(pacer.Live() ? 1 : std::min(kRefill, capacity)),
+      resume_(pacer.Live() ? capacity - 1 : capacity / 2),
+      resumeBytes_(pacer.Live() ? kQueueBytes - 1 : kQueueBytes / 2),
       listener_(listener),
       pacer_(pacer),
       description_(producer_->Description()),
@@ -37,7 +44,13 @@ void QueuedSource::Stop() {
     interrupt_->Stop();
     const std::lock_guard lock(mutex_);
     stopped_ = true;
-    changed_.notify_all();
+    arrived_.notify_one();
+    room_.notify_one();
+}
+
+std::size_t QueuedSource::Queued() const {
+    const std::lock_guard lock(mutex_);
+    return queue_.size();
 }
 
 void QueuedSource::Run() {
@@ -54,9 +67,11 @@ void QueuedSource::Run() {
                 }
                 queue_.push_back(std::move(item));
             }
-            changed_.notify_all();
-            changed_.wait(
-                lock, [this] { return stopped_ || (queue_.size() < capacity_ && queued_ < kQueueBytes); });
+            if (queue_.size() >= refill_) {
+                arrived_.notify_one();
+            }
+            full_ = queue_.size() >= capacity_ || queued_ >= kQueueBytes;
+            room_.wait(lock, [this] { return stopped_ || !full_; });
         }
     } catch (...) {
         failure = std::current_exception();
@@ -65,14 +80,17 @@ void QueuedSource::Run() {
     // The reader alone has it from now on.
     failure_ = std::move(failure);
     ended_ = true;
-    changed_.notify_all();
+    arrived_.notify_one();
 }
 
 SourceInterface::Result QueuedSource::Read(SourceUnit& unit) {
     const auto deadline = std::chrono::steady_clock::now() + kIdle;
     std::unique_lock lock(mutex_);
     for (;;) {
-        changed_.wait_until(lock, deadline, [this] { return stopped_ || ended_ || !queue_.empty(); });
+        if (queue_.empty()) {
+            arrived_.wait_until(lock, deadline,
+                                [this] { return stopped_ || ended_ || queue_.size() >= refill_; });
+        }
         if (stopped_) {
             return Result::kStopped;
         }
@@ -84,7 +102,7 @@ SourceInterface::Result QueuedSource::Read(SourceUnit& unit) {
         }
         if (const auto* const notice = std::get_if<std::string>(&queue_.front())) {
             const std::string sentence = *notice;
-            queue_.pop_front();
+            DropFront();
             lock.unlock();
             listener_.OnNotice(sentence);
             lock.lock();
@@ -92,25 +110,36 @@ SourceInterface::Result QueuedSource::Read(SourceUnit& unit) {
         }
         if (auto* const description = std::get_if<SourceDescription>(&queue_.front())) {
             description_ = std::move(*description);
-            queue_.pop_front();
+            DropFront();
             return Result::kChanged;
         }
         SourceUnit& front = std::get<SourceUnit>(queue_.front());
         const Pacer::Duration time = TimeOf(front);
-        const auto due = pacer_.Due(time, std::chrono::steady_clock::now());
-        if (due > deadline) {
-            changed_.wait_until(lock, deadline, [this] { return stopped_; });
-            return stopped_ ? Result::kStopped : Result::kIdle;
+        const auto now = std::chrono::steady_clock::now();
+        const auto due = pacer_.Due(time, now);
+        if (due > now) {
+            const bool soon = due <= deadline;
+            if (arrived_.wait_until(lock, soon ? due : deadline, [this] { return stopped_; })) {
+                return Result::kStopped;
+            }
+            if (!soon) {
+                return Result::kIdle;
+            }
         }
-        if (changed_.wait_until(lock, due, [this] { return stopped_; })) {
-            return Result::kStopped;
-        }
-        queued_ -= front.size;
         unit = std::move(front);
-        queue_.pop_front();
+        queued_ -= unit.size;
+        DropFront();
         pacer_.Taken(time, std::chrono::steady_clock::now());
-        changed_.notify_all();
         return Result::kUnit;
+    }
+}
+
+void QueuedSource::DropFront() {
+    queue_.pop_front();
+    const bool room = queue_.size() <= resume_ && queued_ <= resumeBytes_;
+    if (full_ && (room || queue_.empty())) {
+        full_ = false;
+        room_.notify_one();
     }
 }
 

@@ -17,6 +17,8 @@ class Pacer {
     static Pacer ForFile(double speed) { return {speed, false}; }
     static Pacer ForLive(double burst) { return {burst, true}; }
 
+    /// Whether the source sets its own pace.
+    bool Live() const { return live_; }
     /// When the unit at `time` of the source is due, `now` or later. Does not enter it.
     Clock::time_point Due(Duration time, Clock::time_point now) const;
     /// Enters a unit that was handed over at `now`.

@@ -5,6 +5,11 @@
 #include <stdlib.h>
 #include <unistd.h>
 
+#include <fstream>
+#include <iterator>
+#include <regex>
+#include <set>
+
 #include "common/ReceiverError.h"
 
 namespace receiver {
@@ -47,6 +52,7 @@ TEST(Options, WithoutAnyTheTestPictureIsRecordedFromTheStart) {
     EXPECT_FALSE(options.source.transcode);
     EXPECT_EQ(options.mode, OutputMode::kSync);
     EXPECT_EQ(options.fileType, "normal");
+    EXPECT_EQ(options.recover, RecoverMode::kYes);
     EXPECT_EQ(options.naluType, "normal");
     EXPECT_TRUE(options.record.empty());
     EXPECT_TRUE(options.dropFrame);
@@ -62,15 +68,17 @@ TEST(Options, WithoutAnyTheTestPictureIsRecordedFromTheStart) {
 }
 
 TEST(Options, EachOneReachesItsPlace) {
-    const Options options = Parsed(
-        {"--input",        "test:",       "--speed",        "8",        "--timeout",     "2.5",
-         "--no-reconnect", "--transcode", "--fps",          "59.94",    "--size",        "1920x1080",
-         "--bitrate",      "12000",       "--gop",          "30",       "--output",      "/srv/rec",
-         "--prefix",       "CAM1",        "--file-type",    "fragment", "--max-minutes", "0",
-         "--user",         "u",           "--password",     "p",        "--mode",        "sync",
-         "--record",       "2-9,12-",     "--seconds",      "20",       "--timecode",    "10:00:00;00",
-         "--module",       "m.so",        "--settings",     "s.ini",    "--nalu-type",   "direct",
-         "--log",          "l.log",       "--log-priority", "13",       "--json",        "--group-write"});
+    const Options options =
+        Parsed({"--input",    "test:",          "--speed",     "8",          "--timeout",
+                "2.5",        "--no-reconnect", "--transcode", "--fps",      "59.94",
+                "--size",     "1920x1080",      "--bitrate",   "12000",      "--gop",
+                "30",         "--output",       "/srv/rec",    "--recover",  "ask",
+                "--prefix",   "CAM1",           "--file-type", "fragment",   "--max-minutes",
+                "0",          "--user",         "u",           "--password", "p",
+                "--mode",     "sync",           "--record",    "2-9,12-",    "--seconds",
+                "20",         "--timecode",     "10:00:00;00", "--module",   "m.so",
+                "--settings", "s.ini",          "--nalu-type", "direct",     "--log",
+                "l.log",      "--log-priority", "13",          "--json",     "--group-write"});
     EXPECT_EQ(options.source.speed, 8);
     EXPECT_EQ(options.source.timeout, 2.5);
     EXPECT_FALSE(options.source.reconnect);
@@ -83,6 +91,7 @@ TEST(Options, EachOneReachesItsPlace) {
     EXPECT_EQ(options.output, "/srv/rec");
     EXPECT_EQ(options.prefix, "CAM1");
     EXPECT_EQ(options.fileType, "fragment");
+    EXPECT_EQ(options.recover, RecoverMode::kAsk);
     EXPECT_EQ(options.maxMinutes, 0u);
     EXPECT_EQ(options.user, "u");
     EXPECT_EQ(options.password, "p");
@@ -147,6 +156,7 @@ TEST(Options, EachErrorNamesItsOptionInOneSentence) {
         {{"--timecode", "10:00:00"}, "HH:MM:SS:FF"},
         {{"--timecode", "25:00:00:00"}, "--timecode 25:00:00:00"},
         {{"--file-type", "mov"}, "--file-type"},
+        {{"--recover", "perhaps"}, "--recover"},
         {{"--mode", "off"}, "--mode"},
         {{"--nalu-type", "x"}, "--nalu-type"},
         {{"--max-minutes", "-1"}, "--max-minutes"},
@@ -193,6 +203,23 @@ TEST(Options, HelpTellsOfEveryOptionOfTheExamplesAndOfTheExitCodes) {
                                    "receiver.password"}) {
         EXPECT_THAT(text, HasSubstr(part));
     }
+}
+
+/// The long options in a text.
+std::set<std::string> OptionsIn(std::string text) {
+    // A man page has its hyphens as "\-".
+    std::erase(text, '\\');
+    const std::regex option("--[a-z][-a-z]*");
+    return {std::sregex_token_iterator(text.begin(), text.end(), option), std::sregex_token_iterator()};
+}
+
+TEST(Options, TheManPageHasEachOfThem) {
+    std::string help;
+    EXPECT_FALSE(Parse({"--help"}, help));
+    std::ifstream in(RECEIVER_MAN_PAGE);
+    const std::string page{std::istreambuf_iterator<char>(in), {}};
+    EXPECT_EQ(OptionsIn(page), OptionsIn(help));
+    EXPECT_GT(OptionsIn(help).size(), 30U);
 }
 
 TEST(Options, VersionIsPrinted) {

@@ -31,14 +31,14 @@ int openSocket() {
 
 }  // namespace
 
-bool LossyRelay::Road::Passes() {
-    const bool dropped = loss_(dice_);
+bool LossyRelay::Road::Passes(double loss) {
+    const bool dropped = std::bernoulli_distribution(loss)(dice_);
     ++(dropped ? dropped_ : passed_);
     return !dropped;
 }
 
-LossyRelay::LossyRelay(std::uint16_t from, std::uint16_t to, double loss, std::uint32_t seed)
-    : forth_(loss, seed), back_(loss, seed + 1), sender_(openSocket()), receiver_(openSocket()) {
+LossyRelay::LossyRelay(std::uint16_t from, std::uint16_t to, const PacketLoss& loss, std::uint32_t seed)
+    : loss_(loss), forth_(seed), back_(seed + 1), sender_(openSocket()), receiver_(openSocket()) {
     const sockaddr_in here = loopback(from);
     const sockaddr_in there = loopback(to);
     if (bind(sender_, reinterpret_cast<const sockaddr*>(&here), sizeof here) != 0 ||
@@ -58,6 +58,12 @@ LossyRelay::~LossyRelay() {
     close(receiver_);
 }
 
+double LossyRelay::lossNow() const {
+    const auto passed = std::chrono::steady_clock::now() - begin_;
+    const bool burst = loss_.burst.count() > 0 && passed % loss_.every >= loss_.every - loss_.burst;
+    return burst ? loss_.burstShare : loss_.share;
+}
+
 void LossyRelay::run() {
     std::array<char, 65536> packet{};
     sockaddr_in peer{};
@@ -68,13 +74,13 @@ void LossyRelay::run() {
         for (ssize_t size = 0; (size = recvfrom(sender_, packet.data(), packet.size(), 0,
                                                 reinterpret_cast<sockaddr*>(&peer), &length)) >= 0;
              length = sizeof peer) {
-            if (forth_.Passes()) {
+            if (forth_.Passes(lossNow())) {
                 // Nobody listens yet: the packet is lost, as on any road.
                 static_cast<void>(send(receiver_, packet.data(), static_cast<std::size_t>(size), 0));
             }
         }
         for (ssize_t size = 0; (size = recv(receiver_, packet.data(), packet.size(), 0)) >= 0;) {
-            if (peer.sin_port != 0 && back_.Passes()) {
+            if (peer.sin_port != 0 && back_.Passes(lossNow())) {
                 static_cast<void>(sendto(sender_, packet.data(), static_cast<std::size_t>(size), 0,
                                          reinterpret_cast<const sockaddr*>(&peer), sizeof peer));
             }

@@ -214,7 +214,7 @@ TEST(LossyRelayTest, PassesPacketsInBothDirections) {
     const std::uint16_t front = ports.First();
     Socket receiver(static_cast<std::uint16_t>(front + 1));
     Socket sender(static_cast<std::uint16_t>(front + 2));
-    const LossyRelay relay(front, static_cast<std::uint16_t>(front + 1), 0, 1);
+    const LossyRelay relay(front, static_cast<std::uint16_t>(front + 1), {}, 1);
     sender.Send(front, 'a');
     EXPECT_EQ(receiver.Receive(), 'a');
     receiver.Send(receiver.From(), 'b');
@@ -229,7 +229,7 @@ TEST(LossyRelayTest, DropsItsShareAndNothingElse) {
     const std::uint16_t front = ports.First();
     Socket receiver(static_cast<std::uint16_t>(front + 1));
     const Socket sender(static_cast<std::uint16_t>(front + 2));
-    const LossyRelay relay(front, static_cast<std::uint16_t>(front + 1), 0.25, 1);
+    const LossyRelay relay(front, static_cast<std::uint16_t>(front + 1), {.share = 0.25}, 1);
     constexpr std::uint64_t kPackets = 200;
     for (std::uint64_t number = 1; number <= kPackets; ++number) {
         const auto passed = relay.Forth().passed;
@@ -243,6 +243,31 @@ TEST(LossyRelayTest, DropsItsShareAndNothingElse) {
     }
     // Five standard deviations of a binomial distribution.
     EXPECT_NEAR(static_cast<double>(relay.Forth().dropped), 50, 31);
+}
+
+TEST(LossyRelayTest, DropsEverythingForTheLengthOfABurst) {
+    const FreePorts ports;
+    const std::uint16_t front = ports.First();
+    Socket receiver(static_cast<std::uint16_t>(front + 1));
+    const Socket sender(static_cast<std::uint16_t>(front + 2));
+    const PacketLoss loss{.burst = std::chrono::milliseconds(20), .every = std::chrono::milliseconds(40)};
+    const LossyRelay relay(front, static_cast<std::uint16_t>(front + 1), loss, 1);
+    const auto deadline = std::chrono::steady_clock::now() + kPatience;
+    std::uint64_t number = 0;
+    // What was dropped before a packet passed again.
+    std::uint64_t behind = 0;
+    while (behind == 0 && std::chrono::steady_clock::now() < deadline) {
+        const auto before = relay.Forth();
+        sender.Send(front, static_cast<char>(++number));
+        while (relay.Forth().passed + relay.Forth().dropped < number) {
+            std::this_thread::yield();
+        }
+        if (relay.Forth().passed > before.passed) {
+            EXPECT_EQ(receiver.Receive(), static_cast<char>(number));
+            behind = before.dropped;
+        }
+    }
+    EXPECT_GT(behind, 0U);
 }
 
 }  // namespace

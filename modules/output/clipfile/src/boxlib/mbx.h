@@ -4,6 +4,15 @@
 // Use: MbxCreateContext, MbxSessionCreate, then `ftyp`, `PROF`, the movie, its tracks, their entries, and
 // samples; the writing calls in between and at the end; MbxSessionDestroy, MbxDestroyContext.
 //
+// Names: everything here begins with Mbx, macros and constants with MBX_, since the library has no namespace.
+// The verb comes first and what it works on is the first argument: a session here, a context inside. Where an
+// inner function does to a record what an operation does to a session, the record stands in the name
+// (MbxSealFragment, MbxMovieSealFragment); MbxAddSample, MbxEndChunk, MbxAddTrackReference and
+// MbxSetMovieTimes alone have an inner form of the same name, which takes the context first. Fields that a
+// standard names are written as there (`AVCProfileIndication`). All else in this repository is classes and
+// std; this folder is plain functions on plain records, files named in lower case, because whoever uses it
+// brings the memory and the files: nothing here may allocate, throw or open by itself.
+//
 // Common to all operations:
 // - The result is a status; values come back through pointers, which are left alone on failure.
 // - A null session or result pointer is MBX_ERR_INVALID_ARG. A call that needs a movie gives
@@ -115,8 +124,9 @@ MbxStatus MbxAddDataReference(MbxSession* session, uint32_t track, const char* l
                               uint32_t* index);
 
 // Append a sample entry; `index` receives its 1-based place. MBX_ERR_INVALID_ARG for a kind of video entry
-// other than 1, 2 and 11, or a data reference index outside 1 to 65535 or that the track does not have;
-// MBX_ERR_BAD_STATE when the track's handler is not `vide`, `soun`, `tmcd` or `meta` respectively.
+// other than those of MbxVisualEntryParams, or a data reference index outside 1 to 65535 or that the track
+// does not have; MBX_ERR_BAD_STATE when the track's handler is not `vide`, `soun`, `tmcd` or `meta`
+// respectively.
 MbxStatus MbxAddVideoEntry(MbxSession* session, uint32_t track, const MbxVisualEntryParams* params,
                            uint32_t* index);
 MbxStatus MbxAddSoundEntry(MbxSession* session, uint32_t track, const MbxAudioEntryParams* params,
@@ -149,8 +159,8 @@ MbxStatus MbxSetHvcConfig(MbxSession* session, uint32_t track, uint32_t entry, c
 MbxStatus MbxAddHvcNalUnit(MbxSession* session, uint32_t track, uint32_t entry, uint8_t nalType,
                            uint8_t completeness, const uint8_t* data, uint64_t size);
 
-// Sets or replaces the elementary stream descriptor of an entry of kind 1, 3 or 4. MBX_ERR_BAD_STATE for
-// another kind, or for one of kind 3 that describes another codec; MBX_ERR_INVALID_ARG for a value out of its
+// Sets or replaces the elementary stream descriptor of an MP4V, MP4A or SYSTEMS entry. MBX_ERR_BAD_STATE for
+// another kind, or for an MP4A entry that describes another codec; MBX_ERR_INVALID_ARG for a value out of its
 // range, MBX_ERR_INTERNAL for an unknown form.
 MbxStatus MbxSetEsds(MbxSession* session, uint32_t track, uint32_t entry, const MbxEsdsParams* params);
 
@@ -230,8 +240,8 @@ MbxStatus MbxReleaseFragment(MbxSession* session, uint32_t fragment);
 MbxStatus MbxWriteMdatHeader(MbxSession* session, MbxFile* file, uint64_t position, uint32_t type,
                              uint64_t payloadSize, uint64_t* headerSize);
 
-// The same for `mdat` with a form of its own: 0 forces box_size_mode 0, 1 forces mode 2 (always 16 bytes, so
-// that it can be patched in place whatever the size), 2 forces mode 1. MBX_ERR_INVALID_ARG for another type.
+// The same for `mdat` with a form (MbxMdatHeaderForm) of its own in place of the session's box_size_mode.
+// MBX_ERR_INVALID_ARG for another type.
 MbxStatus MbxWriteWideMdatHeader(MbxSession* session, uint32_t form, MbxFile* file, uint64_t position,
                                  uint32_t type, uint64_t payloadSize, uint64_t* headerSize);
 

@@ -129,7 +129,7 @@ MbxStatus MbxStdioWrite(MbxFile* file, const void* buffer, uint64_t size, uint64
 
 MbxStatus MbxStdioSeek(MbxFile* file, int64_t offset, uint32_t origin) {
     static constexpr int kOrigins[] = {SEEK_SET, SEEK_CUR, SEEK_END};
-    if (!isOpen(file) || origin > 2) return MBX_ERR_INVALID_ARG;
+    if (!isOpen(file) || origin > MBX_SEEK_END) return MBX_ERR_INVALID_ARG;
     return MbxSeekStream(file->stream, offset, kOrigins[origin]) ? MBX_OK : MBX_ERR_IO;
 }
 

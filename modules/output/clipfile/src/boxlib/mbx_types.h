@@ -40,7 +40,7 @@ struct MbxCallbacks {
     void* user_data;  // passed first to `alloc`, `free` and to the string and memory entries
     MbxStatus (*read)(MbxFile* file, void* buffer, uint64_t size, uint64_t* count);
     MbxStatus (*write)(MbxFile* file, const void* buffer, uint64_t size, uint64_t* count);
-    MbxStatus (*seek)(MbxFile* file, int64_t offset, uint32_t origin);  // origin 0 start, 1 position, 2 end
+    MbxStatus (*seek)(MbxFile* file, int64_t offset, uint32_t origin);  // MbxSeekOrigin
     MbxStatus (*tell)(MbxFile* file, uint64_t* position);
     MbxStatus (*size)(MbxFile* file, uint64_t* length);
     void* (*alloc)(void* user_data, uint64_t size);  // at least 8-byte aligned memory, or null
@@ -58,27 +58,117 @@ struct MbxCallbacks {
     void* (*memset)(void* user_data, void* pointer, int byte, uint64_t count);
 };
 
+// A four-character code of a box, brand or handler, as the number that boxes carry.
+consteval uint32_t MbxCode(const char (&code)[5]) {
+    uint32_t value = 0;
+    for (int i = 0; i < 4; i++) value = value << 8 | static_cast<uint8_t>(code[i]);
+    return value;
+}
+
+// Codes that callers of the library name.
+constexpr uint32_t MBX_BOX_MDAT = MbxCode("mdat");
+constexpr uint32_t MBX_CODE_AVC1 = MbxCode("avc1");       // H.264 with its parameter sets in the sample entry
+constexpr uint32_t MBX_CODE_MP4A = MbxCode("mp4a");       // MPEG-4 audio
+constexpr uint32_t MBX_REFERENCE_CDSC = MbxCode("cdsc");  // the track describes the one referred to
+
+// Handlers of tracks (ISO/IEC 14496-12 8.4.3).
+constexpr uint32_t MBX_HANDLER_VIDEO = MbxCode("vide");
+constexpr uint32_t MBX_HANDLER_SOUND = MbxCode("soun");
+constexpr uint32_t MBX_HANDLER_TIMECODE = MbxCode("tmcd");
+constexpr uint32_t MBX_HANDLER_META = MbxCode("meta");
+constexpr uint32_t MBX_HANDLER_SUBTITLE = MbxCode("subt");
+constexpr uint32_t MBX_HANDLER_OBJECT_DESCRIPTOR = MbxCode("odsm");
+constexpr uint32_t MBX_HANDLER_BOOK = MbxCode("BKDT");
+constexpr uint32_t MBX_HANDLER_PACKED_DATA = MbxCode("PKDT");
+constexpr uint32_t MBX_HANDLER_GRAPHICS = MbxCode("GRAP");
+
+// Languages (ISO 639-2/T), three letters of five bits each.
+constexpr uint16_t MBX_LANGUAGE_ENGLISH = 0x15C7;
+constexpr uint16_t MBX_LANGUAGE_UNDETERMINED = 0x55C4;
+
+// Where a seek counts from.
+enum MbxSeekOrigin : uint32_t {
+    MBX_SEEK_START = 0,
+    MBX_SEEK_POSITION = 1,
+    MBX_SEEK_END = 2,
+};
+
+// box_size_mode: the width of box sizes. Anything else is MBX_ERR_INVALID_ARG.
+enum MbxBoxSizeMode : uint32_t {
+    MBX_SIZES_32 = 0,        // a larger box is MBX_ERR_BAD_STATE
+    MBX_SIZES_BY_VALUE = 1,  // 32 bits unless the size needs more, then `largesize`
+    MBX_SIZES_64 = 2,        // always the header of 16 bytes
+};
+
+// time_version_mode: the version of boxes with times of 32 or 64 bits. version.h tells the exact choice of
+// each box.
+enum MbxTimeVersionMode : uint32_t {
+    MBX_TIMES_32 = 0,        // version 0, MBX_ERR_BAD_STATE if a value needs 64 bits; `tfra` has version 1
+    MBX_TIMES_BY_VALUE = 1,  // version 0 unless a value needs more
+    MBX_TIMES_32_WITH_TFRA = 2,  // version 0 as above, `tfra` included
+    MBX_TIMES_64 = 3,            // always version 1
+};
+
+// chunk_offset_mode: the box of chunk offsets.
+enum MbxChunkOffsetMode : uint32_t {
+    MBX_OFFSETS_32 = 0,        // `stco`, MBX_ERR_BAD_STATE if an offset needs 64 bits
+    MBX_OFFSETS_BY_VALUE = 1,  // `stco` unless an offset needs `co64`
+    MBX_OFFSETS_64 = 2,        // always `co64`
+};
+
+// mehd_mode: the length of a fragmented movie.
+enum MbxMehdMode : uint32_t {
+    MBX_MEHD_NONE = 0,
+    MBX_MEHD_BY_VALUE = 1,
+    MBX_MEHD_32 = 2,  // MBX_ERR_BAD_STATE if more is needed
+    MBX_MEHD_64 = 3,
+};
+
+// base_offset_mode: where the data offsets of a track fragment count from. Anything else is
+// MBX_ERR_INVALID_ARG. All but the first also forgive overflow when offsets of a fragment are shifted, and
+// the 31-bit check on the data offsets of `trun`.
+enum MbxBaseOffsetMode : uint32_t {
+    MBX_BASE_EXPLICIT = 0,  // `tfhd` carries a base data offset
+    MBX_BASE_RUNS_ON = 1,   // the end of the previous track fragment
+    MBX_BASE_MOOF = 2,      // the start of `moof`
+};
+
+// trun_offset_mode: any value but 0 leaves data offsets out where the data runs on.
+enum MbxTrunOffsetMode : uint32_t {
+    MBX_TRUN_OFFSET_ALWAYS = 0,
+    MBX_TRUN_OFFSET_AS_NEEDED = 1,
+};
+
+// trun_version_mode: any value but 1 leaves the choice to the sample composition offsets.
+enum MbxTrunVersionMode : uint32_t {
+    MBX_TRUN_VERSION_BY_VALUE = 0,
+    MBX_TRUN_VERSION_1 = 1,
+};
+
+// tfdt_mode: whether each track fragment tells its decode time. Any value but 1 is no.
+enum MbxTfdtMode : uint32_t {
+    MBX_TFDT_NONE = 0,
+    MBX_TFDT_ALWAYS = 1,
+};
+
 // The configuration words that choose the form of boxes.
 struct MbxOptions {
-    // 0: 32-bit box sizes only, a larger box is MBX_ERR_BAD_STATE. 1: 32-bit unless the size needs more, then
-    // `largesize`. 2: always the 16-byte header. Anything else is MBX_ERR_INVALID_ARG.
-    uint32_t box_size_mode;
-    // Version of boxes with 32/64-bit time fields. 0 and 2: version 0, MBX_ERR_BAD_STATE if a value needs 64
-    // bits. 1: version 0 unless needed. 3: always version 1. version.h tells the exact choice of each box.
-    uint32_t time_version_mode;
-    // 0: `stco`, MBX_ERR_BAD_STATE if an offset needs 64 bits. 1: `stco` unless an offset needs `co64`.
-    // 2: always `co64`.
-    uint32_t chunk_offset_mode;
-    // 0: no `mehd`. 1: width chosen by the value. 2: 32-bit, MBX_ERR_BAD_STATE if more is needed. 3: 64-bit.
-    uint32_t mehd_mode;
-    // 0: `tfhd` carries an explicit base data offset. 1: the base runs on from the end of the previous track
-    // fragment. 2: the base is `moof`. Non-zero also forgives overflow from offset shifting in a fragment and
-    // the 31-bit check on `trun` data offsets.
-    uint32_t base_offset_mode;
-    uint32_t trun_offset_mode;   // 0: every `trun` carries a data offset
-    uint32_t trun_version_mode;  // 1: `trun` version 1; otherwise the sample composition offsets decide
-    uint32_t tfdt_mode;          // 1: each track fragment gets a `tfdt`
+    uint32_t box_size_mode;      // MbxBoxSizeMode
+    uint32_t time_version_mode;  // MbxTimeVersionMode
+    uint32_t chunk_offset_mode;  // MbxChunkOffsetMode
+    uint32_t mehd_mode;          // MbxMehdMode
+    uint32_t base_offset_mode;   // MbxBaseOffsetMode
+    uint32_t trun_offset_mode;   // MbxTrunOffsetMode
+    uint32_t trun_version_mode;  // MbxTrunVersionMode
+    uint32_t tfdt_mode;          // MbxTfdtMode
     uint32_t reserved;           // 0
+};
+
+// Forms of MbxWriteWideMdatHeader. The numbers are not those of MbxBoxSizeMode.
+enum MbxMdatHeaderForm : uint32_t {
+    MBX_MDAT_HEADER_32 = 0,
+    MBX_MDAT_HEADER_64 = 1,  // always 16 bytes, so that it can be patched in place whatever the size
+    MBX_MDAT_HEADER_BY_VALUE = 2,
 };
 
 struct MbxSessionConfig {
@@ -113,6 +203,22 @@ struct MbxVideoProfile {
     uint16_t pairs[4][2];
 };
 
+// enable_mode of a track. 8 and 16 are as MBX_ENABLE_ALL, 6 as MBX_ENABLE_HIDDEN, 0xFFFFFFFF as
+// MBX_ENABLE_NONE.
+enum MbxEnableMode : uint32_t {
+    MBX_ENABLE_NONE = 0,    // `tkhd` flags 0
+    MBX_ENABLE_ALL = 1,     // flags 7: enabled, in the movie, in its preview
+    MBX_ENABLE_HIDDEN = 2,  // flags 6: the same, not enabled
+};
+
+// The default values of a fragment's samples: places in fragmentDefaults and defaultsForced.
+enum MbxSampleDefault : uint32_t {
+    MBX_DEFAULT_DESCRIPTION = 0,
+    MBX_DEFAULT_DURATION = 1,
+    MBX_DEFAULT_SIZE = 2,
+    MBX_DEFAULT_FLAGS = 3,
+};
+
 // A new track. A zeroed record with identifier, timescale, language and, for video, size and enable_mode is
 // complete. Metadata and audio tracks leave what they do not name at 0.
 struct MbxTrackParams {
@@ -121,7 +227,7 @@ struct MbxTrackParams {
     uint32_t stsdVersion;          // sound tracks only: version of `stsd` and of its audio entries
     uint32_t auxEnabled;           // the samples carry auxiliary information (`saiz`, `saio`, `senc`)
     uint32_t trickEnabled;         // the samples carry trick play bytes (`trik`)
-    uint32_t fragmentDefaults[4];  // `trex`: description index, duration, size, flags; 0 for "derive it"
+    uint32_t fragmentDefaults[4];  // `trex`, by MbxSampleDefault; 0 for "derive it"
     uint32_t defaultsForced[4];    // per default: 0 in `tfhd` only where it differs from `trex`, 1 always
     uint32_t perSampleForced[3];   // duration, size, flags: 1 writes the field on every sample of a `trun`
     uint32_t trackId;              // 1 to 639 or 1024 to 63487
@@ -130,13 +236,29 @@ struct MbxTrackParams {
     uint16_t height;
     uint16_t heightFraction;
     uint32_t timescale;    // ticks per second, not 0
-    uint16_t language;     // ISO 639-2/T, three times five bits
-    uint32_t enable_mode;  // video tracks only: `tkhd` flags, 1, 8, 16: 7; 2, 6: 6; 0, 0xFFFFFFFF: 0
+    uint16_t language;     // as MBX_LANGUAGE_ENGLISH
+    uint32_t enable_mode;  // MbxEnableMode; video tracks only
+};
+
+// The kinds of sample entry.
+enum MbxEntryKind : uint32_t {
+    MBX_ENTRY_MP4V = 1,
+    MBX_ENTRY_AVC1 = 2,
+    MBX_ENTRY_MP4A = 3,
+    MBX_ENTRY_SYSTEMS = 4,  // code given: a bare entry with an optional `esds`
+    MBX_ENTRY_PLAIN = 5,    // code given: head and four zero bytes
+    MBX_ENTRY_RTMD = 6,
+    MBX_ENTRY_PLAIN2 = 7,       // code given: as kind 5
+    MBX_ENTRY_GRAPHICS = 8,     // code given: a 32-byte body
+    MBX_ENTRY_GRAPHICS_3D = 9,  // code given: as kind 8, with a `3STP`
+    MBX_ENTRY_TEXT = 10,        // code given: three texts
+    MBX_ENTRY_HVC1 = 11,
+    MBX_ENTRY_TMCD = 12,
 };
 
 // A video sample entry.
 struct MbxVisualEntryParams {
-    uint32_t kind;                // 1 `mp4v`, 2 `avc1`, 11 `hvc1`
+    uint32_t kind;                // MBX_ENTRY_MP4V, MBX_ENTRY_AVC1 or MBX_ENTRY_HVC1
     uint32_t dataReferenceIndex;  // 1-based, as MbxAddDataReference returned it
     uint16_t width;               // in pixels
     uint16_t height;
@@ -153,10 +275,13 @@ struct MbxAudioEntryParams {
     uint16_t sampleSize;  // in bits
 };
 
+// Bits of MbxTimecodeEntryParams::flags.
+constexpr uint32_t MBX_TIMECODE_DROP_FRAME = 1;
+
 // A timecode sample entry, `tmcd`.
 struct MbxTimecodeEntryParams {
     uint32_t dataReferenceIndex;
-    uint32_t flags;          // 1: drop frame
+    uint32_t flags;          // MBX_TIMECODE_DROP_FRAME
     uint32_t timescale;      // ticks per second
     uint32_t frameDuration;  // in ticks
     uint8_t frameCount;      // frames per second, rounded
@@ -202,9 +327,15 @@ struct MbxHvcCValues {
     uint8_t lengthSizeMinusOne;
 };
 
+// What MbxEsdsParams::form says about which part of the parameters counts.
+enum MbxEsdsForm : uint32_t {
+    MBX_ESDS_FIELDS = 0,
+    MBX_ESDS_RAW = 1,
+};
+
 // The elementary stream descriptor of an entry, as fields or as ready bytes.
 struct MbxEsdsParams {
-    uint32_t form;  // 0: the fields, 1: the bytes of `raw`
+    uint32_t form;  // MbxEsdsForm
     uint8_t objectTypeIndication;
     uint8_t streamType;     // below 64
     uint8_t upStream;       // below 2
@@ -217,6 +348,9 @@ struct MbxEsdsParams {
     uint64_t rawSize;
 };
 
+// Type of the item that says how a track is used; of its data the first four bytes are `enable_mode`.
+constexpr uint32_t MBX_USAGE_TYPE = 10;
+
 // One item of user metadata. An item of the same type, language and encoding is replaced.
 struct MbxMetadataItemParams {
     uint32_t type;
@@ -228,7 +362,7 @@ struct MbxMetadataItemParams {
 };
 
 struct MbxTrackReferenceParams {
-    uint32_t type;     // four-character code, such as `cdsc`
+    uint32_t type;     // four-character code, such as MBX_REFERENCE_CDSC
     uint32_t trackId;  // the track referred to; 63488 to 65535 names a metadata track of the movie
 };
 
@@ -248,7 +382,7 @@ struct MbxSampleInfo {
     uint8_t dependencyLevel;  // six bits
 };
 
-// Bits of MbxSetMovieTimes' selector. UINT32_MAX selects all.
+// Bits of MbxSetMovieTimes' selector.
 enum MbxTimeSelector : uint32_t {
     MBX_TIME_MOVIE_CREATION = 1,
     MBX_TIME_MOVIE_MODIFICATION = 2,
@@ -258,4 +392,5 @@ enum MbxTimeSelector : uint32_t {
     MBX_TIME_MEDIA_MODIFICATION = 32,
     MBX_TIME_METADATA_CREATION = 64,
     MBX_TIME_METADATA_MODIFICATION = 128,
+    MBX_TIME_ALL = UINT32_MAX,
 };

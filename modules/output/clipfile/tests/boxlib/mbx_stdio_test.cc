@@ -9,7 +9,7 @@
 #include <filesystem>
 #include <fstream>
 
-#include "fixture.h"
+#include "boxlib/support/fixture.h"
 
 namespace {
 

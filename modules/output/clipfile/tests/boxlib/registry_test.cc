@@ -1,5 +1,5 @@
 // Properties that every box of the registry proves, and the proof that every box is in it.
-#include "registry.h"
+#include "boxlib/support/registry.h"
 
 #include <filesystem>
 #include <fstream>
@@ -164,7 +164,7 @@ std::string readFile(const std::filesystem::path& path) {
 std::set<std::string> declaredNames(const std::string& pattern) {
     static const std::set<std::string> kShared = {"box.h", "stream.h"};  // their helpers are named alike
     std::set<std::string> names;
-    for (const auto& entry : std::filesystem::directory_iterator(BOXLIB_SOURCE_DIR)) {
+    for (const auto& entry : std::filesystem::recursive_directory_iterator(BOXLIB_SOURCE_DIR)) {
         if (entry.path().extension() != ".h" || kShared.contains(entry.path().filename())) continue;
         const std::string text = readFile(entry.path());
         const std::regex expression("\\nMbxStatus " + pattern + "\\(");

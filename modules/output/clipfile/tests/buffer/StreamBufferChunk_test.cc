@@ -155,10 +155,12 @@ TEST(StreamBufferChunk, LateUnitsFindTheirPlace) {
         harness.buffer->PushMeta(harness.clock.Meta(n ^ 1U));
         harness.buffer->PushAudio(harness.clock.Audio((2 * n) ^ 1U));
         harness.buffer->PushAudio(harness.clock.Audio((2 * n + 1) ^ 1U));
+    }
+    // A chunk is cut as soon as the pictures are there: the other half of a pair would come too late for it.
+    ASSERT_TRUE(harness.WaitForCached(1, 120, 60));
+    for (std::uint64_t n = 1; n < 60; ++n) {
         const std::uint64_t inGroup[] = {0, 2, 1, 3};
-        if (n > 0) {
-            harness.buffer->PushVideo(harness.clock.Video(n - n % 4 + inGroup[n % 4]));
-        }
+        harness.buffer->PushVideo(harness.clock.Video(n - n % 4 + inGroup[n % 4]));
     }
     harness.nextVideo = 60;
     harness.nextAudio = 120;

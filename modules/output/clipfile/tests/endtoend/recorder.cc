@@ -8,6 +8,7 @@
 #include "endtoend/LoadedModule.h"
 #include "endtoend/PacedPush.h"
 #include "endtoend/RecorderProgress.h"
+#include "support/CodedMedia.h"
 #include "support/FakeHost.h"
 #include "support/SharedMemory.h"
 
@@ -18,7 +19,9 @@ int record(const char* media, const char* output, const char* fileType, const ch
     const SharedMemory<RecorderProgress> progress(progressPath);
     FakeHost host;
     host.texts = {{"-outputPath", output}, {"-fileType", fileType}};
-    host.numbers["-encodedFPS"] = 25000;
+    host.numbers = {{"-encodedFPS", 25000},
+                    {"-encodedWidth", static_cast<int>(kCodedWidth)},
+                    {"-encodedHeight", static_cast<int>(kCodedHeight)}};
     LoadedModule library;
     if (!library.Module().Initialize(&host)) {
         return 1;

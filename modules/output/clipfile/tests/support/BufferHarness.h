@@ -17,8 +17,9 @@
 
 /// A recording with recorders at both of its ends, and a stream to push into it.
 ///
-/// The chunk thread makes one pass for each unit that finds it waiting; a unit that comes while it works
-/// wakes nobody. What waits for the chunk thread therefore keeps the stream running.
+/// The chunk thread makes one pass for each unit that finds it waiting, once a pass could do anything; a unit
+/// that comes while it works wakes nobody. What waits for the chunk thread therefore keeps the stream
+/// running.
 class BufferHarness {
  public:
     explicit BufferHarness(stream_units::StreamClock streamClock = {}, std::int64_t start = 0,

@@ -13,7 +13,7 @@ namespace clipfileModule {
 /// A bounded first-in first-out queue between threads. `Q` is the container adaptor that holds the items.
 ///
 /// Any thread may call any operation. A queue that was closed takes nothing more and lets nobody wait; one
-/// that was finished does the same once it is empty.
+/// that was finished does the same once it is empty. It must outlive every operation on it.
 template <typename T, typename Q>
 class BlockingQueue {
  public:
@@ -25,17 +25,20 @@ class BlockingQueue {
     /// True when the item went in, false when it was dropped: the queue is full and `dropWhenFull`, finished
     /// or closed.
     bool Push(T item) {
-        MutexLock lock(mutex);
-        while (queue.size() >= capacity && !finished) {
-            if (dropWhenFull) {
+        {
+            MutexLock lock(mutex);
+            while (queue.size() >= capacity && !finished) {
+                if (dropWhenFull) {
+                    return false;
+                }
+                lock.Wait(notFull);
+            }
+            if (finished) {
                 return false;
             }
-            lock.Wait(notFull);
+            queue.push(std::move(item));
         }
-        if (finished) {
-            return false;
-        }
-        queue.push(std::move(item));
+        // Who is woken wants the lock: it is free by then.
         notEmpty.notify_one();
         return true;
     }
@@ -43,15 +46,18 @@ class BlockingQueue {
     /// Waits for an item and takes it from the front. Gives a default `T` once the queue is closed, whatever
     /// it still holds, and once it is finished and empty.
     T Pop() {
-        MutexLock lock(mutex);
-        while (queue.empty() && !finished) {
-            lock.Wait(notEmpty);
+        T item{};
+        {
+            MutexLock lock(mutex);
+            while (queue.empty() && !finished) {
+                lock.Wait(notEmpty);
+            }
+            if (closed || queue.empty()) {
+                return item;
+            }
+            item = std::move(queue.front());
+            queue.pop();
         }
-        if (closed || queue.empty()) {
-            return T();
-        }
-        T item = std::move(queue.front());
-        queue.pop();
         notFull.notify_one();
         return item;
     }

@@ -278,13 +278,17 @@ void StreamBuffer::changeState(const std::shared_ptr<CacheState>& next) {
 // Contract: media-word-unused. The last argument.
 void StreamBuffer::addToCache(const std::shared_ptr<StreamData>& unit, UnitList StreamBuffer::*cache,
                               const char* /*mediaType*/) {
+    bool due = false;
     {
         MutexLock lock(bufferMutex);
         UnitList& units = this->*cache;
         // Contract: sorted-insertion. The cache is in order; a late unit goes behind those of its own time.
         units.insert(std::upper_bound(units.begin(), units.end(), unit, byRtpTimestamp), unit);
+        due = isPassDue();
     }
-    bufferCondition.notify_one();
+    if (due) {
+        bufferCondition.notify_one();
+    }
 }
 
 void StreamBuffer::SetVideoSequenceHeader(const nal_access::NalUnit& sps, const nal_access::NalUnit& pps,

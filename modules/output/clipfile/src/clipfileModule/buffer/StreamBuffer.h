@@ -132,6 +132,8 @@ class StreamBuffer final : public QxModuleStreamInterface,
     void makeChunk() EXCLUDES(stateMutex, bufferMutex);
     void endSync() EXCLUDES(stateMutex, bufferMutex);
     PassResult findPassedLimit() const REQUIRES(bufferMutex);
+    /// Whether a pass would do, log or decide anything: the chunk thread sleeps until then.
+    bool isPassDue() const REQUIRES(bufferMutex);
     PassResult makePass() REQUIRES(bufferMutex);
     ChunkEnd findChunkEnd(std::size_t pictures) REQUIRES(bufferMutex);
     std::optional<ChunkCounts> findChunk(std::size_t pictures, std::uint64_t end) REQUIRES(bufferMutex);

@@ -103,6 +103,23 @@ void StreamBuffer::makeChunk() {
     }
 }
 
+bool StreamBuffer::isPassDue() const {
+    if (findPassedLimit() != kGoOn) {
+        return true;
+    }
+    if (videoBuffer.empty()) {
+        return false;
+    }
+    if (videoBuffer.size() >= kMinimumVideoUnits) {
+        return true;
+    }
+    if (isExact()) {
+        // What comes before the first chunk may head the record, and is cut back pass by pass.
+        return chunkedVideo == 0 || findEnd() <= videoBuffer.back()->rtp_timestamp;
+    }
+    return static_cast<std::uint64_t>(stopTimestamp.load()) < videoBuffer.front()->rtp_timestamp;
+}
+
 PassResult StreamBuffer::makePass() {
     if (videoBuffer.empty()) {
         return kGoOn;

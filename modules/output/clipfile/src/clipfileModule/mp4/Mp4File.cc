@@ -7,18 +7,14 @@
 
 #include "common/Log.h"
 #include "mp4/FileAccess.h"
-#include "mp4/FourCc.h"
 #include "mp4/MuxerRoutine.h"
 
 namespace clipfileModule {
 
 namespace {
 
-constexpr std::uint32_t kBrand = FourCc("ZQVC");
+constexpr std::uint32_t kBrand = MbxCode("ZQVC");
 constexpr std::uint32_t kMinorVersion = 0x01001FFF;
-
-/// The 16-byte header of `mdat`, which takes any payload when it is patched at the end.
-constexpr std::uint32_t kLargeHeader = 1;
 
 /// Names that are tried for one timecode. In a day's directory no recorder leaves as many: with a file for
 /// each 0.32 s, the shortest distance of two points where sound and picture are in step, it is 270,000.
@@ -74,7 +70,7 @@ bool Mp4File::Uninitialize() {
 void Mp4File::FillSessionConfig(MbxSessionConfig& config) {
     config = {};
     // Contract: wide-offsets-always. Also where 32 bits would do.
-    config.options.chunk_offset_mode = 2;
+    config.options.chunk_offset_mode = MBX_OFFSETS_64;
 }
 
 void Mp4File::Reset() {
@@ -168,7 +164,7 @@ MbxStatus Mp4File::createFile(MuxerRoutine& routine, bool dropFrame) {
     m_info.MakeInputStreamInfo(m_stream);
     if (!dropFrame) {
         // Contract: drop-frame-needs-both. The rate's bit is a permission; the flag decides.
-        m_info.tmcd_m_data_type_it &= ~1U;
+        m_info.tmcd_m_data_type_it &= ~MBX_TIMECODE_DROP_FRAME;
     }
     MUXER_STEP(routine, createFtyp());
     MUXER_STEP(routine, createUuidProf());
@@ -179,7 +175,7 @@ MbxStatus Mp4File::createFile(MuxerRoutine& routine, bool dropFrame) {
 MbxStatus Mp4File::createFtyp() {
     MUXER_ROUTINE(routine);
     MUXER_STEP(routine, MbxCreateFileType(m_session.get(), kBrand, kMinorVersion));
-    for (const std::uint32_t brand : {kBrand, FourCc("mp42"), FourCc("iso2")}) {
+    for (const std::uint32_t brand : {kBrand, MbxCode("mp42"), MbxCode("iso2")}) {
         MUXER_STEP(routine, MbxAddCompatibleBrand(m_session.get(), brand));
     }
     std::uint64_t size = 0;
@@ -191,8 +187,8 @@ MbxStatus Mp4File::createFtyp() {
 MbxStatus Mp4File::beginMdat(MuxerRoutine& routine) {
     m_mdat_position = m_position;
     std::uint64_t size = 0;
-    MUXER_STEP(routine, MbxWriteWideMdatHeader(m_session.get(), kLargeHeader, m_file.get(), m_mdat_position,
-                                               FourCc("mdat"), 0, &size));
+    MUXER_STEP(routine, MbxWriteWideMdatHeader(m_session.get(), MBX_MDAT_HEADER_64, m_file.get(),
+                                               m_mdat_position, MBX_BOX_MDAT, 0, &size));
     m_position += size;
     MUXER_STEP(routine, seekTo(m_position));
     return routine.Return(MBX_OK);
@@ -242,8 +238,8 @@ bool Mp4File::Close() {
 
 MbxStatus Mp4File::completeFile(MuxerRoutine& routine) {
     std::uint64_t size = 0;
-    MUXER_STEP(routine, MbxWriteWideMdatHeader(m_session.get(), kLargeHeader, m_file.get(), m_mdat_position,
-                                               FourCc("mdat"), m_payload, &size));
+    MUXER_STEP(routine, MbxWriteWideMdatHeader(m_session.get(), MBX_MDAT_HEADER_64, m_file.get(),
+                                               m_mdat_position, MBX_BOX_MDAT, m_payload, &size));
     // Samples were entered with their distance from the start of the payload.
     MUXER_STEP(routine, MbxShiftChunkOffsets(m_session.get(), 0, 0, static_cast<std::int64_t>(m_position)));
     m_position += m_payload;
@@ -266,8 +262,9 @@ MbxStatus Mp4File::closeFile() {
 }
 
 MbxStatus Mp4File::seekTo(std::uint64_t position) {
-    return m_callbacks.seek(m_file.get(), static_cast<std::int64_t>(position), 0) == MBX_OK ? MBX_OK
-                                                                                            : MBX_ERR_IO;
+    return m_callbacks.seek(m_file.get(), static_cast<std::int64_t>(position), MBX_SEEK_START) == MBX_OK
+               ? MBX_OK
+               : MBX_ERR_IO;
 }
 
 LocalTime Mp4File::localOpenTime() const {

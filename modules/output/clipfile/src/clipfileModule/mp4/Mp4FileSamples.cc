@@ -133,7 +133,7 @@ MbxStatus Mp4File::writeTmcd(const unsigned char* timecode) {
     m_payload += kTimecodeSize;
     MUXER_STEP(routine, MbxEndChunk(m_session.get(), m_track_ids[kTimecodeTrack]));
 
-    const bool dropFrame = (m_info.tmcd_m_data_type_it & 1U) != 0;
+    const bool dropFrame = (m_info.tmcd_m_data_type_it & MBX_TIMECODE_DROP_FRAME) != 0;
     const std::uint32_t value = FrameNumber(timecode, m_info.timecode_numFrames, dropFrame);
     MUXER_STEP(routine,
                storeTimecode({static_cast<std::uint8_t>(value >> 24), static_cast<std::uint8_t>(value >> 16),

@@ -2,10 +2,8 @@
 
 #include <cstddef>
 #include <iterator>
-#include <limits>
 
 #include "common/Log.h"
-#include "mp4/FourCc.h"
 #include "mp4/FrameNumber.h"
 #include "mp4/InputStreamInfo.h"
 #include "mp4/Mp4File.h"
@@ -21,13 +19,7 @@ constexpr std::uint32_t kNormalProfile = 0x20000000;
 constexpr std::uint32_t kVideoTrackId = 1;
 constexpr std::uint32_t kAudioTrackId = 2;
 
-/// ISO 639-2/T codes, three letters of five bits each.
-constexpr std::uint16_t kEnglish = 0x15C7;
-constexpr std::uint16_t kUndetermined = 0x55C4;
-
 constexpr std::uint16_t kAudioChannels = 2;
-constexpr std::uint32_t kAvcEntry = 2;
-constexpr std::uint32_t kUsageItem = 10;
 
 /// A reference to this very file.
 MbxStatus addOwnFile(MbxSession* session, std::uint32_t track, std::uint32_t& index) {
@@ -59,7 +51,7 @@ MbxStatus Mp4File::createAprf() {
     // Contract: always-aac-lc. Constants, whatever the stream carries.
     m_aprf = {{
         kAudioTrackId,
-        FourCc("mp4a"),
+        MBX_CODE_MP4A,
         // Contract: profile-numbers. This one, and 00030000 below; readers of the box know what they mean.
         553,
         0,
@@ -78,7 +70,7 @@ MbxStatus Mp4File::createVprf() {
     const auto fraction = static_cast<std::uint16_t>(m_info.video_average_framerate_point);
     // Contract: bit-rate-as-given. In the host's unit.
     m_vprf = {
-        {kVideoTrackId, FourCc("avc1"), m_info.video_codec_specific_information, 0x00030000,
+        {kVideoTrackId, MBX_CODE_AVC1, m_info.video_codec_specific_information, 0x00030000,
          m_info.video_average_bitrate, m_info.video_max_bitrate},
         {{rate, fraction},                                     // average
          {rate, fraction},                                     // maximum
@@ -104,8 +96,8 @@ MbxTrackParams Mp4File::trackParams(std::uint32_t trackId, std::uint32_t timesca
     params.noEditList = hasEdits() ? 0 : 1;
     params.trackId = trackId;
     params.timescale = timescale;
-    params.language = kEnglish;
-    params.enable_mode = 1;
+    params.language = MBX_LANGUAGE_ENGLISH;
+    params.enable_mode = MBX_ENABLE_ALL;
     return params;
 }
 
@@ -122,7 +114,7 @@ MbxStatus Mp4File::createVideoTrack() {
 
     MbxVisualEntryParams visual = {};
     // Contract: always-avc1. Nothing looks at the codec.
-    visual.kind = kAvcEntry;
+    visual.kind = MBX_ENTRY_AVC1;
     MUXER_STEP(routine, addOwnFile(session, track, visual.dataReferenceIndex));
     visual.width = m_info.video_size_width;
     visual.height = m_info.video_size_height;
@@ -190,8 +182,7 @@ MbxStatus Mp4File::createTimcdTrack() {
         // leaves the size to `trex`. A file that is cut off before its `moov` is written again has to tell it
         // too: readers refuse a whole file for a sample of no size. With exact rules the fragment tells it
         // itself.
-        static constexpr std::size_t kSize = 2;
-        params.fragmentDefaults[kSize] = kTimecodeSize;
+        params.fragmentDefaults[MBX_DEFAULT_SIZE] = kTimecodeSize;
     }
     MUXER_STEP(routine, MbxAddTimecodeTrack(session, &params, &track));
 
@@ -206,8 +197,8 @@ MbxStatus Mp4File::createTimcdTrack() {
     // Contract: usage-items-differ. Other tracks get their enable mode and zeros.
     static constexpr std::uint8_t kUsage[] = {0xFF, 0xFF, 0xFF, 0xFF, 0x00, 0x00, 0xFF, 0xFF};
     MbxMetadataItemParams item = {};
-    item.type = kUsageItem;
-    item.language = kUndetermined;
+    item.type = MBX_USAGE_TYPE;
+    item.language = MBX_LANGUAGE_UNDETERMINED;
     item.data = kUsage;
     item.dataSize = sizeof kUsage;
     MUXER_STEP(routine, MbxAddTrackMetadata(session, track, &item));
@@ -226,7 +217,7 @@ MbxStatus Mp4File::createRtmtaTrack() {
     MUXER_STEP(routine, MbxAddMetaTrack(session, &params, &track));
 
     // The metadata describes the video.
-    const MbxTrackReferenceParams reference = {FourCc("cdsc"), m_vprf.words[0]};
+    const MbxTrackReferenceParams reference = {MBX_REFERENCE_CDSC, m_vprf.words[0]};
     std::uint32_t target = 0;
     MUXER_STEP(routine, MbxAddTrackReference(session, track, &reference, &target));
 
@@ -259,8 +250,7 @@ MbxStatus Mp4File::updateTimestamp() {
     const MbxStatus converted = MbxToMp4Time(m_context.get(), &date, &seconds);
     // Contract: one-time-failure-counts. There is no other.
     MUXER_STEP(routine, converted == MBX_ERR_INVALID_ARG ? converted : MBX_OK);
-    MUXER_STEP(routine, MbxSetMovieTimes(m_session.get(), 0, std::numeric_limits<std::uint32_t>::max(),
-                                         seconds, seconds));
+    MUXER_STEP(routine, MbxSetMovieTimes(m_session.get(), 0, MBX_TIME_ALL, seconds, seconds));
     return routine.Return(MBX_OK);
 }
 

@@ -5,7 +5,6 @@
 #include <vector>
 
 #include "common/Log.h"
-#include "mp4/FourCc.h"
 #include "mp4/MuxerRoutine.h"
 
 namespace clipfileModule {
@@ -13,7 +12,6 @@ namespace clipfileModule {
 namespace {
 
 constexpr std::uint32_t kFragmentProfile = 0x30000000;
-constexpr std::uint32_t kMdat = FourCc("mdat");
 
 }  // namespace
 
@@ -23,7 +21,7 @@ void Mp4FragmentMuxer::FillSessionConfig(MbxSessionConfig& config) {
     config = {};
     // Contract: fragment-below-4-gib. All other modes 0: sizes and `stco` of 32 bits.
     // Contract: fragments-without-tfdt. And with absolute offsets.
-    config.options.mehd_mode = 1;
+    config.options.mehd_mode = MBX_MEHD_BY_VALUE;
 }
 
 void Mp4FragmentMuxer::Reset() {
@@ -205,13 +203,13 @@ MbxStatus Mp4FragmentMuxer::forceLateDefaults() {
 }
 
 MbxStatus Mp4FragmentMuxer::measureMdatHeader(std::uint64_t& size) {
-    return MbxWriteMdatHeader(m_session.get(), nullptr, 0, kMdat, 0, &size);
+    return MbxWriteMdatHeader(m_session.get(), nullptr, 0, MBX_BOX_MDAT, 0, &size);
 }
 
 MbxStatus Mp4FragmentMuxer::writeMdat(MuxerRoutine& routine) {
     std::uint64_t size = 0;
-    MUXER_STEP(routine,
-               MbxWriteMdatHeader(m_session.get(), m_file.get(), m_position, kMdat, m_flush->payload, &size));
+    MUXER_STEP(routine, MbxWriteMdatHeader(m_session.get(), m_file.get(), m_position, MBX_BOX_MDAT,
+                                           m_flush->payload, &size));
     m_position += size;
     MUXER_STEP(routine, seekTo(m_position));
     for (const auto& chunk : m_flush->chunks) {

@@ -1,4 +1,4 @@
-#include "IsoReader.h"
+#include "boxlib/support/IsoReader.h"
 
 #include <algorithm>
 #include <map>

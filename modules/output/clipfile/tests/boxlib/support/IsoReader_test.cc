@@ -1,6 +1,6 @@
-#include "IsoReader.h"
+#include "boxlib/support/IsoReader.h"
 
-#include "../fixture.h"
+#include "boxlib/support/fixture.h"
 
 namespace {
 

@@ -1,0 +1,51 @@
+#include "journal/ChildProgram.h"
+
+#include <gtest/gtest.h>
+#include <signal.h>
+
+#include <chrono>
+#include <thread>
+
+namespace receiver {
+namespace {
+
+TEST(ChildProgram, GivesWhatItSaysAndItsCode) {
+    const ChildResult result = ChildProgram().Run({"/bin/sh", "-c", "echo one; echo two >&2; exit 3"});
+    EXPECT_EQ(result.code, 3);
+    EXPECT_EQ(result.text, "one\ntwo\n");
+}
+
+TEST(ChildProgram, ThatIsMissingIsNotStarted) {
+    const ChildResult result = ChildProgram().Run({"/nowhere/clipfile", "recover"});
+    EXPECT_EQ(result.code, -1);
+    EXPECT_EQ(result.text, "No such file or directory");
+}
+
+TEST(ChildProgram, ThatIsKilledHasNoCode) {
+    EXPECT_EQ(ChildProgram().Run({"/bin/sh", "-c", "kill -9 $$"}).code, -1);
+}
+
+TEST(ChildProgram, TakesOverNeitherBlockedSignalsNorTheLog) {
+    sigset_t blocked;
+    sigset_t before;
+    sigfillset(&blocked);
+    ASSERT_EQ(pthread_sigmask(SIG_BLOCK, &blocked, &before), 0);
+    setenv("QX_LOG", "/dev/full", 1);
+    const ChildResult result =
+        ChildProgram().Run({"/bin/sh", "-c", "grep SigBlk /proc/self/status; echo \"log=$QX_LOG\"; cat"});
+    ASSERT_EQ(pthread_sigmask(SIG_SETMASK, &before, nullptr), 0);
+    EXPECT_EQ(result.text, "SigBlk:\t0000000000000000\nlog=\n");
+}
+
+TEST(ChildProgram, IsKilledWithItsRun) {
+    ChildProgram program;
+    std::thread end([&] { program.End(); });
+    const auto began = std::chrono::steady_clock::now();
+    EXPECT_EQ(program.Run({"/bin/sh", "-c", "exec sleep 1000"}).code, -1);
+    EXPECT_LT(std::chrono::steady_clock::now() - began, std::chrono::seconds(500));
+    end.join();
+    EXPECT_EQ(program.Run({"/bin/true"}).code, -1);
+}
+
+}  // namespace
+}  // namespace receiver

@@ -1,6 +1,0 @@
-#include "registry.h"
-
-std::vector<BoxRow>& BoxRows() {
-    static std::vector<BoxRow> rows;
-    return rows;
-}

@@ -1,0 +1,6 @@
+#include "boxlib/support/registry.h"
+
+std::vector<BoxRow>& BoxRows() {
+    static std::vector<BoxRow> rows;
+    return rows;
+}
