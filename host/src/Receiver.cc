@@ -121,6 +121,9 @@ void Running::PrepareOutput(const OutputPlace& place) {
         display_.Notice("made the output folder " + place.folder);
     }
     ExpectDatedFolders(*folder_, place.prefix, std::time(nullptr));
+    if (const std::string leftover = folder_->TakeLeftover(); !leftover.empty()) {
+        display_.Notice(leftover);
+    }
     if (const auto warning = SetUpLog(options_, place)) {
         display_.Notice(*warning);
     }
@@ -248,6 +251,9 @@ void Running::Loop(SourceInterface& source, Recorder& recorder) {
 void Running::CheckFolder() {
     if (const std::optional<std::string> warning = watch_->TakeWarning()) {
         display_.Notice("tomorrow nothing can be recorded: " + *warning);
+    }
+    if (const std::optional<std::string> leftover = watch_->TakeLeftover()) {
+        display_.Notice(*leftover);
     }
     const std::string obstacle = watch_->Obstacle();
     if (!obstacle.empty()) {

@@ -16,7 +16,7 @@ const std::map<std::pair<int, int>, const char*>& Words() {
         {{6, 24}, "more than 900 audio units wait for the other media"},
         {{6, 25}, "more than 600 metadata units wait for the other media"},
         {{6, 26}, "the host went offline while a recording ran"},
-        {{7, 2}, "no output path is set, or there is no memory for a file"},
+        {{7, 2}, "no output path is set, or there is no memory or no thread"},
         {{7, 21}, "the credentials for a share were refused"},
         {{7, 22}, "the free space of the output path cannot be read"},
         {{7, 23}, "the disk is full: less than 150 MiB are free"},

@@ -29,6 +29,7 @@ QueuedSource::QueuedSource(std::unique_ptr<ProducerInterface> producer, std::sha
       capacity_(capacity),
       refill_(pacer.Live() ? 1 : std::min(kRefill, capacity)),
       resume_(pacer.Live() ? capacity - 1 : capacity / 2),
+      resumeBytes_(pacer.Live() ? kQueueBytes - 1 : kQueueBytes / 2),
       listener_(listener),
       pacer_(pacer),
       description_(producer_->Description()),
@@ -135,7 +136,8 @@ SourceInterface::Result QueuedSource::Read(SourceUnit& unit) {
 
 void QueuedSource::DropFront() {
     queue_.pop_front();
-    if (full_ && queue_.size() <= resume_ && queued_ < kQueueBytes) {
+    const bool room = queue_.size() <= resume_ && queued_ <= resumeBytes_;
+    if (full_ && (room || queue_.empty())) {
         full_ = false;
         room_.notify_one();
     }

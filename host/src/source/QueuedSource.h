@@ -44,9 +44,10 @@ class QueuedSource final : public SourceInterface {
     const std::size_t capacity_;
     /// Units that must wait before the reader who found none goes on.
     const std::size_t refill_;
-    /// The producer that had no room goes on when no more than so many wait: of a live source as soon as
-    /// there is any, since the network does not wait.
+    /// The producer that had no room goes on when no more than so many wait, of so many bytes: of a live
+    /// source as soon as there is any room, since the network does not wait.
     const std::size_t resume_;
+    const std::size_t resumeBytes_;
     SourceListenerInterface& listener_;
     /// Of the reading thread alone.
     Pacer pacer_;

@@ -130,17 +130,58 @@ TEST_F(AudioRunsTest, ARunInFrontOfAStepBackGoesOn) {
     EXPECT_EQ(Passed(), (Numbers{100, 101}));
 }
 
-/// Without frame headers nobody can tell a loss from a sender whose stamps do not fit.
-TEST_F(AudioRunsTest, StampsThatNeverFitCountForNothing) {
-    const auto put = [this](std::int64_t number) {
-        auto packet = Frame(number, kSize - 1);
-        packet->pos = number * 188 + 1;
-        Put(std::move(packet));
-    };
-    for (const std::int64_t number : {0, 2, 4, 6, 8}) {
-        put(number);
+/// A frame of MP2 (ISO/IEC 11172-3): it has a header of its own, which is none of AAC.
+libav::Owner<AVPacket> OtherFrame(std::int64_t pts, std::int64_t pos) {
+    libav::Owner<AVPacket> packet = libav::NewPacket();
+    EXPECT_EQ(av_new_packet(packet.get(), kSize), 0);
+    std::memset(packet->data, 0x55, kSize);
+    packet->pts = pts;
+    packet->duration = 2160;
+    packet->pos = pos;
+    return packet;
+}
+
+/// Stamps that jitter, and a pause.
+TEST_F(AudioRunsTest, WithoutFrameHeadersAllThatIsNotMarkedGoesOnAtOnce) {
+    std::int64_t pos = 0;
+    for (const std::int64_t pts : {0, 2160 + 1300, 4320, 6480 + 1300, 120000}) {
+        EXPECT_EQ(runs_.Put(OtherFrame(pts, pos += 188), kTicks).size(), 1u);
     }
-    EXPECT_EQ(Passed(), Numbers{6});
+    EXPECT_EQ(runs_.Damaged(), 0u);
+    auto marked = OtherFrame(122160, pos);
+    marked->flags |= AV_PKT_FLAG_CORRUPT;
+    EXPECT_TRUE(runs_.Put(std::move(marked), kTicks).empty());
+    EXPECT_EQ(runs_.Damaged(), 1u);
+}
+
+TEST_F(AudioRunsTest, NoMoreThanFourTenthsOfASecondAreHeld) {
+    PutFirst(0);
+    // 18 frames last 0.384 s, 19 are more than 0.4 s.
+    for (std::int64_t number = 1; number <= 18; ++number) {
+        Put(Frame(number));
+    }
+    EXPECT_EQ(Passed(), Numbers{});
+    Put(Frame(19));
+    EXPECT_EQ(Passed().size(), 20u);
+}
+
+TEST_F(AudioRunsTest, AMarkedRunOfThatLengthIsNotProved) {
+    PutFirst(0, AV_PKT_FLAG_CORRUPT);
+    for (std::int64_t number = 1; number <= 18; ++number) {
+        Put(Frame(number));
+    }
+    Put(Frame(19));
+    EXPECT_EQ(Passed(), Numbers{19});
+    EXPECT_EQ(runs_.Damaged(), 19u);
+}
+
+/// The sound pauses, and the pictures go on.
+TEST_F(AudioRunsTest, ARunGoesOnWhenPicturesAreASecondFurther) {
+    PutFirst(10);
+    Put(Frame(11));
+    EXPECT_TRUE(runs_.Expire(11 * kFrame + 90000, kTicks).empty());
+    EXPECT_EQ(runs_.Expire(11 * kFrame + 90001, kTicks).size(), 2u);
+    EXPECT_TRUE(runs_.Expire(11 * kFrame + 900000, kTicks).empty());
 }
 
 }  // namespace

@@ -318,20 +318,6 @@ void StreamBuffer::SetVideoSequenceHeader(const nal_access::NalUnit& sps, const 
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
-void StreamBuffer::startWriter() {
-    try {
-        fileOutput->Start(settings);
-    } catch (const std::system_error& error) {
-        if (!isExact()) {
-            throw;
-        }
-        CLIPFILE_LOG(LOG_PRIORITY_ERROR, "recording cannot be started. %s.", error.what());
-        // The chunk thread ends the recording: no status may leave here, under the locks of states and list.
-        writerMissing = true;
-        bufferCondition.notify_one();
-    }
-}
-
 void StreamBuffer::removeBefore(UnitList& cache, std::uint64_t limit) {
     CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "start. ts = %llu", static_cast<unsigned long long>(limit));
     auto end = cache.begin();
@@ -372,18 +358,6 @@ void StreamBuffer::setError(int code) {
     if (stateId == kErrorState) {
         controller->PostEvent(std::make_shared<RestartStreamingEvent>(shared_from_this()));
     }
-}
-
-void StreamBuffer::endWithoutThread() {
-    {
-        MutexLock lock(stateMutex);
-        if (stateId != kWaitStartState && stateId != kStartState) {
-            return;
-        }
-        changeState(std::make_shared<ErrorCacheState>(this));
-    }
-    controller->SetStatus(7, 26);
-    NotifyEndSync();
 }
 
 bool StreamBuffer::MakeFileTimecode(const std::shared_ptr<ChunkData>& chunk) {
