@@ -47,8 +47,22 @@ void CrashRecovery::Follow(const ModuleReport& report) {
     if (const auto warning = journal_->TakeWarning()) {
         display_.Notice(*warning);
     }
+    Tell();
+}
+
+void CrashRecovery::Tell() {
+    if (!recovery_) {
+        return;
+    }
     for (const std::string& sentence : recovery_->TakeSentences()) {
         display_.Notice(sentence);
+    }
+}
+
+void CrashRecovery::End() {
+    if (recovery_) {
+        recovery_->End();
+        Tell();
     }
 }
 

@@ -24,6 +24,10 @@ class CrashRecovery {
     void LookAt(const SourceUnit& unit);
     /// Follows the files of the run, and tells what there is to tell.
     void Follow(const ModuleReport& report);
+    /// Tells what there is to tell of earlier files.
+    void Tell();
+    /// Stops recovering, and tells what has become of each file.
+    void End();
     /// The operator agrees to what was asked. False when nothing was.
     bool Agree() { return recovery_ && recovery_->Agree(); }
 

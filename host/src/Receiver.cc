@@ -142,6 +142,7 @@ ExitCode Running::Record(const SourceOpener& open) {
 
     const std::unique_ptr<SourceInterface> source = open(options_.source, *this, QuitAsked);
     if (source == nullptr) {
+        recovery_->End();
         display_.Finish({});
         return ExitCode::kSuccess;
     }
@@ -195,6 +196,7 @@ ExitCode Running::Record(const SourceOpener& open) {
     if (failure) {
         summary.exitCode = failure->Code();
     }
+    recovery_->End();
     display_.Finish(summary);
     if (failure) {
         display_.Failure(failure->Code(), WithFullStop(failure->what()));
@@ -280,6 +282,9 @@ bool Running::QuitAsked() {
         return false;
     }
     run->TakeKeys();
+    if (run->recovery_) {
+        run->recovery_->Tell();
+    }
     return run->quit_ || run->signals_.QuitRequested();
 }
 

@@ -7,8 +7,8 @@
 #include <memory>
 #include <optional>
 #include <string>
-#include <thread>
 
+#include "common/PatientThread.h"
 #include "output/OutputFolder.h"
 
 namespace receiver {
@@ -54,7 +54,7 @@ class FolderWatch {
     static void look(State& state);
 
     const std::shared_ptr<State> state_;
-    std::thread thread_;
+    PatientThread thread_;
 };
 
 }  // namespace receiver
