@@ -92,7 +92,9 @@ void BM_SmbclientPut(benchmark::State& state) {
             file.write(block.data(), static_cast<std::streamsize>(block.size()));
         }
     }
-    const std::string command = "smbclient -A '" + (directory.Path() / "login").string() + "' -p " +
+    // Signed, as the connection of a user is.
+    const std::string command = "smbclient --option='client signing = required' -A '" +
+                                (directory.Path() / "login").string() + "' -p " +
                                 std::to_string(server.Port()) + " //127.0.0.1/rec -c 'put \"" +
                                 (directory.Path() / "file").string() + "\" file' >/dev/null 2>&1";
     const double before = processorSeconds(RUSAGE_CHILDREN);

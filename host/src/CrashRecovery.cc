@@ -47,23 +47,16 @@ void CrashRecovery::Follow(const ModuleReport& report) {
     if (const auto warning = journal_->TakeWarning()) {
         display_.Notice(*warning);
     }
-    Tell();
-}
-
-void CrashRecovery::Tell() {
-    if (!recovery_) {
-        return;
-    }
     for (const std::string& sentence : recovery_->TakeSentences()) {
         display_.Notice(sentence);
     }
 }
 
-void CrashRecovery::End() {
+void CrashRecovery::End(const ModuleReport& report) {
     if (recovery_) {
         recovery_->End();
-        Tell();
     }
+    Follow(report);
 }
 
 }  // namespace receiver

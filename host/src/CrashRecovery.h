@@ -24,10 +24,8 @@ class CrashRecovery {
     void LookAt(const SourceUnit& unit);
     /// Follows the files of the run, and tells what there is to tell.
     void Follow(const ModuleReport& report);
-    /// Tells what there is to tell of earlier files.
-    void Tell();
-    /// Stops recovering, and tells what has become of each file.
-    void End();
+    /// The run is over: stops what goes on in the background, and tells the rest.
+    void End(const ModuleReport& report);
     /// The operator agrees to what was asked. False when nothing was.
     bool Agree() { return recovery_ && recovery_->Agree(); }
 

@@ -121,6 +121,9 @@ void Running::PrepareOutput(const OutputPlace& place) {
         display_.Notice("made the output folder " + place.folder);
     }
     ExpectDatedFolders(*folder_, place.prefix, std::time(nullptr));
+    if (const std::string leftover = folder_->TakeLeftover(); !leftover.empty()) {
+        display_.Notice(leftover);
+    }
     if (const auto warning = SetUpLog(options_, place)) {
         display_.Notice(*warning);
     }
@@ -142,7 +145,7 @@ ExitCode Running::Record(const SourceOpener& open) {
 
     const std::unique_ptr<SourceInterface> source = open(options_.source, *this, QuitAsked);
     if (source == nullptr) {
-        recovery_->End();
+        recovery_->End(report_);
         display_.Finish({});
         return ExitCode::kSuccess;
     }
@@ -192,11 +195,11 @@ ExitCode Running::Record(const SourceOpener& open) {
     commands_.Close("the run is over");
     plan_.Finish();
     TellMissed();
+    recovery_->End(report_);
     Summary summary = Summarise(*source, *recorderSettings.past);
     if (failure) {
         summary.exitCode = failure->Code();
     }
-    recovery_->End();
     display_.Finish(summary);
     if (failure) {
         display_.Failure(failure->Code(), WithFullStop(failure->what()));
@@ -250,6 +253,9 @@ void Running::CheckFolder() {
     if (const std::optional<std::string> warning = watch_->TakeWarning()) {
         display_.Notice("tomorrow nothing can be recorded: " + *warning);
     }
+    if (const std::optional<std::string> leftover = watch_->TakeLeftover()) {
+        display_.Notice(*leftover);
+    }
     const std::string obstacle = watch_->Obstacle();
     if (!obstacle.empty()) {
         throw ReceiverError(ExitCode::kOutput, obstacle);
@@ -282,9 +288,7 @@ bool Running::QuitAsked() {
         return false;
     }
     run->TakeKeys();
-    if (run->recovery_) {
-        run->recovery_->Tell();
-    }
+    run->recovery_->Follow(run->report_);
     return run->quit_ || run->signals_.QuitRequested();
 }
 

@@ -1,3 +1,4 @@
+#include <sys/wait.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -19,6 +20,7 @@
 #include "operator/Keyboard.h"
 #include "operator/Signals.h"
 #include "options/Options.h"
+#include "output/OutputFolder.h"
 
 namespace {
 
@@ -86,6 +88,21 @@ void EndSoon(int code) {
     }).detach();
 }
 
+/// The end of a process destroys what its threads use. Where one of them hangs, the process ends without
+/// that.
+void EndAtOnce(int code) {
+    std::cout.flush();
+    // A fork waits until the log is written (Logger.h).
+    const pid_t child = fork();
+    if (child == 0) {
+        _exit(0);
+    }
+    if (child > 0) {
+        waitpid(child, nullptr, 0);
+    }
+    _exit(code);
+}
+
 }  // namespace
 
 int main(int argc, char** argv) {
@@ -107,6 +124,9 @@ int main(int argc, char** argv) {
         receiver::RunReceiver(*options, receiver::OpenSource, signals, outlet.Display(), STDIN_FILENO));
     if (!outlet.Close() || LogsToStandardError()) {
         EndSoon(code);
+    }
+    if (receiver::ShareThreadsLeft()) {
+        EndAtOnce(code);
     }
     return code;
 }

@@ -195,8 +195,8 @@ fs::path BackgroundRecovery::DefaultProgram() {
     std::error_code error;
     const fs::path self = fs::read_symlink("/proc/self/exe", error);
     if (error) {
-        return {};  // without its folder it would be that of the current one, which anybody may have put
-                    // there
+        // Without its folder it would be that of the current one, which anybody may have put there.
+        return {};
     }
     const fs::path folder = self.parent_path();
     for (const char* const place : {"", "../clipfile"}) {

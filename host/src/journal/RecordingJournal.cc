@@ -92,8 +92,17 @@ void RecordingJournal::SetOpenFiles(const std::vector<std::string>& files) {
     openFiles_ = files;
     journal_.files.clear();
     for (const std::string& file : files) {
-        journal_.files.push_back(
-            std::filesystem::path(file).lexically_normal().lexically_relative(folder_).string());
+        const std::filesystem::path below =
+            std::filesystem::path(file).lexically_normal().lexically_relative(folder_);
+        // One elsewhere would make the journal none.
+        if (!below.empty() && *below.begin() != "..") {
+            journal_.files.push_back(below.string());
+        }
+    }
+    if (journal_.files.size() > clipfile::Journal::kMaxFiles) {
+        journal_.files.erase(
+            journal_.files.begin(),
+            journal_.files.end() - static_cast<std::ptrdiff_t>(clipfile::Journal::kMaxFiles));
     }
     Publish();
 }

@@ -42,6 +42,7 @@ struct FolderWatch::State {
     std::optional<std::uint64_t> freeBytes;
     std::string obstacle;
     std::string warning;
+    std::string leftover;
     /// The day that was warned of.
     std::string warnedOf;
 };
@@ -100,6 +101,7 @@ void FolderWatch::look(State& state) {
     std::optional<std::uint64_t> freeBytes;
     std::string obstacle;
     std::string warning;
+    std::string leftover;
     const std::time_t now = state.now();
     const std::string tomorrow = DateAfter(now);
     try {
@@ -111,6 +113,7 @@ void FolderWatch::look(State& state) {
             } else if (obstacle.empty()) {
                 warning = state.folder->Obstacle(tomorrow, state.prefix);
             }
+            leftover = state.folder->TakeLeftover();
         }
     } catch (const ReceiverError&) {
         // What the module writes to meets the same.
@@ -122,6 +125,9 @@ void FolderWatch::look(State& state) {
     if (!warning.empty() && state.warnedOf != tomorrow) {
         state.warnedOf = tomorrow;
         state.warning = warning;
+    }
+    if (!leftover.empty()) {
+        state.leftover = leftover;
     }
 }
 
@@ -136,9 +142,17 @@ std::string FolderWatch::Obstacle() const {
 }
 
 std::optional<std::string> FolderWatch::TakeWarning() {
+    return take(state_->warning);
+}
+
+std::optional<std::string> FolderWatch::TakeLeftover() {
+    return take(state_->leftover);
+}
+
+std::optional<std::string> FolderWatch::take(std::string& text) {
     const std::lock_guard lock(state_->mutex);
-    std::string warning = std::exchange(state_->warning, {});
-    return warning.empty() ? std::nullopt : std::optional<std::string>(std::move(warning));
+    std::string taken = std::exchange(text, {});
+    return taken.empty() ? std::nullopt : std::optional<std::string>(std::move(taken));
 }
 
 }  // namespace receiver

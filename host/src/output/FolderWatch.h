@@ -46,12 +46,15 @@ class FolderWatch {
     std::string Obstacle() const;
     /// The same about tomorrow, once for each day.
     std::optional<std::string> TakeWarning();
+    /// What a look has made and cannot delete, as a sentence, once.
+    std::optional<std::string> TakeLeftover();
 
  private:
     struct State;
 
     static void watch(State& state);
     static void look(State& state);
+    std::optional<std::string> take(std::string& text);
 
     const std::shared_ptr<State> state_;
     PatientThread thread_;

@@ -11,4 +11,8 @@ std::unique_ptr<OutputFolder> OpenShareFolder(const OutputPlace& place) {
                                                "libsmbclient; --output names another one.");
 }
 
+bool ShareThreadsLeft() {
+    return false;
+}
+
 }  // namespace receiver

@@ -31,6 +31,8 @@ class OutputFolder {
     /// Why no file could be made in the folder `prefix` of `date`, as a sentence: others may have made them
     /// first. Empty when one could, and when that cannot be told.
     virtual std::string Obstacle(const std::string& date, const std::string& prefix) = 0;
+    /// What was made to try a folder and cannot be deleted, as a sentence, once; empty when there is nothing.
+    virtual std::string TakeLeftover() { return {}; }
 
     // Of files below the folder, with slashes.
     virtual bool Exists(const std::string& path) = 0;
@@ -42,6 +44,11 @@ std::unique_ptr<OutputFolder> OpenOutputFolder(const OutputPlace& place);
 /// The parts of `OpenOutputFolder`.
 std::unique_ptr<OutputFolder> OpenLocalFolder(const std::string& folder);
 std::unique_ptr<OutputFolder> OpenShareFolder(const OutputPlace& place);
+
+/// True while a thread is in the middle of something with a share, as one that waits for a server which does
+/// not answer: also of the module, also when nobody waits for it any more. The end of the process would take
+/// away from under it what it uses. Any thread.
+bool ShareThreadsLeft();
 
 /// What ends the run for a folder that cannot be used.
 ReceiverError Unusable(const std::string& sentence);

@@ -2,12 +2,14 @@
 
 #include <algorithm>
 #include <array>
+#include <atomic>
 #include <cerrno>
 #include <chrono>
 #include <cstring>
 #include <functional>
 #include <set>
 #include <system_error>
+#include <utility>
 #include <vector>
 
 #include "common/ReceiverError.h"
@@ -15,9 +17,10 @@
 #include "platform/SharePath.h"
 #include "platform/posix/SmbSession.h"
 
-/// The module has a copy of the same code: both use libsmbclient, and this lock, which the program exports.
+/// The module has a copy of the same code: both use libsmbclient, and these, which the program exports.
 extern "C" {
 __attribute__((visibility("default"), used)) clipfileModule::Mutex clipfile_smb_process_lock;
+__attribute__((visibility("default"), used)) std::atomic<int> clipfile_smb_clients;
 }
 
 namespace receiver {
@@ -49,6 +52,7 @@ class ShareFolder final : public OutputFolder {
     std::optional<std::uint64_t> FreeBytes() override;
     std::string Obstacle(const std::string& date, const std::string& prefix) override;
     bool Exists(const std::string& path) override;
+    std::string TakeLeftover() override { return std::exchange(leftover_, {}); }
     RecordedFile ReadBackFile(const std::string& path) override;
 
  private:
@@ -73,6 +77,7 @@ class ShareFolder final : public OutputFolder {
     Clock::time_point restingUntil_{};
     /// Folders in which a file was made.
     std::set<std::string> writable_;
+    std::string leftover_;
 };
 
 std::string UrlOf(const std::string& path) {
@@ -178,17 +183,26 @@ bool ShareFolder::makeWhereMissing() {
 
 /// Whether rights of the server allow a file in a folder can only be tried. An error number.
 int ShareFolder::tryFile(const std::string& folder) {
-    const std::string probe = UrlOf(folder) + "/.receiver-" + std::to_string(getpid()) + "-" +
-                              std::to_string(std::chrono::system_clock::now().time_since_epoch().count());
-    return run([&probe](SmbSession& session) {
+    const std::string name = ".receiver-" + std::to_string(getpid()) + "-" +
+                             std::to_string(std::chrono::system_clock::now().time_since_epoch().count());
+    const std::string probe = UrlOf(folder) + "/" + name;
+    int kept = 0;
+    const int error = run([&probe, &kept](SmbSession& session) {
         SMBCFILE* file = nullptr;
         int failure = session.Open(probe, file);
         if (failure == 0) {
             failure = session.Close(file);
-            session.Remove(probe);
+            kept = session.Remove(probe);
         }
         return failure;
     });
+    if (kept != 0 && kept != ENOENT) {
+        // Recording goes on: it deletes nothing.
+        leftover_ = "the file '" + folder + "/" + name +
+                    "' was made to try the folder, and cannot be deleted: " + std::strerror(kept) +
+                    "; delete it by hand.";
+    }
+    return error;
 }
 
 void ShareFolder::expectWritable() {
@@ -284,6 +298,10 @@ RecordedFile ShareFolder::ReadBackFile(const std::string& path) {
 }
 
 }  // namespace
+
+bool ShareThreadsLeft() {
+    return clipfile_smb_clients > 0;
+}
 
 std::unique_ptr<OutputFolder> OpenShareFolder(const OutputPlace& place) {
     return std::make_unique<ShareFolder>(place);

@@ -77,6 +77,10 @@ std::string AudioSummary(const AVCodecParameters& parameters) {
            RateAndLayout(parameters.sample_rate, parameters.ch_layout);
 }
 
+bool IsAdtsFrame(const AVPacket& packet) {
+    return HasAdtsHeader(packet) && static_cast<std::size_t>(packet.size) == FrameLength(packet);
+}
+
 bool CanPass(const AVCodecParameters& parameters, const AVPacket* first) {
     if (parameters.codec_id != AV_CODEC_ID_AAC) {
         return false;

@@ -121,6 +121,11 @@ bool Connection::Pump() {
     if (!NextPacket()) {
         return false;
     }
+    if (input_->Transport() && IsOf(*packet_, audio_)) {
+        newSounds_ = 0;
+        HandleAll(runs_.Put(std::exchange(packet_, libav::NewPacket()), audio_->time_base));
+        return true;
+    }
     if ((packet_->flags & AV_PKT_FLAG_CORRUPT) != 0) {
         ++damaged_;
         return true;
@@ -131,6 +136,13 @@ bool Connection::Pump() {
     position_ = packet_->pos;
     Handle(*packet_);
     return true;
+}
+
+void Connection::HandleAll(const Packets& packets) {
+    for (const auto& packet : packets) {
+        position_ = packet->pos;
+        Handle(*packet);
+    }
 }
 
 std::unique_ptr<Input> Connection::End(std::unique_ptr<Connection> connection) {
@@ -268,6 +280,11 @@ void Connection::HandleKlv(const AVPacket& packet) {
 }
 
 void Connection::Finish() {
+    try {
+        HandleAll(runs_.Finish());
+    } catch (const FormatChanged&) {
+        // Nothing follows in which the new format could go on.
+    }
     paths_.video->Finish(ToPictures());
     if (paths_.audio) {
         paths_.audio->Finish(ToAudio());
@@ -284,7 +301,7 @@ AudioSink Connection::ToAudio() {
 }
 
 std::uint64_t Connection::Damaged() const {
-    return damaged_ + paths_.video->Damaged() + (paths_.audio ? paths_.audio->Damaged() : 0) +
+    return damaged_ + runs_.Damaged() + paths_.video->Damaged() + (paths_.audio ? paths_.audio->Damaged() : 0) +
            klvPackets_.Damaged();
 }
 

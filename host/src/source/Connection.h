@@ -8,6 +8,7 @@
 #include <vector>
 
 #include "common/ReceiverError.h"
+#include "source/AudioRuns.h"
 #include "source/FormatWatch.h"
 #include "source/Input.h"
 #include "source/KlvPackets.h"
@@ -65,6 +66,7 @@ class Connection {
     void CheckOther(const AVPacket& packet);
     bool NextPacket();
     void Handle(AVPacket& packet);
+    void HandleAll(const Packets& packets);
     void HandleVideo(AVPacket& packet);
     /// False when the picture, stamped so, cannot be the first one of the line. Else it stands at `begin_`.
     bool Start(const AVPacket& packet, std::optional<std::int64_t> stamp);
@@ -90,6 +92,8 @@ class Connection {
     std::optional<FormatWatch> watch_;
     std::optional<StreamClock> clock_;
     KlvPackets klvPackets_;
+    /// Of the audio of a transport stream.
+    AudioRuns runs_;
     libav::Owner<AVPacket> packet_;
 
     UnitAssembler* assembler_ = nullptr;

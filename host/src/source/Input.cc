@@ -25,8 +25,9 @@ constexpr int kLongestDrain = 100;
 constexpr double kLongestShortfall = 1;
 /// Bytes in front of a picture in which its program's tables stand: ten packets of a transport stream.
 constexpr std::int64_t kTables = 1880;
-/// Bytes in which a stream's tables are found, at 200 Mb/s in 0.3 s.
-constexpr std::int64_t kOpening = std::int64_t{8} << 20;
+/// Bytes of a live stream in which its tables are found, and to whose beginning it can go back: at 100 Mb/s
+/// the second in which another frame rate shows.
+constexpr std::int64_t kOpening = std::int64_t{16} << 20;
 /// Bytes that are looked at to find out what its media are: at high bit rates as many as that time may hold.
 constexpr std::int64_t kAnalysed = std::int64_t{64} << 20;
 
@@ -136,9 +137,9 @@ AVFormatContext* Input::NewFormat() {
     format->interrupt_callback = {OnWait, this};
     // Wraps are undone by the time line, which knows any number of them.
     format->correct_ts_overflow = 0;
-    // Opening a transport stream finds its tables in a fraction of a second, and keeps room for so many bytes
-    // of a live one, so that it can go back.
-    format->probesize = kOpening;
+    // Opening a live transport stream keeps room for so many bytes, so that it can go back.
+    const std::string scheme = SchemeOf(url_);
+    format->probesize = scheme.empty() || scheme == "file" ? kAnalysed : kOpening;
     return format;
 }
 

@@ -65,6 +65,8 @@ class Input {
     std::chrono::steady_clock::time_point Opened() const { return opened_; }
     /// Packets come by RTP, which stamps pictures with the time when they are shown and nothing else.
     bool Rtp() const { return rtp_; }
+    /// Packets come by a transport stream.
+    bool Transport() const { return transport_; }
 
  private:
     struct CloseConnection {
@@ -109,7 +111,6 @@ class Input {
     std::set<int> asked_;
     bool recorded_ = false;
     bool rtp_ = false;
-    /// Packets come by a transport stream.
     bool transport_ = false;
     /// Streams whose next picture is damaged.
     std::set<int> damagedNext_;

@@ -28,6 +28,8 @@ QueuedSource::QueuedSource(std::unique_ptr<ProducerInterface> producer, std::sha
       interrupt_(std::move(interrupt)),
       capacity_(capacity),
       refill_(pacer.Live() ? 1 : std::min(kRefill, capacity)),
+      resume_(pacer.Live() ? capacity - 1 : capacity / 2),
+      resumeBytes_(pacer.Live() ? kQueueBytes - 1 : kQueueBytes / 2),
       listener_(listener),
       pacer_(pacer),
       description_(producer_->Description()),
@@ -44,6 +46,11 @@ void QueuedSource::Stop() {
     stopped_ = true;
     arrived_.notify_one();
     room_.notify_one();
+}
+
+std::size_t QueuedSource::Queued() const {
+    const std::lock_guard lock(mutex_);
+    return queue_.size();
 }
 
 void QueuedSource::Run() {
@@ -95,7 +102,7 @@ SourceInterface::Result QueuedSource::Read(SourceUnit& unit) {
         }
         if (const auto* const notice = std::get_if<std::string>(&queue_.front())) {
             const std::string sentence = *notice;
-            queue_.pop_front();
+            DropFront();
             lock.unlock();
             listener_.OnNotice(sentence);
             lock.lock();
@@ -103,7 +110,7 @@ SourceInterface::Result QueuedSource::Read(SourceUnit& unit) {
         }
         if (auto* const description = std::get_if<SourceDescription>(&queue_.front())) {
             description_ = std::move(*description);
-            queue_.pop_front();
+            DropFront();
             return Result::kChanged;
         }
         SourceUnit& front = std::get<SourceUnit>(queue_.front());
@@ -119,22 +126,21 @@ SourceInterface::Result QueuedSource::Read(SourceUnit& unit) {
                 return Result::kIdle;
             }
         }
-        unit = Take();
+        unit = std::move(front);
+        queued_ -= unit.size;
+        DropFront();
         pacer_.Taken(time, std::chrono::steady_clock::now());
         return Result::kUnit;
     }
 }
 
-SourceUnit QueuedSource::Take() {
-    SourceUnit unit = std::move(std::get<SourceUnit>(queue_.front()));
+void QueuedSource::DropFront() {
     queue_.pop_front();
-    queued_ -= unit.size;
-    // The producer that was held up goes on with room for many.
-    if (full_ && queue_.size() <= capacity_ / 2 && queued_ <= kQueueBytes / 2) {
+    const bool room = queue_.size() <= resume_ && queued_ <= resumeBytes_;
+    if (full_ && (room || queue_.empty())) {
         full_ = false;
         room_.notify_one();
     }
-    return unit;
 }
 
 }  // namespace receiver

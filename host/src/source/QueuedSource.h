@@ -31,26 +31,33 @@ class QueuedSource final : public SourceInterface {
     SourceCounts Counts() const override { return producer_->Counts(); }
     void Stop() override;
 
+    /// Units, sentences and descriptions that wait for the reader. From any thread.
+    std::size_t Queued() const;
+
  private:
     void Run();
-    /// The unit in front, out of the queue. Under the lock.
-    SourceUnit Take();
+    /// Takes what is in front out of the queue. Under the lock.
+    void DropFront();
 
     const std::unique_ptr<ProducerInterface> producer_;
     const std::shared_ptr<Interrupt> interrupt_;
     const std::size_t capacity_;
     /// Units that must wait before the reader who found none goes on.
     const std::size_t refill_;
+    /// The producer that had no room goes on when no more than so many wait, of so many bytes: of a live
+    /// source as soon as there is any room, since the network does not wait.
+    const std::size_t resume_;
+    const std::size_t resumeBytes_;
     SourceListenerInterface& listener_;
     /// Of the reading thread alone.
     Pacer pacer_;
     SourceDescription description_;
 
     /// Guards what follows.
-    std::mutex mutex_;
+    mutable std::mutex mutex_;
     /// For the reader: units came, the producer ended, or a stop.
     std::condition_variable arrived_;
-    /// For the producer: half of the queue was taken, or a stop.
+    /// For the producer: there is room again, or a stop.
     std::condition_variable room_;
     /// The producer waits for room.
     bool full_ = false;

@@ -1,11 +1,17 @@
-#include <gmock/gmock.h>
+// Sources that become another one in the middle of a connection.
 
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <csignal>
 #include <fstream>
 
 #include "endtoend/ReceiverFixture.h"
 #include "support/CodedMedia.h"
 #include "support/Judges.h"
 #include "support/Material.h"
+#include "support/NumberedMedia.h"
+#include "support/Senders.h"
 
 namespace endtoend {
 namespace {
@@ -56,6 +62,125 @@ TEST_F(FormatChangesTest, AnotherSizeAndRateGoOnInAFileOfTheirOwn) {
     EXPECT_GE(DecodeVideo(recordings[0]).checksums.size(), 40U);
     EXPECT_GE(DecodeVideo(recordings[1]).checksums.size(), 90U);
 }
+
+/// A live stream that goes on in another format.
+struct LiveChange {
+    const char* name;
+    NumberedPart before;
+    NumberedPart after;
+    const char* sentence;
+    bool transcode = false;
+    /// Pictures of what follows that the first file holds too.
+    std::size_t unnoticed = 0;
+};
+
+/// A multiplexer sends sound up to half a second behind the pictures that it belongs to.
+constexpr std::size_t kUntilSound = 13;
+
+std::ostream& operator<<(std::ostream& out, const LiveChange& change) {
+    return out << change.name;
+}
+
+class LiveChangesTest : public ReceiverFixture, public ::testing::WithParamInterface<LiveChange> {};
+
+TEST_P(LiveChangesTest, AreToldOnceAndGoOnInStepInAFileOfTheirOwn) {
+    const NumberedPart& before = GetParam().before;
+    NumberedPart after = GetParam().after;
+    after.start = before.start + before.seconds;
+    // FFmpeg's libraries look at HEVC for five seconds before they know it.
+    after.seconds = GetParam().transcode ? 7 : 3;
+    after.number = 1000;
+    const auto first = folder.Path() / "before.ts";
+    const auto second = folder.Path() / "after.ts";
+    WriteNumbered(before, first);
+    WriteNumbered(after, second);
+    const FreePorts ports;
+    std::vector<std::string> options{"--input",    "udp://127.0.0.1:" + std::to_string(ports.First()),
+                                     "--timeout",  "3",
+                                     "--timecode", "10:00:00:00"};
+    if (GetParam().transcode) {
+        options.emplace_back("--transcode");
+    }
+    const auto receiver = Start(options);
+    ASSERT_TRUE(WaitUntilBound(ports.First())) << receiver->AllText();
+    SendFile(first, ports.First(), std::chrono::seconds(before.seconds));
+    SendFile(second, ports.First(), std::chrono::seconds(after.seconds));
+    ASSERT_TRUE(receiver->WaitForText("the source was lost")) << receiver->AllText();
+    receiver->Signal(SIGINT);
+    EXPECT_EQ(receiver->Wait(), 8) << receiver->AllText();
+
+    const std::string told = receiver->Errors();
+    const std::string sentence = std::string(GetParam().sentence) + ": the recording goes on in a new file";
+    const std::size_t at = told.find(sentence);
+    EXPECT_NE(at, std::string::npos) << told;
+    EXPECT_EQ(told.find("the recording goes on in a new file", at + sentence.size()), std::string::npos)
+        << told;
+    const auto recordings = Recordings();
+    ASSERT_THAT(recordings, SizeIs(2)) << told;
+    NumberedRecording one = ReadNumbered(recordings[0]);
+    const std::size_t own = one.CountOf(before);
+    EXPECT_LE(one.numbers.size() - own, GetParam().unnoticed) << told;
+    one.numbers.resize(own);
+    one.times.resize(own);
+    ExpectInStep(one, before);
+    const NumberedRecording other = ReadNumbered(recordings[1]);
+    ExpectInStep(other, after);
+    ASSERT_FALSE(one.numbers.empty() || other.numbers.empty());
+    // All of it, but for the picture at whose end and the group in which it became another one.
+    EXPECT_EQ(one.numbers.front(), before.number);
+    EXPECT_GE(one.numbers.size(), static_cast<std::size_t>(before.seconds * before.rate - 1)) << told;
+    EXPECT_LE(other.numbers.front(), after.number + 10) << told;
+    EXPECT_EQ(after.TimeOf(other.numbers.back() + 1), after.start + after.seconds) << told;
+    for (const auto& recording : recordings) {
+        EXPECT_EQ(DecodeVideo(recording).messages, "") << recording;
+        EXPECT_EQ(DecodeAudio(recording).messages, "") << recording;
+        EXPECT_EQ(StreamOf(AskFfprobe(recording), "video").value("codec_name", ""), "h264");
+    }
+}
+
+const NumberedPart kPlain;
+
+NumberedPart WithAudio(const std::vector<std::string>& audio) {
+    NumberedPart part;
+    part.audio = audio;
+    return part;
+}
+NumberedPart WithVideo(const std::vector<std::string>& video) {
+    NumberedPart part;
+    part.video = video;
+    return part;
+}
+NumberedPart WithRate(int rate) {
+    NumberedPart part;
+    part.rate = rate;
+    return part;
+}
+NumberedPart WithSize(const char* size) {
+    NumberedPart part;
+    part.size = size;
+    return part;
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    All, LiveChangesTest,
+    ::testing::Values(
+        LiveChange{"AudioRate", kPlain, WithAudio({"-c:a", "aac", "-ac", "2", "-ar", "44100"}),
+                   "the audio is no longer AAC LC 48 kHz stereo", false, kUntilSound},
+        LiveChange{"AudioChannels", kPlain, WithAudio({"-c:a", "aac", "-ac", "1", "-ar", "48000"}),
+                   "the audio is no longer AAC LC 48 kHz stereo", false, kUntilSound},
+        LiveChange{"AudioBegins", WithAudio({}), kPlain, "audio has begun", false, kUntilSound},
+        LiveChange{"Rate", kPlain, WithRate(50), "the frame rate of the video changed"},
+        LiveChange{"Size", kPlain, WithSize("256x144"), "the picture changed from 160x96 to 256x144"},
+        LiveChange{"Reordered", kPlain,
+                   WithVideo({"-c:v", "libx264", "-preset", "ultrafast", "-bf", "2", "-g", "10",
+                              "-x264-params", "scenecut=0:open-gop=0"}),
+                   // Known by the second of them.
+                   "the video begins to send its pictures reordered (B frames)", true, 2},
+        LiveChange{"Hevc", kPlain,
+                   WithVideo({"-c:v", "libx265", "-preset", "ultrafast", "-x265-params",
+                              "log-level=none:bframes=0:keyint=10:min-keyint=10:repeat-headers=1"}),
+                   "the video changed from h264 to hevc", true}),
+    ::testing::PrintToStringParamName());
 
 }  // namespace
 }  // namespace endtoend

@@ -122,9 +122,10 @@ Range CheckRecording(const std::filesystem::path& recording, const Sent& sent, c
     checkDecoder(recording, sent, range);
     checkAudio(recorded, sent, expected, range);
     checkMetadata(recorded, sent, expected, range);
+    const std::size_t since = expected.timecodeOfRecording ? 0 : range.first;
     range.timecode =
         receiver::TimecodeOf(receiver::FrameNumberOf(expected.timecode, expected.rate.timecodeFrames) +
-                                 static_cast<std::int64_t>(range.first),
+                                 static_cast<std::int64_t>(since),
                              expected.rate.timecodeFrames, expected.timecode.dropFrame);
     EXPECT_EQ(recording.filename(), FileNameOf(range.timecode));
     checkFfprobe(recording, expected, range);

@@ -27,6 +27,8 @@ struct Expected {
     bool fragmented = false;
     /// Of the first picture that was sent, and whether the recording counts by the drop-frame rule.
     receiver::Timecode timecode;
+    /// It is that of the first picture that is recorded.
+    bool timecodeOfRecording = false;
     /// KLV packets are compared too.
     bool klv = false;
     /// The audio is the source's own.

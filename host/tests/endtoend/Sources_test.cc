@@ -15,7 +15,7 @@ namespace {
 using ::testing::EndsWith;
 using ::testing::HasSubstr;
 
-enum class Road { kUdp, kRtp, kSrtListener, kSrtCaller, kHttp, kRtsp, kFile };
+enum class Road { kUdp, kRtp, kSrtListener, kSrtCaller, kHttp, kHls, kRtmp, kRtsp, kFile };
 
 struct SourceCase {
     const char* name;
@@ -26,6 +26,8 @@ struct SourceCase {
     const char* timecode;
     bool klv;
     const char* container;
+    /// What the caller of SRT adds to its address.
+    const char* streamId = "";
 };
 
 std::ostream& operator<<(std::ostream& out, const SourceCase& parameters) {
@@ -34,73 +36,100 @@ std::ostream& operator<<(std::ostream& out, const SourceCase& parameters) {
 
 class SourcesTest : public ReceiverFixture, public ::testing::WithParamInterface<SourceCase> {
  protected:
-    /// Sends the material over the road of this case and records `kSeconds` of it.
-    Outcome Record(const std::filesystem::path& material) {
-        const FreePorts ports;
-        const std::string port = std::to_string(ports.First());
-        std::vector<std::string> options = {"--timecode", GetParam().timecode, "--file-type",
-                                            GetParam().fragmented ? "fragment" : "normal"};
-        const auto add = [&](const std::vector<std::string>& more) {
-            options.insert(options.end(), more.begin(), more.end());
-        };
-        std::unique_ptr<Process> receiver;
-        std::unique_ptr<Process> sender;
+    using Program = std::unique_ptr<Process>;
+
+    std::string Port() const { return std::to_string(ports_.First()); }
+    /// Of that address, and `kSeconds` of it.
+    Program StartReceiver(const std::string& input) const {
+        return Start({"--timecode", GetParam().timecode, "--file-type",
+                      GetParam().fragmented ? "fragment" : "normal", "--input", input, "--seconds",
+                      kSeconds});
+    }
+    static Outcome Finish(Process& receiver) {
+        const int code = receiver.Wait().value_or(-1);
+        return {code, receiver.Output(), receiver.Errors()};
+    }
+    /// The receiver waits for the sender at that UDP port.
+    template <typename Send>
+    Outcome Await(std::uint16_t port, const std::string& input, Send send) const {
+        const Program receiver = StartReceiver(input);
+        EXPECT_TRUE(WaitUntilBound(port)) << receiver->AllText();
+        const Program sender = send();
+        return Finish(*receiver);
+    }
+    /// The receiver calls the sender.
+    Outcome Call(const Program& sender, bool ready, const std::string& input) const {
+        EXPECT_TRUE(ready) << sender->AllText();
+        return Finish(*StartReceiver(input));
+    }
+
+    Outcome RecordRtp(const std::filesystem::path& material) const {
+        const auto description = folder.Path() / "stream.sdp";
+        WriteSessionDescription(material, ports_, description);
+        return Await(static_cast<std::uint16_t>(ports_.First() + 2), description.string(),
+                     [&] { return SendRtp(material, ports_); });
+    }
+    Outcome RecordRtmp(const std::filesystem::path& material) const {
+        const Program receiver = StartReceiver("rtmp://0.0.0.0:" + Port() + "/live/key");
+        EXPECT_TRUE(WaitUntilListening(ports_.First())) << receiver->AllText();
+        const Program sender = PublishRtmp(material, "rtmp://127.0.0.1:" + Port() + "/live/key");
+        return Finish(*receiver);
+    }
+    Outcome RecordHls(const std::filesystem::path& material) const {
+        const auto site = folder.Path() / "site";
+        std::filesystem::create_directory(site);
+        const Program server = ServeFolder(site, ports_.First());
+        const Program encoder = WriteHls(material, site);
+        return Call(encoder, WaitFor([&] { return std::filesystem::exists(site / "live.m3u8"); }),
+                    "http://127.0.0.1:" + Port() + "/live.m3u8");
+    }
+    Outcome RecordFile(const std::filesystem::path& material) const {
+        // To its end, and faster than it was made.
+        return RunReceiver({"--timecode", GetParam().timecode, "--file-type",
+                            GetParam().fragmented ? "fragment" : "normal", "--input", material.string(),
+                            "--speed", "4"});
+    }
+
+    /// Sends the material over the road of this case and records it.
+    Outcome Record(const std::filesystem::path& material) const {
+        const std::string udp = "udp://127.0.0.1:" + Port();
+        const std::string srt = "srt://127.0.0.1:" + Port();
+        const std::string http = "http://127.0.0.1:" + Port() + "/live.ts";
+        const std::string id = GetParam().streamId;
         switch (GetParam().road) {
             case Road::kUdp:
-                add({"--input", "udp://127.0.0.1:" + port, "--seconds", kSeconds});
-                receiver = Start(options);
-                EXPECT_TRUE(WaitUntilBound(ports.First())) << receiver->AllText();
-                sender = SendTransportStream(material, "udp://127.0.0.1:" + port + "?pkt_size=1316");
-                break;
-            case Road::kRtp: {
-                const auto description = folder.Path() / "stream.sdp";
-                WriteSessionDescription(material, ports, description);
-                add({"--input", description.string(), "--seconds", kSeconds});
-                receiver = Start(options);
-                EXPECT_TRUE(WaitUntilBound(static_cast<std::uint16_t>(ports.First() + 2)))
-                    << receiver->AllText();
-                sender = SendRtp(material, ports);
-                break;
-            }
+                return Await(ports_.First(), udp,
+                             [&] { return SendTransportStream(material, udp + "?pkt_size=1316"); });
+            case Road::kRtp:
+                return RecordRtp(material);
             case Road::kSrtListener:
-                add({"--input", "srt://127.0.0.1:" + port + "?mode=listener", "--seconds", kSeconds});
-                receiver = Start(options);
-                EXPECT_TRUE(WaitUntilBound(ports.First())) << receiver->AllText();
-                sender = SendTransportStream(material, "srt://127.0.0.1:" + port + "?mode=caller");
-                break;
-            case Road::kSrtCaller:
-                sender = SendTransportStream(material, "srt://127.0.0.1:" + port + "?mode=listener");
-                EXPECT_TRUE(WaitUntilBound(ports.First())) << sender->AllText();
-                add({"--input", "srt://127.0.0.1:" + port, "--seconds", kSeconds});
-                receiver = Start(options);
-                break;
-            case Road::kHttp: {
-                const std::string url = "http://127.0.0.1:" + port + "/live.ts";
-                sender = ServeHttp(material, url);
-                EXPECT_TRUE(WaitUntilListening(ports.First())) << sender->AllText();
-                add({"--input", url, "--seconds", kSeconds});
-                receiver = Start(options);
-                break;
+                return Await(ports_.First(), srt + "?mode=listener",
+                             [&] { return SendTransportStream(material, srt + "?mode=caller" + id); });
+            case Road::kSrtCaller: {
+                const Program sender = SendTransportStream(material, srt + "?mode=listener");
+                return Call(sender, WaitUntilBound(ports_.First()), srt + "?mode=caller" + id);
             }
+            case Road::kHttp: {
+                const Program sender = ServeHttp(material, http);
+                return Call(sender, WaitUntilListening(ports_.First()), http);
+            }
+            case Road::kHls:
+                return RecordHls(material);
+            case Road::kRtmp:
+                return RecordRtmp(material);
             case Road::kRtsp:
-                sender = ServeRtsp(material, ports.First());
-                add({"--input", "rtsp://127.0.0.1:" + port + "/live", "--seconds", kSeconds});
-                receiver = Start(options);
-                break;
+                return Call(ServeRtsp(material, ports_.First()), true,
+                            "rtsp://127.0.0.1:" + Port() + "/live");
             case Road::kFile:
-                // To its end, and faster than it was made.
-                add({"--input", material.string(), "--speed", "4"});
-                receiver = Start(options);
-                break;
+                return RecordFile(material);
         }
-        Outcome outcome;
-        outcome.code = receiver->Wait().value_or(-1);
-        outcome.output = receiver->Output();
-        outcome.errors = receiver->Errors();
-        return outcome;
+        return {};
     }
 
     static constexpr const char* kSeconds = "2.5";
+
+ private:
+    const FreePorts ports_;
 };
 
 TEST_P(SourcesTest, IsRecordedByteForByte) {
@@ -108,7 +137,8 @@ TEST_P(SourcesTest, IsRecordedByteForByte) {
     options.rate = GetParam().exactRate;
     options.container = GetParam().container;
     // Of a file there is more, so that the fragmented one has fragments.
-    options.seconds = GetParam().road == Road::kFile ? 7 : 4;
+    const bool longer = GetParam().road == Road::kFile || GetParam().road == Road::kHls;
+    options.seconds = longer ? 7 : 4;
     options.picturesPerKlv = GetParam().klv ? 2 : 0;
     const Sent sent(MakeMaterial(folder, options));
 
@@ -123,6 +153,12 @@ TEST_P(SourcesTest, IsRecordedByteForByte) {
     expected.timecode = *receiver::ParseTimecode(GetParam().timecode);
     expected.timecode.dropFrame = expected.rate.dropFrame;
     expected.klv = GetParam().klv;
+    // Joined wherever the last segments begin.
+    expected.timecodeOfRecording = GetParam().road == Road::kHls;
+    if (GetParam().road == Road::kRtmp) {
+        // Milliseconds, of picture and sound.
+        expected.stampSlack = 0.002;
+    }
     if (GetParam().road == Road::kRtp) {
         // ffmpeg's two senders begin each at 0, the one of the audio with the frame before the first picture.
         expected.stampSlack += 1024.0 / 48000;
@@ -137,7 +173,7 @@ TEST_P(SourcesTest, IsRecordedByteForByte) {
         EXPECT_EQ(range.first, 0U);
         EXPECT_EQ(range.count, sent.media.video.size());
     } else {
-        EXPECT_EQ(range.first, 0U);
+        EXPECT_EQ(GetParam().road == Road::kHls ? range.first % options.pictureGroup : range.first, 0U);
         EXPECT_GE(static_cast<double>(range.count), 1.5 * expected.rate.timecodeFrames);
     }
 }
@@ -154,6 +190,14 @@ INSTANTIATE_TEST_SUITE_P(
         SourceCase{"SrtCallerFragment25WithKlv", Road::kSrtCaller, "25", "25", true, "01:02:03:04", true,
                    "ts"},
         SourceCase{"HttpNormal25WithKlv", Road::kHttp, "25", "25", false, "19:59:59:24", true, "ts"},
+        SourceCase{"SrtListenerNormal25WithStreamId", Road::kSrtListener, "25", "25", false, "10:00:00:00",
+                   false, "ts", "&streamid=live/camera"},
+        SourceCase{"SrtCallerNormal25WithStreamId", Road::kSrtCaller, "25", "25", false, "10:00:00:00", false,
+                   "ts", "&streamid=live/camera"},
+        SourceCase{"HlsNormal25", Road::kHls, "25", "25", false, "20:00:00:00", false, "ts"},
+        SourceCase{"RtmpListenerNormal2997", Road::kRtmp, "29.97", "30000/1001", false, "10:59:59;20", false,
+                   "mp4"},
+        SourceCase{"RtmpListenerFragment25", Road::kRtmp, "25", "25", true, "10:00:00:00", false, "mp4"},
         SourceCase{"RtspFragment25", Road::kRtsp, "25", "25", true, "05:00:00:00", false, "mp4"},
         SourceCase{"FileNormal2997", Road::kFile, "29.97", "30000/1001", false, "10:00:58;28", false, "mp4"},
         SourceCase{"FileFragment50WithKlv", Road::kFile, "50", "50", true, "12:34:56:49", true, "ts"},

@@ -91,6 +91,19 @@ TEST_F(RecordingJournalTest, ParameterSetsThatFollowStandInFront) {
     EXPECT_EQ(next.sets.size(), 2U);
 }
 
+TEST_F(RecordingJournalTest, NamesTheNewestFilesBelowItsFolder) {
+    RecordingJournal journal(folder_.Path() / "." / "");
+    std::vector<std::string> files = {"/elsewhere/a.MP4"};
+    for (std::size_t i = 0; i < clipfile::Journal::kMaxFiles + 1; ++i) {
+        files.push_back(In(std::to_string(i) + ".MP4"));
+    }
+    journal.SetOpenFiles(files);
+    ASSERT_TRUE(WaitFor([&] { return OnDisk().has_value(); }));
+    EXPECT_EQ(OnDisk()->files.size(), clipfile::Journal::kMaxFiles);
+    EXPECT_EQ(OnDisk()->files.front(), "1.MP4");
+    EXPECT_EQ(OnDisk()->files.back(), "256.MP4");
+}
+
 TEST_F(RecordingJournalTest, StaysWithFilesThatAreOpenAtTheEnd) {
     {
         RecordingJournal journal(folder_.Path());

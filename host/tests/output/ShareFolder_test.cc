@@ -178,6 +178,38 @@ TEST_F(ShareFolder, TellsAboutItsDatedFoldersAndLeavesNothingBehind) {
     EXPECT_THAT(folder->Obstacle("20261121", "CAM2"), HasSubstr("/20261121/CAM2' is no folder; "));
 }
 
+TEST_F(ShareFolder, TellsOfTheFileThatTriedItAndCannotBeDeleted) {
+    namespace fs = std::filesystem;
+    // What is made belongs to the superuser at once, and in such a folder only he deletes it.
+    ASSERT_EQ(geteuid(), 0U) << "this test has to make files of others";
+    const SambaServer server(SambaServer::Shares{{"rec", {"force user = nobody", "inherit owner = yes"}}});
+    fs::permissions(server.Folder().parent_path(), fs::perms(0755));
+    fs::permissions(server.Folder(), fs::perms(01777));
+    const auto folder = OpenOutputFolder(PlaceAt(FolderOf(server)));
+    EXPECT_FALSE(folder->Prepare());
+    const std::string leftover = folder->TakeLeftover();
+    EXPECT_THAT(leftover, HasSubstr("the file '" + FolderOf(server) + "/.receiver-"));
+    EXPECT_THAT(leftover, HasSubstr("' was made to try the folder, and cannot be deleted: "));
+    EXPECT_EQ(folder->TakeLeftover(), "");
+    EXPECT_FALSE(std::filesystem::is_empty(server.Folder()));
+}
+
+TEST_F(ShareFolder, ItsThreadsAreCountedUntilTheyHaveLeftTheServer) {
+    EXPECT_FALSE(ShareThreadsLeft());
+    {
+        SambaServer server;
+        auto folder = OpenOutputFolder(PlaceAt(FolderOf(server)));
+        EXPECT_FALSE(folder->Prepare());
+        EXPECT_TRUE(ShareThreadsLeft());
+        server.Freeze();
+        EXPECT_FALSE(folder->Exists(FolderOf(server) + "/file"));
+        // Its thread is left alone with the connection.
+        folder.reset();
+        EXPECT_TRUE(ShareThreadsLeft());
+    }
+    EXPECT_TRUE(waitUntil([] { return !ShareThreadsLeft(); }));
+}
+
 TEST_F(ShareFolder, AFileThatIsNoRecordingHasAProblemAndASize) {
     const SambaServer server;
     std::ofstream(server.Folder() / "a.MP4") << "no recording";

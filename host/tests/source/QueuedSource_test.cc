@@ -23,7 +23,11 @@ class Pictures final : public ProducerInterface {
         std::atomic<int> allowed{0};
         int last = 1000000;
         bool fails = false;
+        /// Each picture comes with so many sentences behind it.
+        int notices = 0;
         std::atomic<int> made{0};
+        /// How often a picture was asked for.
+        std::atomic<int> calls{0};
     };
 
     Pictures(std::shared_ptr<Script> script, std::shared_ptr<Interrupt> interrupt)
@@ -32,6 +36,7 @@ class Pictures final : public ProducerInterface {
     const SourceDescription& Description() const override { return description_; }
     SourceCounts Counts() const override { return {}; }
     bool Produce(Batch& batch) override {
+        ++script_->calls;
         while (script_->made == script_->allowed) {
             if (interrupt_->Wait(std::chrono::milliseconds(1))) {
                 return false;
@@ -40,6 +45,9 @@ class Pictures final : public ProducerInterface {
         SourceUnit unit;
         unit.time = script_->made * std::int64_t{90};
         batch.emplace_back(std::move(unit));
+        for (int n = 0; n < script_->notices; ++n) {
+            batch.emplace_back(std::string("a sentence"));
+        }
         if (++script_->made == script_->last && script_->fails) {
             throw std::runtime_error("the source broke");
         }
@@ -104,7 +112,7 @@ TEST_F(QueuedSourceTest, TheLastUnitsOfAFileComeBeforeItsEnd) {
     script_->allowed = 1000;
     ExpectUnits(*source, 0, 205);
     SourceUnit unit;
-    EXPECT_EQ(source->Read(unit), SourceInterface::Result::kEnd);
+    EXPECT_EQ(ReadNext(*source, unit), SourceInterface::Result::kEnd);
 }
 
 TEST_F(QueuedSourceTest, TheLastUnitsComeBeforeTheFailure) {
@@ -119,32 +127,61 @@ TEST_F(QueuedSourceTest, TheLastUnitsComeBeforeTheFailure) {
     EXPECT_EQ(source->Read(unit), SourceInterface::Result::kEnd);
 }
 
-TEST_F(QueuedSourceTest, AProducerThatIsAheadWaitsUntilHalfIsTaken) {
+TEST_F(QueuedSourceTest, AProducerOfAFileThatIsAheadGoesOnWhenHalfWasTaken) {
     const auto source = Open(Pacer::ForFile(kFast));
+    script_->allowed = 100;
+    ASSERT_TRUE(WaitUntil([&] { return source->Queued() == kCapacity; }));
     script_->allowed = 1000;
-    ASSERT_TRUE(WaitUntil([this] { return script_->made == static_cast<int>(kCapacity); }));
     ExpectUnits(*source, 0, 49);
-    EXPECT_EQ(script_->made, static_cast<int>(kCapacity));
+    EXPECT_EQ(script_->calls, 100);
     ExpectUnits(*source, 49, 1);
-    EXPECT_TRUE(WaitUntil([this] { return script_->made == static_cast<int>(kCapacity) + 50; }));
-    ExpectUnits(*source, 50, 100);
+    ASSERT_TRUE(WaitUntil([&] { return source->Queued() == kCapacity; }));
+    EXPECT_EQ(script_->made, 150);
 }
 
-TEST_F(QueuedSourceTest, AStopEndsTheWaitsOfBothSides) {
+TEST_F(QueuedSourceTest, ALiveProducerGoesOnAsSoonAsThereIsRoom) {
     const auto source = Open(Pacer::ForLive(kFast));
-    auto read = std::async(std::launch::async, [&] {
+    script_->allowed = 1000;
+    ASSERT_TRUE(WaitUntil([&] { return source->Queued() == kCapacity; }));
+    ExpectUnits(*source, 0, 1);
+    ASSERT_TRUE(WaitUntil([&] { return source->Queued() == kCapacity; }));
+    EXPECT_EQ(script_->made, 101);
+}
+
+TEST_F(QueuedSourceTest, SentencesMakeRoomAsUnitsDo) {
+    script_->notices = 200;
+    const auto source = Open(Pacer::ForFile(kFast));
+    script_->allowed = 3;
+    script_->last = 3;
+    ExpectUnits(*source, 0, 3);
+    SourceUnit unit;
+    EXPECT_EQ(ReadNext(*source, unit), SourceInterface::Result::kEnd);
+}
+
+TEST_F(QueuedSourceTest, AStopEndsTheWaitOfTheReader) {
+    // Due long after the test.
+    const auto source = Open(Pacer::ForFile(1e-9));
+    script_->allowed = 50;
+    ExpectUnits(*source, 0, 1);
+    std::promise<void> reading;
+    auto result = std::async(std::launch::async, [&] {
+        reading.set_value();
         SourceUnit unit;
         return ReadNext(*source, unit);
     });
+    reading.get_future().wait();
     source->Stop();
-    EXPECT_EQ(read.get(), SourceInterface::Result::kStopped);
+    EXPECT_EQ(result.get(), SourceInterface::Result::kStopped);
+}
 
-    const auto ahead = Open(Pacer::ForFile(kFast));
+TEST_F(QueuedSourceTest, AStopEndsTheWaitOfAProducerWithoutRoom) {
+    const auto source = Open(Pacer::ForFile(kFast));
     script_->allowed = 1000;
-    ASSERT_TRUE(WaitUntil([this] { return script_->made >= static_cast<int>(kCapacity); }));
+    ASSERT_TRUE(WaitUntil([&] { return source->Queued() == kCapacity; }));
     SourceUnit unit;
-    ahead->Stop();
-    EXPECT_EQ(ahead->Read(unit), SourceInterface::Result::kStopped);
+    source->Stop();
+    EXPECT_EQ(source->Read(unit), SourceInterface::Result::kStopped);
+    // The destructor waits for the producer's thread.
 }
 
 TEST_F(QueuedSourceTest, AUnitIsNotHandedOverBeforeItIsDue) {

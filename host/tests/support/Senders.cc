@@ -94,7 +94,56 @@ std::unique_ptr<Process> ServeRtsp(const std::filesystem::path& material, std::u
 std::unique_ptr<Process> SendTransportStream(const std::filesystem::path& material, const std::string& url) {
     return std::make_unique<Process>(std::vector<std::string>{"ffmpeg", "-v", "error", "-nostdin", "-re",
                                                               "-i", material.string(), "-map", "0", "-c",
-                                                              "copy", "-f", "mpegts", url});
+                                                              "copy", "-copyinkf", "-f", "mpegts", url});
+}
+
+std::unique_ptr<Process> PublishRtmp(const std::filesystem::path& material, const std::string& url) {
+    return std::make_unique<Process>(std::vector<std::string>{
+        "ffmpeg", "-v", "error", "-nostdin", "-re", "-i", material.string(), "-c", "copy", "-f", "flv", url});
+}
+
+std::unique_ptr<Process> WriteHls(const std::filesystem::path& material,
+                                  const std::filesystem::path& folder) {
+    return std::make_unique<Process>(std::vector<std::string>{
+        "ffmpeg", "-v", "error", "-nostdin", "-re", "-i", material.string(), "-c", "copy", "-f", "hls",
+        "-hls_time", "1", "-hls_list_size", "4", (folder / "live.m3u8").string()});
+}
+
+std::unique_ptr<Process> ServeFolder(const std::filesystem::path& folder, std::uint16_t port) {
+    auto server = std::make_unique<Process>(
+        std::vector<std::string>{"/usr/bin/python3", "-m", "http.server", std::to_string(port), "--bind",
+                                 "127.0.0.1", "--directory", folder.string()});
+    if (!WaitUntilListening(port)) {
+        throw std::runtime_error("the web server: " + server->AllText());
+    }
+    return server;
+}
+
+void SendDatagrams(const std::vector<Bytes>& datagrams, std::uint16_t port, std::chrono::nanoseconds length) {
+    const int file = socket(AF_INET, SOCK_DGRAM | SOCK_CLOEXEC, 0);
+    sockaddr_in address{};
+    address.sin_family = AF_INET;
+    address.sin_port = htons(port);
+    address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
+    const auto begin = std::chrono::steady_clock::now();
+    for (std::size_t number = 0; number < datagrams.size(); ++number) {
+        std::this_thread::sleep_until(begin + length * number / datagrams.size());
+        sendto(file, datagrams[number].data(), datagrams[number].size(), 0,
+               reinterpret_cast<const sockaddr*>(&address), sizeof address);
+    }
+    close(file);
+}
+
+void SendFile(const std::filesystem::path& transportStream, std::uint16_t port,
+              std::chrono::nanoseconds length) {
+    constexpr std::size_t kSize = std::size_t{7} * 188;
+    const std::string bytes = textOf(transportStream);
+    std::vector<Bytes> datagrams;
+    for (std::size_t at = 0; at < bytes.size(); at += kSize) {
+        const std::string part = bytes.substr(at, kSize);
+        datagrams.emplace_back(part.begin(), part.end());
+    }
+    SendDatagrams(datagrams, port, length);
 }
 
 std::unique_ptr<Process> SendRtp(const std::filesystem::path& material, const FreePorts& ports) {

@@ -6,6 +6,7 @@
 
 #include "support/HeldQueueThreads.h"
 #include "support/RunningController.h"
+#include "support/ThreadCount.h"
 
 namespace clipfileModule {
 namespace {
@@ -35,6 +36,55 @@ class ControllerExactTest : public RunningController {
     std::uint64_t frame_ = 0;
     std::uint64_t audio_ = 0;
 };
+
+// Recordings that wait.
+
+TEST_F(ControllerExactTest, AFlagThatTogglesWhileTheClockStandsStillMakesABoundedNumberOfRecordings) {
+    Run("exact");
+    const std::size_t threads = threadCount();
+    for (int i = 0; i < 40; ++i) {
+        PushFlag(true, 1000);
+        PushFlag(false, 1000);
+        // The stop is an event: a recording that is removed before it says so.
+        WaitForEvents();
+    }
+    EXPECT_EQ(peer_.StreamBuffers().size(), 16U);
+    // The kernel lists a thread for a moment after it was joined.
+    EXPECT_TRUE(waitUntil([&] { return threadCount() == threads + std::size_t{16} * 4; }));
+    EXPECT_EQ(log_.Count("16 recordings wait for their first picture. the oldest is removed."), 24U);
+    EXPECT_EQ(log_.Count("OP: REMOVE STREAM. RTPTS = 90000 -> 90000."), 24U);
+    EXPECT_TRUE(host_.Statuses().empty());
+}
+
+TEST_F(ControllerExactTest, TheRecordingThatWaitsLongestMakesRoomAndTheNewOneRecords) {
+    Run("exact");
+    // Far ahead of all that comes.
+    for (std::int64_t i = 0; i < 20; ++i) {
+        const std::uint64_t rtp = 900000000U + static_cast<std::uint64_t>(i) * 90;
+        controller_.PushMeta(stream_units::MetaUnit(1, rtp, 1000, {true, std::nullopt}));
+        controller_.PushMeta(stream_units::MetaUnit(1, rtp, 1000, {false, std::nullopt}));
+    }
+    WaitUntilHanded(kMeta, 1000);
+    StartRecord(2000);
+    const Ranges recordings = Recordings();
+    ASSERT_EQ(recordings.size(), 16U);
+    EXPECT_EQ(recordings.front().first, 900000000 + 5 * 90);
+    EXPECT_EQ(recordings.back(), (std::pair<std::int64_t, std::int64_t>{180000, -1}));
+    EXPECT_FALSE(peer_.StreamBuffers().back()->IsWaiting());
+}
+
+TEST_F(ControllerExactTest, RecordingsThatHaveTheirPicturesAreNotCounted) {
+    Run("exact");
+    // What has ended is not removed meanwhile.
+    const auto held = HoldEvents();
+    for (std::uint64_t i = 0; i < 20; ++i) {
+        StartRecord(1000 + 2 * i);
+        PushFlag(false, 1001 + 2 * i);
+    }
+    EXPECT_EQ(peer_.StreamBuffers().size(), 20U);
+    EXPECT_EQ(log_.CountIf([](const CapturedLine& line) { return line.priority == LOG_PRIORITY_WARNING; }),
+              0U);
+}
 
 // The end of a record.
 

@@ -179,6 +179,28 @@ TEST_F(ControllerTest, StartParametersOverrideTheStore) {
     EXPECT_EQ(settings.bitrate, 8000U);
 }
 
+TEST_F(ControllerTest, TextsEndAtTheirFirstZeroByte) {
+    registry_.Set("MP4OutputPath", std::string("stored\0path", 11));
+    registry_.Set("MP4AuthUserName", std::string("user\0\0", 6));
+    host_.texts = {{"-filePrefix", std::string("CAM1\0\0\0\0", 8)},
+                   {"-outputPath", std::string("none\0padding", 12)},
+                   {"-password", std::string("\0secret", 7)},
+                   {"-outputMode", std::string("sync\0", 5)}};
+    ASSERT_TRUE(Initialize());
+    const OutputSettings settings = peer_.Settings();
+    EXPECT_EQ(settings.filePrefix, "CAM1");
+    EXPECT_EQ(settings.outputPath, "stored");
+    EXPECT_EQ(settings.userName, "user");
+    EXPECT_EQ(settings.password, "");
+    EXPECT_EQ(settings.outputMode, "sync");
+}
+
+TEST_F(ControllerTest, AnOutputPathOfAZeroByteIsNone) {
+    host_.texts["-outputPath"] = std::string("\0/mnt", 5);
+    EXPECT_FALSE(Initialize());
+    EXPECT_TRUE(log_.Find("end. file output path is none."));
+}
+
 TEST_F(ControllerTest, StartParametersAreAskedForInTheirOrder) {
     registry_.Set("MP4OutputPath", "a");
     ASSERT_TRUE(Initialize());

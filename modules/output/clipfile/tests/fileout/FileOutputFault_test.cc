@@ -148,6 +148,21 @@ TEST_F(FileOutputFaultTest, ClosingBoxesThatCannotBeMeasuredFindNoRoom) {
     EXPECT_THAT(Disk(), Contains(Pair(kToday + "1.txt", "open, chunk 0, tmcd 01:02:03:00, closed")));
 }
 
+TEST_F(FileOutputFaultTest, WithExactRulesClosingBoxesThatCannotBeMeasuredHaveALineOfTheirOwn) {
+    muxers.SetBoxSize(~std::uint64_t{0});
+    platform.SetAvailableSpace(1000 * kMinFreeSpace);
+    settings.recordRules = RecordRules::kExact;
+    Start();
+    Push(0);
+    Push(1);
+    WaitForEnd();
+    Finish();
+    EXPECT_TRUE(Logged(LOG_PRIORITY_ERROR, "outputFile", "mp4 box size could not be measured."));
+    EXPECT_FALSE(Logged(LOG_PRIORITY_ERROR, "outputFile", "no disk freespace. 157286400000."));
+    EXPECT_THAT(Statuses(), ElementsAre("7 23"));
+    EXPECT_THAT(Disk(), Contains(Pair(kToday + "1.txt", "open, chunk 0, tmcd 01:02:03:00, closed")));
+}
+
 TEST_F(FileOutputFaultTest, SpaceBeyond32BitsIsCountedAndTold) {
     muxers.SetBoxSize(std::uint64_t{1} << 40);
     platform.SetAvailableSpace((std::uint64_t{1} << 40) + 157286399);

@@ -98,6 +98,24 @@ TEST_F(Mp4FileTest, EachCandidateIsLookedForUnderItsModulePath) {
     EXPECT_THAT(asked, ElementsAre(prefix + ".MP4", prefix + "(2).MP4", prefix + "(3).MP4"));
 }
 
+TEST_F(Mp4FileTest, WithExactRulesTheSearchForAFreeNameEndsWhereNoneIsEverFree) {
+    std::uint64_t asked = 0;
+    platform.Set([&](FakePlatform::Hooks& hooks) {
+        hooks.testExistence = [&](const auto&) {
+            ++asked;
+            return 0;
+        };
+    });
+    initialize();
+    OutputSettings settings = MakeSettings(directory, 25000);
+    settings.recordRules = RecordRules::kExact;
+    EXPECT_FALSE(muxer.Open(settings, kTimecode, false));
+    EXPECT_EQ(asked, 300000U);
+    // EEXIST.
+    EXPECT_TRUE(log.Contains(LOG_PRIORITY_ERROR, "clipfileModule::Mp4File::createFilename", "errno = 17."));
+    EXPECT_EQ(faults.Count(FaultyFiles::kOpen), 0U);
+}
+
 TEST_F(Mp4FileTest, AMissingDirectoryFailsAtOpeningTheFile) {
     initialize();
     OutputSettings settings = MakeSettings(directory, 25000);
@@ -214,6 +232,16 @@ TEST_F(Mp4FileTest, GetBoxSizeIsZeroWhenItCannotBeTold) {
     EXPECT_THAT(errorResults(), ElementsAre(MBX_ERR_NO_MEMORY));
     EXPECT_TRUE(log.Contains("end. ret = 256."));
     EXPECT_GT(muxer.GetBoxSize(), 0U);
+}
+
+TEST_F(Mp4FileTest, WithExactRulesGetBoxSizeIsTheGreatestNumberWhenItCannotBeTold) {
+    initialize();
+    OutputSettings settings = MakeSettings(directory, 25000);
+    settings.recordRules = RecordRules::kExact;
+    ASSERT_TRUE(muxer.Open(settings, kTimecode, false));
+    faults.FailAt(FaultyFiles::kAlloc, faults.Count(FaultyFiles::kAlloc) + 1);
+    EXPECT_EQ(muxer.GetBoxSize(), std::numeric_limits<std::uint64_t>::max());
+    EXPECT_THAT(errorResults(), ElementsAre(MBX_ERR_NO_MEMORY));
 }
 
 TEST_F(Mp4FileTest, ClosingPatchesTheHeaderWithTheSizeOfAllSamples) {

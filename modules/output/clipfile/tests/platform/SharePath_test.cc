@@ -32,6 +32,27 @@ TEST(SharePath, TakesAPortBehindTheServer) {
     EXPECT_EQ(path.Url(), "smb://127.0.0.1:4450/rec");
 }
 
+TEST(SharePath, TakesAnIpv6AddressInBracketsOrAsAName) {
+    SharePath path;
+    for (const char* text : {"\\\\[2001:db8::1]\\rec", "\\\\2001-db8--1.ipv6-literal.net\\rec"}) {
+        ASSERT_TRUE(SharePath::Parse(text, path)) << text;
+        EXPECT_EQ(path.Server(), "2001:db8::1");
+        EXPECT_EQ(path.Port(), "445");
+        EXPECT_EQ(path.Url(), "smb://2001-db8--1.ipv6-literal.net:445/rec");
+    }
+    ASSERT_TRUE(SharePath::Parse("\\\\[fe80::a%eth0]:4450\\rec", path));
+    EXPECT_EQ(path.Server(), "fe80::a%eth0");
+    EXPECT_EQ(path.Port(), "4450");
+    EXPECT_EQ(path.Url(), "smb://fe80--aseth0.ipv6-literal.net:4450/rec");
+    ASSERT_TRUE(SharePath::Parse("\\\\fe80--aseth0.ipv6-literal.net\\rec", path));
+    EXPECT_EQ(path.Server(), "fe80::a%eth0");
+    for (const char* text :
+         {"\\\\[]\\rec", "\\\\[::1\\rec", "\\\\[::1]x\\rec", "\\\\[::1]:\\rec", "\\\\[nas]\\rec",
+          "\\\\[::1%]\\rec", "\\\\::1\\rec", "\\\\nas.ipv6-literal.net\\rec"}) {
+        EXPECT_FALSE(SharePath::Parse(text, path)) << text;
+    }
+}
+
 TEST(SharePath, CountsNoEmptyParts) {
     SharePath path;
     for (const char* text :

@@ -4,9 +4,11 @@
 
 #include <filesystem>
 #include <functional>
+#include <memory>
 #include <string>
 #include <vector>
 
+#include "support/BoundProcess.h"
 #include "support/TempDir.h"
 
 /// Debian's smbd on a free port of the loopback interface, with settings, users and state in a directory of
@@ -36,8 +38,9 @@ class SambaServer {
     /// What is shared.
     const std::filesystem::path& Folder() const { return folder_; }
     int Port() const { return port_; }
-    /// `\\server\share`, as the module's settings hold it.
-    std::string Path(const std::string& share = "rec") const;
+    /// `\\server\share`, as the module's settings hold it. `host` is a name of the loopback interface's
+    /// address.
+    std::string Path(const std::string& share = "rec", const std::string& host = "127.0.0.1") const;
 
     void Start();
     /// Ends it at once, in the middle of what it does, with all connections.
@@ -58,10 +61,8 @@ class SambaServer {
     /// A socket.
     const int reservation_;
     const int port_;
-    /// The server's process. Its process group is that of all that belongs to it.
-    pid_t id_ = 0;
-    /// Held open for as long as the server may run.
-    int lifeline_ = -1;
+    /// Null while it does not run.
+    std::unique_ptr<BoundProcess> server_;
     /// Its helpers, which belong to no connection.
     std::vector<pid_t> helpers_;
 };

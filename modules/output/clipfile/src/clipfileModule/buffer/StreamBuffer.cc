@@ -4,6 +4,7 @@
 #include <cmath>
 #include <cstring>
 #include <iterator>
+#include <system_error>
 #include <utility>
 
 #include "buffer/state/EndSyncRecState.h"
@@ -12,6 +13,7 @@
 #include "buffer/state/WaitStartCacheState.h"
 #include "common/JoinThread.h"
 #include "common/Log.h"
+#include "common/LogScope.h"
 
 namespace clipfileModule {
 
@@ -56,10 +58,9 @@ StreamBuffer::~StreamBuffer() {
 }
 
 void StreamBuffer::Start(const OutputSettings& recordSettings) {
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
     MutexLock control(controlMutex);
     if (stateId != kStopState) {
-        CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
         return;
     }
     if (stopPending) {
@@ -78,6 +79,7 @@ void StreamBuffer::Start(const OutputSettings& recordSettings) {
         audioBuffer.clear();
         metaBuffer.clear();
         firstPicture.reset();
+        writerMissing = false;
         metaBlock.assign(std::begin(kMetaBlock), std::end(kMetaBlock));
         chunkedVideo = 0;
         chunkedAudio = 0;
@@ -102,20 +104,35 @@ void StreamBuffer::Start(const OutputSettings& recordSettings) {
         queues = started;
         changeState(std::make_shared<WaitStartCacheState>(this, settings.recordRules));
     }
+    if (!startThreads(started)) {
+        control.Unlock();
+        endWithoutThread();
+    }
+}
+
+bool StreamBuffer::startThreads(const std::vector<std::shared_ptr<StreamQueue>>& started) {
     UnitList StreamBuffer::*const caches[] = {&StreamBuffer::videoBuffer, &StreamBuffer::audioBuffer,
                                               &StreamBuffer::metaBuffer};
-    for (std::size_t medium = 0; medium < kMediumCount; ++medium) {
-        started[medium]->Start([this, cache = caches[medium],
-                                mediaType = kMediaTypes[medium]](std::shared_ptr<StreamData>& unit) {
-            addToCache(unit, cache, mediaType);
-        });
+    try {
+        for (std::size_t medium = 0; medium < kMediumCount; ++medium) {
+            started[medium]->Start([this, cache = caches[medium],
+                                    mediaType = kMediaTypes[medium]](std::shared_ptr<StreamData>& unit) {
+                addToCache(unit, cache, mediaType);
+            });
+        }
+        chunkThread = std::make_shared<std::thread>(&StreamBuffer::makeChunk, this);
+        return true;
+    } catch (const std::system_error& error) {
+        if (!isExact()) {
+            throw;
+        }
+        CLIPFILE_LOG(LOG_PRIORITY_ERROR, "recording cannot be started. %s.", error.what());
+        return false;
     }
-    chunkThread = std::make_shared<std::thread>(&StreamBuffer::makeChunk, this);
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
 void StreamBuffer::Stop() {
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
     MutexLock control(controlMutex);
     std::vector<std::shared_ptr<StreamQueue>> stopped(kMediumCount);
     {
@@ -123,7 +140,6 @@ void StreamBuffer::Stop() {
         // that the worker waits for waits for this lock, so the push gets its room and the lock comes free.
         MutexLock lock(stateMutex);
         if (stateId == kStopState && !stopPending) {
-            CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
             return;
         }
         if (stateId != kStopState) {
@@ -146,7 +162,6 @@ void StreamBuffer::Stop() {
         }
     }
     finishStop();
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
 void StreamBuffer::finishStop() {
@@ -175,7 +190,7 @@ void StreamBuffer::finishStop() {
 }
 
 void StreamBuffer::Cancel() {
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
     if (chunkThread != nullptr) {
         if (chunkThread->joinable()) {
             CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start join...");
@@ -190,7 +205,6 @@ void StreamBuffer::Cancel() {
         }
         chunkThread.reset();
     }
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
 void StreamBuffer::PushReserved(const std::shared_ptr<StreamData>& /*unit*/) {}
@@ -273,7 +287,7 @@ void StreamBuffer::addToCache(const std::shared_ptr<StreamData>& unit, UnitList 
 
 void StreamBuffer::SetVideoSequenceHeader(const nal_access::NalUnit& sps, const nal_access::NalUnit& pps,
                                           const std::shared_ptr<StreamData>& unit) {
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
     const double frameMilliSec = static_cast<double>(streamInfo.audio_sample_duration) /
                                  static_cast<double>(streamInfo.audio_track_timescale) * 1000;
     // Contract: half-an-audio-frame-is-10-ms. Cut twice: 21.3 to 21, and 10.5 to 10.
@@ -288,14 +302,13 @@ void StreamBuffer::SetVideoSequenceHeader(const nal_access::NalUnit& sps, const 
     }
     settings.sps = sps;
     settings.pps = pps;
-    fileOutput->Start(settings);
+    startWriter();
     // Contract: idr-frame-unsorted. The cache is empty here.
     videoBuffer.push_back(unit);
     firstPicture = unit;
     if (isExact()) {
         startInStep();
     }
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
 void StreamBuffer::removeBefore(UnitList& cache, std::uint64_t limit) {
@@ -327,10 +340,10 @@ void StreamBuffer::setError(int code) {
         }
         changeState(std::make_shared<ErrorCacheState>(this));
     }
-    controller->SetStatus(6, code);
+    controller->SetStatus(QxStatus::kStreamFault, code);
     if (!chunkProduced) {
         // Contract: fault-before-first-chunk. Ends the module for good, whatever the cause was.
-        controller->SetStatus(7, 26);
+        controller->SetStatus(QxStatus::kFailed, QxFailure::kNoFirstChunk);
         return;
     }
     MutexLock lock(stateMutex);

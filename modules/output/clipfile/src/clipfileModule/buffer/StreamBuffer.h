@@ -13,14 +13,14 @@
 #include "QxModuleStreamInterface.h"
 #include "StreamAnalyzer.h"
 #include "StreamData.h"
-#include "buffer/ChunkData.h"
 #include "buffer/ChunkPass.h"
-#include "buffer/StreamQueue.h"
+#include "buffer/chunk/ChunkData.h"
+#include "buffer/queue/StreamQueue.h"
 #include "buffer/state/CacheState.h"
-#include "buffer/state/StreamBufferInterface.h"
+#include "common/ControllerInterface.h"
 #include "common/Mutex.h"
-#include "controller/ControllerInterface.h"
-#include "controller/OutputSettings.h"
+#include "common/OutputSettings.h"
+#include "common/StreamBufferInterface.h"
 #include "fileout/FileOutput.h"
 #include "mp4/InputStreamInfo.h"
 
@@ -34,7 +34,7 @@ namespace clipfileModule {
 /// may be called from any thread, at any time in that life.
 ///
 /// Sources: StreamBuffer.cc has life and states, StreamBufferChunk.cc the chunk thread, StreamBufferExact.cc
-/// what is different there with exact rules.
+/// what is different with exact rules.
 ///
 /// Order of the locks: `controlMutex`, `stateMutex`, `bufferMutex`, and last, one at a time,
 /// `analyzerMutex`, the locks of the queues and of `FileOutput`.
@@ -50,7 +50,8 @@ class StreamBuffer final : public QxModuleStreamInterface,
     StreamBuffer& operator=(const StreamBuffer&) = delete;
 
     /// Starts the recording with its own copy of `recordSettings`. Does nothing unless the buffer is
-    /// stopped. Throws `std::system_error` when no thread can be started.
+    /// stopped. Throws `std::system_error` when no thread can be started; with exact rules the recording
+    /// fails then, and asks for its removal.
     void Start(const OutputSettings& recordSettings) EXCLUDES(controlMutex);
     /// Ends the recording: joins its threads, writes the chunks that wait and closes the file. Leaves start
     /// and stop timestamp at 0 and -1. Does nothing when the buffer is stopped. With exact rules what is
@@ -60,6 +61,8 @@ class StreamBuffer final : public QxModuleStreamInterface,
     /// `std::system_error` then: units are dropped from now on, and the next `Stop`, `Start` or the
     /// destruction on another thread does what is left.
     void Stop() EXCLUDES(controlMutex);
+    /// True from `Start` until the first IDR frame, the end or a fault. Any thread.
+    bool IsWaiting() const { return stateId == kWaitStartState; }
     /// Sets where the record starts: units before it do not belong to it. Has an effect until the recording
     /// has met its first IDR frame.
     void SetStartTimestamp(std::int64_t start) { startTimestamp = start; }
@@ -120,6 +123,7 @@ class StreamBuffer final : public QxModuleStreamInterface,
     void setError(int code) EXCLUDES(stateMutex, bufferMutex);
     void finishStop() REQUIRES(controlMutex) EXCLUDES(bufferMutex);
     void Cancel() REQUIRES(controlMutex) EXCLUDES(bufferMutex);
+    bool startThreads(const std::vector<std::shared_ptr<StreamQueue>>& started) REQUIRES(controlMutex);
     bool isExact() const { return settings.recordRules == RecordRules::kExact; }
     int framesIn(std::int64_t distance) const;
     static unsigned int getTimecodeFrameCount(std::uint32_t framerate);
@@ -142,6 +146,10 @@ class StreamBuffer final : public QxModuleStreamInterface,
     void splitMeta(ChunkData& chunk, std::size_t count, std::uint64_t end) REQUIRES(bufferMutex);
     void setDurations(SampleList& samples, std::uint64_t next, std::uint32_t clock, std::uint32_t timescale)
         REQUIRES(analyzerMutex);
+
+    // A recording without a thread, which only exact rules allow.
+    void startWriter() REQUIRES(bufferMutex);
+    void endWithoutThread() EXCLUDES(controlMutex, stateMutex, bufferMutex);
 
     // The chunk thread with exact rules.
     PassResult makeExactPass() REQUIRES(bufferMutex);
@@ -192,6 +200,8 @@ class StreamBuffer final : public QxModuleStreamInterface,
     UnitList metaBuffer GUARDED_BY(bufferMutex);
     /// The IDR frame that the record begins with.
     std::shared_ptr<StreamData> firstPicture GUARDED_BY(bufferMutex);
+    /// With exact rules: its thread could not be started.
+    bool writerMissing GUARDED_BY(bufferMutex) = false;
     /// Units moved into chunks.
     std::uint64_t chunkedVideo GUARDED_BY(bufferMutex) = 0;
     std::uint64_t chunkedAudio GUARDED_BY(bufferMutex) = 0;

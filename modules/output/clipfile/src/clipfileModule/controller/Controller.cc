@@ -1,12 +1,14 @@
 #include "controller/Controller.h"
 
 #include <algorithm>
+#include <system_error>
 #include <utility>
 
+#include "QxModuleStatus.h"
 #include "QxRegistry.h"
 #include "buffer/StreamBuffer.h"
 #include "common/Log.h"
-#include "controller/Status.h"
+#include "common/LogScope.h"
 
 namespace clipfileModule {
 
@@ -39,10 +41,15 @@ constexpr const char* kNoOutputPath = "none";
 constexpr const char* kRecordRulesKept = "kept";
 constexpr const char* kRecordRulesExact = "exact";
 
+// Contract: text-ends-at-zero. A host may give a padded buffer; a path would be cut there by the system.
+std::string upToFirstZero(const std::string& text) {
+    return text.substr(0, text.find('\0'));
+}
+
 std::string readText(QxModuleHostInterface& host, const std::string& key, const std::string& defaultValue) {
     std::string value;
     host.GetParameter(key, value, defaultValue);
-    return value;
+    return upToFirstZero(value);
 }
 
 std::uint32_t readNumber(QxModuleHostInterface& host, const std::string& key, std::uint32_t defaultValue) {
@@ -74,7 +81,7 @@ bool Controller::Initialize(QxModuleHostInterface* moduleHost) {
         CLIPFILE_LOG(LOG_PRIORITY_WARNING, "initialize is called twice.");
         return true;
     }
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
     recFlag = -1;
     strayUnitNoted = false;
     host = moduleHost;
@@ -87,8 +94,8 @@ bool Controller::Initialize(QxModuleHostInterface* moduleHost) {
     }
     // Contract: static-config-never-fails. A guard that nothing reaches.
     if (!getStaticConfig()) {
-        CLIPFILE_LOG(LOG_PRIORITY_ERROR, "end. static config error.");
-        SetStatus(kStatusFailed, kCauseInitialize);
+        scope.EndAs(LOG_PRIORITY_ERROR, "end. static config error.");
+        SetStatus(QxStatus::kFailed, QxFailure::kInitialize);
         endStatusChannel();
         return false;
     }
@@ -97,8 +104,8 @@ bool Controller::Initialize(QxModuleHostInterface* moduleHost) {
         analyzer = std::make_shared<nal_access::StreamAnalyzer>();
     }
     if (!getStartParameters()) {
-        CLIPFILE_LOG(LOG_PRIORITY_ERROR, "end. file output path is none.");
-        SetStatus(kStatusFailed, kCauseInitialize);
+        scope.EndAs(LOG_PRIORITY_ERROR, "end. file output path is none.");
+        SetStatus(QxStatus::kFailed, QxFailure::kInitialize);
         endStatusChannel();
         return false;
     }
@@ -122,22 +129,42 @@ bool Controller::Initialize(QxModuleHostInterface* moduleHost) {
         {kTransferStatusNotify, [this](std::shared_ptr<Event> event) { OnTransferStatusNotify(event); }},
         {kTerminate, [this](std::shared_ptr<Event> event) { OnTerminate(event); }},
     };
-    eventThread = std::make_shared<std::thread>(&Controller::EventLoop, this);
+    try {
+        eventThread = std::make_shared<std::thread>(&Controller::EventLoop, this);
 
-    queueThreads.resize(kQueueCount);
-    queues.resize(kQueueCount);
-    const UnitConsumer consumers[kQueueCount] = {
-        [this](const std::shared_ptr<StreamData>& unit) { pushToBuffers(Medium::kVideo, unit); },
-        [this](const std::shared_ptr<StreamData>& unit) { pushToBuffers(Medium::kAudio, unit); },
-        [this](const std::shared_ptr<StreamData>& unit) { processMeta(unit); },
-    };
-    for (std::size_t i = 0; i < kQueueCount; ++i) {
-        startQueueThread(i, consumers[i]);
-        CLIPFILE_LOG(LOG_PRIORITY_TRACE, "count = %d.", static_cast<int>(i));
+        queueThreads.resize(kQueueCount);
+        queues.resize(kQueueCount);
+        const UnitConsumer consumers[kQueueCount] = {
+            [this](const std::shared_ptr<StreamData>& unit) { pushToBuffers(Medium::kVideo, unit); },
+            [this](const std::shared_ptr<StreamData>& unit) { pushToBuffers(Medium::kAudio, unit); },
+            [this](const std::shared_ptr<StreamData>& unit) { processMeta(unit); },
+        };
+        for (std::size_t i = 0; i < kQueueCount; ++i) {
+            startQueueThread(i, consumers[i]);
+            CLIPFILE_LOG(LOG_PRIORITY_TRACE, "count = %d.", static_cast<int>(i));
+        }
+    } catch (const std::system_error& error) {
+        if (!isExact) {
+            throw;
+        }
+        CLIPFILE_LOG(LOG_PRIORITY_ERROR, "end. threads cannot be started. %s.", error.what());
+        scope.Dismiss();
+        SetStatus(QxStatus::kFailed, QxFailure::kInitialize);
+        endFailedStart();
+        return false;
     }
     intake = channel.get();
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
     return true;
+}
+
+void Controller::endFailedStart() {
+    terminated = true;
+    if (eventThread != nullptr) {
+        PostEvent(std::make_shared<TerminateEvent>());
+        eventThread->join();
+        eventThread.reset();
+    }
+    endLife();
 }
 
 bool Controller::getStaticConfig() {
@@ -156,7 +183,7 @@ bool Controller::getStaticConfig() {
                 // Contract: missing-text-is-empty. Only a missing number is logged.
                 value.clear();
             }
-            *field = value;
+            *field = upToFirstZero(value);
         }
         unsigned int maxFileSize = 0;
         if (!registry->getValue(kSettingsSection, kKeyMaxFileSize, maxFileSize)) {
@@ -244,7 +271,7 @@ void Controller::Uninitialize() {
         CLIPFILE_LOG(LOG_PRIORITY_WARNING, "uninitialize is called without initialize.");
         return;
     }
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
     terminated = true;
     if (eventThread->joinable()) {
         PostEvent(std::make_shared<TerminateEvent>());
@@ -253,12 +280,17 @@ void Controller::Uninitialize() {
         CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end join");
     }
     eventThread.reset();
+    endLife();
+}
+
+/// What is left behind the event thread. Not all of the others need have been started.
+void Controller::endLife() {
     stopAndRemoveBuffers();
-    for (std::size_t i = 0; i < queueThreads.size(); ++i) {
+    for (std::size_t i = 0; i < queueThreads.size() && queues[i] != nullptr; ++i) {
         queues[i]->Clear();
         // Contract: closed-queues. Closing wakes the thread, which then finds `terminated`.
         queues[i]->Close();
-        if (queueThreads[i]->joinable()) {
+        if (queueThreads[i] != nullptr && queueThreads[i]->joinable()) {
             queueThreads[i]->join();
         }
     }
@@ -281,7 +313,6 @@ void Controller::Uninitialize() {
     }
     undelivered.clear();
     endStatusChannel();
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
 void Controller::Execute() {
@@ -289,10 +320,9 @@ void Controller::Execute() {
         CLIPFILE_LOG(LOG_PRIORITY_WARNING, "execute is called without initialize.");
         return;
     }
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
     PostEvent(std::make_shared<TransferStatusNotifyEvent>(
-        std::map<std::string, std::string>{{kFileOutputStatusKey, kFileOutputStatusStandby}}));
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
+        std::map<std::string, std::string>{{QxStatusMap::kFileOutput, QxStatusMap::kStandby}}));
 }
 
 void Controller::SetStatus(int status, int cause) {

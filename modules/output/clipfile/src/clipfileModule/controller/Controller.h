@@ -17,10 +17,10 @@
 #include "QxModuleHostInterface.h"
 #include "QxModuleStreamInterface.h"
 #include "StreamAnalyzer.h"
-#include "buffer/StreamQueue.h"
+#include "buffer/queue/StreamQueue.h"
+#include "common/ControllerInterface.h"
 #include "common/Mutex.h"
-#include "controller/ControllerInterface.h"
-#include "controller/OutputSettings.h"
+#include "common/OutputSettings.h"
 #include "controller/PreRoll.h"
 #include "controller/Recording.h"
 #include "controller/StatusChannel.h"
@@ -41,8 +41,9 @@ class Controller : public ControllerInterface, public QxModuleStreamInterface {
 
     /// Reads the settings store and the start parameters of `moduleHost`, which must live until
     /// `Uninitialize`, and starts the threads. False when no output path is known: the host then has status
-    /// 7, cause 2, and no thread runs. Throws `std::system_error` when a thread cannot be started. A life
-    /// that runs already goes on with the host that it has, and the result is true.
+    /// 7, cause 2, and no thread runs. When a thread cannot be started it throws `std::system_error` with
+    /// kept rules, and is false with cause 2 with exact ones. A life that runs already goes on with the host
+    /// that it has, and the result is true.
     bool Initialize(QxModuleHostInterface* moduleHost);
     /// Ends the event thread, every recording and every queue thread, in this order, once the host has
     /// stopped pushing. Nothing outside a life.
@@ -77,6 +78,8 @@ class Controller : public ControllerInterface, public QxModuleStreamInterface {
     // Configuration (Controller.cc).
     bool getStaticConfig();
     bool getStartParameters();
+    void endFailedStart();
+    void endLife();
     void startQueueThread(std::size_t index, const UnitConsumer& consumer);
     void endStatusChannel() EXCLUDES(statusMutex);
     std::shared_ptr<StatusChannel> getStatusChannel() const EXCLUDES(statusMutex);
@@ -121,6 +124,7 @@ class Controller : public ControllerInterface, public QxModuleStreamInterface {
     // What exact rules add (ControllerExact.cc). Nothing happens in them with kept rules.
     void followCommand(const StreamData& unit) EXCLUDES(streamBuffersMutex);
     void endRecordings(std::int64_t end) EXCLUDES(streamBuffersMutex);
+    void limitWaiting() EXCLUDES(streamBuffersMutex);
     void replayInto(const Recording& recording, std::int64_t start) REQUIRES(streamBuffersMutex);
     bool keepsStop(const Recording& recording) const REQUIRES(streamBuffersMutex);
     void startBehindStream(Recording& recording) REQUIRES(streamBuffersMutex);

@@ -3,6 +3,7 @@
 
 #include <algorithm>
 
+#include "common/Log.h"
 #include "common/RtpClock.h"
 #include "controller/Controller.h"
 
@@ -14,6 +15,10 @@ namespace {
 constexpr std::uint64_t kAudioFrame = 22;
 /// No unit of the same clock comes so late behind those of other media: a queue holds some two seconds.
 constexpr std::uint64_t kLargestLag = 5000;
+
+/// With four threads each. A flag that toggles while the stream's clock stands still would make more and
+/// more.
+constexpr std::ptrdiff_t kMostWaiting = 16;
 
 }  // namespace
 
@@ -34,6 +39,30 @@ void Controller::endRecordings(std::int64_t end) {
             recording.buffer->SetEndTimestamp(end);
         }
     }
+}
+
+void Controller::limitWaiting() {
+    if (!isExact) {
+        return;
+    }
+    const auto waits = [](const Recording& recording) { return recording.buffer->IsWaiting(); };
+    std::shared_ptr<StreamBuffer> oldest;
+    {
+        MutexLock lock(streamBuffersMutex);
+        if (std::count_if(streamBuffers.begin(), streamBuffers.end(), waits) < kMostWaiting) {
+            return;
+        }
+        const auto found = std::find_if(streamBuffers.begin(), streamBuffers.end(), waits);
+        if (found == streamBuffers.end()) {
+            return;
+        }
+        oldest = found->buffer;
+        // At once: from now on no unit can end it, which would have it removed a second time.
+        streamBuffers.erase(found);
+    }
+    CLIPFILE_LOG(LOG_PRIORITY_WARNING, "%d recordings wait for their first picture. the oldest is removed.",
+                 static_cast<int>(kMostWaiting));
+    RemoveStream(oldest);
 }
 
 void Controller::replayInto(const Recording& recording, std::int64_t start) {

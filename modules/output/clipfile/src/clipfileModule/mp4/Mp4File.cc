@@ -1,5 +1,6 @@
 #include "mp4/Mp4File.h"
 
+#include <cerrno>
 #include <cstdio>
 #include <cstdlib>
 #include <ratio>
@@ -14,6 +15,10 @@ namespace {
 
 constexpr std::uint32_t kBrand = MbxCode("ZQVC");
 constexpr std::uint32_t kMinorVersion = 0x01001FFF;
+
+/// Names that are tried for one timecode. In a day's directory no recorder leaves as many: with a file for
+/// each 0.32 s, the shortest distance of two points where sound and picture are in step, it is 270,000.
+constexpr std::uint64_t kMostNames = 300000;
 
 using Ticks = std::chrono::duration<std::int64_t, std::ratio<1, 10000000>>;
 
@@ -130,11 +135,15 @@ bool Mp4File::createFilename(const std::array<unsigned char, 4>& timecode) {
     std::string suffix;
     for (std::uint64_t counter = 1;;) {
         const std::string filename = base + suffix + ".MP4";
-        const int error = GetPlatform().TestExistence(m_stream.outputPath + "\\" + filename);
+        int error = GetPlatform().TestExistence(m_stream.outputPath + "\\" + filename);
         if (error == kNoSuchPath) {
             m_filename = filename;
             CLIPFILE_LOG_PLAIN(LOG_PRIORITY_TRACE, "ST: out_filename = \"%s\"", filename.c_str());
             return routine.Return(true);
+        }
+        if (error == 0 && isExact() && counter == kMostNames) {
+            // A system that has a file of every name will never say otherwise.
+            error = EEXIST;
         }
         if (error != 0) {
             CLIPFILE_LOG(LOG_PRIORITY_ERROR, "errno = %d.", error);
@@ -195,7 +204,7 @@ std::uint64_t Mp4File::GetBoxSize() {
     const MbxStatus status = MbxWriteMoov(m_session.get(), nullptr, 0, &size);
     static_cast<void>(routine.Return(status));
     // Contract: box-size-failure-0-or-max. 0 here, 2^64 - 1 in a fragmented file.
-    return MUXER_FAILED(routine, status) ? 0 : size;
+    return MUXER_FAILED(routine, status) ? (isExact() ? kUnmeasured : 0) : size;
 }
 
 std::uint64_t Mp4File::GetDuration() {

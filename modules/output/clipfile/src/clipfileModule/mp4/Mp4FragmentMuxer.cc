@@ -1,7 +1,6 @@
 #include "mp4/Mp4FragmentMuxer.h"
 
 #include <cstdio>
-#include <limits>
 #include <utility>
 #include <vector>
 
@@ -247,7 +246,7 @@ std::uint64_t Mp4FragmentMuxer::GetBoxSize() {
     std::uint64_t size = 0;
     const MbxStatus status = MbxWriteMoov(m_session.get(), nullptr, 0, &size);
     static_cast<void>(routine.Return(status));
-    return MUXER_FAILED(routine, status) ? std::numeric_limits<std::uint64_t>::max() : size + m_estimate;
+    return MUXER_FAILED(routine, status) ? kUnmeasured : size + m_estimate;
 }
 
 bool Mp4FragmentMuxer::Close() {

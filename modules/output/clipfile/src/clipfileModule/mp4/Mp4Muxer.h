@@ -1,12 +1,13 @@
 #pragma once
 
 #include <cstdint>
+#include <limits>
 #include <memory>
 #include <string>
 
 #include "boxlib/mbx_types.h"
-#include "buffer/ChunkData.h"
-#include "controller/OutputSettings.h"
+#include "buffer/chunk/ChunkData.h"
+#include "common/OutputSettings.h"
 #include "mp4/InputStreamInfo.h"
 
 namespace clipfileModule {
@@ -18,6 +19,8 @@ namespace clipfileModule {
 /// failed stays on disk as far as it was written, and can still be closed.
 class Mp4Muxer {
  public:
+    static constexpr std::uint64_t kUnmeasured = std::numeric_limits<std::uint64_t>::max();
+
     /// Makes what a file needs in memory. False without memory.
     virtual bool Initialize() = 0;
     /// Releases it. Always true.
@@ -36,7 +39,8 @@ class Mp4Muxer {
     virtual bool WriteTmcd(const unsigned char* timecode) = 0;
     /// Bytes of the file with the samples that it will get next.
     virtual std::uint64_t GetWrittenSize() = 0;
-    /// Bytes that closing the file will still add.
+    /// Bytes that closing the file will still add. `kUnmeasured` when that cannot be told; with kept rules a
+    /// normal file says 0 then.
     virtual std::uint64_t GetBoxSize() = 0;
     /// Video written so far, in ticks of the video's time scale.
     virtual std::uint64_t GetDuration() = 0;

@@ -252,6 +252,33 @@ TEST_F(ExactWaitStartCacheStateTest, OtherMediaThatOvertookThePicturesDoNotCance
     EXPECT_EQ(executeExact(video(999), "video")->GetId(), kStartState);
 }
 
+/// An IDR frame whose parameter sets have these sizes, with their headers.
+std::shared_ptr<StreamData> idrWithSets(std::size_t spsSize, std::size_t ppsSize) {
+    stream_units::Bytes payload;
+    for (const auto& [set, size] :
+         {std::pair{stream_units::Sps(), spsSize}, std::pair{stream_units::Pps(), ppsSize}}) {
+        stream_units::Append(payload, {0, 0, 0, 1});
+        stream_units::Append(payload, set);
+        payload.insert(payload.end(), size - set.size(), 0x55);
+    }
+    stream_units::Append(payload, {0, 0, 1});
+    stream_units::Append(payload, stream_units::Slice(true, 7));
+    return stream_units::MakeUnit(payload, 90000, 1000);
+}
+
+TEST_F(ExactWaitStartCacheStateTest, AParameterSetThatNoFileCanHoldIsRefusedWithALine) {
+    EXPECT_EQ(executeExact(idrWithSets(65536, 100), "video"), nullptr);
+    EXPECT_TRUE(log.Contains(LOG_PRIORITY_NOTICE, kExecute, "sps nal unit size is 65536."));
+    log.Clear();
+    EXPECT_EQ(executeExact(idrWithSets(100, 65536), "video"), nullptr);
+    EXPECT_TRUE(log.Contains(LOG_PRIORITY_NOTICE, kExecute, "pps nal unit size is 65536."));
+    EXPECT_EQ(executeExact(idrWithSets(65535, 65535), "video")->GetId(), kStartState);
+}
+
+TEST_F(WaitStartCacheStateTest, WithKeptRulesAParameterSetThatNoFileCanHoldIsTaken) {
+    EXPECT_EQ(execute(idrWithSets(65536, 65536), "video")->GetId(), kStartState);
+}
+
 TEST_F(ExactWaitStartCacheStateTest, WithoutPicturesTheOtherMediaCancelTheRecordALittleLater) {
     buffer.end = 90000;
     EXPECT_EQ(executeExact(audio(3999), "audio"), nullptr);

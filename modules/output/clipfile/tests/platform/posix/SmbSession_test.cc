@@ -1,7 +1,10 @@
 #include "platform/posix/SmbSession.h"
 
 #include <gtest/gtest.h>
+#include <sys/socket.h>
+#include <unistd.h>
 
+#include <atomic>
 #include <cerrno>
 #include <chrono>
 #include <cstdio>
@@ -13,6 +16,7 @@
 #include <vector>
 
 #include "platform/posix/SmbStream.h"
+#include "support/BoundProcess.h"
 #include "support/SambaServer.h"
 
 namespace clipfileModule {
@@ -89,6 +93,57 @@ TEST_F(SmbSessionTest, ManyThreadsConnectWriteAndLeaveAtOnce) {
             EXPECT_EQ(text, folderOf(i, round));
         }
     }
+}
+
+/// Takes one connection and what it begins with, and is silent from then on, as a server that is frozen.
+class SilentServer {
+ public:
+    SilentServer() : listening_(free_port::Reserve()) { EXPECT_EQ(listen(listening_, 8), 0); }
+    ~SilentServer() {
+        close(taken_);
+        close(listening_);
+    }
+    SilentServer(const SilentServer&) = delete;
+    SilentServer& operator=(const SilentServer&) = delete;
+
+    std::string Path() const {
+        return "\\\\127.0.0.1:" + std::to_string(free_port::Of(listening_)) + "\\rec";
+    }
+    /// Waits for somebody who has connected and begun to speak.
+    void AwaitClient() {
+        taken_ = accept(listening_, nullptr, nullptr);
+        char byte = 0;
+        EXPECT_EQ(recv(taken_, &byte, 1, 0), 1);
+    }
+    void HangUp() {
+        close(taken_);
+        taken_ = -1;
+        shutdown(listening_, SHUT_RDWR);
+    }
+
+ private:
+    const int listening_;
+    int taken_ = -1;
+};
+
+TEST_F(SmbSessionTest, AServerThatIsSilentHoldsUpNoLogonToAnother) {
+    SilentServer silent;
+    SharePath share;
+    ASSERT_TRUE(SharePath::Parse(silent.Path(), share));
+    std::string reason;
+    const SmbLibrary* const library = SmbLibrary::Get(reason);
+    std::atomic<bool> ended = false;
+    std::thread connecting([&] {
+        SmbClient client(*library, share, SmbCredentials::Of(SambaServer::kUser, SambaServer::kPassword),
+                         seconds(60));
+        EXPECT_NE(client.Connect(), 0);
+        ended = true;
+    });
+    silent.AwaitClient();
+    EXPECT_EQ(connect()->ConnectResult(), 0);
+    EXPECT_FALSE(ended) << "it came too late to tell";
+    silent.HangUp();
+    connecting.join();
 }
 
 TEST_F(SmbSessionTest, LooksOpensForReadingAndDeletes) {

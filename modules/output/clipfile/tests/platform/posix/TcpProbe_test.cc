@@ -11,6 +11,7 @@
 #include <cerrno>
 #include <chrono>
 #include <string>
+#include <thread>
 
 namespace clipfileModule {
 namespace {
@@ -34,6 +35,7 @@ class BoundSocket {
     BoundSocket(const BoundSocket&) = delete;
     BoundSocket& operator=(const BoundSocket&) = delete;
 
+    int Descriptor() const { return descriptor_; }
     std::string Port() const { return std::to_string(ntohs(address_.sin_port)); }
     sockaddr* Address() { return reinterpret_cast<sockaddr*>(&address_); }
 
@@ -104,6 +106,35 @@ TEST(TcpProbe, GivesAddressesUpThatDropWhatIsSent) {
     addrinfo second = entryOf(refusing.Address(), nullptr);
     const addrinfo first = entryOf(full.Address(), &second);
     EXPECT_EQ(ProbeTcp(&first, std::chrono::milliseconds(50)), ETIMEDOUT);
+}
+
+TEST(TcpProbe, AServerThatTakesConnectionsAndIsSilentDoesNotAnswer) {
+    // The system takes them in its place, as for a process that is stopped.
+    const BoundSocket server(true);
+    EXPECT_EQ(ProbeTcp("127.0.0.1", server.Port(), std::chrono::milliseconds(50), "hello"), ETIMEDOUT);
+}
+
+TEST(TcpProbe, AnythingThatComesBackIsAnAnswer) {
+    BoundSocket server(true);
+    std::string heard;
+    std::thread answering([&] {
+        const int taken = accept(server.Descriptor(), nullptr, nullptr);
+        std::array<char, 5> data = {};
+        EXPECT_EQ(recv(taken, data.data(), data.size(), MSG_WAITALL), 5);
+        heard.assign(data.data(), data.size());
+        EXPECT_EQ(send(taken, "x", 1, MSG_NOSIGNAL), 1);
+        close(taken);
+    });
+    EXPECT_EQ(ProbeTcp("127.0.0.1", server.Port(), kLimit, "hello"), 0);
+    answering.join();
+    EXPECT_EQ(heard, "hello");
+}
+
+TEST(TcpProbe, AServerThatHangsUpHasAnswered) {
+    BoundSocket server(true);
+    std::thread hangingUp([&] { close(accept(server.Descriptor(), nullptr, nullptr)); });
+    EXPECT_EQ(ProbeTcp("127.0.0.1", server.Port(), kLimit, "hello"), 0);
+    hangingUp.join();
 }
 
 TEST(TcpProbe, LeavesANameThatItCannotResolveToOthers) {

@@ -1,5 +1,7 @@
 #include "buffer/state/WaitStartCacheState.h"
 
+#include <algorithm>
+
 #include "buffer/state/EndSyncRecState.h"
 #include "buffer/state/StartCacheState.h"
 #include "common/Log.h"
@@ -14,6 +16,9 @@ constexpr std::uint64_t kHalfAudioFrameMilliSec = 11;
 /// How far the other media may be ahead of the pictures: a queue of 50 pictures and the one in hand last 2.13
 /// s at the lowest frame rate.
 constexpr std::uint64_t kVideoLagMilliSec = 3000;
+
+/// A parameter set has a length of 16 bits in its record (ISO/IEC 14496-15 5.2.4.1).
+constexpr std::uint64_t kLongestSet = 65535;
 
 constexpr std::string_view kVideoName = "video";
 constexpr std::string_view kAudioName = "audio";
@@ -76,6 +81,12 @@ std::shared_ptr<CacheState> WaitStartCacheState::Execute(const std::shared_ptr<S
     }
     if (pps.size == 0) {
         CLIPFILE_LOG(LOG_PRIORITY_NOTICE, "pps nal unit size is 0.");
+        return nullptr;
+    }
+    if (rules == RecordRules::kExact && std::max(sps.size, pps.size) > kLongestSet) {
+        const bool isSps = sps.size > kLongestSet;
+        CLIPFILE_LOG(LOG_PRIORITY_NOTICE, "%s nal unit size is %llu.", isSps ? "sps" : "pps",
+                     static_cast<unsigned long long>(isSps ? sps.size : pps.size));
         return nullptr;
     }
     dump("IDR received. sps dump.", sps.data.get(), sps.size);

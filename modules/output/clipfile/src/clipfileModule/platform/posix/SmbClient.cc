@@ -23,8 +23,11 @@ namespace {
 
 /// Fields of this size, with the terminator, are what libsmbclient copies credentials through.
 constexpr std::size_t kFieldSize = 256;
+
 /// Below the time-out of an operation, so that a server that is switched off is known by its own error.
-constexpr std::chrono::milliseconds kProbeLimit(2000);
+std::chrono::milliseconds probeLimit(std::chrono::milliseconds answerTimeout) {
+    return answerTimeout * 5 / 8;
+}
 
 /// What the last call left in `errno`, which it does not always set.
 int lastError() {
@@ -85,6 +88,22 @@ class RequiredSigning {
     const char* const before_;
 };
 
+/// An SMB2 NEGOTIATE request (MS-SMB2 2.2.1.2 and 2.2.3) with its length in front (2.1), to which every
+/// server has an answer, if it is that it knows none of the dialects.
+const std::string& negotiateRequest() {
+    using namespace std::string_literals;
+    static const std::string request =
+        "\x00\x00\x00\x6C"s            // length
+        "\xFESMB\x40\x00"s             // protocol, size of the header
+        + std::string(6, '\0')         // credit charge, status
+        + "\x00\x00\x01\x00"s          // command, credits
+        + std::string(48, '\0')        // flags to signature
+        + "\x24\x00\x04\x00\x01\x00"s  // size of the body, dialects, signing enabled
+        + std::string(30, '\0')        // capabilities, client, negotiate contexts
+        + "\x02\x02\x10\x02\x00\x03\x02\x03"s;
+    return request;
+}
+
 /// Keeps what all contexts share alive. Under `ProcessLock`.
 void keepLibraryInitialised(const SmbLibrary& library) {
     static SMBCCTX* kept = nullptr;
@@ -113,15 +132,27 @@ SmbCredentials SmbCredentials::Of(const std::string& userName, const std::string
 
 SmbClient::SmbClient(const SmbLibrary& library, const SharePath& share, const SmbCredentials& credentials,
                      std::chrono::milliseconds answerTimeout)
-    : library_(library), share_(share), credentials_(credentials), lost_(ENOTCONN) {
+    : library_(library),
+      share_(share),
+      credentials_(credentials),
+      probeLimit_(probeLimit(answerTimeout)),
+      lost_(ENOTCONN) {
+    ++SmbLibrary::Clients();
     MutexLock lock(SmbLibrary::ProcessLock());
+    if (credentials_.user.empty()) {
+        ticketUser_ = library_.TicketUser();
+    }
     context_ = makeContext(answerTimeout);
 }
 
 SmbClient::~SmbClient() {
-    if (context_ == nullptr) {
-        return;
+    if (context_ != nullptr) {
+        leave();
     }
+    --SmbLibrary::Clients();
+}
+
+void SmbClient::leave() {
     while (!files_.empty()) {
         Close(files_.back());
     }
@@ -144,11 +175,12 @@ SMBCCTX* SmbClient::makeContext(std::chrono::milliseconds answerTimeout) {
     library_.setTimeout(context, static_cast<int>(answerTimeout.count()));
     library_.setOptionUserData(context, this);
     library_.setFunctionAuthDataWithContext(context, fillIn);
-    library_.setUser(context, credentials_.user.c_str());
+    // A user is what it looks for tickets with: without one it is a guest at once.
+    library_.setUser(context, credentials_.user.empty() ? ticketUser_.c_str() : credentials_.user.c_str());
     library_.setWorkgroup(context, credentials_.domain.c_str());
     // Credentials that are refused would else be followed by an attempt as a guest, of the library's own.
     library_.setOptionNoAutoAnonymousLogin(context, credentials_.user.empty() ? 0 : 1);
-    library_.setOptionUseKerberos(context, 0);
+    library_.setOptionUseKerberos(context, ticketUser_.empty() ? 0 : 1);
     library_.setOptionUseCCache(context, 0);
     library_.setFunctionCheckServer(context, trustServer);
     addServer_ = library_.getFunctionAddCachedServer(context);
@@ -173,9 +205,10 @@ void SmbClient::fillIn(SMBCCTX* context, const char* /*server*/, const char* /*s
     const auto fill = [](char* field, int size, const std::string& text) {
         std::snprintf(field, static_cast<std::size_t>(size), "%s", text.c_str());
     };
-    const SmbCredentials& credentials = of(context).credentials_;
+    const SmbClient& self = of(context);
+    const SmbCredentials& credentials = self.credentials_;
     fill(workgroup, workgroupSize, credentials.domain);
-    fill(user, userSize, credentials.user);
+    fill(user, userSize, credentials.user.empty() ? self.ticketUser_ : credentials.user);
     fill(password, passwordSize, credentials.password);
 }
 
@@ -199,12 +232,13 @@ int SmbClient::Connect() {
     if (context_ == nullptr) {
         return ENOMEM;
     }
-    if (std::max({credentials_.domain.size(), credentials_.user.size(), credentials_.password.size()}) >=
-        kFieldSize) {
+    if (std::max({credentials_.domain.size(), credentials_.user.size(), credentials_.password.size(),
+                  ticketUser_.size()}) >= kFieldSize) {
         return lost_ = EINVAL;
     }
-    // Resolving and reaching the server can take long; what holds the lock below must not wait for that.
-    if (const int unreachable = ProbeTcp(share_.Server(), share_.Port(), kProbeLimit)) {
+    // Resolving, reaching and waking the server can take long; what holds the lock below must not wait for
+    // that.
+    if (const int unreachable = ProbeTcp(share_.Server(), share_.Port(), probeLimit_, negotiateRequest())) {
         return lost_ = unreachable;
     }
     MutexLock lock(SmbLibrary::ProcessLock());

@@ -11,8 +11,8 @@
 
 namespace clipfileModule {
 
-/// Who logs on to a server. An empty user stands for the process's own rights: those of a guest. A Kerberos
-/// ticket of the process is not used.
+/// Who logs on to a server. An empty user stands for the process's own rights: those of its Kerberos ticket
+/// where it has one that the server takes, else those of a guest.
 struct SmbCredentials {
     /// `userName` as `DOMAIN\user`, `user@domain` or a user alone.
     static SmbCredentials Of(const std::string& userName, const std::string& password);
@@ -37,7 +37,8 @@ struct SmbStatus {
 /// for several of its time-outs. All return an error number, 0 for success. URLs are those of `SharePath`.
 class SmbClient {
  public:
-    /// `answerTimeout` is how long libsmbclient waits for an answer.
+    /// `answerTimeout` is how long libsmbclient waits for an answer. A server that is not there, or does not
+    /// answer, is known in less.
     SmbClient(const SmbLibrary& library, const SharePath& share, const SmbCredentials& credentials,
               std::chrono::milliseconds answerTimeout);
     /// Closes the files that are still open, and disconnects.
@@ -75,12 +76,16 @@ class SmbClient {
                              const char* workgroup, const char* user);
     static int onServerRemoved(SMBCCTX* context, SMBCSRV* server);
 
+    void leave();
     SMBCCTX* makeContext(std::chrono::milliseconds answerTimeout);
     int open(const std::string& url, int flags, smbc_share_mode shareMode, SMBCFILE*& file);
 
     const SmbLibrary& library_;
     const SharePath share_;
     const SmbCredentials credentials_;
+    /// Of the process's Kerberos ticket, where `credentials_` has no user. Empty without one.
+    std::string ticketUser_;
+    const std::chrono::milliseconds probeLimit_;
     SMBCCTX* context_ = nullptr;
     /// Of libsmbclient; ours stand before them.
     smbc_add_cached_srv_fn addServer_ = nullptr;

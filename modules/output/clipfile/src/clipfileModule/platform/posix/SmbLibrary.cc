@@ -5,6 +5,7 @@
 #include <array>
 #include <cstdio>
 
+#include "platform/posix/KerberosTicket.h"
 #include "platform/posix/PinLibrary.h"
 #include "platform/posix/SmbThreads.h"
 
@@ -69,6 +70,7 @@ LoadResult load() {
     if (result.loaded) {
         PinLibrary();
         MutexLock lock(SmbLibrary::ProcessLock());
+        result.library.handle = handle;
         result.library.takesThreads = EnableSmbThreads(handle);
     } else {
         const char* const error = dlerror();
@@ -88,10 +90,20 @@ const SmbLibrary* SmbLibrary::Get(std::string& reason) {
     return &result.library;
 }
 
+std::string SmbLibrary::TicketUser() const {
+    return KerberosTicket(handle).User();
+}
+
 Mutex& SmbLibrary::ProcessLock() {
     static Mutex own;
     static void* const offered = dlsym(RTLD_DEFAULT, kLockSymbol);
     return offered != nullptr ? *static_cast<Mutex*>(offered) : own;
+}
+
+std::atomic<int>& SmbLibrary::Clients() {
+    static std::atomic<int> own = 0;
+    static void* const offered = dlsym(RTLD_DEFAULT, kClientsSymbol);
+    return offered != nullptr ? *static_cast<std::atomic<int>*>(offered) : own;
 }
 
 }  // namespace clipfileModule

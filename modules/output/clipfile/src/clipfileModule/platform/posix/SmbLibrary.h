@@ -7,6 +7,7 @@
 
 #include <libsmbclient.h>
 
+#include <atomic>
 #include <string>
 
 #include "common/Mutex.h"
@@ -65,6 +66,11 @@ struct SmbLibrary {
     int (*clientSigning)();
     bool (*setParameter)(int section, const char* name, const char* value);
 
+    /// The user of the process's Kerberos ticket; empty without one. Under `ProcessLock`.
+    std::string TicketUser() const;
+
+    /// Of the loader. Never closed.
+    void* handle;
     /// False when one thread at a time may be in it.
     bool takesThreads;
 
@@ -75,6 +81,11 @@ struct SmbLibrary {
     static Mutex& ProcessLock();
     /// The name of a variable of the type `Mutex` that the program itself exports.
     static constexpr const char* kLockSymbol = "clipfile_smb_process_lock";
+    /// Connections that there are, from the first moment of being made to the last of being freed; one whose
+    /// thread hangs in the library as well. Of the whole process, as the lock. Any thread.
+    static std::atomic<int>& Clients();
+    /// Of a `std::atomic<int>`.
+    static constexpr const char* kClientsSymbol = "clipfile_smb_clients";
 };
 
 }  // namespace clipfileModule

@@ -18,6 +18,7 @@ set(CLIPFILE_HAS_SHARES FALSE CACHE INTERNAL "Paths on network shares are served
 if(CLIPFILE_SMB AND SMBCLIENT_FOUND)
     set(CLIPFILE_HAS_SHARES TRUE CACHE INTERNAL "")
     target_sources(clipfile_platform PRIVATE
+        platform/posix/KerberosTicket.cc
         platform/posix/SmbClient.cc
         platform/posix/SmbLibrary.cc
         platform/posix/SmbSession.cc

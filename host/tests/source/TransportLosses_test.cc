@@ -1,0 +1,99 @@
+// What a network loses of a transport stream, in bursts of any length and at any place: what is left is in
+// step.
+
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <random>
+
+#include "SentMedia.h"
+#include "SourceTesting.h"
+#include "damaged/TransportStream.h"
+
+namespace receiver {
+namespace {
+
+using endtoend::Pieces;
+
+/// Packets of a datagram, of the longest burst, and between two bursts, at the least and beyond that.
+constexpr std::size_t kDatagram = 7;
+constexpr std::size_t kLongestBurst = 120;
+constexpr std::size_t kShortBurst = 12;
+constexpr std::size_t kQuiet = 400;
+
+/// Takes bursts out, in steps of so many packets, short ones and long ones. The tables stay.
+Pieces TakeBursts(const Pieces& pieces, std::size_t step, std::mt19937& random) {
+    Pieces left;
+    std::size_t next = kQuiet;
+    for (std::size_t at = 0; at < pieces.size();) {
+        if (at >= next) {
+            const std::size_t length = 1 + random() % (random() % 2 == 0 ? kShortBurst : kLongestBurst);
+            at += (length + step - 1) / step * step;
+            next = at + kQuiet + random() % kQuiet;
+            continue;
+        }
+        const std::size_t end = std::min(at + step, pieces.size());
+        left.insert(left.end(), pieces.begin() + static_cast<std::ptrdiff_t>(at),
+                    pieces.begin() + static_cast<std::ptrdiff_t>(end));
+        at = end;
+    }
+    return left;
+}
+
+class TransportLosses : public SourceTest {
+ protected:
+    /// Thirty seconds. `more`: arguments of ffmpeg.
+    void Make(const std::string& more) const {
+        Ffmpeg(
+            "-f lavfi -i testsrc2=size=96x64:rate=25:duration=30 -f lavfi -i "
+            "anoisesrc=sample_rate=48000:seed=7:amplitude=0.2:duration=30" +
+            std::string(kPlainH264) + "-x264-params repeat-headers=1 " + more + " whole.ts");
+    }
+    /// Takes some fifteen bursts out for each seed, and expects that each frame of audio that came stands as
+    /// the pictures do, and that at least `sounds` of them came.
+    void ExpectInStepBehindLosses(std::size_t sounds) {
+        const SentMedia sent(Path("whole.ts"));
+        const Pieces pieces = endtoend::ReadPieces(Path("whole.ts"));
+        for (unsigned seed = 1; seed <= kSeeds; ++seed) {
+            SCOPED_TRACE(seed);
+            std::mt19937 random(seed);
+            endtoend::WritePieces(TakeBursts(pieces, seed % 2 == 0 ? kDatagram : 1, random),
+                                  Path("damaged.ts"));
+            const auto source = OpenSource(Fast("damaged.ts"), notices_, nullptr);
+            const auto units = ReadAll(*source);
+            const auto pictures = sent.Find(Medium::kVideo, units);
+            ASSERT_FALSE(pictures.empty());
+            const auto found = sent.Find(Medium::kAudio, units);
+            EXPECT_GE(found.size(), sounds);
+            std::int64_t furthest = 0;
+            for (const SentMedia::Arrival& sound : found) {
+                furthest = std::max(furthest, std::abs(sound.offset - pictures.front().offset));
+            }
+            EXPECT_LE(furthest, kHalfAudioFrame);
+            for (const SentMedia::Arrival& picture : pictures) {
+                EXPECT_NEAR(static_cast<double>(picture.offset), static_cast<double>(pictures.front().offset),
+                            90);
+            }
+            EXPECT_GT(source->Counts().lostFrames, 0u);
+        }
+        EXPECT_GT(notices_.CountOf("the source has gaps: "), 0u);
+    }
+
+ private:
+    static constexpr unsigned kSeeds = 24;
+};
+
+/// A unit of the stream holds eleven frames in sixteen packets, and the counter of packets has four bits:
+/// what is lost as a whole leaves no mark.
+TEST_F(TransportLosses, LeaveAacInStep) {
+    Make("-c:a aac -ar 48000 -ac 2 -b:a 96k");
+    ExpectInStepBehindLosses(1100);
+}
+
+TEST_F(TransportLosses, LeaveAacInStepThatComesFrameByFrame) {
+    Make("-c:a aac -ar 48000 -ac 2 -b:a 96k -pes_payload_size 0");
+    ExpectInStepBehindLosses(1100);
+}
+
+}  // namespace
+}  // namespace receiver
