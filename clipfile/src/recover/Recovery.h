@@ -52,9 +52,9 @@ struct RecoveryResult {
 /// original is only read, and with `inPlace` replaced as a whole at the end.
 ///
 /// Throws `ToolError` with one sentence when nothing can be recovered, when no parameter sets fit, when the
-/// file is still being recorded, recovered by another program, or changes meanwhile, when the new one is there
-/// already or cannot be written, or when `inPlace` would lose more than a torn chunk. No file is left behind
-/// then.
+/// file is still being recorded, recovered by another program, or changes meanwhile, when the new one is
+/// there already or cannot be written, or when `inPlace` would lose more than a torn chunk. No file is left
+/// behind then.
 RecoveryResult RecoverFile(const std::filesystem::path& path, const RecoveryOptions& options);
 
 /// The file that is already where the recovered one would go, or nothing.
