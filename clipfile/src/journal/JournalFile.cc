@@ -92,7 +92,7 @@ std::string RandomName() {
 }
 
 /// Sorted.
-std::vector<fs::path> FilesIn(const fs::path& folder, const std::string& ending) {
+std::vector<fs::path> JournalFilesIn(const fs::path& folder, const std::string& ending) {
     std::vector<fs::path> found;
     std::error_code error;
     for (auto entry = fs::directory_iterator(folder, error); !error && entry != fs::directory_iterator();
@@ -133,7 +133,7 @@ int MakeLocked(const fs::path& path) {
 }  // namespace
 
 std::vector<fs::path> JournalsIn(const fs::path& folder) {
-    return FilesIn(folder, kExtension);
+    return JournalFilesIn(folder, kExtension);
 }
 
 std::optional<Journal> ReadJournal(const fs::path& path) {
@@ -151,7 +151,7 @@ std::optional<Journal> ReadJournal(const fs::path& path) {
 JournalFile::JournalFile(const fs::path& folder) : path_(folder / RandomName()) {}
 
 void RemoveTornJournals(const fs::path& folder) {
-    for (const fs::path& path : FilesIn(folder, std::string(kExtension) + kNew)) {
+    for (const fs::path& path : JournalFilesIn(folder, std::string(kExtension) + kNew)) {
         const Descriptor descriptor(OpenJournal(path, O_RDWR));
         if (descriptor.Get() >= 0 && flock(descriptor.Get(), LOCK_EX | LOCK_NB) == 0 &&
             IsFileAt(descriptor.Get(), path)) {

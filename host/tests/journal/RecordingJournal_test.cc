@@ -98,10 +98,10 @@ TEST_F(RecordingJournalTest, NamesTheNewestFilesBelowItsFolder) {
         files.push_back(In(std::to_string(i) + ".MP4"));
     }
     journal.SetOpenFiles(files);
-    ASSERT_TRUE(WaitFor([&] { return OnDisk().has_value(); }));
-    EXPECT_EQ(OnDisk()->files.size(), clipfile::Journal::kMaxFiles);
-    EXPECT_EQ(OnDisk()->files.front(), "1.MP4");
-    EXPECT_EQ(OnDisk()->files.back(), "256.MP4");
+    const auto onDisk = WaitForJournal(IsAny);
+    ASSERT_EQ(onDisk.files.size(), clipfile::Journal::kMaxFiles);
+    EXPECT_EQ(onDisk.files.front(), "1.MP4");
+    EXPECT_EQ(onDisk.files.back(), "256.MP4");
 }
 
 TEST_F(RecordingJournalTest, StaysWithFilesThatAreOpenAtTheEnd) {
@@ -114,7 +114,7 @@ TEST_F(RecordingJournalTest, StaysWithFilesThatAreOpenAtTheEnd) {
     const auto journals = clipfile::JournalsIn(folder_.Path());
     ASSERT_EQ(journals.size(), 1U);
     EXPECT_TRUE(WaitFor([&] { return clipfile::JournalFile::Claim(journals[0]).has_value(); }));
-    EXPECT_EQ(OnDisk()->files, std::vector<std::string>{"a.MP4"});
+    EXPECT_EQ(WaitForJournal(IsAny).files, std::vector<std::string>{"a.MP4"});
 }
 
 TEST_F(RecordingJournalTest, AFolderThatTakesNoneIsToldOnce) {
