@@ -133,12 +133,22 @@ bool Connection::Pump() {
         ++damaged_;
         return true;
     }
+    position_ = packet_->pos;
     if (IsOf(*packet_, video_)) {
         input_->Alive();
+        HandleExpired();
     }
-    position_ = packet_->pos;
     Handle(*packet_);
     return true;
+}
+
+void Connection::HandleExpired() {
+    if (packet_->pts == AV_NOPTS_VALUE) {
+        return;
+    }
+    for (const auto& sound : runs_.Expire(packet_->pts, video_->time_base)) {
+        Handle(*sound);
+    }
 }
 
 std::unique_ptr<Input> Connection::End(std::unique_ptr<Connection> connection) {
