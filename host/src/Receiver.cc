@@ -143,7 +143,14 @@ ExitCode Running::Record(const SourceOpener& open) {
     ModuleLog log;
     log_ = &log;
 
-    const std::unique_ptr<SourceInterface> source = open(options_.source, *this, QuitAsked);
+    std::unique_ptr<SourceInterface> source;
+    try {
+        source = open(options_.source, *this, QuitAsked);
+    } catch (...) {
+        // What it has found out is told before the reason of the end.
+        recovery_->End(report_);
+        throw;
+    }
     if (source == nullptr) {
         recovery_->End(report_);
         display_.Finish({});

@@ -38,9 +38,9 @@ void SynchronizeFolder(const std::filesystem::path& folder) {
 /// Letters behind the name of a file in work, which `mkostemp` chooses.
 constexpr std::string_view kPlace = "XXXXXX";
 
-/// Its name, in front of those letters.
+/// Its name, in front of those letters: one that no other program gives to what it has in work.
 std::string NameInWork(const std::filesystem::path& target) {
-    return "." + target.filename().string() + ".";
+    return "." + target.filename().string() + ".clipfile-";
 }
 
 bool Lock(int descriptor) {
@@ -75,8 +75,12 @@ int MakeFile(std::string& path) {
         path.replace(place, kPlace.size(), kPlace);
         const int descriptor = mkostemp(path.data(), O_CLOEXEC);
         struct stat status = {};
-        // Who clears away what was abandoned may have come in between.
-        if (descriptor < 0 || !Lock(descriptor) || fstat(descriptor, &status) != 0 || status.st_nlink != 0) {
+        if (descriptor < 0) {
+            return descriptor;
+        }
+        // Who clears away what was abandoned may have come in between, or be at it.
+        const bool taken = !Lock(descriptor) && errno == EWOULDBLOCK;
+        if (!taken && (fstat(descriptor, &status) != 0 || status.st_nlink != 0)) {
             return descriptor;
         }
         close(descriptor);

@@ -61,6 +61,7 @@ void StreamBuffer::Start(const OutputSettings& recordSettings) {
     CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
     MutexLock control(controlMutex);
     if (stateId != kStopState) {
+        scope.End();
         return;
     }
     if (stopPending) {
@@ -108,6 +109,7 @@ void StreamBuffer::Start(const OutputSettings& recordSettings) {
         control.Unlock();
         endWithoutThread();
     }
+    scope.End();
 }
 
 bool StreamBuffer::startThreads(const std::vector<std::shared_ptr<StreamQueue>>& started) {
@@ -140,6 +142,7 @@ void StreamBuffer::Stop() {
         // that the worker waits for waits for this lock, so the push gets its room and the lock comes free.
         MutexLock lock(stateMutex);
         if (stateId == kStopState && !stopPending) {
+            scope.End();
             return;
         }
         if (stateId != kStopState) {
@@ -162,6 +165,7 @@ void StreamBuffer::Stop() {
         }
     }
     finishStop();
+    scope.End();
 }
 
 void StreamBuffer::finishStop() {

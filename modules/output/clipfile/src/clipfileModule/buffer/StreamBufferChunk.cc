@@ -146,6 +146,7 @@ void StreamBuffer::endSync() {
     if (stateId == kStartState) {
         changeState(std::make_shared<EndSyncRecState>(this));
     }
+    scope.End();
 }
 
 // Contract: full-cache-names-itself. Not the medium that is missing; video is looked at first.

@@ -32,8 +32,9 @@ class LogScope {
         return result;
     }
 
-    /// Logs the last line here, for what comes behind it while the function is left: the delivery of statuses
-    /// that were held back, for one.
+    /// Logs the last line here, for what comes behind it while the function is left: a lock that is given
+    /// back, which would let the lines of who waits for it come first, or the delivery of statuses that were
+    /// held back.
     void End() {
         if (!open_) {
             return;

@@ -204,6 +204,7 @@ void Controller::StopStream(const std::shared_ptr<StreamData>& unit, std::uint64
             CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: REC STOP. RTPTS = %lld -> %lld.", start, stop);
         }
     }
+    scope.End();
 }
 
 void Controller::RemoveStream(const std::shared_ptr<StreamBuffer>& buffer) {
@@ -350,6 +351,7 @@ void Controller::OnChangeInStreamInfo(const std::shared_ptr<Event>& event) {
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "bitrate   : %d.", static_cast<int>(settings.bitrate));
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "width     : %d.", static_cast<int>(settings.width));
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "height    : %d.", static_cast<int>(settings.height));
+    scope.End();
 }
 
 // Contract: start-event-unused. Nothing posts one.
