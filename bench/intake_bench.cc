@@ -10,7 +10,7 @@
 #include <thread>
 
 #include "QxModuleHostInterface.h"
-#include "buffer/StreamQueue.h"
+#include "buffer/queue/StreamQueue.h"
 #include "controller/Controller.h"
 
 namespace {

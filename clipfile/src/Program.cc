@@ -18,6 +18,7 @@
 #include "inspect/TextReport.h"
 #include "inspect/Thumbnails.h"
 #include "reader/Folder.h"
+#include "reader/FormatError.h"
 #include "recover/Recovery.h"
 #include "recover/Unattended.h"
 #include "recover/UnfinishedFiles.h"
@@ -29,6 +30,9 @@ namespace {
 
 namespace fs = std::filesystem;
 using Json = nlohmann::ordered_json;
+
+/// Of a file that is verified, from one look at the free space to the next: seconds, at most.
+constexpr int kSamplesBetweenChecks = 256;
 
 /// Options as they stand on the command line.
 struct Options {
@@ -163,12 +167,32 @@ void TellDefects(const std::string& path, const RecoveryResult& result, const Op
     }
 }
 
+/// Recovers a file beside a running recorder, which needs the disk more. A file in which no later attempt
+/// will find more counts as one that cannot be recovered.
+RecoveryResult RecoverUnattended(const std::string& path, RecoveryOptions options) {
+    CheckRoomForCopy(path);
+    options.checkRoom = [path] { CheckRoom(path); };
+    options.verify = [path](const fs::path& file, const fs::path& name) {
+        const auto onSample = [path, count = 0]() mutable {
+            if (++count % kSamplesBetweenChecks == 0) {
+                CheckRoom(path);
+            }
+        };
+        return VerifyFile(file, {.deep = true, .name = name, .onSample = onSample}).defects;
+    };
+    try {
+        return RecoverFile(path, options);
+    } catch (const NoRecordingError& error) {
+        throw ToolError(ExitCode::kDefects, error.what());
+    } catch (const FormatError& error) {
+        throw ToolError(ExitCode::kDefects, path + " cannot be recovered: " + error.what());
+    }
+}
+
 ExitCode RecoverOne(const std::string& path, const Options& options, std::ostream& out,
                     std::ostream& errors) {
-    if (options.unattended) {
-        CheckRoom(path);
-    }
-    const RecoveryResult result = RecoverFile(path, options.recovery);
+    const RecoveryResult result =
+        options.unattended ? RecoverUnattended(path, options.recovery) : RecoverFile(path, options.recovery);
     TellLockFault(path, result, options, errors);
     if (options.json) {
         PrintJson(out, {{"file", path},
@@ -267,7 +291,7 @@ ExitCode Verify(const Options& options, std::ostream& out, std::ostream& errors)
     ExitCode result = FindFiles(found, out, errors);
     std::vector<Verification> files;
     const ExitCode read = ForEachFile(found, out, errors, [&](const std::string& path) {
-        Verification& file = files.emplace_back(VerifyFile(path, options.deep));
+        Verification& file = files.emplace_back(VerifyFile(path, {.deep = options.deep}));
         if (options.json) {
             return ExitCode::kSuccess;
         }
@@ -355,7 +379,7 @@ ExitCode RunProgram(const std::vector<std::string>& arguments, std::ostream& out
     }
     if (options.unattended) {
         GiveWay();
-        options.recovery.verify = [](const fs::path& path) { return VerifyFile(path, true).defects; };
+        EndWithParent();
     }
     if (verify->parsed()) {
         return Verify(options, out, errors);

@@ -7,12 +7,14 @@
 
 #include <algorithm>
 #include <fstream>
+#include <map>
 #include <nlohmann/json.hpp>
 #include <regex>
 #include <set>
 #include <sstream>
 
 #include "support/ByteFile.h"
+#include "support/SystemCalls.h"
 #include "support/TempDir.h"
 #include "support/TestStream.h"
 
@@ -21,6 +23,9 @@ namespace {
 
 class ProgramTest : public testing::Test {
  protected:
+    ProgramTest() {
+        SystemCalls().availableBytes = [] { return std::uint64_t{1'000'000'000'000}; };
+    }
     ExitCode run(std::vector<std::string> arguments) {
         arguments.insert(arguments.begin(), "clipfile");
         out_.str("");
@@ -55,6 +60,7 @@ class ProgramTest : public testing::Test {
                             test_stream::MakePlainStream(2));
     }
 
+    SystemCallGuard guard_;
     TempDir folder_;
     TempDir logs_;
     rusage usage_ = {};
@@ -271,6 +277,52 @@ TEST_F(ProgramTest, UnattendedRecoveryLeavesAFileWithDefectsBesideItsOriginal) {
     EXPECT_EQ(runApart({"recover", "--unattended", path("01_02_03_04.MP4")}), ExitCode::kSuccess);
     EXPECT_EQ(said(), path("01_02_03_04.MP4") + " is passed over: " + path("01_02_03_04.recovered.MP4") +
                           " is there already.\n");
+}
+
+TEST_F(ProgramTest, UnattendedRecoveryIsHopelessForWhatWillNeverBeARecording) {
+    // What a fragmented file is before its first fragment, 5 to 11 seconds.
+    test_stream::Record(path("whole.MP4"), {"fragment", clipfileModule::RecordRules::kExact, true},
+                        test_stream::MakePlainStream(32));
+    test_stream::Data bytes = test_stream::ReadAll(path("whole.MP4"));
+    const std::size_t head = bytes[3];  // `ftyp`
+    const std::map<std::string, test_stream::Data> files = {
+        {"empty", {}},
+        {"head", test_stream::Data(bytes.begin(), bytes.begin() + static_cast<std::ptrdiff_t>(head))},
+        {"zeros", test_stream::Data(4096)},
+        {"foreign", byte_file::Join({byte_file::MakeBox("ftyp", {byte_file::Text("isom")}),
+                                     byte_file::MakeBox("moov", {})})}};
+    const std::map<std::string, std::string> reasons = {
+        {"empty", "is empty."},
+        {"head", "ends before its first sample: nothing was recorded in it."},
+        {"zeros", "is no MP4 file."},
+        {"foreign", "is an MP4 file, but none of this recorder: it lacks its profile."}};
+    for (const auto& [name, data] : files) {
+        const std::string file = path(name + ".MP4");
+        test_stream::WriteAll(file, data);
+        EXPECT_EQ(runApart({"recover", "--unattended", file}), ExitCode::kDefects) << name;
+        EXPECT_EQ(said(), "clipfile: " + file + " " + reasons.at(name) + "\n");
+        EXPECT_EQ(run({"recover", file}), ExitCode::kUnreadable) << "it is no recording";
+        EXPECT_EQ(test_stream::ReadAll(file), data);
+    }
+    EXPECT_EQ(runApart({"recover", "--unattended", path("missing.MP4")}), ExitCode::kUnreadable);
+}
+
+TEST_F(ProgramTest, UnattendedRecoveryEndsWhenTheDiskFillsUp) {
+    const std::string file = path("01_02_03_04.MP4");
+    test_stream::Record(file, {"fragment", clipfileModule::RecordRules::kExact, false},
+                        test_stream::MakePlainStream(32));
+    const test_stream::Data before = test_stream::ReadAll(file);
+    for (const int full : {0, 1, 2, 3}) {
+        SystemCalls().availableBytes = [full, looks = 0]() mutable {
+            return std::uint64_t{looks++ < full ? 2'000'000'000U : 900'000'000U};
+        };
+        EXPECT_EQ(runApart({"recover", "--unattended", file}), ExitCode::kUnreadable) << full;
+        EXPECT_EQ(said(), "clipfile: " + file +
+                              " is not recovered: its disk has 900 MB of free space, and what is recorded "
+                              "needs them.\n");
+        EXPECT_EQ(test_stream::ReadAll(file), before);
+        EXPECT_EQ(std::distance(std::filesystem::directory_iterator(folder_.Path()), {}), 1) << full;
+    }
 }
 
 TEST_F(ProgramTest, UnattendedRecoveryGivesWay) {

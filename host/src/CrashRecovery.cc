@@ -54,7 +54,7 @@ void CrashRecovery::Follow(const ModuleReport& report) {
 
 void CrashRecovery::End(const ModuleReport& report) {
     if (recovery_) {
-        recovery_->Stop();
+        recovery_->End();
     }
     Follow(report);
 }

@@ -1,19 +1,14 @@
 #include "ModuleReport.h"
 
+#include "QxModuleStatus.h"
+
 namespace receiver {
-namespace {
-
-/// A fault of the stream; the recording begins anew.
-constexpr int kStatusFault = 6;
-/// With it: the host went offline, which is how each session ends.
-constexpr int kCauseOffline = 26;
-
-}  // namespace
 
 void ModuleReport::Tell(const std::vector<ModuleStatus>& statuses, bool ending) {
     for (const ModuleStatus& status : statuses) {
-        if (status.status == kStatusFault) {
-            if (ending && status.cause == kCauseOffline) {
+        if (status.status == QxStatus::kStreamFault) {
+            // Going offline is how each session ends.
+            if (ending && status.cause == QxStreamFault::kOffline) {
                 continue;
             }
             ++faults_;

@@ -145,6 +145,7 @@ ExitCode Running::Record(const SourceOpener& open) {
 
     const std::unique_ptr<SourceInterface> source = open(options_.source, *this, QuitAsked);
     if (source == nullptr) {
+        recovery_->End(report_);
         display_.Finish({});
         return ExitCode::kSuccess;
     }

@@ -121,7 +121,15 @@ void Recorder::Push(const SourceUnit& unit) {
     }
 }
 
+void Recorder::BeginBalance(std::int64_t time) {
+    balance_.Begin(time * kAudioClock / kVideoClock,
+                   lastAudio_ ? std::optional(lastAudio_->time) : std::nullopt);
+}
+
 void Recorder::PushAudio(const SourceUnit& unit) {
+    if (!balance_.Takes(unit.time, unit.passed)) {
+        return;
+    }
     lastAudio_ = unit;
     if (settings_.mode == OutputMode::kSync || online_) {
         feed_.PushAudio(unit.time, unit.data, unit.size);
@@ -164,6 +172,7 @@ bool Recorder::PushOnlineMeta(const SourceUnit& unit, const Timecode& timecode) 
         online_ = true;
         NoteChange(true, timecode);
         session_.GoOnline();
+        BeginBalance(unit.time);
         if (lastAudio_) {
             feed_.PushAudio(lastAudio_->time, lastAudio_->data, lastAudio_->size);
         }
@@ -178,9 +187,11 @@ bool Recorder::PushSyncMeta(const SourceUnit& unit, const Timecode& timecode) {
     const RecordDecision decision = plan_.Next(Elapsed(), unit.keyFrame);
     if (decision.ended) {
         NoteChange(false, timecode);
+        balance_.End();
     }
     if (decision.begun) {
         NoteChange(true, timecode);
+        BeginBalance(unit.time);
     }
     if (decision.ended && decision.begun) {
         PushFlag(JustBefore(unit.time), false, BuildMetadata(false, std::nullopt, {}));
@@ -234,6 +245,7 @@ void Recorder::Interrupt() {
 void Recorder::EndBeforeGap() {
     if (settings_.mode == OutputMode::kSync && plan_.Recording()) {
         plan_.Interrupt();
+        balance_.End();
         NoteEndBehindLast();
         PushFlag(FrameTime(lastFrame_, 1), false, BuildMetadata(false, std::nullopt, {}));
     }

@@ -14,6 +14,7 @@
 #include "operator/CommandQueue.h"
 #include "operator/RecordPlan.h"
 #include "options/Options.h"
+#include "timing/AudioBalance.h"
 
 namespace receiver {
 
@@ -117,6 +118,8 @@ class Recorder {
     bool PushOnlineMeta(const SourceUnit& unit, const Timecode& timecode);
     bool PushSyncMeta(const SourceUnit& unit, const Timecode& timecode);
     void PushFlag(std::int64_t time, bool record, const std::vector<unsigned char>& meta);
+    /// A recording begins with the frame at `time`.
+    void BeginBalance(std::int64_t time);
     void EndBeforeGap();
     /// The recording, if any, has ended with the last frame, and so has what stops commanded.
     void NoteEndBehindLast();
@@ -148,7 +151,9 @@ class Recorder {
     std::uint64_t recorded_ = 0;
     std::optional<std::int64_t> firstFrame_;
     std::int64_t lastFrame_ = 0;
+    /// That went to the module.
     std::optional<SourceUnit> lastAudio_;
+    AudioBalance balance_;
     /// KLV packets since the last frame.
     std::vector<std::vector<unsigned char>> packets_;
     bool finishing_ = false;

@@ -1,3 +1,4 @@
+#include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -30,32 +31,50 @@ using receiver::OutputQueue;
 /// How long the end of a run waits for somebody who does not read.
 constexpr std::chrono::seconds kReaderPatience{1};
 
-/// Tells on a thread of its own: nobody who reads holds up a recording.
+/// Tells on threads of its own: nobody who reads holds up a recording, nor who does not read messages the
+/// results. On one terminal, or in one file, all stands in the order in which it was told.
 class Outlet {
  public:
-    explicit Outlet(bool json)
-        : queue_(json           ? receiver::JsonRemark
-                 : OnTerminal() ? receiver::TerminalRemark
-                                : receiver::TextRemark) {
+    explicit Outlet(bool json) {
+        const OutputQueue::Remark remark = json           ? receiver::JsonRemark
+                                           : OnTerminal() ? receiver::TerminalRemark
+                                                          : receiver::TextRemark;
+        messageQueue_.emplace(remark);
+        if (!OneFile()) {
+            resultQueue_.emplace(remark);
+        }
+        results_.emplace(resultQueue_ ? *resultQueue_ : *messageQueue_, STDOUT_FILENO);
+        messages_.emplace(*messageQueue_, STDERR_FILENO);
         if (json) {
-            display_ = std::make_unique<receiver::JsonDisplay>(results_);
+            display_ = std::make_unique<receiver::JsonDisplay>(*results_);
         } else if (OnTerminal()) {
-            display_ = std::make_unique<receiver::TerminalDisplay>(messages_, results_, STDERR_FILENO,
-                                                                   [this] { return queue_.Busy(); });
+            display_ = std::make_unique<receiver::TerminalDisplay>(*messages_, *results_, STDERR_FILENO,
+                                                                   [this] { return messageQueue_->Busy(); });
         } else {
-            display_ = std::make_unique<receiver::TextDisplay>(messages_, results_);
+            display_ = std::make_unique<receiver::TextDisplay>(*messages_, *results_);
         }
     }
 
     receiver::DisplayInterface& Display() { return *display_; }
-    bool Close() { return queue_.Close(kReaderPatience); }
+    bool Close() {
+        const bool results = !resultQueue_ || resultQueue_->Close(kReaderPatience);
+        return messageQueue_->Close(kReaderPatience) && results;
+    }
 
  private:
     static bool OnTerminal() { return isatty(STDERR_FILENO) == 1; }
+    static bool OneFile() {
+        struct stat results {};
+        struct stat messages {};
+        return fstat(STDOUT_FILENO, &results) == 0 && fstat(STDERR_FILENO, &messages) == 0 &&
+               results.st_dev == messages.st_dev && results.st_ino == messages.st_ino;
+    }
 
-    OutputQueue queue_;
-    MessageStream messages_{queue_, STDERR_FILENO};
-    MessageStream results_{queue_, STDOUT_FILENO};
+    std::optional<OutputQueue> messageQueue_;
+    /// Null where results go the way of messages.
+    std::optional<OutputQueue> resultQueue_;
+    std::optional<MessageStream> messages_;
+    std::optional<MessageStream> results_;
     std::unique_ptr<receiver::DisplayInterface> display_;
 };
 

@@ -334,6 +334,21 @@ TEST_F(RecorderTest, AStopBehindTheLastFrameOfTheStreamHasEndedTheRecordingThere
     EXPECT_EQ(stop.get(), (CommandResult{Timecode{10, 0, 0, 1, false}, {}}));
 }
 
+/// A picture of 1920 samples is missing, and the source has left out one frame of audio of 1024 for it.
+TEST_F(RecorderTest, AudioThatAGapInThePicturesLeavesOverIsLeftOutWhereItIsMoreThanHalfAFrame) {
+    Recorder& recorder = Make(Sync());
+    for (const std::int64_t frame : {0, 1, 3, 4, 5}) {
+        PutFrame(frame, frame == 0);
+    }
+    for (const std::int64_t audio : {0, 1, 2, 3, 5, 6, 7, 8, 9, 10}) {
+        SourceUnit unit = MakeAudio(audio * 1024);
+        unit.passed = audio == 5 ? 1920 : 0;
+        recorder.Put(std::move(unit));
+    }
+    EXPECT_THAT(module_.Units(), ElementsAre("M0", "v0", "a0", "a1", "M1", "v1", "a2", "a3", "M3", "v3", "a6",
+                                             "a7", "M4", "v4", "a8", "a9", "M5", "v5"));
+}
+
 TEST_F(RecorderTest, HalfASecondIsNoGap) {
     Make(Sync());
     PutLateAudio();

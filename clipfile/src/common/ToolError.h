@@ -33,4 +33,10 @@ class ToolError : public std::runtime_error {
     ExitCode code_;
 };
 
+/// A file that can be read and is no recording. No later attempt will find another thing in it.
+class NoRecordingError : public ToolError {
+ public:
+    explicit NoRecordingError(const std::string& sentence) : ToolError(ExitCode::kUnreadable, sentence) {}
+};
+
 }  // namespace clipfile

@@ -5,6 +5,7 @@
 #include <filesystem>
 #include <nlohmann/json.hpp>
 #include <stdexcept>
+#include <utility>
 
 namespace clipfile {
 
@@ -43,8 +44,27 @@ std::optional<std::vector<unsigned char>> FromHex(const std::string& text) {
     return bytes;
 }
 
+/// Names of files need not be UTF-8, as JSON is. Such a one is an object with its bytes.
+Json NameToJson(const std::string& name) {
+    try {
+        static_cast<void>(Json(name).dump());
+        return name;
+    } catch (const Json::type_error&) {
+        return {{"hex", ToHex({name.begin(), name.end()})}};
+    }
+}
+
+std::optional<std::string> NameFromJson(const Json& json) {
+    if (json.is_string()) {
+        return json.get<std::string>();
+    }
+    const auto bytes = FromHex(json.at("hex").get_ref<const std::string&>());
+    return bytes ? std::optional(std::string(bytes->begin(), bytes->end())) : std::nullopt;
+}
+
 bool IsBelow(const std::filesystem::path& path) {
     return path.is_relative() && !path.empty() && path.has_filename() &&
+           path.native().find('\0') == std::string::npos &&
            std::none_of(path.begin(), path.end(), [](const auto& part) { return part == ".."; });
 }
 
@@ -65,10 +85,11 @@ std::optional<Journal> Read(const Json& json) {
         journal.sets.push_back({std::move(*sps), std::move(*pps)});
     }
     for (const Json& file : json.at("files")) {
-        journal.files.push_back(file.get<std::string>());
-        if (!IsBelow(journal.files.back()) || journal.files.size() > Journal::kMaxFiles) {
+        auto name = NameFromJson(file);
+        if (!name || !IsBelow(*name) || journal.files.size() == Journal::kMaxFiles) {
             return std::nullopt;
         }
+        journal.files.push_back(std::move(*name));
     }
     return journal;
 }
@@ -87,9 +108,9 @@ std::string ToText(const Journal& journal) {
         json["parameter_sets"].push_back({{"sps", ToHex(sets.sps)}, {"pps", ToHex(sets.pps)}});
     }
     for (const std::string& file : journal.files) {
-        json["files"].push_back(file);
+        json["files"].push_back(NameToJson(file));
     }
-    return json.dump(2, ' ', false, Json::error_handler_t::replace) + "\n";
+    return json.dump(2) + "\n";
 }
 
 std::optional<Journal> ParseJournal(std::string_view text) {

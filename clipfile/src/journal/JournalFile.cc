@@ -23,6 +23,7 @@ constexpr const char* kPrefix = ".receiver-";
 constexpr const char* kExtension = ".journal";
 /// Of a journal that does not have its name yet.
 constexpr const char* kNew = ".new";
+constexpr int kMaxAttempts = 10;
 /// More than any journal has.
 constexpr off_t kMaxSize = 2'000'000;
 
@@ -90,20 +91,49 @@ std::string RandomName() {
     return std::string(kPrefix) + digits.data() + kExtension;
 }
 
-}  // namespace
-
-std::vector<fs::path> JournalsIn(const fs::path& folder) {
+/// Sorted.
+std::vector<fs::path> JournalFilesIn(const fs::path& folder, const std::string& ending) {
     std::vector<fs::path> found;
     std::error_code error;
     for (auto entry = fs::directory_iterator(folder, error); !error && entry != fs::directory_iterator();
          entry.increment(error)) {
         const std::string name = entry->path().filename().string();
-        if (name.starts_with(kPrefix) && name.ends_with(kExtension)) {
+        if (name.starts_with(kPrefix) && name.ends_with(ending)) {
             found.push_back(entry->path());
         }
     }
     std::sort(found.begin(), found.end());
     return found;
+}
+
+/// Makes a file that nobody else holds. Throws where the system gives no locks.
+int MakeLocked(const fs::path& path) {
+    for (int attempt = 0; attempt < kMaxAttempts; ++attempt) {
+        // What an earlier attempt has left. Nobody else uses this name.
+        unlink(path.c_str());
+        Descriptor descriptor(OpenJournal(path, O_RDWR | O_CREAT | O_EXCL));
+        if (descriptor.Get() < 0) {
+            Fail(path);
+        }
+        if (flock(descriptor.Get(), LOCK_EX) != 0) {
+            const int error = errno;
+            unlink(path.c_str());
+            errno = error;
+            Fail(path);
+        }
+        if (IsFileAt(descriptor.Get(), path)) {
+            return descriptor.Release();
+        }
+        // Who clears away torn ones has held it for a moment, and taken it away.
+    }
+    errno = EBUSY;
+    Fail(path);
+}
+
+}  // namespace
+
+std::vector<fs::path> JournalsIn(const fs::path& folder) {
+    return JournalFilesIn(folder, kExtension);
 }
 
 std::optional<Journal> ReadJournal(const fs::path& path) {
@@ -120,11 +150,21 @@ std::optional<Journal> ReadJournal(const fs::path& path) {
 
 JournalFile::JournalFile(const fs::path& folder) : path_(folder / RandomName()) {}
 
+void RemoveTornJournals(const fs::path& folder) {
+    for (const fs::path& path : JournalFilesIn(folder, std::string(kExtension) + kNew)) {
+        const Descriptor descriptor(OpenJournal(path, O_RDWR));
+        if (descriptor.Get() >= 0 && flock(descriptor.Get(), LOCK_EX | LOCK_NB) == 0 &&
+            IsFileAt(descriptor.Get(), path)) {
+            unlink(path.c_str());
+        }
+    }
+}
+
 std::optional<JournalFile> JournalFile::Claim(const fs::path& path) {
-    // Some file systems lock what may be written alone (flock(2), NFS).
+    // NFS locks for one alone only what is open for writing. A folder that nobody may write to has files to
+    // tell all the same.
     Descriptor writable(OpenJournal(path, O_RDWR));
-    Descriptor descriptor(writable.Get() < 0 && errno == EACCES ? OpenJournal(path, O_RDONLY)
-                                                                : writable.Release());
+    Descriptor descriptor(writable.Get() >= 0 ? writable.Release() : OpenJournal(path, O_RDONLY));
     // Its holder may have put another one in its place between opening and locking.
     if (descriptor.Get() < 0 || flock(descriptor.Get(), LOCK_EX | LOCK_NB) != 0 ||
         !IsFileAt(descriptor.Get(), path)) {
@@ -143,17 +183,12 @@ JournalFile::JournalFile(JournalFile&& other) noexcept
     : path_(std::move(other.path_)), descriptor_(std::exchange(other.descriptor_, -1)) {}
 
 void JournalFile::Write(const Journal& journal) {
+    const std::string text = ToText(journal);
     const fs::path made = path_.string() + kNew;
-    // What an earlier attempt has left. Nobody else uses this name.
-    unlink(made.c_str());
-    Descriptor descriptor(OpenJournal(made, O_WRONLY | O_CREAT | O_EXCL));
-    if (descriptor.Get() < 0) {
-        Fail(made);
-    }
+    // Locked before it has its name: it is never seen without its holder.
+    Descriptor descriptor(MakeLocked(made));
     try {
-        // Before it has its name: it is never seen without its holder. Without locks nobody claims it.
-        flock(descriptor.Get(), LOCK_EX | LOCK_NB);
-        WriteAll(descriptor.Get(), ToText(journal), made);
+        WriteAll(descriptor.Get(), text, made);
         if (fsync(descriptor.Get()) != 0 || std::rename(made.c_str(), path_.c_str()) != 0) {
             Fail(made);
         }

@@ -11,6 +11,9 @@ namespace clipfile {
 /// The journals in a folder, also those that are no good. Empty when the folder cannot be read.
 std::vector<std::filesystem::path> JournalsIn(const std::filesystem::path& folder);
 
+/// Removes what receivers have left that were killed before a new journal had its name.
+void RemoveTornJournals(const std::filesystem::path& folder);
+
 /// Reads a journal, whoever holds it. Nothing for what is none, and for what cannot be read.
 std::optional<Journal> ReadJournal(const std::filesystem::path& path);
 
@@ -29,7 +32,8 @@ class JournalFile {
 
     const std::filesystem::path& Path() const { return path_; }
     /// Puts a journal in the place of what is there, as a whole, also when the power goes: it is on the disk
-    /// when this returns. Throws `std::system_error`; what was there stays then.
+    /// when this returns. Throws `std::system_error` when the disk fails or gives no locks; then there is
+    /// either the one or the other, and it may be lost with the power.
     void Write(const Journal& journal);
     /// Removes what was written. Throws `std::system_error`.
     void Remove();

@@ -32,10 +32,13 @@ InputFile::InputFile(const std::filesystem::path& path) : path_(path) {
         throw Unreadable(path, errno == ENOENT ? "does not exist" : "cannot be opened: " + Reason(errno));
     }
     struct stat status = {};
-    std::string fault;
     if (fstat(descriptor_, &status) != 0) {
-        fault = "cannot be examined: " + Reason(errno);
-    } else if (S_ISDIR(status.st_mode)) {
+        const int error = errno;
+        close(descriptor_);
+        throw Unreadable(path, "cannot be examined: " + Reason(error));
+    }
+    std::string fault;
+    if (S_ISDIR(status.st_mode)) {
         fault = "is a folder, not a file";
     } else if (!S_ISREG(status.st_mode)) {
         fault = "is no regular file";
@@ -44,7 +47,7 @@ InputFile::InputFile(const std::filesystem::path& path) : path_(path) {
     }
     if (!fault.empty()) {
         close(descriptor_);
-        throw Unreadable(path, fault);
+        throw NoRecordingError(path.string() + " " + fault + ".");
     }
     size_ = static_cast<std::uint64_t>(status.st_size);
     modifiedSeconds_ = status.st_mtim.tv_sec;

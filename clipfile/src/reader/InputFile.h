@@ -15,8 +15,8 @@ using Bytes = std::span<const unsigned char>;
 /// every read is checked against it.
 class InputFile {
  public:
-    /// Throws `ToolError` with one sentence when there is no such file, when it is empty or of another kind
-    /// (folder, device, pipe), or when the system refuses.
+    /// Throws `ToolError` with one sentence when there is no such file or the system refuses, and of these
+    /// `NoRecordingError` when it is empty or of another kind (folder, device, pipe).
     explicit InputFile(const std::filesystem::path& path);
     ~InputFile();
     InputFile(const InputFile&) = delete;

@@ -8,16 +8,15 @@ namespace clipfile {
 
 namespace {
 
-ToolError NotOurs(const InputFile& file, const std::string& what) {
-    return {ExitCode::kUnreadable, file.Path().string() + " " + what + "."};
+NoRecordingError NotOurs(const InputFile& file, const std::string& what) {
+    return NoRecordingError(file.Path().string() + " " + what + ".");
 }
 
 std::optional<Profile> ProfileOf(const InputFile& file, const Box& uuid) {
     try {
         return ReadProfile(file, uuid);
     } catch (const FormatError& error) {
-        throw ToolError(ExitCode::kUnreadable,
-                        file.Path().string() + " has a broken profile: " + error.what());
+        throw NoRecordingError(file.Path().string() + " has a broken profile: " + error.what());
     }
 }
 

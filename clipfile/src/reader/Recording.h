@@ -38,8 +38,8 @@ struct Recording {
     std::optional<Box> fragmentIndex;  // mfra
 };
 
-/// Reads how a file is built, box headers and `moov` alone. Throws `ToolError` with one sentence for a file
-/// that is no MP4 file, and for one that is no recording.
+/// Reads how a file is built, box headers and `moov` alone. Throws `NoRecordingError` with one sentence for a
+/// file that is no MP4 file, and for one that is no recording.
 Recording ReadRecording(const InputFile& file);
 
 /// Goes through the `moof` boxes behind the first `mdat` that are whole, and stops at the first that is not.

@@ -4,7 +4,7 @@
 #include <memory>
 #include <string>
 
-#include "buffer/ChunkData.h"
+#include "buffer/chunk/ChunkData.h"
 
 namespace clipfile {
 

@@ -1,6 +1,8 @@
 #include "recover/MuxerTarget.h"
 
 #include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
 
 #include <cerrno>
 #include <cstdlib>
@@ -52,13 +54,29 @@ MbxStatus SeekFile(MbxFile* file, std::int64_t offset, std::uint32_t origin) {
     return Note(MbxStdioSeek(file, offset, origin));
 }
 
+/// Never over what is there: an empty file at most, which the user of the target has made.
+std::FILE* OpenEmpty(const std::filesystem::path& path) {
+    const int descriptor = open(path.c_str(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW, 0666);
+    struct stat status = {};
+    std::FILE* stream = nullptr;
+    int error = errno;
+    if (descriptor >= 0 && fstat(descriptor, &status) == 0) {
+        stream = status.st_size == 0 ? fdopen(descriptor, "w+b") : nullptr;
+        error = status.st_size == 0 ? errno : EEXIST;
+    }
+    if (descriptor >= 0 && stream == nullptr) {
+        close(descriptor);
+        errno = error;
+    }
+    return stream;
+}
+
 MbxStatus OpenFile(const char*, std::uint32_t, MbxFile** file) {
     auto* const cell = static_cast<MbxFile*>(std::malloc(sizeof(MbxFile)));
     if (cell == nullptr) {
         return MBX_ERR_NO_MEMORY;
     }
-    // Never over a file that is there.
-    cell->stream = std::fopen(currentTarget.path.c_str(), "w+bxe");
+    cell->stream = OpenEmpty(currentTarget.path);
     if (cell->stream == nullptr) {
         std::free(cell);
         return Note(MBX_ERR_IO);

@@ -6,8 +6,8 @@
 
 namespace clipfile {
 
-/// While it lives, the module's muxers write to `path`, a new file, instead of one that they name themselves,
-/// and stamp it with `opened` as the time of its opening. One at a time, on one thread.
+/// While it lives, the module's muxers write to `path`, a new or empty file, instead of one that they name
+/// themselves, and stamp it with `opened` as the time of its opening. One at a time, on one thread.
 ///
 /// The muxers reach files and clock through `GetFileAccess` and `GetPlatform`, which this program has of its
 /// own: a recovered file stands where its user wants it, and nothing of the module's network access is

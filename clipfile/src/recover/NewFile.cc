@@ -1,12 +1,13 @@
 #include "recover/NewFile.h"
 
 #include <fcntl.h>
-#include <signal.h>
+#include <sys/file.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <cerrno>
-#include <charconv>
 #include <cstdio>
+#include <cstdlib>
 #include <string>
 #include <string_view>
 #include <system_error>
@@ -22,35 +23,28 @@ ToolError Unwritable(const std::filesystem::path& path, int error) {
             path.string() + " cannot be written: " + std::generic_category().message(error) + "."};
 }
 
-/// 0, or the system's number for what went wrong.
-int SynchronizeDisk(const std::filesystem::path& path) {
-    const int descriptor = open(path.c_str(), O_RDONLY | O_CLOEXEC);
-    if (descriptor < 0) {
-        return errno;
-    }
-    const int error = fsync(descriptor) == 0 ? 0 : errno;
-    close(descriptor);
-    return error;
-}
-
-/// Some file systems cannot synchronize folders (fsync(2), EINVAL).
 void SynchronizeFolder(const std::filesystem::path& folder) {
-    if (const int error = SynchronizeDisk(folder); error != 0 && error != EINVAL) {
+    const int descriptor = open(folder.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC);
+    const int error = descriptor >= 0 && fsync(descriptor) == 0 ? 0 : errno;
+    if (descriptor >= 0) {
+        close(descriptor);
+    }
+    // Some file systems cannot synchronize folders (fsync(2), EINVAL).
+    if (error != 0 && error != EINVAL) {
         throw Unwritable(folder, error);
     }
 }
 
-/// Its name, in front of the number of the process.
+/// Letters behind the name of a file in work, which `mkostemp` chooses.
+constexpr std::string_view kPlace = "XXXXXX";
+
+/// Its name, in front of those letters.
 std::string NameInWork(const std::filesystem::path& target) {
     return "." + target.filename().string() + ".";
 }
 
-/// Whether a process has this number, as far as can be told.
-bool IsAlive(std::string_view number) {
-    pid_t process = 0;
-    const auto [end, error] = std::from_chars(number.data(), number.data() + number.size(), process);
-    const bool isNumber = error == std::errc() && end == number.data() + number.size() && process > 0;
-    return !isNumber || kill(process, 0) == 0 || errno != ESRCH;
+bool Lock(int descriptor) {
+    return flock(descriptor, LOCK_EX | LOCK_NB) == 0;
 }
 
 /// What processes have left that were killed over the same work: as much as a recording, each time.
@@ -61,10 +55,31 @@ void RemoveAbandoned(const std::filesystem::path& target) {
     for (auto entry = std::filesystem::directory_iterator(folder, error);
          !error && entry != std::filesystem::directory_iterator(); entry.increment(error)) {
         const std::string name = entry->path().filename().string();
-        std::error_code ignored;
-        if (name.starts_with(head) && !IsAlive(std::string_view(name).substr(head.size()))) {
-            std::filesystem::remove(entry->path(), ignored);
+        if (!name.starts_with(head) || name.size() != head.size() + kPlace.size()) {
+            continue;
         }
+        const int descriptor = open(entry->path().c_str(), O_RDWR | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK);
+        if (descriptor >= 0 && Lock(descriptor)) {
+            unlink(entry->path().c_str());
+        }
+        if (descriptor >= 0) {
+            close(descriptor);
+        }
+    }
+}
+
+/// Makes a file by a name that no other has, locked where the system gives locks. Fills in its path.
+int MakeFile(std::string& path) {
+    const std::size_t place = path.size() - kPlace.size();
+    while (true) {
+        path.replace(place, kPlace.size(), kPlace);
+        const int descriptor = mkostemp(path.data(), O_CLOEXEC);
+        struct stat status = {};
+        // Who clears away what was abandoned may have come in between.
+        if (descriptor < 0 || !Lock(descriptor) || fstat(descriptor, &status) != 0 || status.st_nlink != 0) {
+            return descriptor;
+        }
+        close(descriptor);
     }
 }
 
@@ -80,38 +95,37 @@ int RenameToFreeName(const char* path, const char* target) {
 
 }  // namespace
 
-NewFile::NewFile(const std::filesystem::path& target)
-    : target_(target), path_(target.parent_path() / (NameInWork(target) + std::to_string(getpid()))) {
+NewFile::NewFile(const std::filesystem::path& target) {
     RemoveAbandoned(target);
+    std::string path = (target.parent_path() / (NameInWork(target) + std::string(kPlace))).string();
+    descriptor_ = MakeFile(path);
+    if (descriptor_ < 0) {
+        throw Unwritable(target, errno);
+    }
+    path_ = path;
 }
 
 NewFile::~NewFile() {
-    std::error_code ignored;
-    std::filesystem::remove(path_, ignored);
+    if (!path_.empty()) {
+        unlink(path_.c_str());
+    }
+    close(descriptor_);
 }
 
 void NewFile::Synchronize() const {
-    if (const int error = SynchronizeDisk(path_)) {
-        throw Unwritable(path_, error);
+    if (fsync(descriptor_) != 0) {
+        throw Unwritable(path_, errno);
     }
 }
 
-void MoveOver(const std::filesystem::path& path, const std::filesystem::path& target) {
-    if (std::rename(path.c_str(), target.c_str()) != 0) {
-        throw Unwritable(target, errno);
+void NewFile::Keep(const std::filesystem::path& name, bool replaces) {
+    const int result =
+        replaces ? std::rename(path_.c_str(), name.c_str()) : RenameToFreeName(path_.c_str(), name.c_str());
+    if (result != 0) {
+        throw Unwritable(name, errno);
     }
-    SynchronizeFolder(target.parent_path());
-}
-
-void NewFile::Keep(bool replaces) const {
-    if (replaces) {
-        MoveOver(path_, target_);
-        return;
-    }
-    if (RenameToFreeName(path_.c_str(), target_.c_str()) != 0) {
-        throw Unwritable(target_, errno);
-    }
-    SynchronizeFolder(target_.parent_path());
+    path_.clear();
+    SynchronizeFolder(name.parent_path());
 }
 
 }  // namespace clipfile

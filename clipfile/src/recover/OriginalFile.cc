@@ -6,6 +6,7 @@
 
 #include <cerrno>
 #include <system_error>
+#include <utility>
 
 #include "common/ToolError.h"
 
@@ -17,6 +18,22 @@ bool IsSameMoment(const timespec& a, const timespec& b) {
     return a.tv_sec == b.tv_sec && a.tv_nsec == b.tv_nsec;
 }
 
+/// Against recorders and other recoveries. 0, or the system's number for why there is none.
+int LockAlone(int& descriptor, const std::filesystem::path& path) {
+    if (flock(descriptor, LOCK_EX | LOCK_NB) == 0) {
+        return 0;
+    }
+    if (errno != EBADF) {
+        return errno;
+    }
+    // NFS locks for one alone only what is open for writing (flock(2)).
+    const int writable = open(path.c_str(), O_RDWR | O_CLOEXEC | O_NONBLOCK);
+    if (writable >= 0) {
+        close(std::exchange(descriptor, writable));
+    }
+    return flock(descriptor, (writable >= 0 ? LOCK_EX : LOCK_SH) | LOCK_NB) == 0 ? 0 : errno;
+}
+
 }  // namespace
 
 OriginalFile::OriginalFile(const std::filesystem::path& path)
@@ -24,14 +41,13 @@ OriginalFile::OriginalFile(const std::filesystem::path& path)
     if (descriptor_ < 0) {
         return;
     }
-    if (flock(descriptor_, LOCK_SH | LOCK_NB) != 0) {
-        const int error = errno;
-        if (error == EWOULDBLOCK) {
-            close(descriptor_);
-            throw ToolError(ExitCode::kUnreadable, path.string() + " is still being recorded.");
-        }
-        lockFault_ = std::generic_category().message(error);
+    const int error = LockAlone(descriptor_, path);
+    if (error == EWOULDBLOCK) {
+        close(descriptor_);
+        throw ToolError(ExitCode::kUnreadable,
+                        path.string() + " is still being recorded, or recovered by another program.");
     }
+    lockFault_ = error == 0 ? "" : std::generic_category().message(error);
     fstat(descriptor_, &status_);
 }
 

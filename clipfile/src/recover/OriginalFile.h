@@ -7,11 +7,11 @@
 
 namespace clipfile {
 
-/// Keeps recorders, which lock what they write, off a file that is recovered, and notices when it changes all
-/// the same.
+/// Keeps recorders, which lock what they write, and other recoveries off a file that is recovered, and
+/// notices when it changes all the same.
 class OriginalFile {
  public:
-    /// Throws `ToolError` when a recorder holds the file. One that cannot be opened is not locked.
+    /// Throws `ToolError` when one of them holds the file. One that cannot be opened is not locked.
     explicit OriginalFile(const std::filesystem::path& path);
     ~OriginalFile();
     OriginalFile(const OriginalFile&) = delete;

@@ -4,7 +4,7 @@
 #include <filesystem>
 #include <memory>
 
-#include "controller/OutputSettings.h"
+#include "common/OutputSettings.h"
 #include "media/ParameterSets.h"
 #include "mp4/Mp4Muxer.h"
 #include "reader/MetadataUnit.h"

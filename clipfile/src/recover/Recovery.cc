@@ -25,6 +25,8 @@ namespace fs = std::filesystem;
 constexpr std::size_t kTriedPictures = 3;
 /// Chunks that are searched for them: more than two seconds.
 constexpr std::size_t kTriedChunks = 16;
+/// So much is written from one look at the free space to the next.
+constexpr std::uint64_t kBytesBetweenChecks = 8'000'000;
 
 ToolError CannotRecover(const fs::path& path, const std::string& why) {
     return {ExitCode::kDefects, path.string() + " cannot be recovered: " + why + "."};
@@ -77,12 +79,14 @@ std::vector<std::shared_ptr<nal_access::SampleData>> FirstPictures(ChunkSource& 
 std::vector<std::unique_ptr<ParameterSetSource>> SetSources(const fs::path& path,
                                                             const RecoveryOptions& options) {
     std::vector<std::unique_ptr<ParameterSetSource>> sources;
+    // What a person has named goes before what this program finds.
+    if (!options.like.empty()) {
+        sources.push_back(std::make_unique<LikeFile>(options.like));
+    }
     if (auto journal = std::make_unique<JournalSets>(path); !journal->IsEmpty()) {
         sources.push_back(std::move(journal));
     }
-    if (!options.like.empty()) {
-        sources.push_back(std::make_unique<LikeFile>(options.like));
-    } else {
+    if (options.like.empty()) {
         sources.push_back(std::make_unique<FolderFiles>(fs::absolute(path).parent_path(), path));
     }
     return sources;
@@ -126,9 +130,17 @@ std::optional<ParameterSets> OwnSets(const Recording& recording) {
     return ParameterSets{video->avc->sps.front(), video->avc->pps.front()};
 }
 
+void ExpectRoom(const RecoveryOptions& options) {
+    if (options.checkRoom) {
+        options.checkRoom();
+    }
+}
+
 /// Returns the bytes of the longest chunk.
-std::uint64_t CopyChunks(Chunk first, ChunkSource& source, RecordingWriter& writer, RecoveryResult& result) {
+std::uint64_t CopyChunks(Chunk first, ChunkSource& source, RecordingWriter& writer,
+                         const RecoveryOptions& options, RecoveryResult& result) {
     std::uint64_t longest = 0;
+    std::uint64_t unchecked = 0;
     for (Chunk chunk = std::move(first); chunk != nullptr; chunk = source.Next()) {
         writer.Write(chunk);
         result.pictures += chunk->video.size();
@@ -141,8 +153,14 @@ std::uint64_t CopyChunks(Chunk first, ChunkSource& source, RecordingWriter& writ
             }
         }
         longest = std::max(longest, bytes);
+        unchecked += bytes;
+        if (unchecked >= kBytesBetweenChecks) {
+            unchecked = 0;
+            ExpectRoom(options);
+        }
     }
     writer.Close();
+    ExpectRoom(options);
     return longest;
 }
 
@@ -183,15 +201,16 @@ std::uint64_t BytesAtRisk(const InputFile& file, const Recording& recording, std
     return left > longestChunk ? left : 0;
 }
 
-/// Gives a file that was written beside its original the name of that, once nothing is wrong with it.
-void ReplaceWhenVerified(const OriginalFile& original, const fs::path& path, std::uint64_t bytesAtRisk,
-                         const RecoveryOptions& options, RecoveryResult& result) {
-    result.defects = options.verify(result.written);
-    if (result.defects.empty() && bytesAtRisk == 0) {
-        original.CheckUnchanged();
-        MoveOver(result.written, fs::absolute(path));
-        result.written = fs::absolute(path);
+/// Whether the new file may take the place of its original: nothing is wrong with it, and nothing lost. It is
+/// looked at under the name that it has in work, so that one that was not looked at to the end has no other.
+bool MayReplace(const NewFile& written, const fs::path& target, std::uint64_t bytesAtRisk,
+                const RecoveryOptions& options, RecoveryResult& result) {
+    result.defects = options.verify(written.Path(), target);
+    const bool mayReplace = result.defects.empty() && bytesAtRisk == 0;
+    if (!mayReplace) {
+        ExpectRoom(options);  // it will go on taking its own
     }
+    return mayReplace;
 }
 
 /// Fragments cannot be read without the tracks of `moov`.
@@ -252,11 +271,11 @@ RecoveryResult RecoverFile(const fs::path& path, const RecoveryOptions& options)
     if (!options.searched.empty()) {
         MakeFolders(target);
     }
-    const NewFile written(target);
+    NewFile written(target);
     std::uint64_t longestChunk = 0;
     {
         RecordingWriter writer(written.Path(), setup, *sets);
-        longestChunk = CopyChunks(first, *source, writer, result);
+        longestChunk = CopyChunks(first, *source, writer, options, result);
     }
     CheckWritten(written.Path(), result);
     const std::uint64_t bytesAtRisk = BytesAtRisk(file, recording, source->Position(), longestChunk);
@@ -267,15 +286,14 @@ RecoveryResult RecoverFile(const fs::path& path, const RecoveryOptions& options)
     }
     original.CopyAccess(written.Path());
     written.Synchronize();
+    const bool replaces =
+        options.verify ? MayReplace(written, target, bytesAtRisk, options, result) : options.inPlace;
     original.CheckUnchanged();
-    written.Keep(options.inPlace);
+    result.written = replaces ? fs::absolute(path) : target;
+    written.Keep(result.written, replaces);
     result.isRecovered = true;
-    result.written = target;
     result.bytesLeft = file.Size() - std::min(file.Size(), source->Position());
     result.lockFault = original.LockFault();
-    if (options.verify) {
-        ReplaceWhenVerified(original, path, bytesAtRisk, options, result);
-    }
     return result;
 }
 

@@ -10,8 +10,8 @@
 namespace clipfile {
 
 struct RecoveryOptions {
-    /// A recording of the same stream, for the parameter sets of a normal file that no journal has; empty for
-    /// the newest other file in the same folder whose sets fit.
+    /// A recording of the same stream, for the parameter sets of a normal file, in front of those of a
+    /// journal; empty for those, and for the newest other file in the same folder whose sets fit.
     std::filesystem::path like;
     /// Folder for recovered files; empty for that of the original.
     std::filesystem::path output;
@@ -20,9 +20,14 @@ struct RecoveryOptions {
     /// The folder that files were searched in: below `output` they keep their path below it. Empty for the
     /// name alone.
     std::filesystem::path searched = {};
-    /// Tells what is wrong with a file. Where it is given, the recovered file is written beside the original,
-    /// and takes its place when nothing is wrong and no more than a torn chunk would be lost.
-    std::function<std::vector<std::string>(const std::filesystem::path&)> verify = {};
+    /// Tells what is wrong with `file`, which is to be called `name`. Where it is given, the recovered file
+    /// takes the place of the original when nothing is wrong and no more than a torn chunk would be lost, and
+    /// is beside it else.
+    std::function<std::vector<std::string>(const std::filesystem::path& file,
+                                           const std::filesystem::path& name)>
+        verify = {};
+    /// Called while the new file grows. What it throws ends the work.
+    std::function<void()> checkRoom = {};
 };
 
 /// What became of a file.
@@ -47,8 +52,9 @@ struct RecoveryResult {
 /// original is only read, and with `inPlace` replaced as a whole at the end.
 ///
 /// Throws `ToolError` with one sentence when nothing can be recovered, when no parameter sets fit, when the
-/// file is still being recorded or changes meanwhile, when the new one is there already or cannot be written,
-/// or when `inPlace` would lose more than a torn chunk. No file is left behind then.
+/// file is still being recorded, recovered by another program, or changes meanwhile, when the new one is
+/// there already or cannot be written, or when `inPlace` would lose more than a torn chunk. No file is left
+/// behind then.
 RecoveryResult RecoverFile(const std::filesystem::path& path, const RecoveryOptions& options);
 
 /// The file that is already where the recovered one would go, or nothing.

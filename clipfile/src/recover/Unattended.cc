@@ -1,6 +1,10 @@
 #include "recover/Unattended.h"
 
+#include <sched.h>
+#include <signal.h>
+#include <sys/prctl.h>
 #include <sys/resource.h>
+#include <sys/statvfs.h>
 #include <sys/syscall.h>
 #include <unistd.h>
 
@@ -24,23 +28,45 @@ constexpr int kClassShift = 13;
 /// An hour at 50 Mbit/s is 22 GB; so much is recorded in three minutes.
 constexpr std::uint64_t kLeftForRecorder = 1'000'000'000;
 
+/// Throws when there are not so many bytes besides.
+void ExpectFree(const std::filesystem::path& path, std::uint64_t size) {
+    struct statvfs disk = {};
+    if (statvfs(path.c_str(), &disk) != 0) {
+        return;  // whoever opens the file tells why
+    }
+    const std::uint64_t available = std::uint64_t{disk.f_bavail} * disk.f_frsize;
+    if (available < kLeftForRecorder || available - kLeftForRecorder < size) {
+        throw ToolError(ExitCode::kUnreadable, path.string() + " is not recovered: its disk has " +
+                                                   std::to_string(available / 1'000'000) +
+                                                   " MB of free space, and what is recorded needs them.");
+    }
+}
+
 }  // namespace
 
 void GiveWay() {
+    // A receiver may run as a real-time process, which its children do too. Those have no level.
+    const sched_param none = {};
+    if (sched_setscheduler(0, SCHED_IDLE, &none) != 0) {
+        sched_setscheduler(0, SCHED_OTHER, &none);
+    }
     setpriority(PRIO_PROCESS, 0, kLowestPriority);
     syscall(SYS_ioprio_set, kWhoProcess, 0, kIdleClass << kClassShift);
     std::ofstream("/proc/self/oom_score_adj") << kFirstToGo;
 }
 
+void EndWithParent() {
+    prctl(PR_SET_PDEATHSIG, SIGKILL);
+}
+
 void CheckRoom(const std::filesystem::path& path) {
+    ExpectFree(path, 0);
+}
+
+void CheckRoomForCopy(const std::filesystem::path& path) {
     std::error_code error;
     const std::uint64_t size = std::filesystem::file_size(path, error);
-    const std::filesystem::space_info space = std::filesystem::space(path, error);
-    if (!error && space.available < size + kLeftForRecorder) {
-        throw ToolError(ExitCode::kUnreadable, path.string() + " is not recovered: its disk has " +
-                                                   std::to_string(space.available / 1'000'000) +
-                                                   " MB of free space, and what is recorded needs them.");
-    }
+    ExpectFree(path, error ? 0 : size);
 }
 
 }  // namespace clipfile

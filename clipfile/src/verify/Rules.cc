@@ -176,12 +176,12 @@ void CheckData(const InputFile& file, const Inspection& inspection, Defects& def
     }
 }
 
-void CheckTimecode(const InputFile& file, const Inspection& inspection, Defects& defects) {
+void CheckTimecode(const std::filesystem::path& path, const Inspection& inspection, Defects& defects) {
     // A stream without timecode gives its files the time of day as their names.
     if (!inspection.start || !inspection.firstUnit || !inspection.firstUnit->timecode) {
         return;
     }
-    const std::string stem = file.Path().stem().string();
+    const std::string stem = path.stem().string();
     const std::string name = NameOf(*inspection.start);
     if (!stem.starts_with(name)) {
         defects.Add("Its timecode is " + TimecodeText(*inspection.start) + ".");

@@ -1,5 +1,7 @@
 #pragma once
 
+#include <filesystem>
+#include <functional>
 #include <string>
 #include <vector>
 
@@ -26,12 +28,13 @@ void CheckStructure(const InputFile& file, const Inspection& inspection, Defects
 void CheckTracks(const Inspection& inspection, Defects& defects);
 /// Every sample lies in the data, and all data are samples.
 void CheckData(const InputFile& file, const Inspection& inspection, Defects& defects);
-/// The timecode sample against the name of the file and the metadata.
-void CheckTimecode(const InputFile& file, const Inspection& inspection, Defects& defects);
+/// The timecode sample against the name in `path`, and the metadata.
+void CheckTimecode(const std::filesystem::path& path, const Inspection& inspection, Defects& defects);
 /// What a fragmented file tells of its fragments: their numbers, `mehd`, `mfra`.
 void CheckIndex(const InputFile& file, const Inspection& inspection, Defects& defects);
 /// Reads every sample: pictures are whole NAL units, sync samples are IDR pictures, metadata ends with the
-/// recorder's block and its timecode goes on frame by frame, audio decodes.
-void CheckSamples(const InputFile& file, const Inspection& inspection, Defects& defects);
+/// recorder's block and its timecode goes on frame by frame, audio decodes. `onSample` may be empty.
+void CheckSamples(const InputFile& file, const Inspection& inspection, const std::function<void()>& onSample,
+                  Defects& defects);
 
 }  // namespace clipfile

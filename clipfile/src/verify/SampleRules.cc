@@ -90,7 +90,7 @@ SampleRule MetadataRule(Defects& defects, std::uint32_t rate) {
 }
 
 void VisitSamples(const InputFile& file, const Recording& recording, std::size_t track,
-                  const SampleRule& rule) {
+                  const std::function<void()>& onSample, const SampleRule& rule) {
     RecordingSamples samples(file, recording, track);
     std::uint64_t number = 0;
     while (const auto sample = samples.Next()) {
@@ -98,13 +98,17 @@ void VisitSamples(const InputFile& file, const Recording& recording, std::size_t
             sample->size > std::min<std::uint64_t>(kMaxSample, file.Size() - sample->offset)) {
             return;  // told already, where samples were counted
         }
+        if (onSample) {
+            onSample();
+        }
         rule(++number, *sample, file.Read(sample->offset, sample->size));
     }
 }
 
 }  // namespace
 
-void CheckSamples(const InputFile& file, const Inspection& inspection, Defects& defects) {
+void CheckSamples(const InputFile& file, const Inspection& inspection, const std::function<void()>& onSample,
+                  Defects& defects) {
     const TrackSummary* const timecode = inspection.Find(FourCc("tmcd"));
     const std::uint32_t rate =
         timecode != nullptr && timecode->track.timecode ? timecode->track.timecode->frameCount : 0;
@@ -112,13 +116,13 @@ void CheckSamples(const InputFile& file, const Inspection& inspection, Defects& 
         try {
             switch (inspection.tracks[i].track.handler) {
                 case FourCc("vide"):
-                    VisitSamples(file, inspection.recording, i, PictureRule(defects));
+                    VisitSamples(file, inspection.recording, i, onSample, PictureRule(defects));
                     break;
                 case FourCc("soun"):
-                    VisitSamples(file, inspection.recording, i, AudioRule(defects));
+                    VisitSamples(file, inspection.recording, i, onSample, AudioRule(defects));
                     break;
                 case FourCc("meta"):
-                    VisitSamples(file, inspection.recording, i, MetadataRule(defects, rate));
+                    VisitSamples(file, inspection.recording, i, onSample, MetadataRule(defects, rate));
                     break;
                 default:
                     break;

@@ -5,7 +5,7 @@
 
 namespace clipfile {
 
-Verification VerifyFile(const std::filesystem::path& path, bool deep) {
+Verification VerifyFile(const std::filesystem::path& path, const VerifyOptions& options) {
     const InputFile file(path);
     Verification verification;
     verification.path = path;
@@ -21,10 +21,10 @@ Verification VerifyFile(const std::filesystem::path& path, bool deep) {
     if (verification.inspection.recording.completion == Completion::kClosed) {
         CheckTracks(verification.inspection, defects);
         CheckData(file, verification.inspection, defects);
-        CheckTimecode(file, verification.inspection, defects);
+        CheckTimecode(options.name.empty() ? path : options.name, verification.inspection, defects);
         CheckIndex(file, verification.inspection, defects);
-        if (deep) {
-            CheckSamples(file, verification.inspection, defects);
+        if (options.deep) {
+            CheckSamples(file, verification.inspection, options.onSample, defects);
         }
     }
     return verification;

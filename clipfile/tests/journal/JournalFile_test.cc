@@ -1,14 +1,18 @@
 #include "journal/JournalFile.h"
 
+#include <fcntl.h>
 #include <gtest/gtest.h>
 #include <signal.h>
+#include <sys/file.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <cerrno>
 #include <fstream>
 #include <system_error>
 
+#include "support/SystemCalls.h"
 #include "support/TempDir.h"
 
 namespace clipfile {
@@ -137,6 +141,59 @@ TEST_F(JournalFileTest, LinksPipesAndFoldersAreNoJournals) {
         EXPECT_FALSE(ReadJournal(path)) << path;
         EXPECT_FALSE(JournalFile::Claim(path)) << path;
     }
+}
+
+TEST_F(JournalFileTest, WhatAKilledWriterHasLeftIsRemoved) {
+    const auto torn = folder_.Path() / ".receiver-1.journal.new";
+    const auto held = folder_.Path() / ".receiver-2.journal.new";
+    put(torn, "{");
+    put(held, "{");
+    put(folder_.Path() / "other.journal.new", "{");
+    JournalFile journal(folder_.Path());
+    journal.Write(Naming("a.MP4"));
+    const int holder = open(held.c_str(), O_RDWR | O_CLOEXEC);
+    ASSERT_EQ(flock(holder, LOCK_EX | LOCK_NB), 0);
+    RemoveTornJournals(folder_.Path());
+    close(holder);
+    EXPECT_FALSE(std::filesystem::exists(torn));
+    EXPECT_TRUE(std::filesystem::exists(held)) << "somebody writes it";
+    EXPECT_EQ(entries(), 3U);
+}
+
+TEST_F(JournalFileTest, WithoutLocksThereIsNone) {
+    const SystemCallGuard guard;
+    SystemCalls().flock = [] { return ENOLCK; };
+    JournalFile journal(folder_.Path());
+    EXPECT_THROW(journal.Write(Naming("a.MP4")), std::system_error);
+    EXPECT_EQ(entries(), 0U);
+}
+
+TEST_F(JournalFileTest, AFullDiskLeavesTheOneThatIsThere) {
+    const SystemCallGuard guard;
+    JournalFile journal(folder_.Path());
+    journal.Write(Naming("a.MP4"));
+    SystemCalls().fsync = [](int) { return ENOSPC; };
+    EXPECT_THROW(journal.Write(Naming("b.MP4")), std::system_error);
+    SystemCalls().fsync = nullptr;
+    EXPECT_EQ(entries(), 1U);
+    EXPECT_EQ(ReadJournal(journal.Path())->files, std::vector<std::string>{"a.MP4"});
+    EXPECT_FALSE(JournalFile::Claim(journal.Path())) << "it is still held";
+    journal.Write(Naming("c.MP4"));
+    EXPECT_EQ(ReadJournal(journal.Path())->files, std::vector<std::string>{"c.MP4"});
+}
+
+TEST_F(JournalFileTest, IsClaimedThroughADescriptorForWriting) {
+    std::filesystem::path path;
+    {
+        JournalFile file(folder_.Path());
+        file.Write(Naming("a.MP4"));
+        path = file.Path();
+    }
+    const SystemCallGuard guard;
+    int mode = -1;
+    SystemCalls().flockOf = [&](int descriptor) { mode = fcntl(descriptor, F_GETFL) & O_ACCMODE; };
+    ASSERT_TRUE(JournalFile::Claim(path));
+    EXPECT_EQ(mode, O_RDWR);
 }
 
 TEST_F(JournalFileTest, AFolderThatTakesNoFilesIsAFailureThatLeavesNothing) {

@@ -68,9 +68,25 @@ TEST(Journal, ATornTextIsNone) {
 
 TEST(Journal, AFileOutsideOfItsFolderMakesItNone) {
     const std::string file = "20261121/CAM1/01_02_03_04.MP4";
-    for (const char* const path : {"/etc/passwd", "../a.MP4", "a/../../b.MP4", "..", "", "a/"}) {
+    for (const char* const path :
+         {"/etc/passwd", "../a.MP4", "a/../../b.MP4", "..", "", "a/", "a.MP4\\u0000/b"}) {
         EXPECT_FALSE(ParseJournal(With(file, path))) << path;
     }
+}
+
+TEST(Journal, ANameThatIsNotUtf8StandsAsItsBytes) {
+    Journal journal = MakeJournal();
+    journal.files = {"20261121/CAM\xE9/a.MP4"};
+    const std::string text = ToText(journal);
+    EXPECT_NE(text.find("\"hex\": \"32303236313132312f43414de92f612e4d5034\""), std::string::npos) << text;
+    const auto read = ParseJournal(text);
+    ASSERT_TRUE(read);
+    EXPECT_EQ(read->files, journal.files);
+    const std::string name = "\"20261121/CAM1/01_02_03_04.MP4\"";
+    EXPECT_FALSE(ParseJournal(With(name, "{\"hex\": \"2e2e2f61\"}"))) << "../a";
+    EXPECT_FALSE(ParseJournal(With(name, "{\"hex\": \"\"}")));
+    EXPECT_FALSE(ParseJournal(With(name, "{}")));
+    EXPECT_FALSE(ParseJournal(With(name, "17")));
 }
 
 TEST(Journal, WhatHasAnotherFormIsNone) {

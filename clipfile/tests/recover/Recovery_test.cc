@@ -88,6 +88,22 @@ TEST_F(RecoveryTest, AJournalWhoseSetsFitNothingGivesWayToTheFileThatIsNamed) {
     EXPECT_EQ(RecoverFile(original(), {like(), {}, false}).parameterSets, like().string());
 }
 
+TEST_F(RecoveryTest, TheFileThatIsNamedGoesBeforeTheJournal) {
+    const test_stream::Stream stream = MakeCodedStream(4);
+    recordUnfinished(stream);
+    Journal journal;
+    journal.sets = {SetsOf(stream)};
+    journal.files = {"01_02_03_04.MP4"};
+    JournalFile kept(folder_.Path());
+    kept.Write(journal);
+    EXPECT_EQ(RecoverFile(original(), {like(), {}, false}).parameterSets, like().string());
+    std::filesystem::remove(recovered());
+    Record(path("b.MP4"), {"normal", kExact, true}, MakePlainStream(1));
+    EXPECT_EQ(RecoverFile(original(), {path("b.MP4"), {}, false}).parameterSets,
+              "the journal " + kept.Path().string())
+        << "where its sets fit nothing";
+}
+
 TEST_F(RecoveryTest, AJournalThatNamesOtherFilesAndOneThatIsTornAreNotAsked) {
     const test_stream::Stream stream = MakeCodedStream(4);
     recordUnfinished(stream);
@@ -242,7 +258,7 @@ TEST_F(RecoveryTest, AFileThatIsStillRecordedIsLeftAlone) {
     std::FILE* const writer = std::fopen(original().c_str(), "r+b");
     ASSERT_NE(writer, nullptr);
     ASSERT_EQ(flock(fileno(writer), LOCK_EX | LOCK_NB), 0);
-    EXPECT_EQ(failure(), original().string() + " is still being recorded.");
+    EXPECT_EQ(failure(), original().string() + " is still being recorded, or recovered by another program.");
     std::fclose(writer);
     EXPECT_EQ(failure(), "");
 }

@@ -1,10 +1,13 @@
 // How a recovered file takes its name, and what keeps it from taking that of a good one.
 
+#include <fcntl.h>
+#include <sys/file.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
 #include "recover/RecoveryFixture.h"
+#include "support/AnotherUser.h"
 #include "support/BoxFinder.h"
 #include "support/SystemCalls.h"
 
@@ -110,8 +113,10 @@ TEST_F(ReplacementTest, AFileThatIsVerifiedTakesThePlaceOfItsOriginal) {
     recordUnfinished();
     const Data before = ReadAll(original());
     RecoveryOptions options;
-    options.verify = [&](const std::filesystem::path& file) {
-        EXPECT_EQ(file, recovered());
+    options.verify = [&](const std::filesystem::path& file, const std::filesystem::path& name) {
+        EXPECT_TRUE(std::filesystem::exists(file));
+        EXPECT_EQ(name, recovered());
+        EXPECT_FALSE(std::filesystem::exists(name)) << "it has no name before";
         EXPECT_EQ(ReadAll(original()), before) << "the original is kept until then";
         return std::vector<std::string>();
     };
@@ -127,7 +132,7 @@ TEST_F(ReplacementTest, AFileWithDefectsStaysBesideItsOriginal) {
     recordUnfinished();
     const Data before = ReadAll(original());
     RecoveryOptions options;
-    options.verify = [](const auto&) { return std::vector<std::string>{"Something is wrong."}; };
+    options.verify = [](const auto&, const auto&) { return std::vector<std::string>{"Something is wrong."}; };
     const RecoveryResult result = RecoverFile(original(), options);
     EXPECT_EQ(result.written, recovered());
     EXPECT_EQ(result.defects, std::vector<std::string>{"Something is wrong."});
@@ -140,7 +145,7 @@ TEST_F(ReplacementTest, AVerifiedFileThatLacksMoreThanAChunkStaysBesideItsOrigin
     bytes[box_finder::Find(bytes, "moof:2").offset + 8 + 16 + 8 + 8 + 4 + 3] = 99;
     WriteAll(original(), bytes);
     RecoveryOptions options;
-    options.verify = [](const auto&) { return std::vector<std::string>(); };
+    options.verify = [](const auto&, const auto&) { return std::vector<std::string>(); };
     EXPECT_EQ(RecoverFile(original(), options).written, recovered());
     EXPECT_EQ(ReadAll(original()), bytes);
 }
@@ -150,31 +155,103 @@ TEST_F(ReplacementTest, AnOriginalThatChangesWhileTheNewFileIsVerifiedIsNotRepla
     Data longer = ReadAll(original());
     longer.push_back(0);
     RecoveryOptions options;
-    options.verify = [&](const auto&) {
+    options.verify = [&](const auto&, const auto&) {
         WriteAll(original(), longer);
         return std::vector<std::string>();
     };
     EXPECT_EQ(failure(options), original().string() + " has changed while it was recovered.");
     EXPECT_EQ(ReadAll(original()), longer);
+    EXPECT_EQ(fileCount(), 1U);
 }
 
-TEST_F(ReplacementTest, WhatAKilledRecoveryHasLeftIsRemoved) {
+TEST_F(ReplacementTest, ARecoveryThatIsKilledWhileItVerifiesIsDoneAgain) {
     recordUnfinished();
-    const pid_t gone = fork();
-    if (gone == 0) {
-        _exit(0);
+    RecoveryOptions options;
+    const pid_t killed = fork();
+    if (killed == 0) {
+        options.verify = [](const auto&, const auto&) -> std::vector<std::string> { _exit(0); };
+        failure(options);
     }
-    ASSERT_EQ(waitpid(gone, nullptr, 0), gone);
-    const auto work = [&](const std::string& number) {
-        return path("." + recovered().filename().string() + "." + number);
+    ASSERT_EQ(waitpid(killed, nullptr, 0), killed);
+    EXPECT_EQ(fileCount(), 2U);
+    options.verify = [](const auto&, const auto&) { return std::vector<std::string>(); };
+    EXPECT_EQ(RecoveredBefore(original(), options), std::nullopt);
+    EXPECT_EQ(RecoverFile(original(), options).written, original());
+    EXPECT_EQ(fileCount(), 1U);
+}
+
+TEST_F(ReplacementTest, ADiskThatFillsUpEndsTheRecoveryAndGetsItsRoomBack) {
+    recordUnfinished();
+    std::vector<int> looks;
+    RecoveryOptions options;
+    options.verify = [&](const auto&, const auto&) {
+        looks.push_back(0);
+        return std::vector<std::string>{"Something is wrong."};
     };
-    WriteAll(work(std::to_string(gone)), {1});
-    WriteAll(work(std::to_string(getppid())), {1});
-    WriteAll(work("1x"), {1});
+    options.checkRoom = [&] {
+        looks.push_back(1);
+        if (looks.size() == 3) {
+            throw ToolError(ExitCode::kUnreadable, "full");
+        }
+    };
+    EXPECT_EQ(failure(options), "full") << "while it is verified somebody else has filled it";
+    EXPECT_EQ(looks, (std::vector<int>{1, 0, 1}));
+    EXPECT_EQ(fileCount(), 1U);
+    looks.assign(2, 0);
+    EXPECT_EQ(failure(options), "full") << "once it is written";
+    EXPECT_EQ(looks, (std::vector<int>{0, 0, 1}));
+    EXPECT_EQ(fileCount(), 1U);
+}
+
+TEST_F(ReplacementTest, AFileIsRecoveredByOneProgramAtATime) {
+    recordUnfinished();
+    RecoveryOptions options;
+    options.verify = [&](const auto&, const auto&) {
+        EXPECT_EQ(failure(),
+                  original().string() + " is still being recorded, or recovered by another program.");
+        return std::vector<std::string>();
+    };
+    EXPECT_EQ(RecoverFile(original(), options).written, original());
+}
+
+TEST_F(ReplacementTest, WhereOnlyFilesOpenForWritingAreLockedAloneItIsOpenedSo) {
+    recordUnfinished();
+    int refused = 0;
+    SystemCalls().flock = [&] { return refused++ == 0 ? EBADF : 0; };
+    EXPECT_EQ(RecoverFile(original(), {}).lockFault, "");
+    EXPECT_GE(refused, 2);
+}
+
+TEST_F(ReplacementTest, WhatAKilledRecoveryHasLeftIsRemovedAndWhatIsInWorkStays) {
+    recordUnfinished();
+    const auto work = [&](const std::string& letters) {
+        return path("." + recovered().filename().string() + "." + letters);
+    };
+    for (const char* const letters : {"a1B2c3", "inWork", "1x"}) {
+        WriteAll(work(letters), {1});
+    }
+    const int held = open(work("inWork").c_str(), O_RDWR | O_CLOEXEC);
+    ASSERT_EQ(flock(held, LOCK_EX | LOCK_NB), 0);
     RecoverFile(original(), {});
-    EXPECT_FALSE(std::filesystem::exists(work(std::to_string(gone))));
-    EXPECT_TRUE(std::filesystem::exists(work(std::to_string(getppid()))));
-    EXPECT_TRUE(std::filesystem::exists(work("1x")));
+    EXPECT_FALSE(std::filesystem::exists(work("a1B2c3")));
+    EXPECT_TRUE(std::filesystem::exists(work("inWork")));
+    EXPECT_TRUE(std::filesystem::exists(work("1x"))) << "another kind of name";
+    close(held);
+}
+
+TEST_F(ReplacementTest, InAFolderThatNobodyMayWriteToNothingIsRecovered) {
+    recordUnfinished();
+    const Data before = ReadAll(original());
+    std::filesystem::permissions(original(), std::filesystem::perms(0444));
+    std::filesystem::permissions(folder_.Path(), std::filesystem::perms(0555));
+    {
+        const AnotherUser other;
+        ASSERT_TRUE(other.IsOther());
+        EXPECT_EQ(failure(), recovered().string() + " cannot be written: Permission denied.");
+    }
+    std::filesystem::permissions(folder_.Path(), std::filesystem::perms(0755));
+    EXPECT_EQ(ReadAll(original()), before);
+    EXPECT_EQ(fileCount(), 1U);
 }
 
 TEST_F(ReplacementTest, TheOwnerStaysTheSame) {

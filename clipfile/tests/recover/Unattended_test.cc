@@ -1,6 +1,8 @@
 #include "recover/Unattended.h"
 
 #include <gtest/gtest.h>
+#include <sched.h>
+#include <signal.h>
 #include <sys/resource.h>
 #include <sys/syscall.h>
 #include <sys/wait.h>
@@ -9,6 +11,7 @@
 #include <fstream>
 
 #include "common/ToolError.h"
+#include "support/SystemCalls.h"
 #include "support/TempDir.h"
 
 namespace clipfile {
@@ -31,20 +34,63 @@ TEST(Unattended, GivesWayInProcessorDiskAndMemory) {
     EXPECT_EQ(status, 0);
 }
 
+TEST(Unattended, GivesWayAlsoAsTheChildOfARealTimeProcess) {
+    const pid_t child = fork();
+    if (child == 0) {
+        const sched_param first = {1};
+        if (sched_setscheduler(0, SCHED_RR, &first) != 0) {
+            _exit(2);
+        }
+        GiveWay();
+        _exit(sched_getscheduler(0) == SCHED_IDLE ? 0 : 1);
+    }
+    int status = 0;
+    ASSERT_EQ(waitpid(child, &status, 0), child);
+    ASSERT_TRUE(WIFEXITED(status));
+    // Where the system lets nobody be a real-time process, none has children.
+    EXPECT_NE(WEXITSTATUS(status), 1);
+}
+
+TEST(Unattended, EndsWithTheProcessThatHasStartedIt) {
+    int ready[2] = {};
+    ASSERT_EQ(pipe(ready), 0);
+    const pid_t parent = fork();
+    if (parent == 0) {
+        if (fork() == 0) {
+            EndWithParent();
+            [[maybe_unused]] const ssize_t told = write(ready[1], "x", 1);
+            pause();
+        }
+        pause();
+    }
+    close(ready[1]);
+    char byte = 0;
+    ASSERT_EQ(read(ready[0], &byte, 1), 1);
+    kill(parent, SIGKILL);
+    ASSERT_EQ(waitpid(parent, nullptr, 0), parent);
+    EXPECT_EQ(read(ready[0], &byte, 1), 0) << "it has closed its end";
+    close(ready[0]);
+}
+
 TEST(Unattended, AFileForWhichTheDiskHasNoRoomIsNotRecovered) {
+    const SystemCallGuard guard;
     const TempDir folder;
     const auto file = folder.Path() / "a.MP4";
-    std::ofstream(file).close();
+    std::ofstream(file) << std::string(5'000'000, '.');
+    SystemCalls().availableBytes = [] { return std::uint64_t{1'006'000'000}; };
+    EXPECT_NO_THROW(CheckRoomForCopy(file));
+    SystemCalls().availableBytes = [] { return std::uint64_t{1'004'000'000}; };
     EXPECT_NO_THROW(CheckRoom(file));
-    std::filesystem::resize_file(file, std::filesystem::space(file).available);
     try {
-        CheckRoom(file);
+        CheckRoomForCopy(file);
         FAIL() << "there is room";
     } catch (const ToolError& error) {
         EXPECT_EQ(error.Code(), ExitCode::kUnreadable);
         EXPECT_TRUE(std::string(error.what()).starts_with(file.string() + " is not recovered: its disk has "))
             << error.what();
     }
+    SystemCalls().availableBytes = [] { return std::uint64_t{999'000'000}; };
+    EXPECT_THROW(CheckRoom(file), ToolError);
 }
 
 }  // namespace

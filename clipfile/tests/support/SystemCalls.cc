@@ -1,7 +1,9 @@
 #include "support/SystemCalls.h"
 
+#include <dlfcn.h>
 #include <stdio.h>
 #include <sys/file.h>
+#include <sys/statvfs.h>
 #include <sys/syscall.h>
 #include <unistd.h>
 
@@ -27,6 +29,9 @@ bool Fails(int error) {
 extern "C" {
 
 int flock(int descriptor, int operation) noexcept {
+    if (SystemCalls().flockOf) {
+        SystemCalls().flockOf(descriptor);
+    }
     if (SystemCalls().flock && Fails(SystemCalls().flock())) {
         return -1;
     }
@@ -46,6 +51,16 @@ int renameat2(int oldFolder, const char* oldPath, int newFolder, const char* new
         return -1;
     }
     return static_cast<int>(syscall(SYS_renameat2, oldFolder, oldPath, newFolder, newPath, flags));
+}
+
+int statvfs(const char* path, struct statvfs* disk) noexcept {
+    static const auto real = reinterpret_cast<decltype(&statvfs)>(dlsym(RTLD_NEXT, "statvfs"));
+    const int result = real(path, disk);
+    if (result == 0 && SystemCalls().availableBytes) {
+        disk->f_frsize = 1;
+        disk->f_bavail = SystemCalls().availableBytes();
+    }
+    return result;
 }
 
 ssize_t pread(int descriptor, void* buffer, size_t size, off_t offset) {

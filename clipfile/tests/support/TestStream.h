@@ -8,8 +8,8 @@
 #include <string>
 #include <vector>
 
-#include "buffer/ChunkData.h"
-#include "controller/OutputSettings.h"
+#include "buffer/chunk/ChunkData.h"
+#include "common/OutputSettings.h"
 #include "reader/MetadataUnit.h"
 #include "recover/MuxerTarget.h"
 

@@ -22,7 +22,7 @@ class VerificationTest : public testing::TestWithParam<const char*> {
         test_stream::Record(path(name), {type, clipfileModule::RecordRules::kExact, close}, stream);
     }
     std::filesystem::path path(const std::string& name = kName) const { return folder_.Path() / name; }
-    Sentences defects(bool deep = false) const { return VerifyFile(path(), deep).defects; }
+    Sentences defects(bool deep = false) const { return VerifyFile(path(), {.deep = deep}).defects; }
     /// Writes a number over the bytes of a box, `at` bytes behind its header.
     void patch(const std::string& box, std::size_t at, std::uint64_t value, std::size_t width) const {
         Data bytes = test_stream::ReadAll(path());
@@ -68,7 +68,7 @@ TEST_F(VerificationTest, AnUnfinishedFileIsTold) {
 
 TEST_F(VerificationTest, ANameWithAnotherTimecodeIsTold) {
     record("01_02_03_05.MP4", MakePlainStream(2));
-    EXPECT_EQ(VerifyFile(path("01_02_03_05.MP4"), false).defects, Sentences{"Its timecode is 01:02:03;04."});
+    EXPECT_EQ(VerifyFile(path("01_02_03_05.MP4")).defects, Sentences{"Its timecode is 01:02:03;04."});
 }
 
 TEST_F(VerificationTest, TablesThatNameOtherBytesAreTold) {
@@ -176,7 +176,7 @@ class NeighboursTest : public VerificationTest {
     /// A file of `chunks` chunks whose timecode begins with the frame `first` of the day.
     Verification piece(const std::string& name, std::int64_t first, std::size_t chunks) const {
         record(kName, MakePlainStream(chunks));
-        Verification file = VerifyFile(path(), false);
+        Verification file = VerifyFile(path());
         file.path = path(name);
         file.inspection.start = TimecodeOf(first, 30, true);
         return file;

@@ -1,5 +1,6 @@
 #include "display/TextDisplay.h"
 
+#include "QxModuleStatus.h"
 #include "display/StatusWords.h"
 
 namespace receiver {
@@ -34,7 +35,7 @@ void TextDisplay::Failure(ExitCode, const std::string& sentence) {
 }
 
 void TextDisplay::Status(const ModuleStatus& status) {
-    const bool fault = status.status == 6 || status.status == 7;
+    const bool fault = status.status == QxStatus::kStreamFault || status.status == QxStatus::kFailed;
     const std::string numbers =
         fault ? " (status " + std::to_string(status.status) + ", cause " + std::to_string(status.cause) + ")"
               : "";

@@ -1,11 +1,14 @@
 #include "journal/BackgroundRecovery.h"
 
 #include <condition_variable>
+#include <exception>
 #include <mutex>
+#include <set>
 #include <system_error>
 #include <utility>
 
 #include "journal/ChildProgram.h"
+#include "journal/JournalFile.h"
 #include "journal/UnfinishedFiles.h"
 
 namespace receiver {
@@ -62,7 +65,6 @@ struct BackgroundRecovery::State {
     bool asked = false;
     bool agreed = false;
     bool ending = false;
-    bool ended = false;
 
     void Tell(const std::string& sentence) {
         const std::lock_guard lock(mutex);
@@ -79,43 +81,82 @@ struct BackgroundRecovery::State {
         changed.wait(lock, [this] { return agreed || ending; });
         return agreed && !ending;
     }
-    void TellFound(const std::vector<UnfinishedFiles>& found);
+    /// Tells the files of a journal, each once however many name it. Whether there are any.
+    bool Tell(const UnfinishedFiles& files);
     void Recover(UnfinishedFiles& files);
+    void Recover(UnfinishedFiles& files, const fs::path& path);
+    void Work();
+
+    /// The thread's own: the files that were told.
+    std::set<fs::path> told;
 };
 
-void BackgroundRecovery::State::TellFound(const std::vector<UnfinishedFiles>& found) {
+bool BackgroundRecovery::State::Tell(const UnfinishedFiles& files) {
     const char* const what = mode == RecoverMode::kYes  ? "; it is recovered in the background"
                              : mode == RecoverMode::kNo ? "; clipfile recover makes a whole file of it"
                                                         : "; press y to have it recovered";
-    for (const UnfinishedFiles& files : found) {
-        for (const fs::path& path : files.Paths()) {
+    for (const fs::path& path : files.Paths()) {
+        if (told.insert(path).second) {
             Tell(path.string() + " was never closed: its receiver is gone" + what);
+        }
+    }
+    for (const std::string& obstacle : files.Obstacles()) {
+        Tell(obstacle);
+    }
+    return !files.Paths().empty();
+}
+
+void BackgroundRecovery::State::Recover(UnfinishedFiles& files) {
+    for (const fs::path& path : std::vector(files.Paths())) {
+        if (Ending()) {
+            Tell(path.string() + " is not recovered yet: the next receiver goes on with it");
+        } else {
+            Recover(files, path);
         }
     }
 }
 
-void BackgroundRecovery::State::Recover(UnfinishedFiles& files) {
-    for (const fs::path& path : files.Paths()) {
-        if (Ending()) {
-            return;
+void BackgroundRecovery::State::Recover(UnfinishedFiles& files, const fs::path& path) {
+    const ChildResult result =
+        child.Run({program.string(), "recover", "--unattended", fs::absolute(path).string()});
+    if (Ending() && result.code < 0) {
+        Tell(path.string() + " is not recovered yet: the next receiver goes on with it");
+        return;
+    }
+    if (result.code < 0) {
+        Tell(path.string() + " is not recovered: " + program.string() + " did not run to its end" +
+             (result.text.empty() ? "" : ": " + SentenceOf(result.text)));
+        return;
+    }
+    for (const std::string& sentence : SentencesOf(result.text)) {
+        Tell(sentence);
+    }
+    // Any other failure may pass: a full disk, a file that somebody holds.
+    if (result.code == kDone || result.code == kHopeless) {
+        files.Forget(path);
+    }
+}
+
+/// One journal is held at a time, however many there are.
+void BackgroundRecovery::State::Work() {
+    clipfile::RemoveTornJournals(folder);
+    std::vector<fs::path> found;
+    for (const fs::path& journal : clipfile::JournalsIn(folder)) {
+        const auto files = UnfinishedFiles::Take(journal);
+        if (files && Tell(*files)) {
+            found.push_back(journal);
         }
-        const ChildResult result =
-            child.Run({program.string(), "recover", "--unattended", fs::absolute(path).string()});
-        if (Ending()) {
-            Tell(path.string() + " is not recovered yet: the next receiver goes on with it");
-            return;
-        }
-        if (result.code < 0) {
-            Tell(path.string() + " is not recovered: " + program.string() + " did not run to its end" +
-                 (result.text.empty() ? "" : ": " + SentenceOf(result.text)));
-            continue;
-        }
-        for (const std::string& sentence : SentencesOf(result.text)) {
-            Tell(sentence);
-        }
-        // Any other failure may pass: a full disk, a file that somebody holds.
-        if (result.code == kDone || result.code == kHopeless) {
-            files.Forget(path);
+    }
+    if (found.empty() || mode == RecoverMode::kNo || (mode == RecoverMode::kAsk && !WaitForAgreement())) {
+        return;
+    }
+    if (program.empty()) {
+        Tell("nothing is recovered: the program clipfile cannot be found");
+        return;
+    }
+    for (const fs::path& journal : found) {
+        if (auto files = UnfinishedFiles::Take(journal)) {
+            Recover(*files);
         }
     }
 }
@@ -124,26 +165,17 @@ BackgroundRecovery::BackgroundRecovery(const fs::path& folder, RecoverMode mode,
     : state_(std::make_shared<State>(folder, mode, program)), thread_([state = state_] { run(*state); }) {}
 
 BackgroundRecovery::~BackgroundRecovery() {
-    Stop();
+    End();
 }
 
-void BackgroundRecovery::Stop() {
-    if (!thread_.joinable()) {
-        return;
-    }
-    bool ended = false;
+void BackgroundRecovery::End() {
     {
-        std::unique_lock lock(state_->mutex);
+        const std::lock_guard lock(state_->mutex);
         state_->ending = true;
-        state_->child.End();
         state_->changed.notify_all();
-        ended = state_->changed.wait_for(lock, kRecoveryPatience, [this] { return state_->ended; });
     }
-    if (ended) {
-        thread_.join();
-    } else {
-        thread_.detach();
-    }
+    state_->child.End();
+    thread_.End(kRecoveryPatience);
 }
 
 bool BackgroundRecovery::Agree() {
@@ -161,7 +193,12 @@ std::vector<std::string> BackgroundRecovery::TakeSentences() {
 
 fs::path BackgroundRecovery::DefaultProgram() {
     std::error_code error;
-    const fs::path folder = fs::read_symlink("/proc/self/exe", error).parent_path();
+    const fs::path self = fs::read_symlink("/proc/self/exe", error);
+    if (error) {
+        // Without its folder it would be that of the current one, which anybody may have put there.
+        return {};
+    }
+    const fs::path folder = self.parent_path();
     for (const char* const place : {"", "../clipfile"}) {
         const fs::path program = folder / place / "clipfile";
         if (fs::is_regular_file(program, error)) {
@@ -172,18 +209,11 @@ fs::path BackgroundRecovery::DefaultProgram() {
 }
 
 void BackgroundRecovery::run(State& state) {
-    std::vector<UnfinishedFiles> found = FindUnfinishedFiles(state.folder);
-    state.TellFound(found);
-    const bool recovers = state.mode == RecoverMode::kYes ||
-                          (state.mode == RecoverMode::kAsk && !found.empty() && state.WaitForAgreement());
-    for (UnfinishedFiles& files : found) {
-        if (recovers) {
-            state.Recover(files);
-        }
+    try {
+        state.Work();
+    } catch (const std::exception& error) {
+        state.Tell(std::string("files that were never closed are not recovered: ") + error.what());
     }
-    const std::lock_guard lock(state.mutex);
-    state.ended = true;
-    state.changed.notify_all();
 }
 
 }  // namespace receiver

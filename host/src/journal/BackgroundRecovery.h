@@ -3,9 +3,9 @@
 #include <filesystem>
 #include <memory>
 #include <string>
-#include <thread>
 #include <vector>
 
+#include "common/PatientThread.h"
 #include "options/Options.h"
 
 namespace receiver {
@@ -23,14 +23,15 @@ class BackgroundRecovery {
     BackgroundRecovery& operator=(const BackgroundRecovery&) = delete;
 
     /// Stops a recovery that is going on; the next receiver begins it again. One that a disk holds up is left
-    /// to itself. The destructor does so too.
-    void Stop();
+    /// to itself. All sentences are there then. So the destructor does too.
+    void End();
     /// The operator wants what was asked. False when nothing was.
     bool Agree();
     /// What an operator should know, since the last call: sentences without full stop.
     std::vector<std::string> TakeSentences();
 
-    /// The program `clipfile` that belongs to this build. It may be missing.
+    /// The program `clipfile` that belongs to this build. It may be missing; empty when nobody can tell where
+    /// it would be.
     static std::filesystem::path DefaultProgram();
 
  private:
@@ -39,7 +40,7 @@ class BackgroundRecovery {
     static void run(State& state);
 
     const std::shared_ptr<State> state_;
-    std::thread thread_;
+    PatientThread thread_;
 };
 
 }  // namespace receiver

@@ -51,6 +51,8 @@ class Setup {
         posix_spawn_file_actions_addopen(&actions_, STDIN_FILENO, "/dev/null", O_RDONLY, 0);
         posix_spawn_file_actions_adddup2(&actions_, output, STDOUT_FILENO);
         posix_spawn_file_actions_adddup2(&actions_, output, STDERR_FILENO);
+        // A file that the module has open would stay locked by it.
+        posix_spawn_file_actions_addclosefrom_np(&actions_, STDERR_FILENO + 1);
     }
     ~Setup() {
         posix_spawn_file_actions_destroy(&actions_);

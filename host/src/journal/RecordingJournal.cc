@@ -2,8 +2,8 @@
 
 #include <algorithm>
 #include <condition_variable>
+#include <exception>
 #include <mutex>
-#include <system_error>
 #include <utility>
 
 #include "StreamData.h"
@@ -35,7 +35,6 @@ struct RecordingJournal::State {
     // Guarded by mutex:
     std::optional<clipfile::Journal> next;
     bool ending = false;
-    bool ended = false;
     bool warned = false;
     std::string warning;
 };
@@ -46,18 +45,12 @@ RecordingJournal::RecordingJournal(const std::filesystem::path& folder)
       thread_([state = state_] { write(*state); }) {}
 
 RecordingJournal::~RecordingJournal() {
-    bool ended = false;
     {
-        std::unique_lock lock(state_->mutex);
+        const std::lock_guard lock(state_->mutex);
         state_->ending = true;
         state_->changed.notify_all();
-        ended = state_->changed.wait_for(lock, kEndPatience, [this] { return state_->ended; });
     }
-    if (ended) {
-        thread_.join();
-    } else {
-        thread_.detach();
-    }
+    thread_.End(kEndPatience);
 }
 
 void RecordingJournal::Describe(const SourceDescription& source) {
@@ -142,7 +135,7 @@ void RecordingJournal::write(State& state) {
             } else {
                 state.file.Write(journal);
             }
-        } catch (const std::system_error& error) {
+        } catch (const std::exception& error) {
             fault = std::string("no journal can be kept, ") + error.what() +
                     ": files that a crash leaves open will have to be recovered by hand";
         }
@@ -151,8 +144,6 @@ void RecordingJournal::write(State& state) {
             state.warning = fault;
         }
     }
-    state.ended = true;
-    state.changed.notify_all();
 }
 
 }  // namespace receiver

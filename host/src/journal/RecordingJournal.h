@@ -4,10 +4,10 @@
 #include <memory>
 #include <optional>
 #include <string>
-#include <thread>
 #include <vector>
 
 #include "StreamAnalyzer.h"
+#include "common/PatientThread.h"
 #include "journal/Journal.h"
 #include "source/SourceInterface.h"
 
@@ -43,7 +43,7 @@ class RecordingJournal {
     clipfile::Journal journal_;
     std::vector<std::string> openFiles_;
     const std::shared_ptr<State> state_;
-    std::thread thread_;
+    PatientThread thread_;
 };
 
 }  // namespace receiver

@@ -2,13 +2,9 @@
 
 #include <utility>
 
+#include "QxModuleStatus.h"
+
 namespace receiver {
-namespace {
-
-/// The module has failed; it sets no status after this one.
-constexpr int kStatusFailed = 7;
-
-}  // namespace
 
 void Host::SetStatus(int status, int cause) {
     const std::lock_guard lock(mutex_);
@@ -43,7 +39,7 @@ ModuleStatus Host::Status() const {
 }
 
 bool Host::Failed() const {
-    return Status().status == kStatusFailed;
+    return Status().status == QxStatus::kFailed;
 }
 
 std::vector<ModuleStatus> Host::TakeStatuses() {
@@ -58,8 +54,8 @@ bool Host::WaitForMap(std::chrono::milliseconds patience) const {
 
 bool Host::Writing() const {
     const std::lock_guard lock(mutex_);
-    const auto found = map_.find("file_output_status");
-    return found != map_.end() && found->second == "output";
+    const auto found = map_.find(QxStatusMap::kFileOutput);
+    return found != map_.end() && found->second == QxStatusMap::kOutput;
 }
 
 }  // namespace receiver

@@ -39,7 +39,6 @@ struct FolderWatch::State {
     std::condition_variable changed;
     // Guarded by mutex:
     bool ending = false;
-    bool ended = false;
     std::optional<std::uint64_t> freeBytes;
     std::string obstacle;
     std::string warning;
@@ -79,18 +78,12 @@ FolderWatch::FolderWatch(std::unique_ptr<OutputFolder> folder, const std::string
       thread_([state = state_] { watch(*state); }) {}
 
 FolderWatch::~FolderWatch() {
-    bool ended = false;
     {
-        std::unique_lock lock(state_->mutex);
+        const std::lock_guard lock(state_->mutex);
         state_->ending = true;
         state_->changed.notify_all();
-        ended = state_->changed.wait_for(lock, kEndPatience, [this] { return state_->ended; });
     }
-    if (ended) {
-        thread_.join();
-    } else {
-        thread_.detach();
-    }
+    thread_.End(kEndPatience);
 }
 
 void FolderWatch::watch(State& state) {
@@ -102,8 +95,6 @@ void FolderWatch::watch(State& state) {
         const int looks = state.freeBytes ? 1 : kRestAfterFailure;
         state.changed.wait_for(lock, looks * state.interval, [&state] { return state.ending; });
     }
-    state.ended = true;
-    state.changed.notify_all();
 }
 
 void FolderWatch::look(State& state) {

@@ -7,8 +7,8 @@
 #include <memory>
 #include <optional>
 #include <string>
-#include <thread>
 
+#include "common/PatientThread.h"
 #include "output/OutputFolder.h"
 
 namespace receiver {
@@ -57,7 +57,7 @@ class FolderWatch {
     std::optional<std::string> take(std::string& text);
 
     const std::shared_ptr<State> state_;
-    std::thread thread_;
+    PatientThread thread_;
 };
 
 }  // namespace receiver

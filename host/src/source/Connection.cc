@@ -123,25 +123,31 @@ bool Connection::Pump() {
     }
     if (input_->Transport() && IsOf(*packet_, audio_)) {
         newSounds_ = 0;
-        HandleAll(runs_.Put(std::exchange(packet_, libav::NewPacket()), audio_->time_base));
+        for (const auto& packet : runs_.Put(std::exchange(packet_, libav::NewPacket()), audio_->time_base)) {
+            position_ = packet->pos;
+            Handle(*packet);
+        }
         return true;
     }
     if ((packet_->flags & AV_PKT_FLAG_CORRUPT) != 0) {
         ++damaged_;
         return true;
     }
+    position_ = packet_->pos;
     if (IsOf(*packet_, video_)) {
         input_->Alive();
+        HandleExpired();
     }
-    position_ = packet_->pos;
     Handle(*packet_);
     return true;
 }
 
-void Connection::HandleAll(const Packets& packets) {
-    for (const auto& packet : packets) {
-        position_ = packet->pos;
-        Handle(*packet);
+void Connection::HandleExpired() {
+    if (packet_->pts == AV_NOPTS_VALUE) {
+        return;
+    }
+    for (const auto& sound : runs_.Expire(packet_->pts, video_->time_base)) {
+        Handle(*sound);
     }
 }
 
@@ -281,7 +287,9 @@ void Connection::HandleKlv(const AVPacket& packet) {
 
 void Connection::Finish() {
     try {
-        HandleAll(runs_.Finish());
+        for (const auto& packet : runs_.Finish()) {
+            Handle(*packet);
+        }
     } catch (const FormatChanged&) {
         // Nothing follows in which the new format could go on.
     }
@@ -301,8 +309,8 @@ AudioSink Connection::ToAudio() {
 }
 
 std::uint64_t Connection::Damaged() const {
-    return damaged_ + runs_.Damaged() + paths_.video->Damaged() + (paths_.audio ? paths_.audio->Damaged() : 0) +
-           klvPackets_.Damaged();
+    return damaged_ + runs_.Damaged() + paths_.video->Damaged() +
+           (paths_.audio ? paths_.audio->Damaged() : 0) + klvPackets_.Damaged();
 }
 
 }  // namespace receiver

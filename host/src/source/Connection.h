@@ -66,7 +66,8 @@ class Connection {
     void CheckOther(const AVPacket& packet);
     bool NextPacket();
     void Handle(AVPacket& packet);
-    void HandleAll(const Packets& packets);
+    /// The sound that waits for a stamp which the pictures have passed.
+    void HandleExpired();
     void HandleVideo(AVPacket& packet);
     /// False when the picture, stamped so, cannot be the first one of the line. Else it stands at `begin_`.
     bool Start(const AVPacket& packet, std::optional<std::int64_t> stamp);

@@ -43,6 +43,9 @@ struct SourceUnit {
     std::optional<Timecode> timecode;
     /// Video of a live source: when the frame came, by its place in the stream.
     std::optional<Clock::time_point> arrived = {};
+    /// Audio: how long pictures are missing between the frame before and this one, in samples. As many whole
+    /// frames of audio are left out; how to make up for the rest depends on where a recording began.
+    std::int64_t passed = 0;
 };
 
 /// What a source is.

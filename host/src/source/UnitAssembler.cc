@@ -151,8 +151,7 @@ void UnitAssembler::PlaceAudio(const CodedAudio& audio) {
                 continue;
             case AudioGrid::Action::kAccept:
                 audioBegun_ = true;
-                batch_.emplace_back(
-                    SourceUnit{Medium::kAudio, place.time, audio.data, audio.size, false, std::nullopt});
+                EmitAudio(place.time, audio);
                 return;
             case AudioGrid::Action::kOverlap:
                 ++tally_.overlapping;
@@ -164,8 +163,14 @@ void UnitAssembler::PlaceAudio(const CodedAudio& audio) {
     }
 }
 
+void UnitAssembler::EmitAudio(std::int64_t time, const CodedAudio& audio) {
+    SourceUnit unit{Medium::kAudio, time, audio.data, audio.size, false, std::nullopt};
+    unit.passed = audioGrid_.TakePassed();
+    batch_.emplace_back(std::move(unit));
+}
+
 void UnitAssembler::EmitSilence(std::int64_t time) {
-    batch_.emplace_back(SourceUnit{Medium::kAudio, time, silence_.data, silence_.size, false, std::nullopt});
+    EmitAudio(time, silence_);
 }
 
 void UnitAssembler::CountSilence() {

@@ -60,6 +60,7 @@ class UnitAssembler {
     void Release(std::int64_t time);
     void PlaceAudio(const CodedAudio& audio);
     void EmitKlv(const Klv& klv);
+    void EmitAudio(std::int64_t time, const CodedAudio& audio);
     void EmitSilence(std::int64_t time);
     void CountSilence();
     void MakeSilence(std::int64_t time);

@@ -22,12 +22,13 @@ void AudioGrid::AddVideoGap(std::int64_t begin, std::int64_t length, bool rejoin
 
 std::int64_t AudioGrid::End() {
     while (!gaps_.empty() && gaps_.front().begin <= next_ + kFrame / 2) {
-        remainder_ += gaps_.front().length;
+        passed_ += gaps_.front().length;
+        surplus_ += gaps_.front().length;
         rejoining_ |= gaps_.front().rejoin;
         origin_ = gaps_.front().begin + gaps_.front().length;
         gaps_.pop_front();
-        const std::int64_t frames = Frames(remainder_);
-        remainder_ -= frames * kFrame;
+        const std::int64_t frames = surplus_ / kFrame;
+        surplus_ -= frames * kFrame;
         next_ += frames * kFrame;
         passedUntil_ = next_;
     }

@@ -3,6 +3,7 @@
 #include <cstdint>
 #include <deque>
 #include <optional>
+#include <utility>
 
 namespace receiver {
 
@@ -13,8 +14,9 @@ namespace receiver {
 /// - a gap in the audio alone is filled with frames of silence, and a frame that overlaps what is there is
 /// left
 ///   out;
-/// - where video frames are missing, the audio that belongs to them is left out too, and its time passes: the
-///   counts stay together, and so do sound and picture.
+/// - where video frames are missing, the audio that belongs to them is left out too, and its time passes, in
+///   whole frames. What is left of the gap, less than a frame, is for the recording to balance: whether it
+///   has to leave out a frame more depends on where it began.
 ///
 /// Samples at 48000 a second. Not for several threads.
 class AudioGrid {
@@ -59,6 +61,12 @@ class AudioGrid {
 
     /// Where the next frame would stand, the audio of missing video passed over.
     std::int64_t End();
+    /// The length of the gaps in the video between the frame that was entered last and the one before it.
+    /// Once.
+    std::int64_t TakePassed() {
+        surplus_ = 0;
+        return std::exchange(passed_, 0);
+    }
     /// Enters a frame of silence at `End` that no frame of the source asked for, and gives its time.
     std::int64_t Append();
 
@@ -78,8 +86,9 @@ class AudioGrid {
     /// Where the first picture behind the last gap stands, and the last frame that was entered.
     std::optional<std::int64_t> origin_;
     std::int64_t last_ = -2 * kFrame;
-    /// What gaps left over that is less than half a frame, or was taken too much.
-    std::int64_t remainder_ = 0;
+    /// Gaps since the last frame, and what of them is less than a frame.
+    std::int64_t passed_ = 0;
+    std::int64_t surplus_ = 0;
     std::int64_t next_ = 0;
     /// How far frames stand behind a line of whole frames from the first one on, since they joined. At most
     /// half a frame either way, however often they do, or the counts would drift apart.

@@ -5,6 +5,7 @@
 
 #include <csignal>
 #include <fstream>
+#include <iterator>
 
 #include "endtoend/ReceiverFixture.h"
 #include "support/Judges.h"
@@ -32,6 +33,18 @@ class StalledOutputTest : public ReceiverFixture {
         command.insert(command.end(), receiver.begin(), receiver.end());
         return std::make_unique<Process>(command, environment);
     }
+    /// The same with a pipe for messages alone; the results go to a file.
+    std::unique_ptr<Process> StartWithUnreadMessages(const std::vector<std::string>& options) const {
+        const std::string script = "(head -c 65536 /dev/zero >&2; \"$@\" > '" + ResultFile() +
+                                   "'; echo $? > '" + CodeFile() + "') 2>&1 >/dev/null | (until [ -s '" +
+                                   CodeFile() + "' ]; do sleep 0.05; done; tr -d '\\0'); exit $(cat '" +
+                                   CodeFile() + "')";
+        std::vector<std::string> command = {"bash", "-c", script, "receiver"};
+        const auto receiver = CommandOf(options);
+        command.insert(command.end(), receiver.begin(), receiver.end());
+        return std::make_unique<Process>(command, environment);
+    }
+    std::string ResultFile() const { return (folder.Path() / "results").string(); }
     std::string PidFile() const { return (folder.Path() / "pid").string(); }
     std::string CodeFile() const { return (folder.Path() / "code").string(); }
     void SignalReceiver(int number) const {
@@ -55,6 +68,14 @@ TEST_F(StalledOutputTest, LinesThatNobodyReadsCostNoFrame) {
     const auto receiver = StartBehindAFullPipe(Small({"--seconds", "3", "--log", "-"}));
     EXPECT_EQ(receiver->Wait(), 0) << receiver->AllText();
     EXPECT_EQ(PicturesOfTheOneFile(), 75U);
+}
+
+TEST_F(StalledOutputTest, MessagesThatNobodyReadsHoldNoResultsUp) {
+    const auto receiver = StartWithUnreadMessages(Small({"--seconds", "3"}));
+    EXPECT_EQ(receiver->Wait(), 0) << receiver->AllText();
+    std::ifstream file(ResultFile());
+    const std::string results{std::istreambuf_iterator<char>(file), {}};
+    EXPECT_THAT(results, ::testing::HasSubstr(".MP4"));
 }
 
 TEST_F(StalledOutputTest, SigtermIsHeard) {

@@ -4,9 +4,11 @@
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <sys/resource.h>
 
 #include <fstream>
 #include <functional>
+#include <thread>
 
 #include "journal/JournalFile.h"
 #include "support/TempDir.h"
@@ -115,8 +117,10 @@ TEST_F(BackgroundRecoveryTest, NoOnlyTells) {
                                         " was never closed: its receiver is gone; clipfile recover makes a "
                                         "whole file of it");
     EXPECT_FALSE(recovery.Agree());
+    recovery.End();
     EXPECT_THAT(Called(), SizeIs(0));
-    EXPECT_TRUE(fs::exists(journal_));
+    EXPECT_THAT(recovery.TakeSentences(), SizeIs(0));
+    EXPECT_THAT(clipfile::ReadJournal(journal_)->files, SizeIs(2));
 }
 
 TEST_F(BackgroundRecoveryTest, AskWaitsForAnAnswer) {
@@ -140,12 +144,66 @@ TEST_F(BackgroundRecoveryTest, TheEndStopsARecoveryAndTheNextReceiverBeginsItAga
     {
         BackgroundRecovery recovery(folder_.Path(), RecoverMode::kYes, Program("exec sleep 1000"));
         ASSERT_TRUE(WaitFor([&] { return Called().size() == 1; }));
-        recovery.Stop();
+        recovery.End();
         EXPECT_EQ(recovery.TakeSentences().back(),
                   File("a.MP4") + " is not recovered yet: the next receiver goes on with it");
     }
     EXPECT_THAT(clipfile::ReadJournal(journal_)->files, SizeIs(2));
     EXPECT_TRUE(WaitFor([&] { return clipfile::JournalFile::Claim(journal_).has_value(); }));
+}
+
+TEST_F(BackgroundRecoveryTest, TheEndTellsWhatIsNotRecoveredYet) {
+    BackgroundRecovery recovery(folder_.Path(), RecoverMode::kYes, Program("exec sleep 1000"));
+    ASSERT_TRUE(WaitFor([&] { return Called().size() == 1; }));
+    recovery.End();
+    EXPECT_THAT(Hear(recovery, 4),
+                ElementsAre(HasSubstr("was never closed"), HasSubstr("was never closed"),
+                            File("a.MP4") + " is not recovered yet: the next receiver goes on with it",
+                            File("b.MP4") + " is not recovered yet: the next receiver goes on with it"));
+}
+
+TEST_F(BackgroundRecoveryTest, AFileThatTwoJournalsNameIsRecoveredOnce) {
+    clipfile::Journal journal;
+    journal.files = {"a.MP4"};
+    fs::path second;
+    {
+        clipfile::JournalFile file(folder_.Path());
+        file.Write(journal);
+        second = file.Path();
+    }
+    test_stream::Record(programs_.Path() / "closed", {"normal", clipfileModule::RecordRules::kExact, true},
+                        test_stream::MakePlainStream(1));
+    BackgroundRecovery recovery(
+        folder_.Path(), RecoverMode::kYes,
+        Program("cp " + (programs_.Path() / "closed").string() + " \"$3\"; echo done"));
+    EXPECT_THAT(Hear(recovery, 4),
+                ElementsAre(HasSubstr("was never closed"), HasSubstr("was never closed"), "done", "done"));
+    EXPECT_TRUE(WaitFor([&] { return !fs::exists(journal_) && !fs::exists(second); }));
+    EXPECT_THAT(Called(), SizeIs(2));
+}
+
+TEST_F(BackgroundRecoveryTest, MoreJournalsThanFilesThatAProcessMayOpenAreAllSeenTo) {
+    rlimit before = {};
+    ASSERT_EQ(getrlimit(RLIMIT_NOFILE, &before), 0);
+    clipfile::Journal journal;
+    journal.files = {"a.MP4"};
+    for (int i = 0; i < 80; ++i) {
+        clipfile::JournalFile(folder_.Path()).Write(journal);
+    }
+    const rlimit few = {64, before.rlim_max};
+    ASSERT_EQ(setrlimit(RLIMIT_NOFILE, &few), 0);
+    {
+        BackgroundRecovery recovery(folder_.Path(), RecoverMode::kYes, Program("echo done"));
+        EXPECT_TRUE(WaitFor([&] { return clipfile::JournalsIn(folder_.Path()).empty(); }));
+    }
+    EXPECT_EQ(setrlimit(RLIMIT_NOFILE, &before), 0);
+}
+
+TEST_F(BackgroundRecoveryTest, WithoutAProgramNothingIsStartedAndThatIsTold) {
+    BackgroundRecovery recovery(folder_.Path(), RecoverMode::kYes, "");
+    EXPECT_EQ(Hear(recovery, 3)[2], "nothing is recovered: the program clipfile cannot be found");
+    recovery.End();
+    EXPECT_THAT(clipfile::ReadJournal(journal_)->files, SizeIs(2));
 }
 
 TEST_F(BackgroundRecoveryTest, AProgramThatIsMissingIsTold) {
@@ -158,9 +216,11 @@ TEST_F(BackgroundRecoveryTest, AProgramThatIsMissingIsTold) {
 TEST_F(BackgroundRecoveryTest, NothingIsSaidWithoutUnfinishedFiles) {
     fs::remove(journal_);
     BackgroundRecovery recovery(folder_.Path(), RecoverMode::kAsk, Program("echo done"));
-    std::this_thread::yield();
+    // The end comes behind its look at the folder.
+    recovery.End();
     EXPECT_FALSE(recovery.Agree());
     EXPECT_THAT(recovery.TakeSentences(), SizeIs(0));
+    EXPECT_THAT(Called(), SizeIs(0));
 }
 
 }  // namespace

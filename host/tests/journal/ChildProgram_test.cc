@@ -1,7 +1,9 @@
 #include "journal/ChildProgram.h"
 
+#include <fcntl.h>
 #include <gtest/gtest.h>
 #include <signal.h>
+#include <unistd.h>
 
 #include <chrono>
 #include <thread>
@@ -35,6 +37,16 @@ TEST(ChildProgram, TakesOverNeitherBlockedSignalsNorTheLog) {
         ChildProgram().Run({"/bin/sh", "-c", "grep SigBlk /proc/self/status; echo \"log=$QX_LOG\"; cat"});
     ASSERT_EQ(pthread_sigmask(SIG_SETMASK, &before, nullptr), 0);
     EXPECT_EQ(result.text, "SigBlk:\t0000000000000000\nlog=\n");
+}
+
+TEST(ChildProgram, TakesOverNoOpenFiles) {
+    // As a library opens them that knows of no children.
+    const int held = open("/dev/null", O_RDONLY);
+    ASSERT_GE(held, 3);
+    const ChildResult result = ChildProgram().Run(
+        {"/bin/sh", "-c", "[ -e /proc/$$/fd/" + std::to_string(held) + " ] && echo open || echo closed"});
+    close(held);
+    EXPECT_EQ(result.text, "closed\n");
 }
 
 TEST(ChildProgram, IsKilledWithItsRun) {

@@ -8,6 +8,7 @@
 
 #include "Logger.h"
 #include "QxModuleInterface.h"
+#include "QxModuleStatus.h"
 
 namespace {
 
@@ -34,7 +35,7 @@ class FakeModule final : public QxModuleInterface,
         Calls() = "Initialize(" + mode + "," + std::to_string(rate) + ")";
         pushed_ = false;
         if (Behaves("refuse")) {
-            host->SetStatus(7, 2);
+            host->SetStatus(QxStatus::kFailed, QxFailure::kInitialize);
             return false;
         }
         return true;
@@ -68,9 +69,9 @@ class FakeModule final : public QxModuleInterface,
         pushed_ = true;
         Called("PushVideo");
         if (Behaves("fail")) {
-            host_->SetStatus(7, 26);
+            host_->SetStatus(QxStatus::kFailed, QxFailure::kFileWrite);
         } else if (Behaves("fault")) {
-            host_->SetStatus(6, 22);
+            host_->SetStatus(QxStatus::kStreamFault, QxStreamFault::kFileTooSlow);
         } else if (Behaves("overflow")) {
             Logger::Put(LOG_PRIORITY_WARNING, nullptr, nullptr, 0, "queue overflow (video)");
         }
@@ -89,13 +90,13 @@ class FakeModule final : public QxModuleInterface,
     std::uint32_t NotifySetPropertiesRequest(const void*) override { return 0; }
     void NotifyOnlineStatus() override {
         Called("Online");
-        host_->SetStatus(4, 0);
+        host_->SetStatus(QxStatus::kBufferingStarted, QxStatus::kNoCause);
     }
     void NotifyOfflineStatus() override {
         Called("Offline");
-        if (host_->GetStatus() != 7) {
-            host_->SetStatus(6, 26);
-            host_->SetStatus(3, 0);
+        if (host_->GetStatus() != QxStatus::kFailed) {
+            host_->SetStatus(QxStatus::kStreamFault, QxStreamFault::kOffline);
+            host_->SetStatus(QxStatus::kBufferingStopped, QxStatus::kNoCause);
         }
     }
 

@@ -50,8 +50,16 @@ TEST_F(OutputPlaceTest, AShareIsWrittenWithSlashesOrBackslashes) {
     }
 }
 
+TEST_F(OutputPlaceTest, AServerMayBeAnIpv6AddressInBrackets) {
+    const OutputPlace place = Of("//[fd00::5]:4450/share/rec");
+    EXPECT_TRUE(place.onShare);
+    EXPECT_EQ(place.folder, "//[fd00::5]:4450/share/rec");
+    EXPECT_EQ(place.parameter, "\\\\[fd00::5]:4450\\share\\rec");
+}
+
 TEST_F(OutputPlaceTest, AShareWithoutANameIsRefused) {
-    for (const char* const written : {"//server", "\\\\server\\", "//", "//ser ver/share"}) {
+    for (const char* const written :
+         {"//server", "\\\\server\\", "//", "//ser ver/share", "//fd00::5/share"}) {
         try {
             Of(written);
             ADD_FAILURE() << written;

@@ -37,6 +37,18 @@ class LogTestSubject {
     }
 };
 
+/// A part of another class, by whose name the log knows it.
+class LogTestPart {
+ public:
+    void Log() { CLIPFILE_LOG(LOG_PRIORITY_TRACE, "part"); }
+    void InLambda() {
+        [] { CLIPFILE_LOG(LOG_PRIORITY_TRACE, "lambda of the part"); }();
+    }
+
+ private:
+    static constexpr char kLogClass[] = "LogTestSubjectAsAWhole";
+};
+
 TEST(FunctionName, LeavesOffResultTypeAndParameters) {
     EXPECT_EQ(nameOf("bool clipfileModule::Controller::Initialize(QxModuleHostInterface*)"),
               "clipfileModule::Controller::Initialize");
@@ -54,6 +66,15 @@ TEST(FunctionName, PassesOverPointersAndReferences) {
 
 TEST(FunctionName, ReadsConstructors) {
     EXPECT_EQ(nameOf("a::B::B(int)"), "a::B::B");
+}
+
+TEST(Log, NamesTheClassThatAPartOfItTells) {
+    const LogCapture log;
+    LogTestPart part;
+    part.Log();
+    part.InLambda();
+    EXPECT_EQ(log.Find("part")->function, "clipfileModule::LogTestSubjectAsAWhole::Log");
+    EXPECT_EQ(log.Find("lambda of the part")->function, "clipfileModule::LogTestSubjectAsAWhole::InLambda");
 }
 
 TEST(Log, NamesSourceFunctionAndLine) {

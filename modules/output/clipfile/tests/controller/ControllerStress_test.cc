@@ -23,8 +23,8 @@
 #include <vector>
 
 #include "LogSink.h"
+#include "QxModuleStatus.h"
 #include "controller/Controller.h"
-#include "controller/Status.h"
 #include "message_handler/QxMessageHandler.h"
 #include "support/ChunkFollower.h"
 #include "support/ControllerPeer.h"
@@ -104,7 +104,7 @@ class WatchedHost : public FakeHost {
             ++late_;
         }
         FakeHost::SetStatus(status, cause);
-        if (status == kStatusFailed) {
+        if (status == QxStatus::kFailed) {
             // The module drops from now on what is pushed, without a line.
             losses_.Lose();
             failed_ = true;

@@ -14,6 +14,7 @@
 #include "support/FailingThreads.h"
 #include "support/FakeHost.h"
 #include "support/FakeRegistry.h"
+#include "support/SettleEventLoop.h"
 #include "support/StreamUnits.h"
 #include "support/TempDir.h"
 #include "support/ThreadCount.h"
@@ -94,6 +95,8 @@ class RecordingWithoutThread : public ThreadFailureTest {};
 
 TEST_P(RecordingWithoutThread, FailsAndIsRemovedAndTheNextLifeRecords) {
     ASSERT_TRUE(controller_.Initialize(&host_));
+    // A post that comes before the event thread waits would lie there until the next.
+    ASSERT_TRUE(settleEventLoop(controller_, host_, log_));
     {
         const FailingThreads failing(GetParam());
         ASSERT_TRUE(PushUntil([&] { return host_.GetStatus() == 7; }));

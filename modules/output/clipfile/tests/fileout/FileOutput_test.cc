@@ -30,7 +30,7 @@ TEST_F(FileOutputTest, InitializeMakesAMuxer) {
     EXPECT_THAT(TextsOf("Initialize"), ElementsAre("start.", "end. func_result = 1."));
     EXPECT_TRUE(Logged(LOG_PRIORITY_DETAIL, "Initialize", "start."));
     EXPECT_TRUE(Logged(LOG_PRIORITY_DETAIL, "Initialize", "end. func_result = 1."));
-    EXPECT_EQ(log.Find("end. func_result = 1.")->file, kSource + "OutputTarget.cc");
+    EXPECT_EQ(log.Find("end. func_result = 1.")->file, kSource + "FileWriterTarget.cc");
     EXPECT_THAT(controller.Calls(), IsEmpty());
 }
 

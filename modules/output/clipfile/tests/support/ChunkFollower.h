@@ -7,7 +7,7 @@
 #include <optional>
 #include <vector>
 
-#include "buffer/ChunkData.h"
+#include "buffer/chunk/ChunkData.h"
 #include "support/StreamUnits.h"
 
 /// Follows the numbers of a recording's samples through its chunks: none may be missing, twice or out of

@@ -10,7 +10,7 @@
 #include <utility>
 #include <vector>
 
-#include "controller/ControllerInterface.h"
+#include "common/ControllerInterface.h"
 
 /// A controller that keeps what it is told: events, and statuses in their order with them.
 class ControllerRecorder : public clipfileModule::ControllerInterface {

@@ -13,8 +13,8 @@
 #include <string>
 #include <vector>
 
-#include "buffer/ChunkData.h"
-#include "controller/OutputSettings.h"
+#include "buffer/chunk/ChunkData.h"
+#include "common/OutputSettings.h"
 
 /// What muxers do and did while it lives. One at a time. Muxers share its state, so they may outlive it.
 ///

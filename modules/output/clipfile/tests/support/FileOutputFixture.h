@@ -14,9 +14,9 @@
 #include <vector>
 
 #include "LogCapture.h"
-#include "buffer/ChunkData.h"
-#include "buffer/state/StreamBufferInterface.h"
-#include "controller/Event.h"
+#include "buffer/chunk/ChunkData.h"
+#include "common/Event.h"
+#include "common/StreamBufferInterface.h"
 #include "fileout/FileOutput.h"
 #include "support/ControllerRecorder.h"
 #include "support/FakePlatform.h"

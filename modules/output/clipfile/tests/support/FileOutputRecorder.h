@@ -13,9 +13,9 @@
 #include <string>
 #include <vector>
 
-#include "buffer/ChunkData.h"
-#include "buffer/state/StreamBufferInterface.h"
-#include "controller/OutputSettings.h"
+#include "buffer/chunk/ChunkData.h"
+#include "common/OutputSettings.h"
+#include "common/StreamBufferInterface.h"
 
 /// Records what all file outputs are asked for while it lives. One at a time.
 class FileOutputRecorder {

@@ -6,7 +6,7 @@
 #include <utility>
 
 #include "StreamData.h"
-#include "buffer/StreamQueue.h"
+#include "buffer/queue/StreamQueue.h"
 #include "support/ControllerPeer.h"
 #include "support/WaitUntil.h"
 

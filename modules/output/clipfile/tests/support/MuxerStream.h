@@ -14,8 +14,8 @@
 #include <string>
 #include <vector>
 
-#include "buffer/ChunkData.h"
-#include "controller/OutputSettings.h"
+#include "buffer/chunk/ChunkData.h"
+#include "common/OutputSettings.h"
 #include "support/FakePlatform.h"
 #include "support/TempDir.h"
 

@@ -2,6 +2,8 @@
 
 #include <cstddef>
 
+#include "QxModuleStatus.h"
+
 namespace clipfileModule {
 
 // Contract: sixteen-for-eight. A late unit still finds its place.
@@ -15,10 +17,10 @@ enum PassResult : int {
     kRecordEnded = 1,
     /// There is no thread that could write it.
     kWriterMissing = 2,
-    kFileTooSlow = 22,
-    kVideoBufferFull = 23,
-    kAudioBufferFull = 24,
-    kMetaBufferFull = 25,
+    kFileTooSlow = QxStreamFault::kFileTooSlow,
+    kVideoBufferFull = QxStreamFault::kVideoBufferFull,
+    kAudioBufferFull = QxStreamFault::kAudioBufferFull,
+    kMetaBufferFull = QxStreamFault::kMetaBufferFull,
 };
 
 }  // namespace clipfileModule

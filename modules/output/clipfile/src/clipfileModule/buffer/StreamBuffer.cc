@@ -13,6 +13,7 @@
 #include "buffer/state/WaitStartCacheState.h"
 #include "common/JoinThread.h"
 #include "common/Log.h"
+#include "common/LogScope.h"
 
 namespace clipfileModule {
 
@@ -57,10 +58,9 @@ StreamBuffer::~StreamBuffer() {
 }
 
 void StreamBuffer::Start(const OutputSettings& recordSettings) {
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
     MutexLock control(controlMutex);
     if (stateId != kStopState) {
-        CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
         return;
     }
     if (stopPending) {
@@ -104,13 +104,10 @@ void StreamBuffer::Start(const OutputSettings& recordSettings) {
         queues = started;
         changeState(std::make_shared<WaitStartCacheState>(this, settings.recordRules));
     }
-    if (startThreads(started)) {
-        CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
-        return;
+    if (!startThreads(started)) {
+        control.Unlock();
+        endWithoutThread();
     }
-    control.Unlock();
-    endWithoutThread();
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
 bool StreamBuffer::startThreads(const std::vector<std::shared_ptr<StreamQueue>>& started) {
@@ -135,7 +132,7 @@ bool StreamBuffer::startThreads(const std::vector<std::shared_ptr<StreamQueue>>&
 }
 
 void StreamBuffer::Stop() {
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
     MutexLock control(controlMutex);
     std::vector<std::shared_ptr<StreamQueue>> stopped(kMediumCount);
     {
@@ -143,7 +140,6 @@ void StreamBuffer::Stop() {
         // that the worker waits for waits for this lock, so the push gets its room and the lock comes free.
         MutexLock lock(stateMutex);
         if (stateId == kStopState && !stopPending) {
-            CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
             return;
         }
         if (stateId != kStopState) {
@@ -166,7 +162,6 @@ void StreamBuffer::Stop() {
         }
     }
     finishStop();
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
 void StreamBuffer::finishStop() {
@@ -195,7 +190,7 @@ void StreamBuffer::finishStop() {
 }
 
 void StreamBuffer::Cancel() {
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
     if (chunkThread != nullptr) {
         if (chunkThread->joinable()) {
             CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start join...");
@@ -210,7 +205,6 @@ void StreamBuffer::Cancel() {
         }
         chunkThread.reset();
     }
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
 void StreamBuffer::PushReserved(const std::shared_ptr<StreamData>& /*unit*/) {}
@@ -293,7 +287,7 @@ void StreamBuffer::addToCache(const std::shared_ptr<StreamData>& unit, UnitList 
 
 void StreamBuffer::SetVideoSequenceHeader(const nal_access::NalUnit& sps, const nal_access::NalUnit& pps,
                                           const std::shared_ptr<StreamData>& unit) {
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
     const double frameMilliSec = static_cast<double>(streamInfo.audio_sample_duration) /
                                  static_cast<double>(streamInfo.audio_track_timescale) * 1000;
     // Contract: half-an-audio-frame-is-10-ms. Cut twice: 21.3 to 21, and 10.5 to 10.
@@ -314,21 +308,6 @@ void StreamBuffer::SetVideoSequenceHeader(const nal_access::NalUnit& sps, const 
     firstPicture = unit;
     if (isExact()) {
         startInStep();
-    }
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
-}
-
-void StreamBuffer::startWriter() {
-    try {
-        fileOutput->Start(settings);
-    } catch (const std::system_error& error) {
-        if (!isExact()) {
-            throw;
-        }
-        CLIPFILE_LOG(LOG_PRIORITY_ERROR, "recording cannot be started. %s.", error.what());
-        // The chunk thread ends the recording: no status may leave here, under the locks of states and list.
-        writerMissing = true;
-        bufferCondition.notify_one();
     }
 }
 
@@ -361,10 +340,10 @@ void StreamBuffer::setError(int code) {
         }
         changeState(std::make_shared<ErrorCacheState>(this));
     }
-    controller->SetStatus(6, code);
+    controller->SetStatus(QxStatus::kStreamFault, code);
     if (!chunkProduced) {
         // Contract: fault-before-first-chunk. Ends the module for good, whatever the cause was.
-        controller->SetStatus(7, 26);
+        controller->SetStatus(QxStatus::kFailed, QxFailure::kNoFirstChunk);
         return;
     }
     MutexLock lock(stateMutex);
@@ -372,18 +351,6 @@ void StreamBuffer::setError(int code) {
     if (stateId == kErrorState) {
         controller->PostEvent(std::make_shared<RestartStreamingEvent>(shared_from_this()));
     }
-}
-
-void StreamBuffer::endWithoutThread() {
-    {
-        MutexLock lock(stateMutex);
-        if (stateId != kWaitStartState && stateId != kStartState) {
-            return;
-        }
-        changeState(std::make_shared<ErrorCacheState>(this));
-    }
-    controller->SetStatus(7, 26);
-    NotifyEndSync();
 }
 
 bool StreamBuffer::MakeFileTimecode(const std::shared_ptr<ChunkData>& chunk) {

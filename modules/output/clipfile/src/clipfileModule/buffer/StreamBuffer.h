@@ -13,14 +13,14 @@
 #include "QxModuleStreamInterface.h"
 #include "StreamAnalyzer.h"
 #include "StreamData.h"
-#include "buffer/ChunkData.h"
 #include "buffer/ChunkPass.h"
-#include "buffer/StreamQueue.h"
+#include "buffer/chunk/ChunkData.h"
+#include "buffer/queue/StreamQueue.h"
 #include "buffer/state/CacheState.h"
-#include "buffer/state/StreamBufferInterface.h"
+#include "common/ControllerInterface.h"
 #include "common/Mutex.h"
-#include "controller/ControllerInterface.h"
-#include "controller/OutputSettings.h"
+#include "common/OutputSettings.h"
+#include "common/StreamBufferInterface.h"
 #include "fileout/FileOutput.h"
 #include "mp4/InputStreamInfo.h"
 
@@ -34,7 +34,7 @@ namespace clipfileModule {
 /// may be called from any thread, at any time in that life.
 ///
 /// Sources: StreamBuffer.cc has life and states, StreamBufferChunk.cc the chunk thread, StreamBufferExact.cc
-/// what is different there with exact rules.
+/// what is different with exact rules.
 ///
 /// Order of the locks: `controlMutex`, `stateMutex`, `bufferMutex`, and last, one at a time,
 /// `analyzerMutex`, the locks of the queues and of `FileOutput`.
@@ -124,8 +124,6 @@ class StreamBuffer final : public QxModuleStreamInterface,
     void finishStop() REQUIRES(controlMutex) EXCLUDES(bufferMutex);
     void Cancel() REQUIRES(controlMutex) EXCLUDES(bufferMutex);
     bool startThreads(const std::vector<std::shared_ptr<StreamQueue>>& started) REQUIRES(controlMutex);
-    void startWriter() REQUIRES(bufferMutex);
-    void endWithoutThread() EXCLUDES(controlMutex, stateMutex, bufferMutex);
     bool isExact() const { return settings.recordRules == RecordRules::kExact; }
     int framesIn(std::int64_t distance) const;
     static unsigned int getTimecodeFrameCount(std::uint32_t framerate);
@@ -148,6 +146,10 @@ class StreamBuffer final : public QxModuleStreamInterface,
     void splitMeta(ChunkData& chunk, std::size_t count, std::uint64_t end) REQUIRES(bufferMutex);
     void setDurations(SampleList& samples, std::uint64_t next, std::uint32_t clock, std::uint32_t timescale)
         REQUIRES(analyzerMutex);
+
+    // A recording without a thread, which only exact rules allow.
+    void startWriter() REQUIRES(bufferMutex);
+    void endWithoutThread() EXCLUDES(controlMutex, stateMutex, bufferMutex);
 
     // The chunk thread with exact rules.
     PassResult makeExactPass() REQUIRES(bufferMutex);

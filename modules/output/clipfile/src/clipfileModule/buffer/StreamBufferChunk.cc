@@ -9,6 +9,7 @@
 #include "buffer/StreamBuffer.h"
 #include "buffer/state/EndSyncRecState.h"
 #include "common/Log.h"
+#include "common/LogScope.h"
 
 namespace clipfileModule {
 
@@ -139,13 +140,12 @@ PassResult StreamBuffer::makePass() {
 void StreamBuffer::endSync() {
     const std::int64_t end = isExact() ? static_cast<std::int64_t>(findEnd()) : stopTimestamp.load();
     CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: END SYNC REC. RTPTS = %lld.", static_cast<long long>(end));
-    CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_DETAIL);
     MutexLock lock(stateMutex);
     // A stop that came first has ended the record already.
     if (stateId == kStartState) {
         changeState(std::make_shared<EndSyncRecState>(this));
     }
-    CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "end.");
 }
 
 // Contract: full-cache-names-itself. Not the medium that is missing; video is looked at first.

@@ -1,13 +1,43 @@
-// The chunk thread with exact rules: a record begins with all media in step and ends on its frame.
+// A recording with exact rules: it begins with all media in step, ends on its frame, and fails by itself
+// where the system has no thread for it.
 
 #include <algorithm>
+#include <system_error>
 
+#include "QxModuleStatus.h"
 #include "buffer/ChunkTimeline.h"
 #include "buffer/StartInStep.h"
 #include "buffer/StreamBuffer.h"
+#include "buffer/state/ErrorCacheState.h"
 #include "common/Log.h"
 
 namespace clipfileModule {
+
+void StreamBuffer::startWriter() {
+    try {
+        fileOutput->Start(settings);
+    } catch (const std::system_error& error) {
+        if (!isExact()) {
+            throw;
+        }
+        CLIPFILE_LOG(LOG_PRIORITY_ERROR, "recording cannot be started. %s.", error.what());
+        // The chunk thread ends the recording: no status may leave here, under the locks of states and list.
+        writerMissing = true;
+        bufferCondition.notify_one();
+    }
+}
+
+void StreamBuffer::endWithoutThread() {
+    {
+        MutexLock lock(stateMutex);
+        if (stateId != kWaitStartState && stateId != kStartState) {
+            return;
+        }
+        changeState(std::make_shared<ErrorCacheState>(this));
+    }
+    controller->SetStatus(QxStatus::kFailed, QxFailure::kNoFirstChunk);
+    NotifyEndSync();
+}
 
 PassResult StreamBuffer::makeExactPass() {
     if (writerMissing) {

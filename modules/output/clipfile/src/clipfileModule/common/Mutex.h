@@ -20,7 +20,6 @@
 #define EXCLUDES(...) CLIPFILE_THREAD_ATTRIBUTE(locks_excluded(__VA_ARGS__))
 #define ACQUIRE(...) CLIPFILE_THREAD_ATTRIBUTE(acquire_capability(__VA_ARGS__))
 #define RELEASE(...) CLIPFILE_THREAD_ATTRIBUTE(release_capability(__VA_ARGS__))
-#define ACQUIRED_BEFORE(...) CLIPFILE_THREAD_ATTRIBUTE(acquired_before(__VA_ARGS__))
 
 namespace clipfileModule {
 

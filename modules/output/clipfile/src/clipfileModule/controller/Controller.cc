@@ -4,10 +4,11 @@
 #include <system_error>
 #include <utility>
 
+#include "QxModuleStatus.h"
 #include "QxRegistry.h"
 #include "buffer/StreamBuffer.h"
 #include "common/Log.h"
-#include "controller/Status.h"
+#include "common/LogScope.h"
 
 namespace clipfileModule {
 
@@ -80,7 +81,7 @@ bool Controller::Initialize(QxModuleHostInterface* moduleHost) {
         CLIPFILE_LOG(LOG_PRIORITY_WARNING, "initialize is called twice.");
         return true;
     }
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
     recFlag = -1;
     strayUnitNoted = false;
     host = moduleHost;
@@ -93,8 +94,8 @@ bool Controller::Initialize(QxModuleHostInterface* moduleHost) {
     }
     // Contract: static-config-never-fails. A guard that nothing reaches.
     if (!getStaticConfig()) {
-        CLIPFILE_LOG(LOG_PRIORITY_ERROR, "end. static config error.");
-        SetStatus(kStatusFailed, kCauseInitialize);
+        scope.EndAs(LOG_PRIORITY_ERROR, "end. static config error.");
+        SetStatus(QxStatus::kFailed, QxFailure::kInitialize);
         endStatusChannel();
         return false;
     }
@@ -103,8 +104,8 @@ bool Controller::Initialize(QxModuleHostInterface* moduleHost) {
         analyzer = std::make_shared<nal_access::StreamAnalyzer>();
     }
     if (!getStartParameters()) {
-        CLIPFILE_LOG(LOG_PRIORITY_ERROR, "end. file output path is none.");
-        SetStatus(kStatusFailed, kCauseInitialize);
+        scope.EndAs(LOG_PRIORITY_ERROR, "end. file output path is none.");
+        SetStatus(QxStatus::kFailed, QxFailure::kInitialize);
         endStatusChannel();
         return false;
     }
@@ -147,12 +148,12 @@ bool Controller::Initialize(QxModuleHostInterface* moduleHost) {
             throw;
         }
         CLIPFILE_LOG(LOG_PRIORITY_ERROR, "end. threads cannot be started. %s.", error.what());
-        SetStatus(kStatusFailed, kCauseInitialize);
+        scope.Dismiss();
+        SetStatus(QxStatus::kFailed, QxFailure::kInitialize);
         endFailedStart();
         return false;
     }
     intake = channel.get();
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
     return true;
 }
 
@@ -270,7 +271,7 @@ void Controller::Uninitialize() {
         CLIPFILE_LOG(LOG_PRIORITY_WARNING, "uninitialize is called without initialize.");
         return;
     }
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
     terminated = true;
     if (eventThread->joinable()) {
         PostEvent(std::make_shared<TerminateEvent>());
@@ -280,7 +281,6 @@ void Controller::Uninitialize() {
     }
     eventThread.reset();
     endLife();
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
 /// What is left behind the event thread. Not all of the others need have been started.
@@ -320,10 +320,9 @@ void Controller::Execute() {
         CLIPFILE_LOG(LOG_PRIORITY_WARNING, "execute is called without initialize.");
         return;
     }
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
     PostEvent(std::make_shared<TransferStatusNotifyEvent>(
-        std::map<std::string, std::string>{{kFileOutputStatusKey, kFileOutputStatusStandby}}));
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
+        std::map<std::string, std::string>{{QxStatusMap::kFileOutput, QxStatusMap::kStandby}}));
 }
 
 void Controller::SetStatus(int status, int cause) {

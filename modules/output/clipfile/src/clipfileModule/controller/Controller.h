@@ -17,10 +17,10 @@
 #include "QxModuleHostInterface.h"
 #include "QxModuleStreamInterface.h"
 #include "StreamAnalyzer.h"
-#include "buffer/StreamQueue.h"
+#include "buffer/queue/StreamQueue.h"
+#include "common/ControllerInterface.h"
 #include "common/Mutex.h"
-#include "controller/ControllerInterface.h"
-#include "controller/OutputSettings.h"
+#include "common/OutputSettings.h"
 #include "controller/PreRoll.h"
 #include "controller/Recording.h"
 #include "controller/StatusChannel.h"
@@ -41,9 +41,9 @@ class Controller : public ControllerInterface, public QxModuleStreamInterface {
 
     /// Reads the settings store and the start parameters of `moduleHost`, which must live until
     /// `Uninitialize`, and starts the threads. False when no output path is known: the host then has status
-    /// 7, cause 2, and no thread runs. When a thread cannot be started it throws `std::system_error` with kept
-    /// rules, and is false with cause 2 with exact ones. A life that runs already goes on with the host that
-    /// it has, and the result is true.
+    /// 7, cause 2, and no thread runs. When a thread cannot be started it throws `std::system_error` with
+    /// kept rules, and is false with cause 2 with exact ones. A life that runs already goes on with the host
+    /// that it has, and the result is true.
     bool Initialize(QxModuleHostInterface* moduleHost);
     /// Ends the event thread, every recording and every queue thread, in this order, once the host has
     /// stopped pushing. Nothing outside a life.

@@ -3,22 +3,20 @@
 #include <utility>
 
 #include "common/Log.h"
+#include "common/LogScope.h"
 #include "controller/Controller.h"
-#include "controller/Status.h"
 
 namespace clipfileModule {
 
 void Controller::PostEvent(std::shared_ptr<Event> event) {
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start. event_id = %d.", event->id);
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE, " event_id = %d.", event->id);
     enqueueEvent(std::move(event), false);
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
 // Contract: send-event-unused. Two in a row run in reverse order.
 void Controller::SendEvent(std::shared_ptr<Event> event) {
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start. event_id = %d.", event->id);
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE, " event_id = %d.", event->id);
     enqueueEvent(std::move(event), true);
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
 void Controller::enqueueEvent(std::shared_ptr<Event> event, bool atHead) {
@@ -36,7 +34,7 @@ void Controller::enqueueEvent(std::shared_ptr<Event> event, bool atHead) {
 }
 
 std::shared_ptr<Event> Controller::getEvent() {
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
     std::shared_ptr<Event> event;
     {
         MutexLock lock(eventQueueMutex);
@@ -46,27 +44,25 @@ std::shared_ptr<Event> Controller::getEvent() {
         }
     }
     if (event == nullptr) {
-        CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end. no event.");
+        scope.EndAs(LOG_PRIORITY_TRACE, "end. no event.");
         return nullptr;
     }
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "event id = %d.", event->id);
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
     return event;
 }
 
 void Controller::dispatchEvent(const std::shared_ptr<Event>& event) {
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
     const auto handler = eventHandlers.find(event->id);
     if (handler != eventHandlers.end()) {
         handler->second(event);
     } else {
         CLIPFILE_LOG(LOG_PRIORITY_WARNING, "invalid event.");
     }
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
 void Controller::EventLoop() {
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
     bool firstWait = true;
     do {
         waitForEvent(firstWait);
@@ -84,7 +80,6 @@ void Controller::EventLoop() {
             dispatchEvent(event);
         }
     } while (!terminated);
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
 void Controller::waitForEvent(bool firstWait) {
@@ -98,7 +93,7 @@ void Controller::waitForEvent(bool firstWait) {
 }
 
 void Controller::OnTransferStatusNotify(const std::shared_ptr<Event>& event) {
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
     const std::map<std::string, std::string> status =
         std::static_pointer_cast<TransferStatusNotifyEvent>(event)->status;
     const int result = host->SendTransmissionStatus(status);
@@ -106,16 +101,14 @@ void Controller::OnTransferStatusNotify(const std::shared_ptr<Event>& event) {
     if (result != 0) {
         CLIPFILE_LOG(LOG_PRIORITY_ERROR, "SendTransmissionStatus() failed. result = %d.", result);
     }
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
 // Contract: terminate-event-undelivered. Runs only when the event lands in a drain.
 void Controller::OnTerminate(const std::shared_ptr<Event>&) {
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
     terminated = true;
     BufferingStop();
     eventCondition.notify_one();
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
 }  // namespace clipfileModule

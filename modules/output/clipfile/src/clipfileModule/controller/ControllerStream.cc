@@ -5,10 +5,11 @@
 #include <system_error>
 #include <utility>
 
+#include "QxModuleStatus.h"
 #include "buffer/StreamBuffer.h"
 #include "common/Log.h"
+#include "common/LogScope.h"
 #include "controller/Controller.h"
-#include "controller/Status.h"
 
 namespace clipfileModule {
 
@@ -50,7 +51,7 @@ bool Controller::pushUnit(Medium medium, const std::shared_ptr<StreamData>& unit
     }
     // Contract: silent-after-status-7. Dropped units are not logged. Both are asked: the host's status may be
     // older than the module's 7, and a host may hold a 7 of its own.
-    if (channel->IsFinal() || host->GetStatus() == kStatusFailed) {
+    if (channel->IsFinal() || host->GetStatus() == QxStatus::kFailed) {
         return true;
     }
     return queues[static_cast<std::size_t>(medium)]->Push(unit);
@@ -63,7 +64,7 @@ void Controller::noteStrayUnit() {
 }
 
 void Controller::queueing(const std::shared_ptr<StreamDataQueue>& queue, UnitConsumer consumer) {
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
     {
         MutexLock lock(queueStartMutex);
         queueThreadStarted = true;
@@ -76,7 +77,6 @@ void Controller::queueing(const std::shared_ptr<StreamDataQueue>& queue, UnitCon
             consumer(unit);
         }
     }
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
 void Controller::pushTo(StreamBuffer& buffer, Medium medium, const std::shared_ptr<StreamData>& unit) {
@@ -138,7 +138,7 @@ std::shared_ptr<nal_access::SampleData> Controller::readTimecode(const std::shar
 }
 
 void Controller::StartStream(const std::shared_ptr<StreamData>& unit) {
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
     const auto rtp = static_cast<std::int64_t>(unit->rtp_timestamp);
     std::shared_ptr<nal_access::SampleData> timecode;
     if (unit->payload != nullptr) {
@@ -177,11 +177,11 @@ void Controller::StartStream(const std::shared_ptr<StreamData>& unit) {
     }
     streamBuffers.push_back(recording);
     lock.Unlock();
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
+    scope.End();
 }
 
 void Controller::StopStream(const std::shared_ptr<StreamData>& unit, std::uint64_t order) {
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
     const auto rtp = static_cast<std::int64_t>(unit->rtp_timestamp);
     // Contract: stop-reads-any-unit. A start asks for a payload first.
     const std::shared_ptr<nal_access::SampleData> timecode = readTimecode(unit);
@@ -204,11 +204,10 @@ void Controller::StopStream(const std::shared_ptr<StreamData>& unit, std::uint64
             CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: REC STOP. RTPTS = %lld -> %lld.", start, stop);
         }
     }
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
 void Controller::RemoveStream(const std::shared_ptr<StreamBuffer>& buffer) {
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
     {
         MutexLock lock(streamBuffersMutex);
         streamBuffers.remove_if([&](const Recording& recording) { return recording.buffer == buffer; });
@@ -216,11 +215,10 @@ void Controller::RemoveStream(const std::shared_ptr<StreamBuffer>& buffer) {
     CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: REMOVE STREAM. RTPTS = %lld -> %lld.",
                        wide(buffer->GetStartTimestamp()), wide(buffer->GetStopTimestamp()));
     buffer->Stop();
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
 void Controller::BufferingStart() {
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
     if (isOutputMode(kOutputModeOn)) {
         // Contract: second-online-cancels. Recordings of an earlier online are closed at 0.
         StartStream(std::make_shared<StreamData>());
@@ -229,9 +227,10 @@ void Controller::BufferingStart() {
     if (terminated) {
         // Contract: terminated-start-has-no-end. A way out without the last line.
         CLIPFILE_LOG(LOG_PRIORITY_TRACE, "process is terminated.");
+        scope.Dismiss();
         return;
     }
-    SetStatus(kStatusBufferingStarted, kCauseNone);
+    SetStatus(QxStatus::kBufferingStarted, QxStatus::kNoCause);
     const StatusChannel::Hold hold(getStatusChannel());
     MutexLock lock(streamBuffersMutex);
     removeOverBuffers();
@@ -239,7 +238,7 @@ void Controller::BufferingStart() {
     if (const std::exception_ptr fault = startBuffers(); fault != nullptr) {
         std::rethrow_exception(fault);
     }
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
+    scope.End();
 }
 
 void Controller::removeOverBuffers() {
@@ -275,11 +274,11 @@ std::exception_ptr Controller::startBuffers() {
 }
 
 void Controller::BufferingStop() {
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "stream buffering stop.");
     std::exception_ptr fault;
     try {
-        SetStatus(kStatusBufferingStopped, kCauseNone);
+        SetStatus(QxStatus::kBufferingStopped, QxStatus::kNoCause);
     } catch (...) {
         // What a host throws keeps nothing recording.
         fault = std::current_exception();
@@ -300,7 +299,6 @@ void Controller::BufferingStop() {
     if (fault != nullptr) {
         std::rethrow_exception(fault);
     }
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
 /// Stops all that there are also when one of them cannot be joined, as by its own thread. Returns what it
@@ -337,7 +335,7 @@ void Controller::flushQueues() {
 }
 
 void Controller::OnChangeInStreamInfo(const std::shared_ptr<Event>& event) {
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
     const OutputSettings& input = std::static_pointer_cast<ChangeInStreamInfoEvent>(event)->settings;
     MutexLock lock(settingsMutex);
     // Contract: connect-changes-the-rate. The prefix is never taken over, the rest only with "direct".
@@ -352,25 +350,22 @@ void Controller::OnChangeInStreamInfo(const std::shared_ptr<Event>& event) {
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "bitrate   : %d.", static_cast<int>(settings.bitrate));
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "width     : %d.", static_cast<int>(settings.width));
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "height    : %d.", static_cast<int>(settings.height));
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
 // Contract: start-event-unused. Nothing posts one.
 void Controller::OnStartStream(const std::shared_ptr<Event>& event) {
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
     StartStream(std::static_pointer_cast<StartStreamingEvent>(event)->unit);
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
 void Controller::OnStopStream(const std::shared_ptr<Event>& event) {
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
     StopStream(std::static_pointer_cast<StopStreamingEvent>(event)->unit, event->order);
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
 // Contract: restart-misspelled. The log shows the name so.
 void Controller::OnRetartStream(const std::shared_ptr<Event>& event) {
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
     const auto restarting = std::static_pointer_cast<RestartStreamingEvent>(event);
     const std::shared_ptr<StreamBuffer>& buffer = restarting->buffer;
     CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: REC RESTART. RTPTS = %lld -> %lld.",
@@ -378,7 +373,6 @@ void Controller::OnRetartStream(const std::shared_ptr<Event>& event) {
     if (!restart(*restarting)) {
         RemoveStream(buffer);
     }
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
 /// False when the recording has to be removed instead, with nothing done.
@@ -412,9 +406,8 @@ bool Controller::restart(const RestartStreamingEvent& event) {
 }
 
 void Controller::OnRemoveStreaming(const std::shared_ptr<Event>& event) {
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
     RemoveStream(std::static_pointer_cast<RemoveStreamingEvent>(event)->buffer);
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end.");
 }
 
 }  // namespace clipfileModule

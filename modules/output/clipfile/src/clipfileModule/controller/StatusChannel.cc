@@ -4,8 +4,8 @@
 #include <exception>
 #include <utility>
 
+#include "QxModuleStatus.h"
 #include "common/Log.h"
-#include "controller/Status.h"
 
 namespace clipfileModule {
 
@@ -15,7 +15,7 @@ void StatusChannel::Set(int status, int cause) {
         if (closed_ || final_) {
             return;
         }
-        final_ = status == kStatusFailed;
+        final_ = status == QxStatus::kFailed;
         waiting_.push_back({status, cause});
         if (!becomeDeliverer()) {
             return;
@@ -62,7 +62,7 @@ void StatusChannel::deliver() {
     while (takeNext(next)) {
         try {
             // The host may take its time, and be let go of meanwhile.
-            if (host_->GetStatus() != kStatusFailed && !isClosed()) {
+            if (host_->GetStatus() != QxStatus::kFailed && !isClosed()) {
                 host_->SetStatus(next.status, next.cause);
             }
         } catch (...) {

@@ -5,10 +5,10 @@
 #include <memory>
 #include <mutex>
 
-#include "buffer/ChunkData.h"
-#include "buffer/state/StreamBufferInterface.h"
+#include "buffer/chunk/ChunkData.h"
+#include "common/ControllerInterface.h"
 #include "common/RecursiveTimedMutex.h"
-#include "controller/ControllerInterface.h"
+#include "common/StreamBufferInterface.h"
 
 namespace clipfileModule {
 

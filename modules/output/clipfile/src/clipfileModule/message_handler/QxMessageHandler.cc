@@ -3,8 +3,9 @@
 #include <boost/thread/lock_types.hpp>
 #include <memory>
 
+#include "QxModuleStatus.h"
 #include "common/Log.h"
-#include "controller/Status.h"
+#include "common/LogScope.h"
 
 namespace clipfileModule {
 
@@ -44,7 +45,7 @@ std::uint32_t QxMessageHandler::NotifyInputOutputConnectRequest(const QxInputOut
     if (!mayCall("NotifyInputOutputConnectRequest")) {
         return kResultNotHandled;
     }
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "notify input output connect request received.");
     settings.framerate = fileFramerate(request->framerate);
     settings.bitrate = request->bitrate;
@@ -60,18 +61,16 @@ std::uint32_t QxMessageHandler::NotifyInputOutputConnectRequest(const QxInputOut
         settings.filePrefix = prefix->second;
     }
     controller->PostEvent(std::make_shared<ChangeInStreamInfoEvent>(settings));
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end. result = %d.", static_cast<int>(kResultSuccess));
-    return kResultSuccess;
+    return scope.Return("result", kResultSuccess);
 }
 
 std::uint32_t QxMessageHandler::NotifyModuleConnectionRequestReply(const void*) {
     if (!mayCall("NotifyModuleConnectionRequestReply")) {
         return kResultNotHandled;
     }
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "notify module connection request reply.");
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end. result = %d.", static_cast<int>(kResultSuccess));
-    return kResultSuccess;
+    return scope.Return("result", kResultSuccess);
 }
 
 std::uint32_t QxMessageHandler::NotifyInputOutputDisconnectionRequest(
@@ -79,7 +78,7 @@ std::uint32_t QxMessageHandler::NotifyInputOutputDisconnectionRequest(
     if (!mayCall("NotifyInputOutputDisconnectionRequest")) {
         return kResultNotHandled;
     }
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "notify disconnect received.");
     // Contract: other-disconnects-give-3. Nothing else happens then.
     std::uint32_t result = kResultNotHandled;
@@ -90,17 +89,15 @@ std::uint32_t QxMessageHandler::NotifyInputOutputDisconnectionRequest(
         }
         result = kResultSuccess;
     }
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end. result = %d.", static_cast<int>(result));
-    return result;
+    return scope.Return("result", result);
 }
 
 std::uint32_t QxMessageHandler::NotifySetPropertiesRequest(const void*) {
     if (!mayCall("NotifySetPropertiesRequest")) {
         return kResultNotHandled;
     }
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "start.");
-    CLIPFILE_LOG(LOG_PRIORITY_TRACE, "end. result = %d.", static_cast<int>(kResultSuccess));
-    return kResultSuccess;
+    CLIPFILE_LOG_SCOPE(scope, LOG_PRIORITY_TRACE);
+    return scope.Return("result", kResultSuccess);
 }
 
 // Contract: online-outlives-a-life. `Initialize` and `Uninitialize` do not touch the flags.
@@ -139,7 +136,7 @@ void QxMessageHandler::NotifyOfflineStatus() {
     }
     if (changed && fileOutputStarted) {
         // Contract: offline-is-a-fault. Also when it was meant.
-        controller->SetStatus(kStatusStreamFault, kCauseOffline);
+        controller->SetStatus(QxStatus::kStreamFault, QxStreamFault::kOffline);
         stopFileOutput();
     }
 }

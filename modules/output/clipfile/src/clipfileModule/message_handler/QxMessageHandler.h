@@ -5,8 +5,8 @@
 #include <cstdint>
 
 #include "QxModuleNotifyInterface.h"
-#include "controller/ControllerInterface.h"
-#include "controller/OutputSettings.h"
+#include "common/ControllerInterface.h"
+#include "common/OutputSettings.h"
 
 namespace clipfileModule {
 

@@ -2,7 +2,7 @@
 
 #include <cstdint>
 
-#include "controller/OutputSettings.h"
+#include "common/OutputSettings.h"
 
 namespace clipfileModule {
 

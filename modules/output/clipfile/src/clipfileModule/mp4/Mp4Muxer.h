@@ -6,8 +6,8 @@
 #include <string>
 
 #include "boxlib/mbx_types.h"
-#include "buffer/ChunkData.h"
-#include "controller/OutputSettings.h"
+#include "buffer/chunk/ChunkData.h"
+#include "common/OutputSettings.h"
 #include "mp4/InputStreamInfo.h"
 
 namespace clipfileModule {

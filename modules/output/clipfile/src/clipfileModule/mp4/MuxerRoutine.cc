@@ -2,15 +2,15 @@
 
 namespace clipfileModule {
 
-MuxerRoutine::MuxerRoutine(const char* file, const char* function, int line)
-    : file_(file), function_(function), line_(line) {
-    Logger::Put(LOG_PRIORITY_DETAIL, file_, function_, line_, "start.");
-}
+namespace {
 
-MuxerRoutine::~MuxerRoutine() {
-    if (!ended_) {
-        Logger::Put(LOG_PRIORITY_DETAIL, file_, function_, line_, "end. ret = %d.", result_);
-    }
+// What the last line calls the result.
+constexpr const char* kResult = "ret";
+
+}  // namespace
+
+MuxerRoutine::MuxerRoutine(LogScope& scope) : scope_(scope) {
+    scope_.Return(kResult, 0);
 }
 
 bool MuxerRoutine::Failed(MbxStatus status, const char* file, int line) const {
@@ -18,24 +18,21 @@ bool MuxerRoutine::Failed(MbxStatus status, const char* file, int line) const {
         return false;
     }
     // Contract: error-line-is-ours. Changes with every edit of the source.
-    Logger::Put(LOG_PRIORITY_ERROR, file, function_, line, "error. error_line = %d, result = %d.", line,
+    Logger::Put(LOG_PRIORITY_ERROR, file, Function(), line, "error. error_line = %d, result = %d.", line,
                 static_cast<int>(status));
     return true;
 }
 
 MbxStatus MuxerRoutine::Return(MbxStatus result) {
-    result_ = static_cast<int>(result);
-    return result;
+    return scope_.Return(kResult, result);
 }
 
 bool MuxerRoutine::Return(bool result) {
-    result_ = result ? 1 : 0;
-    return result;
+    return scope_.Return(kResult, result);
 }
 
 bool MuxerRoutine::ReturnNotOpen() {
-    ended_ = true;
-    Logger::Put(LOG_PRIORITY_TRACE, file_, function_, line_, "end. file not open.");
+    scope_.EndAs(LOG_PRIORITY_TRACE, "end. file not open.");
     return false;
 }
 

@@ -1,7 +1,7 @@
 #pragma once
 
 #include "boxlib/mbx_types.h"
-#include "common/Log.h"
+#include "common/LogScope.h"
 
 namespace clipfileModule {
 
@@ -9,13 +9,12 @@ namespace clipfileModule {
 /// "end. ret = %d." on exit with what the routine returns.
 class MuxerRoutine {
  public:
-    MuxerRoutine(const char* file, const char* function, int line);
+    explicit MuxerRoutine(LogScope& scope);
     MuxerRoutine(const MuxerRoutine&) = delete;
     MuxerRoutine& operator=(const MuxerRoutine&) = delete;
-    ~MuxerRoutine();
 
     /// The name under which the routine logs, for lines of its parts.
-    const char* Function() const { return function_; }
+    const char* Function() const { return scope_.Function(); }
 
     /// True for a step that failed, which is logged as one of the routine, with the place where it stands.
     bool Failed(MbxStatus status, const char* file, int line) const;
@@ -26,19 +25,15 @@ class MuxerRoutine {
     bool ReturnNotOpen();
 
  private:
-    const char* const file_;
-    const char* const function_;
-    const int line_;
-    int result_ = 0;
-    bool ended_ = false;
+    LogScope& scope_;
 };
 
 }  // namespace clipfileModule
 
 /// Defines `routine` for the function around it.
-#define MUXER_ROUTINE(routine)                                                         \
-    static constexpr ::clipfileModule::FunctionName kRoutineName(__PRETTY_FUNCTION__); \
-    ::clipfileModule::MuxerRoutine routine(__FILE__, kRoutineName.text, __LINE__)
+#define MUXER_ROUTINE(routine)                             \
+    CLIPFILE_LOG_SCOPE(routineScope, LOG_PRIORITY_DETAIL); \
+    ::clipfileModule::MuxerRoutine routine(routineScope)
 
 /// Runs a step of a routine; true when it failed, which is logged.
 #define MUXER_FAILED(routine, step) ((routine).Failed((step), __FILE__, __LINE__))

@@ -5,7 +5,7 @@
 #include <string>
 #include <vector>
 
-#include "buffer/state/StreamBufferInterface.h"
+#include "common/StreamBufferInterface.h"
 
 /// A buffer that keeps what the states ask of it.
 class FakeStreamBuffer : public clipfileModule::StreamBufferInterface {

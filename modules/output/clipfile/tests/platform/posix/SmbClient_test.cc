@@ -1,6 +1,9 @@
 #include "platform/posix/SmbClient.h"
 
 #include <gtest/gtest.h>
+#include <netinet/in.h>
+#include <sys/socket.h>
+#include <unistd.h>
 
 #include <cerrno>
 #include <chrono>
@@ -77,6 +80,28 @@ TEST(SmbClientLogon, TakesNoGuestsRightsForAWrongPassword) {
     EXPECT_EQ(resultOfLogon(server, SambaServer::kUser, "wrong"), EACCES);
     EXPECT_EQ(resultOfLogon(server, SambaServer::kUser, SambaServer::kPassword), 0);
     EXPECT_EQ(resultOfLogon(server, "", ""), 0);
+}
+
+bool hasIpv6() {
+    const int descriptor = socket(AF_INET6, SOCK_STREAM | SOCK_CLOEXEC, 0);
+    sockaddr_in6 address = {};
+    address.sin6_family = AF_INET6;
+    address.sin6_addr = in6addr_loopback;
+    const bool bound = bind(descriptor, reinterpret_cast<const sockaddr*>(&address), sizeof address) == 0;
+    close(descriptor);
+    return bound;
+}
+
+TEST(SmbClientLogon, ReachesAServerByItsIpv6Address) {
+    if (!hasIpv6()) {
+        GTEST_SKIP() << "this machine has no IPv6";
+    }
+    const SambaServer server(SambaServer::Shares{{"rec", {}}}, {"interfaces = 127.0.0.1 ::1"});
+    for (const char* host : {"[::1]", "--1.ipv6-literal.net"}) {
+        SmbClient client(library(), parsed(server.Path("rec", host)),
+                         SmbCredentials::Of(SambaServer::kUser, SambaServer::kPassword), kPatience);
+        EXPECT_EQ(client.Connect(), 0) << host;
+    }
 }
 
 class SmbClientTest : public ::testing::Test {

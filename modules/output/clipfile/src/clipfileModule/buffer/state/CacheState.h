@@ -6,8 +6,8 @@
 #include <string>
 
 #include "StreamData.h"
-#include "buffer/StreamQueue.h"
-#include "buffer/state/StreamBufferInterface.h"
+#include "buffer/queue/StreamQueue.h"
+#include "common/StreamBufferInterface.h"
 
 namespace clipfileModule {
 

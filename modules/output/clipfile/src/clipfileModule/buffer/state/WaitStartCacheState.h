@@ -6,7 +6,7 @@
 #include <string_view>
 
 #include "buffer/state/CacheState.h"
-#include "controller/OutputSettings.h"
+#include "common/OutputSettings.h"
 
 namespace clipfileModule {
 

@@ -8,7 +8,7 @@
 #include <thread>
 
 #include "StreamData.h"
-#include "buffer/BlockingQueue.h"
+#include "buffer/queue/BlockingQueue.h"
 
 namespace clipfileModule {
 

@@ -7,7 +7,7 @@
 #include <utility>
 
 #include "StreamData.h"
-#include "controller/OutputSettings.h"
+#include "common/OutputSettings.h"
 
 namespace clipfileModule {
 

@@ -1,4 +1,4 @@
-#include "buffer/StreamQueue.h"
+#include "buffer/queue/StreamQueue.h"
 
 #include <utility>
 

@@ -2,7 +2,7 @@
 
 #include <memory>
 
-#include "controller/Event.h"
+#include "common/Event.h"
 
 namespace clipfileModule {
 

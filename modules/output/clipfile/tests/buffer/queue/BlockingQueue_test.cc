@@ -1,4 +1,4 @@
-#include "buffer/BlockingQueue.h"
+#include "buffer/queue/BlockingQueue.h"
 
 #include <gtest/gtest.h>
 

@@ -20,7 +20,7 @@ using ::testing::Key;
 using ::testing::Pair;
 using ::testing::UnorderedElementsAre;
 
-class OutputTargetTest : public FileOutputTest {
+class FileWriterTargetTest : public FileOutputTest {
  protected:
     /// Has one chunk written, and ends.
     void Record() {
@@ -55,7 +55,7 @@ class OutputTargetTest : public FileOutputTest {
     std::vector<std::string> logons;
 };
 
-TEST_F(OutputTargetTest, PutsFilesIntoTheDirectoryOfTheDayAndThePrefix) {
+TEST_F(FileWriterTargetTest, PutsFilesIntoTheDirectoryOfTheDayAndThePrefix) {
     platform.SetLocalTime({2027, 1, 5, 0, 0, 0});
     settings.filePrefix = "Studio 1";
     Record();
@@ -65,13 +65,13 @@ TEST_F(OutputTargetTest, PutsFilesIntoTheDirectoryOfTheDayAndThePrefix) {
                        "output path = \"" + dir.ModulePath() + "\\20270105\\Studio 1\"."));
 }
 
-TEST_F(OutputTargetTest, PadsYearMonthAndDay) {
+TEST_F(FileWriterTargetTest, PadsYearMonthAndDay) {
     platform.SetLocalTime({987, 6, 5, 0, 0, 0});
     Record();
     EXPECT_THAT(Disk(), Contains(Key("09870605/Cam/1.txt")));
 }
 
-TEST_F(OutputTargetTest, TheRestOfTheSettingsReachesTheMuxer) {
+TEST_F(FileWriterTargetTest, TheRestOfTheSettingsReachesTheMuxer) {
     settings.framerate = 29970;
     settings.width = 1920;
     settings.userName = "user";
@@ -83,20 +83,20 @@ TEST_F(OutputTargetTest, TheRestOfTheSettingsReachesTheMuxer) {
     EXPECT_EQ(opened.filePrefix, "Cam");
 }
 
-TEST_F(OutputTargetTest, APathThatEndsInABackslashGetsNoSecondOne) {
+TEST_F(FileWriterTargetTest, APathThatEndsInABackslashGetsNoSecondOne) {
     settings.outputPath += "\\";
     Record();
     EXPECT_EQ(muxers.Files().at(0).settings.outputPath, dir.ModulePath() + "\\20261120\\Cam");
 }
 
-TEST_F(OutputTargetTest, APathThatEndsInASlashGetsABackslash) {
+TEST_F(FileWriterTargetTest, APathThatEndsInASlashGetsABackslash) {
     settings.outputPath = dir.Path().string() + "/";
     Record();
     EXPECT_EQ(muxers.Files().at(0).settings.outputPath, dir.Path().string() + "/\\20261120\\Cam");
     EXPECT_THAT(Disk(), Contains(Key(kToday + "1.txt")));
 }
 
-TEST_F(OutputTargetTest, AnEmptyPrefixGivesAPathThatEndsInABackslash) {
+TEST_F(FileWriterTargetTest, AnEmptyPrefixGivesAPathThatEndsInABackslash) {
     settings.filePrefix = "";
     Record();
     EXPECT_EQ(muxers.Files().at(0).settings.outputPath, dir.ModulePath() + "\\20261120\\");
@@ -104,20 +104,20 @@ TEST_F(OutputTargetTest, AnEmptyPrefixGivesAPathThatEndsInABackslash) {
     EXPECT_THAT(Errors(), IsEmpty());
 }
 
-TEST_F(OutputTargetTest, PathsAreUtf8) {
+TEST_F(FileWriterTargetTest, PathsAreUtf8) {
     settings.filePrefix = "\xE6\x98\xA0\xE5\x83\x8F";
     Record();
     EXPECT_THAT(Disk(), Contains(Key("20261120/\xE6\x98\xA0\xE5\x83\x8F/1.txt")));
 }
 
-TEST_F(OutputTargetTest, ADirectoryThatExistsIsNoFault) {
+TEST_F(FileWriterTargetTest, ADirectoryThatExistsIsNoFault) {
     fs::create_directories(dir.Path() / "20261120" / "Cam");
     Record();
     EXPECT_THAT(Disk(), Contains(Pair(kToday + "1.txt", "open, chunk 4, tmcd 01:02:03:04, closed")));
     EXPECT_THAT(Statuses(), IsEmpty());
 }
 
-TEST_F(OutputTargetTest, ANewDateGivesTheNextFileANewDirectoryWhileAnOpenFileStaysInTheOld) {
+TEST_F(FileWriterTargetTest, ANewDateGivesTheNextFileANewDirectoryWhileAnOpenFileStaysInTheOld) {
     settings.maxFileSize = 0;
     platform.SetLocalTime({2026, 11, 20, 23, 59, 59});
     Start();
@@ -134,7 +134,7 @@ TEST_F(OutputTargetTest, ANewDateGivesTheNextFileANewDirectoryWhileAnOpenFileSta
                             Pair("20261121/Cam/2.txt", "open, chunk 2, tmcd 01:02:03:02, closed")));
 }
 
-TEST_F(OutputTargetTest, NewFileTellsItsSteps) {
+TEST_F(FileWriterTargetTest, NewFileTellsItsSteps) {
     Record();
     EXPECT_THAT(TextsOf("newFile"),
                 ElementsAre("start.", "output path = \"" + dir.ModulePath() + "\\20261120\\Cam\".",
@@ -146,7 +146,7 @@ TEST_F(OutputTargetTest, NewFileTellsItsSteps) {
     EXPECT_TRUE(Logged(LOG_PRIORITY_DETAIL, "deleteMp4FileObject", "start."));
 }
 
-TEST_F(OutputTargetTest, AFileBeginsWithTheTimecodeOfTheChunkThatOpensIt) {
+TEST_F(FileWriterTargetTest, AFileBeginsWithTheTimecodeOfTheChunkThatOpensIt) {
     buffer.SetResults(true, true, true);
     Record();
     EXPECT_EQ(muxers.Files().at(0).timecode, "01:02:03:04 DF");
@@ -155,7 +155,7 @@ TEST_F(OutputTargetTest, AFileBeginsWithTheTimecodeOfTheChunkThatOpensIt) {
     EXPECT_FALSE(log.Contains("no tc."));
 }
 
-TEST_F(OutputTargetTest, AFileWithoutATimecodeIsOpenedWithNone) {
+TEST_F(FileWriterTargetTest, AFileWithoutATimecodeIsOpenedWithNone) {
     buffer.SetResults(false, true, true);
     Record();
     EXPECT_EQ(muxers.Files().at(0).timecode, "none");
@@ -163,14 +163,14 @@ TEST_F(OutputTargetTest, AFileWithoutATimecodeIsOpenedWithNone) {
     EXPECT_TRUE(Logged(LOG_PRIORITY_TRACE, "newFile", "no tc."));
 }
 
-TEST_F(OutputTargetTest, ATimecodeThatCannotBeReadIsNone) {
+TEST_F(FileWriterTargetTest, ATimecodeThatCannotBeReadIsNone) {
     buffer.SetResults(true, false, false);
     Record();
     EXPECT_EQ(muxers.Files().at(0).timecode, "none");
     EXPECT_FALSE(log.Contains("no tc."));
 }
 
-TEST_F(OutputTargetTest, ARotationClosesTheOldFileWithItsOwnTimecode) {
+TEST_F(FileWriterTargetTest, ARotationClosesTheOldFileWithItsOwnTimecode) {
     settings.maxFileSize = 0;
     Start();
     Push(3, true);
@@ -186,7 +186,7 @@ TEST_F(OutputTargetTest, ARotationClosesTheOldFileWithItsOwnTimecode) {
                             "3 Close", "3 Uninitialize", "3 gone"));
 }
 
-TEST_F(OutputTargetTest, AnUnknownTypeWarnsForEachMuxerAndRecordsNormalFiles) {
+TEST_F(FileWriterTargetTest, AnUnknownTypeWarnsForEachMuxerAndRecordsNormalFiles) {
     settings.fileType = "mov";
     settings.maxFileSize = 0;
     Start();
@@ -202,7 +202,7 @@ TEST_F(OutputTargetTest, AnUnknownTypeWarnsForEachMuxerAndRecordsNormalFiles) {
     EXPECT_THAT(Statuses(), IsEmpty());
 }
 
-TEST_F(OutputTargetTest, AMuxerThatDoesNotUninitializeIsReleasedAllTheSame) {
+TEST_F(FileWriterTargetTest, AMuxerThatDoesNotUninitializeIsReleasedAllTheSame) {
     muxers.SetHooks([](FakeMuxers::Hooks& hooks) { hooks.uninitialize = [] { return false; }; });
     Record();
     EXPECT_EQ(log.Count(LOG_PRIORITY_WARNING, "clipfileModule::FileOutput::deleteMp4FileObject",
@@ -212,7 +212,7 @@ TEST_F(OutputTargetTest, AMuxerThatDoesNotUninitializeIsReleasedAllTheSame) {
     EXPECT_THAT(Statuses(), IsEmpty());
 }
 
-TEST_F(OutputTargetTest, ALocalPathNeedsNoLogon) {
+TEST_F(FileWriterTargetTest, ALocalPathNeedsNoLogon) {
     SetLogon(0, 0);
     settings.userName = "user";
     Record();
@@ -220,7 +220,7 @@ TEST_F(OutputTargetTest, ALocalPathNeedsNoLogon) {
     EXPECT_THAT(logons, IsEmpty());
 }
 
-TEST_F(OutputTargetTest, AMappedDriveCountsAsLocal) {
+TEST_F(FileWriterTargetTest, AMappedDriveCountsAsLocal) {
     SetLogon(0, 0);
     settings.userName = "user";
     for (const char* path : {"Z:\\rec", "\\", "", "//server/share", "\\rec\\\\a"}) {
@@ -233,7 +233,7 @@ TEST_F(OutputTargetTest, AMappedDriveCountsAsLocal) {
     EXPECT_THAT(logons, IsEmpty());
 }
 
-TEST_F(OutputTargetTest, AShareWithoutAUserNameNeedsNoLogon) {
+TEST_F(FileWriterTargetTest, AShareWithoutAUserNameNeedsNoLogon) {
     SetLogon(0, 0);
     settings.outputPath = "\\" + dir.ModulePath();
     settings.password = "secret";
@@ -243,7 +243,7 @@ TEST_F(OutputTargetTest, AShareWithoutAUserNameNeedsNoLogon) {
     EXPECT_THAT(Disk(), Contains(Key(kToday + "1.txt")));
 }
 
-TEST_F(OutputTargetTest, AShareIsUsedUnderItsCredentialsFromTheFirstFileToTheEnd) {
+TEST_F(FileWriterTargetTest, AShareIsUsedUnderItsCredentialsFromTheFirstFileToTheEnd) {
     SetLogon(0, 0);
     settings.outputPath = "\\" + dir.ModulePath();
     settings.userName = "user";
@@ -257,7 +257,7 @@ TEST_F(OutputTargetTest, AShareIsUsedUnderItsCredentialsFromTheFirstFileToTheEnd
     EXPECT_THAT(Statuses(), IsEmpty());
 }
 
-TEST_F(OutputTargetTest, AWrongPasswordIsReportedAndTheDiskCallSpeaksForItself) {
+TEST_F(FileWriterTargetTest, AWrongPasswordIsReportedAndTheDiskCallSpeaksForItself) {
     SetLogon(0x52e, 0);
     settings.outputPath = "\\\\server\\share";
     settings.userName = "user";
@@ -271,7 +271,7 @@ TEST_F(OutputTargetTest, AWrongPasswordIsReportedAndTheDiskCallSpeaksForItself) 
     EXPECT_THAT(controller.Calls(), ElementsAre("post 6", "status 7 21", "status 7 22", "post 6"));
 }
 
-TEST_F(OutputTargetTest, ALogonThatCannotBeUsedIsReportedAndStillClosed) {
+TEST_F(FileWriterTargetTest, ALogonThatCannotBeUsedIsReportedAndStillClosed) {
     SetLogon(0, 5);
     settings.outputPath = "\\" + dir.ModulePath();
     settings.userName = "user";
@@ -284,7 +284,7 @@ TEST_F(OutputTargetTest, ALogonThatCannotBeUsedIsReportedAndStillClosed) {
     EXPECT_THAT(Disk(), Contains(Key(kToday + "1.txt")));
 }
 
-TEST_F(OutputTargetTest, WhereSharesCannotBeReachedARemotePathFailsWithOrWithoutAUserName) {
+TEST_F(FileWriterTargetTest, WhereSharesCannotBeReachedARemotePathFailsWithOrWithoutAUserName) {
     SetLogon(0, 0);
     platform.Set([](FakePlatform::Hooks& hooks) {
         hooks.shareSupport = [](std::string& reason) {
@@ -307,7 +307,7 @@ TEST_F(OutputTargetTest, WhereSharesCannotBeReachedARemotePathFailsWithOrWithout
     EXPECT_THAT(logons, IsEmpty());
 }
 
-using OutputTargetDeathTest = OutputTargetTest;
+using OutputTargetDeathTest = FileWriterTargetTest;
 
 TEST_F(OutputTargetDeathTest, APathWhoseStateCannotBeReadEndsTheProcess) {
     GTEST_FLAG_SET(death_test_style, "threadsafe");
@@ -315,7 +315,7 @@ TEST_F(OutputTargetDeathTest, APathWhoseStateCannotBeReadEndsTheProcess) {
     EXPECT_DEATH(Record(), "filesystem_error");
 }
 
-TEST_F(OutputTargetTest, APathWhoseStateCannotBeReadIsCause24WithExactRules) {
+TEST_F(FileWriterTargetTest, APathWhoseStateCannotBeReadIsCause24WithExactRules) {
     settings.recordRules = RecordRules::kExact;
     fs::create_symlink("20261120", dir.Path() / "20261120");
     Record();
