@@ -23,10 +23,7 @@ class HlsSource : public SourceTest, public testing::WithParamInterface<bool> {
             "anoisesrc=sample_rate=48000:seed=7:duration=5" +
             string(kPlainH264) + "-g 25" + kPlainAac + "a.ts");
         if (GetParam()) {
-            server_ = std::make_unique<endtoend::Process>(
-                std::vector<string>{"/usr/bin/python3", "-m", "http.server", std::to_string(ports_.First()),
-                                    "--bind", "127.0.0.1", "--directory", Path("")});
-            ASSERT_TRUE(endtoend::WaitUntilListening(ports_.First())) << server_->AllText();
+            server_ = endtoend::ServeFolder(Path(""), ports_.First());
         }
     }
     SourceOptions Options(const string& playlist) const {
@@ -34,11 +31,7 @@ class HlsSource : public SourceTest, public testing::WithParamInterface<bool> {
                                : playlist);
     }
     /// ffmpeg, writing a playlist of the last four segments of a second each while it plays `a.ts`.
-    void Play() {
-        player_ = std::make_unique<endtoend::Process>(
-            std::vector<string>{"ffmpeg", "-v", "error", "-nostdin", "-re", "-i", Path("a.ts"), "-c", "copy",
-                                "-f", "hls", "-hls_time", "1", "-hls_list_size", "4", Path("live.m3u8")});
-    }
+    void Play() { player_ = endtoend::WriteHls(Path("a.ts"), Path("")); }
     void WaitForPlaylist() const {
         const auto deadline = std::chrono::steady_clock::now() + endtoend::kPatience;
         while (!std::filesystem::exists(Path("live.m3u8")) && std::chrono::steady_clock::now() < deadline) {

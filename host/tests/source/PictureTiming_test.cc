@@ -1,80 +1,14 @@
 #include "source/PictureTiming.h"
 
 #include "SourceTesting.h"
+#include "support/PictureTimingMessage.h"
 
 namespace receiver {
 namespace {
 
+using endtoend::BitWriter;
+using endtoend::PictureTimingMessage;
 using std::string;
-
-/// Writes syntax elements (ITU-T H.264 7.2).
-class BitWriter {
- public:
-    /// u(n)
-    BitWriter& Number(std::uint64_t value, int width) {
-        for (int at = width - 1; at >= 0; --at) {
-            bits_ += (value >> at & 1U) != 0 ? '1' : '0';
-        }
-        return *this;
-    }
-    BitWriter& Flag(bool value) { return Number(value ? 1 : 0, 1); }
-    /// ue(v), 9.1
-    BitWriter& Exponential(std::uint32_t value) {
-        int width = 1;
-        while ((std::uint64_t{value} + 1) >> width != 0) {
-            ++width;
-        }
-        return Number(0, width - 1).Number(std::uint64_t{value} + 1, width);
-    }
-    /// Filled up with a bit 1 and zeros.
-    string Bytes() const {
-        string bits = bits_ + '1';
-        bits.resize((bits.size() + 7) / 8 * 8, '0');
-        string bytes;
-        for (std::size_t at = 0; at < bits.size(); at += 8) {
-            bytes += static_cast<char>(std::stoi(bits.substr(at, 8), nullptr, 2));
-        }
-        return bytes;
-    }
-
- private:
-    string bits_;
-};
-
-/// A NAL unit with its start code and emulation prevention (7.4.1).
-string Unit(char header, const string& payload) {
-    string unit = string("\0\0\1", 3) + header;
-    int zeros = 0;
-    for (const char byte : payload) {
-        if (zeros >= 2 && static_cast<unsigned char>(byte) <= 3) {
-            unit += '\x03';
-            zeros = 0;
-        }
-        zeros = byte == 0 ? zeros + 1 : 0;
-        unit += byte;
-    }
-    return unit;
-}
-
-/// A picture timing message (D.1.3) with one clock timestamp, behind `delays` bits of buffering delays.
-string Message(const Timecode& timecode, unsigned int countingType, bool dropped = false, int delays = 0) {
-    const string payload = BitWriter()
-                               .Number(0, delays)
-                               .Number(0, 4)  // pic_struct: a frame
-                               .Flag(true)    // clock_timestamp_flag
-                               .Number(0, 3)  // ct_type, nuit_field_based_flag
-                               .Number(countingType, 5)
-                               .Flag(true)   // full_timestamp_flag
-                               .Flag(false)  // discontinuity_flag
-                               .Flag(dropped)
-                               .Number(timecode.frames, 8)
-                               .Number(timecode.seconds, 6)
-                               .Number(timecode.minutes, 6)
-                               .Number(timecode.hours, 5)
-                               .Number(0, 24)  // time_offset, which is so long where nothing else is told
-                               .Bytes();
-    return Unit('\x06', string("\x01", 1) + static_cast<char>(payload.size()) + payload + "\x80");
-}
 
 /// A sequence parameter set with everything that may stand in front of the decoder models' parameters, and
 /// these: delays of 16 and 10 bits.
@@ -108,7 +42,7 @@ string FullParameterSet() {
     set.Number(23, 5).Number(15, 5).Number(9, 5).Number(24, 5);
     set.Flag(false).Flag(false);  // vcl_hrd_parameters, low_delay_hrd_flag
     set.Flag(true).Flag(false);   // pic_struct_present_flag, bitstream_restriction_flag
-    return Unit('\x67', set.Bytes());
+    return endtoend::NalUnit('\x67', set.Bytes());
 }
 
 bool DropFrameIn(const string& stream) {
@@ -122,23 +56,23 @@ constexpr Timecode kTime{10, 20, 30, 4, false};
 constexpr int kDelays = 16 + 10;
 
 TEST(PictureTiming, TheDropFrameRuleIsReadBehindAllThatMayStandInFrontOfIt) {
-    EXPECT_TRUE(DropFrameIn(FullParameterSet() + Message(kTime, 4, false, kDelays)));
-    EXPECT_FALSE(DropFrameIn(FullParameterSet() + Message(kTime, 1, false, kDelays)));
-    EXPECT_FALSE(DropFrameIn(FullParameterSet() + Message(kTime, 0, true, kDelays)));
+    EXPECT_TRUE(DropFrameIn(FullParameterSet() + PictureTimingMessage(kTime, 4, false, kDelays)));
+    EXPECT_FALSE(DropFrameIn(FullParameterSet() + PictureTimingMessage(kTime, 1, false, kDelays)));
+    EXPECT_FALSE(DropFrameIn(FullParameterSet() + PictureTimingMessage(kTime, 0, true, kDelays)));
 }
 
 TEST(PictureTiming, ADroppedNumberIsEnoughWithACountingTypeThatDrops) {
-    EXPECT_TRUE(DropFrameIn(FullParameterSet() + Message(kTime, 6, true, kDelays)));
-    EXPECT_FALSE(DropFrameIn(FullParameterSet() + Message(kTime, 6, false, kDelays)));
+    EXPECT_TRUE(DropFrameIn(FullParameterSet() + PictureTimingMessage(kTime, 6, true, kDelays)));
+    EXPECT_FALSE(DropFrameIn(FullParameterSet() + PictureTimingMessage(kTime, 6, false, kDelays)));
 }
 
 TEST(PictureTiming, MessagesWithoutAParameterSetAreNotUnderstood) {
-    EXPECT_FALSE(DropFrameIn(Message(kTime, 4)));
+    EXPECT_FALSE(DropFrameIn(PictureTimingMessage(kTime, 4)));
 }
 
 TEST(PictureTiming, WhatIsCutShortIsNotUnderstood) {
     const string set = FullParameterSet();
-    const string message = Message(kTime, 4, false, kDelays);
+    const string message = PictureTimingMessage(kTime, 4, false, kDelays);
     for (std::size_t size = 0; size < set.size() - 4; ++size) {
         DropFrameIn(set.substr(0, size) + message);
     }
@@ -160,7 +94,8 @@ class PictureTimingOfFiles : public SourceTest {
         for (const Timecode& timecode : timecodes) {
             const std::size_t idr = plain.find(string("\0\0\1\x65", 4), from);
             ASSERT_NE(idr, string::npos);
-            timed += plain.substr(from, idr - from) + Message(timecode, countingType) + plain.substr(idr, 4);
+            timed += plain.substr(from, idr - from) + PictureTimingMessage(timecode, countingType) +
+                     plain.substr(idr, 4);
             from = idr + 4;
         }
         timed += plain.substr(from);

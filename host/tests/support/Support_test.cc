@@ -1,6 +1,7 @@
 // The tests' own tools, before anything rests on them.
 
 #include <gmock/gmock.h>
+#include <gtest/gtest-spi.h>
 #include <gtest/gtest.h>
 
 #include <arpa/inet.h>
@@ -16,6 +17,7 @@
 #include "support/Judges.h"
 #include "support/LossyRelay.h"
 #include "support/Material.h"
+#include "support/NumberedMedia.h"
 #include "support/Process.h"
 #include "support/Senders.h"
 
@@ -168,6 +170,52 @@ TEST_F(FrameJudgeTest, CountsWhatIsMissing) {
 TEST_F(FrameJudgeTest, MeasuresHowFarTheSoundIsOutOfStep) {
     const FrameJudge::Verdict verdict = JudgeCopy({"-bsf:a", "setts=ts=TS+9000"});
     EXPECT_NEAR(verdict.outOfStep, 0.1, 0.001);
+}
+
+/// Two seconds, as they were sent.
+struct NumberedTest : ::testing::Test {
+    static void SetUpTestSuite() {
+        const TemporaryFolder folder;
+        part.start = 2;
+        part.number = 1000;
+        WriteNumbered(part, folder.Path() / "a.ts");
+        sent = ReadNumbered(folder.Path() / "a.ts");
+    }
+    static NumberedPart part;
+    static NumberedRecording sent;
+    static NumberedRecording changed;
+};
+NumberedPart NumberedTest::part;
+NumberedRecording NumberedTest::sent;
+NumberedRecording NumberedTest::changed;
+
+TEST_F(NumberedTest, FindsWhatWasSentInStep) {
+    ASSERT_THAT(sent.numbers, ::testing::SizeIs(50));
+    EXPECT_EQ(sent.numbers.back(), 1049U);
+    EXPECT_EQ(sent.CountOf(part), 50U);
+    ASSERT_THAT(sent.bursts, ::testing::SizeIs(2));
+    EXPECT_EQ(sent.bursts[0].second, 2);
+    EXPECT_EQ(sent.bursts[1].second, 3);
+    ExpectInStep(sent, part);
+}
+
+TEST_F(NumberedTest, TellsOfSoundThatIsOutOfStep) {
+    changed = sent;
+    changed.bursts[1].time += 0.022;
+    EXPECT_NONFATAL_FAILURE(ExpectInStep(changed, part), "of second 3");
+}
+
+TEST_F(NumberedTest, TellsOfSoundThatIsMissing) {
+    changed = sent;
+    changed.bursts.pop_back();
+    EXPECT_NONFATAL_FAILURE(ExpectInStep(changed, part), "second 3 is not heard");
+}
+
+TEST_F(NumberedTest, TellsOfAPictureThatIsMissing) {
+    changed = sent;
+    changed.numbers.erase(changed.numbers.begin() + 20);
+    changed.times.pop_back();
+    EXPECT_FATAL_FAILURE(ExpectInStep(changed, part), "first + at");
 }
 
 /// A UDP socket of this machine.
