@@ -144,7 +144,6 @@ TEST_F(BackgroundRecoveryTest, TheEndStopsARecoveryAndTheNextReceiverBeginsItAga
     {
         BackgroundRecovery recovery(folder_.Path(), RecoverMode::kYes, Program("exec sleep 1000"));
         ASSERT_TRUE(WaitFor([&] { return Called().size() == 1; }));
-        recovery.End();
     }
     EXPECT_THAT(clipfile::ReadJournal(journal_)->files, SizeIs(2));
     EXPECT_TRUE(WaitFor([&] { return clipfile::JournalFile::Claim(journal_).has_value(); }));
