@@ -163,8 +163,8 @@ void TellDefects(const std::string& path, const RecoveryResult& result, const Op
     }
 }
 
-ExitCode RecoverOne(const std::string& path, const Options& options, std::ostream& out,
-                    std::ostream& errors) {
+ExitCode TryToRecover(const std::string& path, const Options& options, std::ostream& out,
+                      std::ostream& errors) {
     if (options.unattended) {
         CheckRoom(path);
     }
@@ -194,6 +194,17 @@ ExitCode RecoverOne(const std::string& path, const Options& options, std::ostrea
     }
     TellDefects(path, result, options, out);
     return ExitCode::kSuccess;
+}
+
+/// Where nobody looks at the sentences, the exit code tells whether another attempt may succeed.
+ExitCode RecoverOne(const std::string& path, const Options& options, std::ostream& out,
+                    std::ostream& errors) {
+    try {
+        return TryToRecover(path, options, out, errors);
+    } catch (const ToolError& error) {
+        const bool isHopeless = options.unattended && HoldsNothing(path);
+        throw ToolError(isHopeless ? ExitCode::kDefects : error.Code(), error.what());
+    }
 }
 
 /// Takes away and tells the files that stand recovered already.

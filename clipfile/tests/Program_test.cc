@@ -1,6 +1,8 @@
 #include "Program.h"
 
+#include <fcntl.h>
 #include <gtest/gtest.h>
+#include <sys/file.h>
 #include <sys/resource.h>
 #include <sys/wait.h>
 #include <unistd.h>
@@ -271,6 +273,24 @@ TEST_F(ProgramTest, UnattendedRecoveryLeavesAFileWithDefectsBesideItsOriginal) {
     EXPECT_EQ(runApart({"recover", "--unattended", path("01_02_03_04.MP4")}), ExitCode::kSuccess);
     EXPECT_EQ(said(), path("01_02_03_04.MP4") + " is passed over: " + path("01_02_03_04.recovered.MP4") +
                           " is there already.\n");
+}
+
+TEST_F(ProgramTest, UnattendedRecoveryTellsWhatIsHopelessFromWhatMaySucceedAnotherTime) {
+    std::ofstream(path("empty.MP4")).close();
+    recordNormal("a.MP4", false);
+    test_stream::Data head = test_stream::ReadAll(path("a.MP4"));
+    head.resize(100);
+    test_stream::WriteAll(path("head.MP4"), head);
+    for (const char* const name : {"empty.MP4", "head.MP4"}) {
+        EXPECT_EQ(runApart({"recover", "--unattended", path(name)}), ExitCode::kDefects) << name;
+        EXPECT_EQ(run({"recover", path(name)}), ExitCode::kUnreadable) << name;
+        EXPECT_EQ(said(), errors_.str());
+    }
+    const int recorder = open(path("a.MP4").c_str(), O_RDONLY);
+    ASSERT_EQ(flock(recorder, LOCK_EX | LOCK_NB), 0);
+    EXPECT_EQ(runApart({"recover", "--unattended", path("a.MP4")}), ExitCode::kUnreadable);
+    EXPECT_EQ(said(), "clipfile: " + path("a.MP4") + " is still being recorded.\n");
+    close(recorder);
 }
 
 TEST_F(ProgramTest, UnattendedRecoveryGivesWay) {

@@ -1,7 +1,10 @@
 #include "recover/UnfinishedFiles.h"
 
 #include <exception>
+#include <optional>
+#include <system_error>
 
+#include "common/ToolError.h"
 #include "reader/Recording.h"
 
 namespace clipfile {
@@ -17,6 +20,25 @@ bool IsClosed(const std::filesystem::path& path) {
 }
 
 }  // namespace
+
+bool HoldsNothing(const std::filesystem::path& path) {
+    std::error_code error;
+    if (std::filesystem::is_empty(path, error)) {
+        return true;
+    }
+    std::optional<InputFile> file;
+    try {
+        file.emplace(path);
+    } catch (const ToolError&) {
+        return false;
+    }
+    try {
+        ReadRecording(*file);
+    } catch (const ToolError&) {
+        return true;
+    }
+    return false;
+}
 
 FolderListing UnfinishedIn(const std::filesystem::path& folder) {
     FolderListing listing = FilesIn(folder);

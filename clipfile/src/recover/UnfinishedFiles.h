@@ -10,4 +10,8 @@ namespace clipfile {
 /// no recording, which recovery tells the reason of.
 FolderListing UnfinishedIn(const std::filesystem::path& folder);
 
+/// Whether a file can be read and is no recording, since it is empty or was cut in front of its first sample:
+/// nothing will ever be recovered from it.
+bool HoldsNothing(const std::filesystem::path& path);
+
 }  // namespace clipfile

@@ -24,5 +24,20 @@ TEST(UnfinishedFiles, AreThoseThatAreNotKnownToBeClosed) {
                                         (day / "other.MP4").string(), (folder.Path() / "a.MP4").string()}));
 }
 
+TEST(UnfinishedFiles, HoldNothingWhenTheyEndInFrontOfTheirSamples) {
+    const TempDir folder;
+    const std::filesystem::path path = folder.Path() / "a.MP4";
+    test_stream::Record(path, {"normal", clipfileModule::RecordRules::kExact, false},
+                        test_stream::MakePlainStream(1));
+    EXPECT_FALSE(HoldsNothing(path));
+    const test_stream::Data whole = test_stream::ReadAll(path);
+    for (const std::size_t size : {0U, 8U, 100U}) {
+        test_stream::WriteAll(path, {whole.begin(), whole.begin() + static_cast<std::ptrdiff_t>(size)});
+        EXPECT_TRUE(HoldsNothing(path)) << size;
+    }
+    std::filesystem::remove(path);
+    EXPECT_FALSE(HoldsNothing(path)) << "nobody knows";
+}
+
 }  // namespace
 }  // namespace clipfile
