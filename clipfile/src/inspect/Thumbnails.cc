@@ -13,15 +13,18 @@ namespace clipfile {
 namespace {
 
 constexpr int kColumns = 6;
-constexpr int kRows = 4;
+constexpr std::uint64_t kPictures = 24;
 constexpr int kCellWidth = 240;
+/// The highest and the flattest picture.
+constexpr std::uint64_t kMaxCellHeight = 960;
+constexpr std::uint64_t kMinCellHeight = 30;
 /// Above this a picture is none of a recording.
 constexpr std::uint32_t kMaxPicture = 64'000'000;
 
 ContactSheet::Cell CellOf(const Track& track) {
     const std::uint64_t height =
         track.width == 0 ? 0 : std::uint64_t{kCellWidth} * track.height / track.width / 2 * 2;
-    return {kCellWidth, static_cast<int>(std::clamp<std::uint64_t>(height, kCellWidth / 8, 4 * kCellWidth))};
+    return {kCellWidth, static_cast<int>(std::clamp(height, kMinCellHeight, kMaxCellHeight))};
 }
 
 /// The IDR pictures that stand first in each of so many equal parts of the track.
@@ -30,7 +33,7 @@ std::vector<Sample> ChooseSamples(const InputFile& file, const Inspection& inspe
     const auto place = static_cast<std::size_t>(&video - inspection.tracks.data());
     std::vector<Sample> chosen;
     RecordingSamples samples(file, inspection.recording, place);
-    const std::uint64_t parts = std::min<std::uint64_t>(kColumns * kRows, video.syncSamples);
+    const std::uint64_t parts = std::min(kPictures, video.syncSamples);
     for (std::uint64_t i = 0; i < video.samples && chosen.size() < parts; ++i) {
         const auto sample = samples.Next();
         if (!sample) {
