@@ -225,7 +225,7 @@ TEST_F(ReplacementTest, WhereOnlyFilesOpenForWritingAreLockedAloneItIsOpenedSo) 
 TEST_F(ReplacementTest, WhatAKilledRecoveryHasLeftIsRemovedAndWhatIsInWorkStays) {
     recordUnfinished();
     const auto work = [&](const std::string& letters) {
-        return path("." + recovered().filename().string() + "." + letters);
+        return path("." + recovered().filename().string() + ".clipfile-" + letters);
     };
     for (const char* const letters : {"a1B2c3", "inWork", "1x"}) {
         WriteAll(work(letters), {1});
