@@ -45,11 +45,10 @@ void ExpectFree(const std::filesystem::path& path, std::uint64_t size) {
 }  // namespace
 
 void GiveWay() {
-    // A receiver may run as a real-time process, which its children do too. Those have no level.
+    // A receiver may run as a real-time process, which its children do too. Those have no level. Idle ones
+    // would get nothing on a machine that is always busy.
     const sched_param none = {};
-    if (sched_setscheduler(0, SCHED_IDLE, &none) != 0) {
-        sched_setscheduler(0, SCHED_OTHER, &none);
-    }
+    sched_setscheduler(0, SCHED_OTHER, &none);
     setpriority(PRIO_PROCESS, 0, kLowestPriority);
     syscall(SYS_ioprio_set, kWhoProcess, 0, kIdleClass << kClassShift);
     std::ofstream("/proc/self/oom_score_adj") << kFirstToGo;
