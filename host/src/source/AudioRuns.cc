@@ -16,7 +16,6 @@ constexpr std::int64_t kLongestHold = 36000;
 /// How far pictures may be ahead of the sound that waits: further than senders' buffers make of it, less than
 /// what waits for both media is waited for.
 constexpr std::int64_t kLongestPause = 90000;
-constexpr AVRational kTicks{1, 90000};
 
 bool IsMarked(const AVPacket& packet) {
     return (packet.flags & AV_PKT_FLAG_CORRUPT) != 0;

@@ -8,7 +8,6 @@
 namespace receiver {
 namespace {
 
-constexpr AVRational kTicks{1, 90000};
 /// Packets that may wait for the first IDR frame.
 constexpr std::size_t kLongestWait = 4000;
 /// Pictures without an IDR frame among them after which the operator is told.

@@ -14,6 +14,13 @@ extern "C" {
 #include <memory>
 #include <string>
 
+namespace receiver {
+
+/// The time base of video in a transport stream, and of all times in the receiver but those of audio.
+inline constexpr AVRational kTicks{1, 90000};
+
+}  // namespace receiver
+
 namespace receiver::libav {
 
 /// Ends the life of FFmpeg's objects, each in its own way.

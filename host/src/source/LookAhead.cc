@@ -14,7 +14,6 @@ namespace {
 
 using Clock = std::chrono::steady_clock;
 
-constexpr AVRational kTicks{1, 90000};
 /// Pictures that are looked at before a source is taken.
 constexpr std::size_t kPictures = 25;
 /// Packets that this may take.

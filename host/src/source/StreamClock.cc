@@ -11,7 +11,6 @@ namespace {
 
 using Clock = std::chrono::steady_clock;
 
-constexpr AVRational kTicks{1, 90000};
 /// How far behind the expected time reordered pictures may stand.
 constexpr std::int64_t kBackReordered = 90000;
 /// And what comes in the order of time, whose stamps merely jitter: this, or three units.

@@ -8,7 +8,6 @@
 namespace receiver {
 namespace {
 
-constexpr AVRational kTicks{1, 90000};
 constexpr std::int64_t kFrame = 1920;
 
 /// An AAC frame of 20 bytes (ISO/IEC 14496-3 1.A.2.2: profile LC, 48 kHz, stereo, aac_frame_length 20).
