@@ -17,9 +17,6 @@ namespace {
 /// A run takes a second or two. What takes longer hangs, also with a sanitizer on a busy machine.
 constexpr std::chrono::seconds kDeadline{60};
 
-constexpr double kPicture = 1.0 / 25;
-constexpr double kSound = 1024.0 / 48000;
-
 /// The number of packets that ffprobe finds.
 std::string packetsOf(const nlohmann::json& answer, const std::string& type) {
     return StreamOf(answer, type).value("nb_read_packets", "");

@@ -12,8 +12,6 @@
 namespace endtoend {
 namespace {
 
-constexpr double kPicture = 1.0 / 25;
-constexpr double kSound = 1024.0 / 48000;
 /// Pictures that fill half a second.
 constexpr std::size_t kLongestGap = 12;
 

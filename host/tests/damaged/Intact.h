@@ -9,6 +9,10 @@
 
 namespace endtoend {
 
+/// Seconds that a picture and an audio frame of the material last.
+inline constexpr double kPicture = 1.0 / 25;
+inline constexpr double kSound = 1024.0 / 48000;
+
 /// What of the material comes through a damage whole, in numbers of pictures and audio frames that were sent.
 struct Intact {
     std::set<std::size_t> pictures;
