@@ -150,9 +150,9 @@ TEST_F(QueuedSourceTest, ALiveProducerGoesOnAsSoonAsThereIsRoom) {
 
 TEST_F(QueuedSourceTest, SentencesMakeRoomAsUnitsDo) {
     script_->notices = 200;
+    script_->last = 3;
     const auto source = Open(Pacer::ForFile(kFast));
     script_->allowed = 3;
-    script_->last = 3;
     ExpectUnits(*source, 0, 3);
     SourceUnit unit;
     EXPECT_EQ(ReadNext(*source, unit), SourceInterface::Result::kEnd);
