@@ -92,15 +92,15 @@ bool hasIpv6() {
     return bound;
 }
 
-TEST(SmbClientLogon, ReachesAServerByItsIpv6Address) {
-    if (!hasIpv6()) {
-        GTEST_SKIP() << "this machine has no IPv6";
-    }
-    const SambaServer server(SambaServer::Shares{{"rec", {}}}, {"interfaces = 127.0.0.1 ::1"});
+TEST(SmbClientLogon, ReachesAServerByItsIpv6AddressWhereThereIsIpv6) {
+    const bool reachable = hasIpv6();
+    const std::string interfaces = std::string("interfaces = 127.0.0.1") + (reachable ? " ::1" : "");
+    const SambaServer server(SambaServer::Shares{{"rec", {}}}, {interfaces});
     for (const char* host : {"[::1]", "--1.ipv6-literal.net"}) {
         SmbClient client(library(), parsed(server.Path("rec", host)),
                          SmbCredentials::Of(SambaServer::kUser, SambaServer::kPassword), kPatience);
-        EXPECT_EQ(client.Connect(), 0) << host;
+        // Elsewhere it is a server that cannot be reached, and never another one.
+        EXPECT_EQ(client.Connect() == 0, reachable) << host;
     }
 }
 
