@@ -38,8 +38,7 @@ constexpr std::chrono::milliseconds kDisplayInterval{250};
 /// The run ends with the frame behind the last one; when the stream has dried up, nobody waits for it.
 constexpr std::chrono::seconds kFinishPatience{2};
 
-constexpr const char* kOneRecording =
-    "in mode on the whole run is one recording; --mode sync takes record commands";
+constexpr const char* kOneRecording = "in mode on everything is recorded; --mode sync takes record commands";
 
 std::string WithFullStop(std::string sentence) {
     return sentence.ends_with('.') ? sentence : sentence + ".";
@@ -68,6 +67,12 @@ class Running final : public SourceListenerInterface {
 
  private:
     void PrepareOutput(const OutputPlace& place);
+    /// Records the source, in one session of the module after the other. Gives how far the run has come.
+    Recorder::Progress RecordAll(SourceInterface& source, QxModuleInterface& module,
+                                 const OutputPlace& place);
+    /// Records in a session of the module what the session before has left, and the source up to where it
+    /// needs another session. False when the run has failed.
+    bool RecordSession(SourceInterface& source, QxModuleInterface& module, Recorder::Settings& settings);
     void Loop(SourceInterface& source, Recorder& recorder);
     void CheckFolder();
     void TakeCommands(Recorder& recorder);
@@ -93,6 +98,8 @@ class Running final : public SourceListenerInterface {
     std::optional<FolderWatch> watch_;
     std::optional<CrashRecovery> recovery_;
     ModuleLog* log_ = nullptr;
+    /// Each lives as long as the module, which may still hold one that a hanging disk has kept.
+    std::vector<std::unique_ptr<Host>> hosts_;
     Host* host_ = nullptr;
     RecordPlan plan_{options_.record};
     CommandQueue commands_;
@@ -104,8 +111,12 @@ class Running final : public SourceListenerInterface {
     std::uint64_t lateStops_ = 0;
     /// Recordings of which there is nothing.
     bool missed_ = false;
-    /// The source has become another one.
+    /// The source has become another one, which is for the next session.
     bool changed_ = false;
+    /// A gap has ended a session, and what came behind it is for the next one.
+    bool gap_ = false;
+    std::vector<SourceUnit> rest_;
+    std::optional<ReceiverError> failure_;
     std::optional<Clock::time_point> finishSince_;
     Clock::time_point shown_{};
 };
@@ -157,65 +168,88 @@ ExitCode Running::Record(const SourceOpener& open) {
         return ExitCode::kSuccess;
     }
     display_.Notice("source: " + source->Description().summary);
-    Recorder::Settings recorderSettings = RecorderSettingsOf(options_, source->Description().frameRate);
-
-    // Each lives as long as the module, which may still hold one that a hanging disk has kept.
-    std::vector<std::unique_ptr<Host>> hosts;
-    std::optional<ReceiverError> failure;
-    // One session for each of what the source is: the module learns rate and size when it starts.
-    do {
-        changed_ = false;
-        recorderSettings.frameRate = source->Description().frameRate;
-        hosts.push_back(std::make_unique<Host>(ParametersOf(options_, place, source->Description())));
-        host_ = hosts.back().get();
-        recovery_->Describe(source->Description());
-        ModuleSession session(library.Module(), *host_);
-        if (options_.mode == OutputMode::kSync) {
-            session.GoOnline();
-        }
-        Recorder recorder(recorderSettings, session, log, plan_, commands_);
-        // A run that is shorter than a file has one only.
-        if (const std::int64_t minutes = FileMinutes();
-            !options_.seconds || *options_.seconds > static_cast<double>(minutes * 60)) {
-            groups_.emplace(recorderSettings.frameRate, minutes, options_.source.pictureGroup);
-        }
-        try {
-            Loop(*source, recorder);
-        } catch (const ReceiverError& error) {
-            failure = error;
-        }
-        if (!host_->Failed()) {
-            recorder.Close();
-        }
-        recorder.NoteEnd();
-        TellChanges(recorder);
-        TellLateStops(recorder);
-        report_.Tell(host_->TakeStatuses(), false);
-        session.End();
-        report_.Tell(log.TakeEvents());
-        report_.Tell(host_->TakeStatuses(), true);
-        recovery_->Follow(report_);
-        recorderSettings.past = recorder.Past();
-        plan_.Interrupt();
-    } while (changed_ && !host_->Failed());
-
+    const Recorder::Progress progress = RecordAll(*source, library.Module(), place);
     commands_.Close("the run is over");
     plan_.Finish();
     TellMissed();
     recovery_->End(report_);
-    Summary summary = Summarise(*source, *recorderSettings.past);
-    if (failure) {
-        summary.exitCode = failure->Code();
+    Summary summary = Summarise(*source, progress);
+    if (failure_) {
+        summary.exitCode = failure_->Code();
     }
     display_.Finish(summary);
-    if (failure) {
-        display_.Failure(failure->Code(), WithFullStop(failure->what()));
+    if (failure_) {
+        display_.Failure(failure_->Code(), WithFullStop(failure_->what()));
     }
     return summary.exitCode;
 }
 
+Recorder::Progress Running::RecordAll(SourceInterface& source, QxModuleInterface& module,
+                                      const OutputPlace& place) {
+    SourceDescription description;
+    Recorder::Settings settings = RecorderSettingsOf(options_, source.Description().frameRate);
+    const std::int64_t minutes = FileMinutes();
+    bool gap = false;
+    bool changed = true;
+    while (changed || gap) {
+        if (changed) {
+            changed_ = false;
+            description = source.Description();
+            settings.frameRate = description.frameRate;
+            recovery_->Describe(description);
+            // A run that is shorter than a file has one only.
+            if (!options_.seconds || *options_.seconds > static_cast<double>(minutes * 60)) {
+                groups_.emplace(settings.frameRate, minutes, options_.source.pictureGroup);
+            }
+        }
+        // The module learns rate and size when it starts.
+        hosts_.push_back(std::make_unique<Host>(ParametersOf(options_, place, description)));
+        host_ = hosts_.back().get();
+        const bool over = !RecordSession(source, module, settings);
+        // What came behind a gap is of the source as it was.
+        gap = !over && gap_;
+        changed = !over && changed_ && !gap_;
+    }
+    return *settings.past;
+}
+
+bool Running::RecordSession(SourceInterface& source, QxModuleInterface& module,
+                            Recorder::Settings& settings) {
+    ModuleSession session(module, *host_);
+    if (options_.mode == OutputMode::kSync) {
+        session.GoOnline();
+    }
+    Recorder recorder(settings, session, *log_, plan_, commands_);
+    for (SourceUnit& unit : std::exchange(rest_, {})) {
+        recorder.Put(std::move(unit));
+    }
+    try {
+        if (!changed_) {
+            Loop(source, recorder);
+        }
+    } catch (const ReceiverError& error) {
+        failure_ = error;
+    }
+    if (!host_->Failed()) {
+        recorder.Close();
+    }
+    recorder.NoteEnd();
+    TellChanges(recorder);
+    TellLateStops(recorder);
+    report_.Tell(host_->TakeStatuses(), false);
+    session.End();
+    report_.Tell(log_->TakeEvents());
+    report_.Tell(host_->TakeStatuses(), true);
+    recovery_->Follow(report_);
+    settings.past = recorder.Past();
+    plan_.Interrupt();
+    gap_ = recorder.EndedByGap();
+    rest_ = recorder.TakeRest();
+    return !failure_ && !host_->Failed();
+}
+
 void Running::Loop(SourceInterface& source, Recorder& recorder) {
-    while (!host_->Failed()) {
+    while (!host_->Failed() && !recorder.EndedByGap()) {
         SourceUnit unit;
         const SourceInterface::Result result = source.Read(unit);
         if (result == SourceInterface::Result::kEnd || result == SourceInterface::Result::kStopped) {

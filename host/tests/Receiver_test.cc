@@ -7,8 +7,11 @@
 #include <stdlib.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <csignal>
 #include <filesystem>
+#include <fstream>
+#include <iterator>
 
 #include "fakes/FakeDisplay.h"
 #include "fakes/FakeSource.h"
@@ -137,6 +140,55 @@ TEST_F(ReceiverTest, InModeOnTheRunIsOneRecording) {
     EXPECT_EQ(Record(150), ExitCode::kSuccess);
     EXPECT_THAT(Frames(), ElementsAre(25));
     EXPECT_THAT(display_.statuses, ElementsAre(ModuleStatus{4, 0}, ModuleStatus{3, 0}));
+}
+
+/// A gap of two seconds behind three, and audio that begins 500 samples behind each picture's. The audio
+/// behind the gap has bytes of its own.
+class GapTest : public ReceiverTest {
+ protected:
+    static constexpr std::string_view kBehind = "audio behind it!";
+
+    static std::unique_ptr<FakeSource> WithGap() {
+        auto source = std::make_unique<FakeSource>(0);
+        std::deque<SourceUnit>& units = source->Units();
+        for (std::uint32_t frame = 0; frame < 200; frame = frame == 74 ? 125 : frame + 1) {
+            units.push_back(MakeFrame(frame * FakeSource::kFrame, frame % FakeSource::kGroup == 0, frame));
+        }
+        // The pictures in front of the gap end at 144000.
+        for (std::int64_t time = 500; time < 144000 - 512; time += 1024) {
+            units.push_back(MakeAudio(time));
+        }
+        std::vector<unsigned char> bytes{0xFF, 0xF1, 0x4C, 0x80, 0x02, 0xFF, 0xFC};
+        bytes.insert(bytes.end(), kBehind.begin(), kBehind.end());
+        for (std::int64_t time = 240000 - 100; time < 384000; time += 1024) {
+            units.push_back(MakeSourceUnit(Medium::kAudio, time, bytes));
+        }
+        std::stable_sort(units.begin(), units.end(), [](const SourceUnit& a, const SourceUnit& b) {
+            return SecondsOf(a) < SecondsOf(b);
+        });
+        return source;
+    }
+    static double SecondsOf(const SourceUnit& unit) {
+        return static_cast<double>(unit.time) /
+               static_cast<double>(unit.medium == Medium::kAudio ? kAudioClock : kVideoClock);
+    }
+    static bool HoldsAudioBehind(const RecordedFile& file) {
+        std::ifstream in(file.path, std::ios::binary);
+        const std::string bytes{std::istreambuf_iterator<char>(in), {}};
+        return bytes.find(kBehind) != std::string::npos;
+    }
+};
+
+TEST_F(GapTest, WhatIsBehindItIsInAFileOfItsOwnWithItsTimecode) {
+    for (const OutputMode mode : {OutputMode::kSync, OutputMode::kOn}) {
+        options_.mode = mode;
+        EXPECT_EQ(Record(WithGap()), ExitCode::kSuccess);
+        EXPECT_THAT(Frames(), ElementsAre(75, 75));
+        EXPECT_THAT(Starts(), ElementsAre("10:00:00:00", "10:00:05:00"));
+        ASSERT_EQ(display_.summary.files.size(), 2u);
+        EXPECT_FALSE(HoldsAudioBehind(display_.summary.files[0]));
+        EXPECT_TRUE(HoldsAudioBehind(display_.summary.files[1]));
+    }
 }
 
 TEST_F(ReceiverTest, SigtermEndsInOrderWithTheFileClosed) {

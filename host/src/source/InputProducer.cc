@@ -45,7 +45,7 @@ InputProducer::InputProducer(const SourceOptions& options, double patience,
       connection_(Connect(options_, patience, interrupt_, stop, nullptr)),
       description_(connection_->Description()),
       recorded_(connection_->Recorded()),
-      assembler_(description_.frameRate, options.continuous),
+      assembler_(description_.frameRate),
       connected_(Clock::now()),
       lastPicture_(connected_) {
     connection_->Begin(assembler_, 0);
