@@ -2,6 +2,7 @@
 
 #include <sys/stat.h>
 
+#include <algorithm>
 #include <chrono>
 #include <ctime>
 #include <exception>
@@ -76,6 +77,8 @@ class Running final : public SourceListenerInterface {
     void Loop(SourceInterface& source, Recorder& recorder);
     void CheckFolder();
     void TakeCommands(Recorder& recorder);
+    /// Takes what has been commanded, for the next frame to carry out.
+    void Hear();
     void TakeKeys();
     void TakeKey(char key);
     void Command(RecordCommand command);
@@ -84,7 +87,7 @@ class Running final : public SourceListenerInterface {
     static bool QuitAsked();
     void TellLateStops(const Recorder& recorder);
     void Show(const SourceInterface& source, const Recorder& recorder);
-    std::uint64_t Lost(const SourceInterface& source) const;
+    std::uint64_t Lost(const SourceInterface& source, const Recorder::Progress& progress) const;
     Summary Summarise(const SourceInterface& source, const Recorder::Progress& past);
 
     /// The run, for the one callback that knows of no object. It comes on the thread of the run.
@@ -188,6 +191,7 @@ Recorder::Progress Running::RecordAll(SourceInterface& source, QxModuleInterface
                                       const OutputPlace& place) {
     SourceDescription description;
     Recorder::Settings settings = RecorderSettingsOf(options_, source.Description().frameRate);
+    settings.meanwhile = [this] { Hear(); };
     const std::int64_t minutes = FileMinutes();
     bool gap = false;
     bool changed = true;
@@ -304,6 +308,14 @@ void Running::CheckFolder() {
 }
 
 void Running::TakeCommands(Recorder& recorder) {
+    Hear();
+    commands_.Apply(plan_);
+    if (quit_ && !recorder.Finishing()) {
+        recorder.Finish();
+    }
+}
+
+void Running::Hear() {
     const SignalCommands commands = signals_.Take();
     for (const RecordCommand command : commands.record) {
         Command(command);
@@ -313,13 +325,9 @@ void Running::TakeCommands(Recorder& recorder) {
         display_.Notice("the terminal is gone; the run goes on until SIGTERM");
     }
     TakeKeys();
-    if (commands.quit && !recorder.Finishing()) {
-        display_.Notice("ending in order; a second signal ends at once");
-    }
-    commands_.Apply(plan_);
-    if ((quit_ || commands.quit) && !recorder.Finishing()) {
+    if (commands.quit && !quit_ && !plan_.Finished()) {
         quit_ = true;
-        recorder.Finish();
+        display_.Notice("ending in order; a second signal ends at once");
     }
 }
 
@@ -416,13 +424,14 @@ void Running::Show(const SourceInterface& source, const Recorder& recorder) {
     snapshot.status = host_->Status();
     snapshot.file = report_.OpenFile();
     snapshot.freeBytes = watch_->FreeBytes();
-    snapshot.lost = Lost(source);
+    snapshot.lost = Lost(source, recorder.Past());
     display_.Show(snapshot);
 }
 
-std::uint64_t Running::Lost(const SourceInterface& source) const {
+std::uint64_t Running::Lost(const SourceInterface& source, const Recorder::Progress& progress) const {
     const SourceCounts counts = source.Counts();
-    return log_->Losses().Total() + counts.lostFrames + counts.damagedPackets;
+    const std::uint64_t reported = log_->Losses().Total();
+    return reported - std::min(reported, progress.droppedMarks) + counts.lostFrames + counts.damagedPackets;
 }
 
 Summary Running::Summarise(const SourceInterface& source, const Recorder::Progress& past) {
@@ -450,7 +459,7 @@ Summary Running::Summarise(const SourceInterface& source, const Recorder::Progre
     }
     Summary summary;
     summary.files = std::move(run.files);
-    summary.lost = Lost(source);
+    summary.lost = Lost(source, past);
     if (host_->Failed()) {
         summary.exitCode = ExitCode::kRecordingFailed;
     } else if (summary.lost != 0 || report_.Faults() != 0 || lateStops_ != 0 || missed_ ||

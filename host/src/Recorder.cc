@@ -63,7 +63,7 @@ Recorder::Recorder(const Settings& settings, ModuleSession& session, const Modul
       log_(log),
       plan_(plan),
       commands_(commands),
-      feed_(session.Stream()),
+      feed_(session.Stream(), StreamFeed::kPatience, settings.meanwhile),
       stops_(log.Stops()) {
     if (!settings_.past) {
         return;
@@ -102,6 +102,17 @@ void Recorder::Finish() {
 bool Recorder::Waiting() const {
     // In mode on everything is wanted.
     return plan_.Wanted() && !(settings_.mode == OutputMode::kOn ? online_ : plan_.Recording());
+}
+
+Recorder::Progress Recorder::Past() const {
+    const std::uint64_t before = settings_.past ? settings_.past->droppedMarks : 0;
+    return {firstFrame_,
+            lastFrame_,
+            timecode_,
+            settings_.frameRate,
+            lateStops_,
+            recorded_,
+            before + feed_.DroppedMarks()};
 }
 
 std::int64_t Recorder::Elapsed() const {
@@ -362,7 +373,7 @@ void Recorder::Close() {
     PushRest();
     feed_.Settle();
     CheckStops(kStopPatience);
-    feed_.Frames().WaitForChunks(KeptChunks(), kDiskPatience);
+    feed_.WaitForChunks(KeptChunks(), kDiskPatience);
 }
 
 std::vector<std::vector<unsigned char>> Recorder::Packets() const {

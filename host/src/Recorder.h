@@ -2,6 +2,7 @@
 
 #include <chrono>
 #include <cstdint>
+#include <functional>
 #include <optional>
 #include <vector>
 
@@ -50,6 +51,8 @@ class Recorder {
         FrameRate frameRate;
         std::uint64_t lateStops = 0;
         std::uint64_t recorded = 0;
+        /// Of what the module reported as lost: marks, which nobody misses.
+        std::uint64_t droppedMarks = 0;
     };
 
     struct Settings {
@@ -64,6 +67,9 @@ class Recorder {
         bool followDisk = false;
         /// Files are fragmented.
         bool fragments = false;
+        /// Called from time to time where the module is waited for, for what must not wait. It must not call
+        /// the recorder.
+        std::function<void()> meanwhile;
         /// Of an earlier recorder of the run, whose source has become another one.
         std::optional<Progress> past;
     };
@@ -107,9 +113,7 @@ class Recorder {
     void NoteEnd();
     /// Frames that belong to recordings.
     std::uint64_t Recorded() const { return recorded_; }
-    Progress Past() const {
-        return {firstFrame_, lastFrame_, timecode_, settings_.frameRate, lateStops_, recorded_};
-    }
+    Progress Past() const;
     /// Stream time of the last frame since the first one, in ticks of 90000 a second.
     std::int64_t Elapsed() const;
 

@@ -15,6 +15,7 @@
 
 #include "fakes/FakeDisplay.h"
 #include "fakes/FakeSource.h"
+#include "support/WaitUntil.h"
 
 namespace receiver {
 namespace {
@@ -57,11 +58,11 @@ class ReceiverTest : public ::testing::Test {
     /// Sends a signal to this process and waits until it has been seen.
     static void Send(int number) {
         kill(getpid(), number);
-        sigset_t pending;
-        do {
-            std::this_thread::sleep_for(std::chrono::milliseconds(1));
+        EXPECT_TRUE(WaitUntil([number] {
+            sigset_t pending;
             sigpending(&pending);
-        } while (sigismember(&pending, number) == 1);
+            return sigismember(&pending, number) != 1;
+        }));
     }
 
     /// Frames of the files, in their order.
@@ -305,12 +306,13 @@ TEST_F(ReceiverTest, ARangeBehindTheEndOfTheStreamIsToldAndIsALoss) {
 TEST_F(ReceiverTest, AFileThatIsDeletedDuringTheRunIsToldAndIsALoss) {
     options_.record = {{0, 90000}, {2 * 90000, 3 * 90000}};
     auto source = std::make_unique<FakeSource>(150);
-    source->Before([this, deleted = false](std::size_t) mutable {
+    source->MakeEndless();
+    source->Before([this, &ended = *source](std::size_t) {
         // The first file is complete, which takes the module a moment.
-        if (!deleted && !display_.closed.empty()) {
-            deleted = std::filesystem::remove(display_.closed.front());
+        if (!display_.closed.empty()) {
+            std::filesystem::remove(display_.closed.front());
+            ended.Stop();
         }
-        std::this_thread::sleep_for(std::chrono::milliseconds(2));
     });
     EXPECT_EQ(Record(std::move(source)), ExitCode::kLost);
     EXPECT_THAT(display_.notices, Contains(HasSubstr("is gone: it was deleted")));
@@ -331,10 +333,13 @@ TEST_F(ReceiverTest, ASourceThatDriesUpAtTheEndHoldsNobodyUp) {
 
 TEST_F(ReceiverTest, SnapshotsTellOfTheRecording) {
     auto source = std::make_unique<FakeSource>(200);
-    source->Before([](std::size_t read) {
-        if (read == 250) {
-            // Longer than the display's interval.
-            std::this_thread::sleep_for(std::chrono::milliseconds(300));
+    source->MakeEndless();
+    source->Before([this, &ended = *source, before = std::optional<std::size_t>()](std::size_t) mutable {
+        if (ended.Units().empty()) {
+            before = before.value_or(display_.snapshots.size());
+            if (display_.snapshots.size() > *before) {
+                ended.Stop();
+            }
         }
     });
     EXPECT_EQ(Record(std::move(source)), ExitCode::kSuccess);
@@ -394,6 +399,11 @@ TEST_F(ReceiverTest, AModuleThatFailsEndsTheRun) {
 TEST_F(ReceiverTest, LostUnitsMakeTheRunALoss) {
     EXPECT_EQ(RecordWith("overflow"), ExitCode::kLost);
     EXPECT_EQ(display_.summary.lost, 1u);
+}
+
+TEST_F(ReceiverTest, AMarkThatTheModuleHasNoRoomForIsNoLoss) {
+    RecordWith("crowded");
+    EXPECT_EQ(display_.summary.lost, 0u);
 }
 
 TEST_F(ReceiverTest, AFaultOfTheStreamMakesTheRunALoss) {

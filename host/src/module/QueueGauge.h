@@ -32,6 +32,8 @@ class QueueGauge {
     bool WaitForBound(std::uint64_t bound, std::chrono::milliseconds patience) const;
     /// How far the queue has come: greater as soon as another mark comes through.
     std::uint64_t Passed() const;
+    /// Marks that never got in.
+    std::uint64_t Dropped() const;
 
  private:
     struct State {
@@ -44,6 +46,7 @@ class QueueGauge {
         std::uint64_t entered = 0;
         /// How many had entered when the last mark that came through was made.
         std::uint64_t passed = 0;
+        std::uint64_t dropped = 0;
         /// The same of the marks that are in the queue.
         std::deque<std::uint64_t> marks;
     };
