@@ -146,6 +146,12 @@ AudioConverter::AudioConverter(const AVCodecParameters& parameters) : frame_(lib
 }
 
 void AudioConverter::Push(const AVPacket& packet, const AudioSink& sink) {
+    std::size_t told = 0;
+    const std::uint8_t* const config = av_packet_get_side_data(&packet, AV_PKT_DATA_NEW_EXTRADATA, &told);
+    if (config != nullptr && !std::equal(config, config + told, decoder_->extradata,
+                                         decoder_->extradata + std::max(0, decoder_->extradata_size))) {
+        throw FormatChanged("the parameters of the audio changed");
+    }
     if (avcodec_send_packet(decoder_.get(), &packet) < 0) {
         ++damaged_;
         if (++failures_ >= kUndecodable) {

@@ -29,7 +29,7 @@ bool HasBegun(const AVStream& stream) {
 
 Connection::Connection(std::unique_ptr<Input> input, const SourceOptions& options,
                        const SourceDescription* before)
-    : input_(std::move(input)), packet_(libav::NewPacket()) {
+    : input_(std::move(input)), packet_(libav::NewPacket()), untouched_(libav::NewPacket()) {
     Choose(options);
     ahead_ = LookAhead(*input_, *video_, audio_);
     AVFormatContext& format = input_->Format();
@@ -120,6 +120,10 @@ bool Connection::Pump() {
     if (!NextPacket()) {
         return false;
     }
+    if (input_->Recorded()) {
+        av_packet_unref(untouched_.get());
+        libav::Check(av_packet_ref(untouched_.get(), packet_.get()), "hold a packet");
+    }
     if (input_->Transport() && IsOf(*packet_, audio_)) {
         newSounds_ = 0;
         for (const auto& packet : runs_.Put(std::exchange(packet_, libav::NewPacket()), audio_->time_base)) {
@@ -148,6 +152,14 @@ void Connection::HandleExpired() {
     for (const auto& sound : runs_.Expire(packet_->pts, video_->time_base)) {
         Handle(*sound);
     }
+}
+
+Packets Connection::TakeUnread() {
+    Packets unread = std::exchange(ahead_.packets, {});
+    if (untouched_->data != nullptr) {
+        unread.push_front(std::move(untouched_));
+    }
+    return unread;
 }
 
 std::unique_ptr<Input> Connection::End(std::unique_ptr<Connection> connection) {

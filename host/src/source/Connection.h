@@ -45,6 +45,9 @@ class Connection {
     /// Gives out what is still on its way. Once, when the connection is over; then its input may be asked
     /// anew.
     void Finish();
+    /// What was read and not used, when a change of the format has ended the connection: the packet that
+    /// showed it, as it came, and what was read ahead behind it. Of files alone. Once.
+    Packets TakeUnread();
     /// Ends the connection, all but the input, and gives that away.
     static std::unique_ptr<Input> End(std::unique_ptr<Connection> connection);
     /// The wait for the source is over: what still comes was held by the libraries.
@@ -96,6 +99,8 @@ class Connection {
     /// Of the audio of a transport stream.
     AudioRuns runs_;
     libav::Owner<AVPacket> packet_;
+    /// The same as it came. Of files alone.
+    libav::Owner<AVPacket> untouched_;
 
     UnitAssembler* assembler_ = nullptr;
     std::int64_t begin_ = 0;

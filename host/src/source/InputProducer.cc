@@ -174,12 +174,13 @@ void InputProducer::Change(const std::string& reason) {
     KeepCounts();
     const std::int64_t position = connection_->Position();
     const std::int64_t passed = recorded_ ? 0 : Ticks(Clock::now() - lastPicture_);
+    Packets unread = connection_->TakeUnread();
     std::unique_ptr<Input> input = Connection::End(std::move(connection_));
     lost_ = Clock::now();
     try {
-        if (!input->Renew(position)) {
+        if (!input->Renew(position, std::move(unread))) {
             throw ReceiverError(ExitCode::kSourceUnsuitable,
-                                reason + ": what follows in this file is left out");
+                                reason + ": what follows in this file cannot be understood, and is left out");
         }
         auto connection = std::make_unique<Connection>(std::move(input), options_, nullptr);
         assembler_.AddNotice(reason + ": the recording goes on in a new file");
