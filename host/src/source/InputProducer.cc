@@ -141,12 +141,12 @@ void InputProducer::KeepCounts() {
 }
 
 void InputProducer::TryAgain() {
-    // Where the sender comes to us nothing is left out while nobody listens; only what fails at once is not
-    // tried in a hurry.
+    using std::chrono::milliseconds;
+    // Where the sender comes to us it is refused while nobody listens.
     const bool listens = Listens(options_.url);
-    const bool hurried = Clock::now() - tried_ < std::chrono::seconds(kPauses[0]);
-    const int pause = !listens ? kPauses[attempts_] : hurried ? kPauses[0] : 0;
-    if (interrupt_->Wait(std::chrono::seconds(pause))) {
+    const milliseconds pause = listens ? std::chrono::ceil<milliseconds>(tried_ + kListenEvery - Clock::now())
+                                       : std::chrono::seconds(kPauses[attempts_]);
+    if (interrupt_->Wait(std::max(milliseconds(0), pause))) {
         throw Stopped();
     }
     attempts_ = std::min(attempts_ + 1, kPauses.size() - 1);
