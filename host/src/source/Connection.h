@@ -77,6 +77,9 @@ class Connection {
     void HandleAudio(AVPacket& packet, bool waited);
     void HandleKlv(const AVPacket& packet);
     void KeepEarly(AVPacket& packet);
+    /// How long after the first picture the one stamped with `stamp` comes, by the stamps, or by the count
+    /// of pictures where the first stamp is none to believe.
+    std::int64_t SinceFirst(std::int64_t stamp) const;
     static bool IsOf(const AVPacket& packet, const AVStream* stream);
     StreamClock::Track* KlvTrackOf(const AVPacket& packet);
     /// How much later a picture is shown than decoded, where the source itself tells.

@@ -218,7 +218,12 @@ void Input::CarryOn(std::int64_t position) {
     format_.reset();
     if (position >= 0) {
         // The tables stand right in front of the picture. A live source has only what is still in memory.
-        avio_seek(connection_.get(), std::max<std::int64_t>(0, position - kTables), SEEK_SET);
+        const std::int64_t reached =
+            avio_seek(connection_.get(), std::max<std::int64_t>(0, position - kTables), SEEK_SET);
+        if (reached < 0 && recorded_) {
+            throw SourceLost("the file cannot be read where it changes: " +
+                             libav::ErrorText(static_cast<int>(reached)));
+        }
     }
     AVFormatContext* format = NewFormat();
     format->pb = connection_.get();
