@@ -22,11 +22,13 @@ namespace receiver {
 /// Brings a source's units into the module: in one order of time, each frame behind its metadata unit with
 /// timecode, record flag and the source's own packets.
 ///
-/// Relies on the module's exact record rules. A record command travels in the metadata unit of its frame, and
-/// no schedule of the module's threads moves it: a recording holds the frames from the first IDR frame with
-/// the flag to the last one that has it, with the audio that belongs to them, and what has been pushed when
-/// the session ends is written. So everything is pushed from the first frame on, also while nothing is
-/// recorded, for the audio in front of a recording to be there when it begins.
+/// What is left to do here is what the module cannot know: the order across media, gaps, addresses of frames,
+/// and whether a stop was carried out. The rest is left to its exact record rules. A record command travels
+/// in the metadata unit of its frame, and no schedule of the module's threads moves it: a recording holds the
+/// frames from the first IDR frame with the flag to the last one that has it, with the audio that belongs to
+/// them, and what has been pushed when the session ends is written. So everything is pushed from the first
+/// frame on, also while nothing is recorded, for the audio in front of a recording to be there when it
+/// begins.
 ///
 /// One thread at a time.
 class Recorder {

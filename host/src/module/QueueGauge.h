@@ -11,10 +11,10 @@
 
 namespace receiver {
 
-/// Tells how full one of the module's queues can be. The module says nothing about its queues but that it
-/// dropped a unit, when it is too late; so marks travel with the units: a mark is a unit without payload,
-/// which the queue's thread lets go unseen. When that releases a mark, everything in front of it has left the
-/// queue. A mark that is released before an earlier one never got in: the queue was full.
+/// Tells how full one of the module's queues can be. With exact rules, too, the module says nothing about its
+/// queues but that it dropped a unit, when it is too late; so marks travel with the units: a mark is a unit
+/// without payload, which the queue's thread lets go unseen. When that releases a mark, everything in front
+/// of it has left the queue. A mark that is released before an earlier one never got in: the queue was full.
 ///
 /// One thread enters and waits; marks are released on the module's threads.
 class QueueGauge {

@@ -15,8 +15,9 @@
 
 namespace receiver {
 
-/// Pushes a stream into the module, no faster than it can take it: the module drops what its queues have no
-/// room for and has no other way of saying that it is too much.
+/// Pushes a stream into the module, no faster than it can take it: with exact rules, too, the module drops
+/// what its queues have no room for, has no other way of saying that it is too much, and forgets what is in
+/// them when the host goes offline.
 ///
 /// Timestamps. `rtp_timestamp` is the unit's time plus ten seconds on the clock of its medium, 64 bits wide
 /// and never wrapped. `timestamp` is the same in whole milliseconds, rounded down for all media, as the

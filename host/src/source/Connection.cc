@@ -170,7 +170,8 @@ bool Connection::Pump() {
     }
     if (input_->Transport() && IsOf(*packet_, audio_)) {
         newSounds_ = 0;
-        for (const auto& packet : runs_.Put(std::exchange(packet_, libav::NewPacket()), audio_->time_base)) {
+        for (const auto& packet : runs_.Put(std::exchange(packet_, libav::NewPacket()),
+                                            audio_->codecpar->codec_id, audio_->time_base)) {
             position_ = packet->pos;
             Handle(*packet);
         }
