@@ -91,7 +91,6 @@ void Interpret(const Texts& texts, Options& options) {
         options.password = PasswordOfService();
     }
     options.mode = texts.mode == "on" ? OutputMode::kOn : OutputMode::kSync;
-    options.source.continuous = options.mode == OutputMode::kOn;
     options.recover = texts.recover == "no"    ? RecoverMode::kNo
                       : texts.recover == "ask" ? RecoverMode::kAsk
                                                : RecoverMode::kYes;
@@ -139,7 +138,7 @@ void CheckTogether(const CLI::App& app, const Options& options) {
         throw Wrong("--speed goes with files and test:; a live source has the speed that it has.");
     }
     if (!options.record.empty() && options.mode == OutputMode::kOn) {
-        throw Wrong("--record goes with --mode sync; in mode on the whole run is one recording.");
+        throw Wrong("--record goes with --mode sync; in mode on everything is recorded.");
     }
     if (options.timecode && options.timecode->dropFrame && !options.dropFrame) {
         throw Wrong("--timecode with ';' asks for drop frame and --no-drop-frame forbids it.");
