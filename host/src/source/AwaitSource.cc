@@ -40,7 +40,7 @@ void AwaitSource(bool listens, const std::function<void(bool told)>& attempt,
                 told = now;
             }
         }
-        clock.SleepUntil((listens ? tried : clock.Now()) + kPause);
+        clock.SleepUntil(listens ? tried + kListenEvery : clock.Now() + kPause);
     }
 }
 

@@ -9,6 +9,9 @@ namespace receiver {
 
 /// How often it is told that a source is still waited for.
 inline constexpr std::chrono::seconds kTellEvery{60};
+/// Two attempts to listen begin no closer together, so that what fails at once, as at a port that is taken,
+/// is not tried in a hurry. Short: a sender that comes in between is refused.
+inline constexpr std::chrono::milliseconds kListenEvery{200};
 
 /// The time that passes while a source is waited for.
 class WaitClockInterface {
@@ -33,7 +36,7 @@ class SteadyWaitClock final : public WaitClockInterface {
 };
 
 /// Calls `attempt` until it does not throw `SourceAbsent`, with pauses; `listens`: an attempt itself waits
-/// for a sender, and a pause is only needed behind one that fails at once. `attempt` is given whether the
+/// for a sender, and the next one begins at once, but for `kListenEvery`. `attempt` is given whether the
 /// absence has been told to `listener`, which happens at the first failure and then every minute.
 void AwaitSource(bool listens, const std::function<void(bool told)>& attempt,
                  SourceListenerInterface& listener, WaitClockInterface& clock);

@@ -45,6 +45,9 @@ class Connection {
     /// Gives out what is still on its way. Once, when the connection is over; then its input may be asked
     /// anew.
     void Finish();
+    /// What was read and not used, when a change of the format has ended the connection: the packet that
+    /// showed it, as it came, and what was read ahead behind it. Of files alone. Once.
+    Packets TakeUnread();
     /// Ends the connection, all but the input, and gives that away.
     static std::unique_ptr<Input> End(std::unique_ptr<Connection> connection);
     /// The wait for the source is over: what still comes was held by the libraries.
@@ -74,6 +77,9 @@ class Connection {
     void HandleAudio(AVPacket& packet, bool waited);
     void HandleKlv(const AVPacket& packet);
     void KeepEarly(AVPacket& packet);
+    /// How long after the first picture the one stamped with `stamp` comes, by the stamps, or by the count
+    /// of pictures where the first stamp is none to believe.
+    std::int64_t SinceFirst(std::int64_t stamp) const;
     static bool IsOf(const AVPacket& packet, const AVStream* stream);
     StreamClock::Track* KlvTrackOf(const AVPacket& packet);
     /// How much later a picture is shown than decoded, where the source itself tells.
@@ -96,6 +102,8 @@ class Connection {
     /// Of the audio of a transport stream.
     AudioRuns runs_;
     libav::Owner<AVPacket> packet_;
+    /// The same as it came. Of files alone.
+    libav::Owner<AVPacket> untouched_;
 
     UnitAssembler* assembler_ = nullptr;
     std::int64_t begin_ = 0;

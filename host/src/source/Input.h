@@ -2,6 +2,7 @@
 
 #include <atomic>
 #include <chrono>
+#include <deque>
 #include <limits>
 #include <memory>
 #include <set>
@@ -14,6 +15,8 @@
 #include "source/Libav.h"
 
 namespace receiver {
+
+using Packets = std::deque<libav::Owner<AVPacket>>;
 
 /// The source ended or broke, for the reason that `what()` tells in a few words.
 class SourceLost : public std::runtime_error {
@@ -45,10 +48,11 @@ class Input {
           bool (*stop)());
 
     AVFormatContext& Format() { return *format_; }
-    /// Finds out anew what the source carries, from byte `position` of the connection on where that can still
-    /// be had (-1: where it is). Streams and packets of before are gone. False for a file that would begin
-    /// again with its first byte. Throws like the constructor, and `SourceLost`.
-    bool Renew(std::int64_t position);
+    /// Finds out anew what the source carries. A transport stream goes on from byte `position` of the
+    /// connection where that can still be had (-1: where it is), another file with `unread`, of which the
+    /// first is the packet that showed the change; all else is opened again. Streams of before are gone.
+    /// False for a file of which that packet tells nothing. Throws like the constructor, and `SourceLost`.
+    bool Renew(std::int64_t position, Packets unread);
     /// True the first time that somebody asks for the stream with that number of the container, also after
     /// `Renew`: what is still not understood then never will be.
     bool AskFor(int stream) { return asked_.insert(stream).second; }
@@ -84,6 +88,7 @@ class Input {
     void Classify();
     void FindStreams();
     void CarryOn(std::int64_t position);
+    bool GoOnWith(Packets unread);
     int ReadFrame(AVPacket& packet);
     /// Moves the mark of a damaged packet to the picture that it is for.
     void MarkDamage(AVPacket& packet);
@@ -119,6 +124,8 @@ class Input {
     /// Of a connection that has been taken over from an earlier context.
     std::unique_ptr<AVIOContext, CloseConnection> connection_;
     libav::Owner<AVFormatContext> format_;
+    /// Packets that `Read` gives once more.
+    Packets unread_;
 };
 
 }  // namespace receiver

@@ -129,8 +129,6 @@ struct SourceOptions {
     bool transcode = false;
     /// Goes on trying while a network source is not there yet, and when it is lost.
     bool reconnect = true;
-    /// What is recorded goes on over outages as one recording, whose counts have to stay together.
-    bool continuous = false;
     /// "test:" and conversions. A rate and a size that are not set are 25 and 1280x720 for "test:" and those
     /// of the source for a conversion.
     std::optional<FrameRate> frameRate;

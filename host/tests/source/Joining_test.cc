@@ -70,6 +70,31 @@ TEST_F(Joining, ALiveStreamIsInStepFromItsFirstIdrFrameOn) {
     ExpectNothingTold();
 }
 
+/// A stamp of the very first picture that is none of the stream's clock, before and at an IDR frame.
+TEST_F(Joining, ADamagedFirstStampMovesNothing) {
+    Make("a.ts", "4");
+    MakeCut("a.ts", "cut.ts");
+    struct Case {
+        const char* file;
+        const char* stamp;
+        std::size_t first;
+    };
+    for (const Case& damage : {Case{"a.ts", "PTS-90000", 0}, Case{"cut.ts", "PTS-90000", 50},
+                               Case{"cut.ts", "PTS-90000*900", 50}}) {
+        SCOPED_TRACE(std::string(damage.file) + ": " + damage.stamp);
+        const string stamp = "if(eq(N\\,0)\\," + string(damage.stamp) + "\\,PTS)";
+        Ffmpeg(string("-copyts -i ") + damage.file + " -c copy -copyinkf -bsf:v 'setts=pts=" + stamp +
+               ":dts=" + stamp + "' -output_ts_offset 1000 damaged.ts");
+        StreamServer server({HttpStream(FileBytes(Path("damaged.ts")))});
+        SourceOptions options = Live(server.Http());
+        options.reconnect = false;
+        const auto source = OpenSource(options, notices_, nullptr);
+        ExpectInStep(SentMedia(Path("a.ts")), ReadAll(*source), damage.first);
+        EXPECT_EQ(source->Counts().lostFrames, 0u);
+        ExpectNothingTold();
+    }
+}
+
 /// Whether there is audio beside the pictures and their metadata.
 class FirstPicture : public Joining, public testing::WithParamInterface<bool> {};
 
