@@ -4,7 +4,7 @@ import statistics
 
 UNITS = {
     "cpu_seconds": "CPU s", "wall_seconds": "s", "peak_mb": "peak MB", "context_switches": "context switches",
-    "percent_of_a_core": "% of a core", "ns_per_sample": "ns CPU/sample", "mb_per_second": "MB/s",
+    "lost": "lost packets (1: yes)", "percent_of_a_core": "% of a core", "ns_per_sample": "ns CPU/sample", "mb_per_second": "MB/s",
     "heap_bytes_per_sample": "heap bytes/sample", "close_ms": "Close ms", "microseconds": "us",
     "channels": "channels",
     "median_us": "median us", "p99_9_us": "99.9th percentile us", "max_us": "maximum us",
@@ -12,7 +12,7 @@ UNITS = {
 
 
 def number(value):
-    digits = 0 if value >= 100 else 1 if value >= 10 else 2
+    digits = 0 if value >= 100 or value in (0, 1) else 1 if value >= 10 else 2
     return f"{value:,.{digits}f}"
 
 
