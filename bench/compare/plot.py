@@ -3,8 +3,8 @@
 import math
 from xml.sax.saxutils import escape
 
-WIDTH, HEIGHT = 720, 400
-LEFT, RIGHT, TOP, BOTTOM = 70, 230, 40, 50
+WIDTH, HEIGHT = 820, 400
+LEFT, RIGHT, TOP, BOTTOM = 70, 300, 40, 50
 COLOURS = ["#0b5fa5", "#c4481d", "#2e7d32", "#7b3fa0", "#8a6d00", "#555555"]
 
 
