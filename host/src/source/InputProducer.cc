@@ -17,7 +17,7 @@ constexpr std::array<int, 5> kPauses{1, 2, 4, 8, 15};
 constexpr std::chrono::seconds kGood{30};
 
 std::unique_ptr<Connection> Connect(const SourceOptions& options, double patience,
-                                    const std::shared_ptr<Interrupt>& interrupt, bool (*stop)(),
+                                    const std::shared_ptr<Interrupt>& interrupt, const StopCheck& stop,
                                     const SourceDescription* before) {
     try {
         return std::make_unique<Connection>(
@@ -39,7 +39,7 @@ std::int64_t Ticks(std::chrono::steady_clock::duration time) {
 }  // namespace
 
 InputProducer::InputProducer(const SourceOptions& options, double patience,
-                             std::shared_ptr<Interrupt> interrupt, bool (*stop)())
+                             std::shared_ptr<Interrupt> interrupt, const StopCheck& stop)
     : options_(options),
       interrupt_(std::move(interrupt)),
       connection_(Connect(options_, patience, interrupt_, stop, nullptr)),
