@@ -76,7 +76,10 @@ void VideoPass::Push(const AVPacket& packet, const PictureSink& sink) {
         return;
     }
     const auto bytes = BytesOf(stream);
-    const auto units = NalUnits(bytes);
+    // Nothing behind the first slice matters here. Where an IDR frame begins behind a rest of another
+    // picture, which a loss may leave, the packet is marked.
+    const bool marked = (packet.flags & AV_PKT_FLAG_KEY) != 0;
+    const auto units = marked ? NalUnits(bytes) : LeadingNalUnits(bytes);
     CodedPicture picture;
     picture.time = packet.pts;
     picture.keyFrame = Contains(units, kNalIdr);

@@ -94,7 +94,7 @@ MbxStatus Mp4File::writeSample(const ChunkData& chunk) {
     }
     std::unique_ptr<unsigned char[]> buffer;
     if (total != 0) {
-        buffer.reset(new (std::nothrow) unsigned char[total]());
+        buffer.reset(new (std::nothrow) unsigned char[total]);  // not cleared: the samples fill it
     }
     if (buffer != nullptr) {
         unsigned char* next = buffer.get();
