@@ -15,8 +15,6 @@ constexpr std::size_t kLongestWait = 4000;
 constexpr std::uint64_t kWithoutStart = 300;
 /// Packets of a new stream, while none of the one before comes, that show a medium to have moved.
 constexpr int kMoved = 25;
-/// Of shorter steps forward the time of arrival does not tell whether something is missing.
-constexpr std::int64_t kShortestStep = 36000;
 /// Pictures whose stamps tell where the first one should stand.
 constexpr std::size_t kWitnesses = 4;
 
@@ -74,6 +72,7 @@ Connection::Connection(std::unique_ptr<Input> input, const SourceOptions& option
     }
     watch_.emplace(video_->codecpar->codec_id, paths_.description.frameRate, paths_.passes);
     clock_.emplace(*video_, audio_, input_->Recorded());
+    steps_.emplace(*clock_);
     ReadTimecodeTag();
     paths_.description.summary += klv_.empty() ? "" : ", KLV";
 }
@@ -171,13 +170,12 @@ bool Connection::Pump() {
         libav::Check(av_packet_ref(untouched_.get(), packet_.get()), "hold a packet");
     }
     if ((packet_->flags & AV_PKT_FLAG_CORRUPT) != 0) {
-        marked_ = assembler_->LastPicture();
+        steps_->Mark(assembler_->LastPicture());
     }
     if (input_->Transport() && IsOf(*packet_, audio_)) {
         newSounds_ = 0;
         for (const auto& packet : runs_.Put(std::exchange(packet_, libav::NewPacket()),
                                             audio_->codecpar->codec_id, audio_->time_base)) {
-            position_ = packet->pos;
             Handle(*packet);
         }
         return true;
@@ -186,7 +184,6 @@ bool Connection::Pump() {
         ++damaged_;
         return true;
     }
-    position_ = packet_->pos;
     if (IsOf(*packet_, video_)) {
         input_->Alive();
         HandleExpired();
@@ -228,16 +225,8 @@ StreamClock::Track* Connection::KlvTrackOf(const AVPacket& packet) {
 }
 
 void Connection::Handle(AVPacket& packet) {
-    if (!suspended_.empty()) {
-        LookAtStep(packet);
-        return;
-    }
-    const auto medium = SteppingMedium(packet);
-    if (medium && LooksLikeAStep(*medium, packet)) {
-        Suspend(packet);
-        return;
-    }
-    Process(packet);
+    steps_->Put(packet, SteppingMedium(packet), assembler_->LastPicture(),
+                [this](AVPacket& next) { Process(next); });
 }
 
 std::optional<StepWatch::Medium> Connection::SteppingMedium(const AVPacket& packet) const {
@@ -249,51 +238,8 @@ std::optional<StepWatch::Medium> Connection::SteppingMedium(const AVPacket& pack
     return marked && IsOf(packet, audio_) ? std::optional(StepWatch::Medium::kAudio) : std::nullopt;
 }
 
-bool Connection::LooksLikeAStep(StepWatch::Medium medium, const AVPacket& packet) {
-    const auto offset = clock_->OffsetOf(medium, packet);
-    if (!offset || offset->distance < kShortestStep || offset->distance > Timeline::kLongestGap ||
-        !IsClean() || clock_->HasPaused(medium, offset->distance)) {
-        return false;
-    }
-    steps_.Suspect(medium, offset->expected, offset->distance);
-    return true;
-}
-
-void Connection::Suspend(AVPacket& packet) {
-    libav::Owner<AVPacket> suspended = libav::NewPacket();
-    av_packet_move_ref(suspended.get(), &packet);
-    suspended_.push_back(std::move(suspended));
-}
-
-void Connection::LookAtStep(AVPacket& packet) {
-    using Verdict = ForwardSteps::Verdict;
-    const auto medium = SteppingMedium(packet);
-    const auto offset = medium ? clock_->OffsetOf(*medium, packet) : std::nullopt;
-    const Verdict verdict =
-        offset ? steps_.Look(*medium, offset->expected, offset->distance) : Verdict::kUnknown;
-    if (verdict == Verdict::kUnknown && (!medium || steps_.IsOf(*medium))) {
-        Suspend(packet);
-        return;
-    }
-    if (verdict == Verdict::kStep && IsClean()) {
-        clock_->StepForward(steps_.Ticks());
-    }
-    if (verdict != Verdict::kUnknown) {
-        Release();
-    }
-    Process(packet);
-}
-
-void Connection::Release() {
-    const std::int64_t position = position_;
-    for (const auto& packet : std::exchange(suspended_, {})) {
-        position_ = packet->pos;
-        Process(*packet);
-    }
-    position_ = position;
-}
-
 void Connection::Process(AVPacket& packet) {
+    position_ = packet.pos;
     const bool audio = IsOf(packet, audio_);
     newPictures_ = IsOf(packet, video_) ? 0 : newPictures_;
     newSounds_ = audio ? 0 : newSounds_;
@@ -416,7 +362,7 @@ void Connection::Finish() {
         for (const auto& packet : runs_.Finish()) {
             Handle(*packet);
         }
-        Release();
+        steps_->Release([this](AVPacket& packet) { Process(packet); });
     } catch (const FormatChanged&) {
         // Nothing follows in which the new format could go on.
     }

@@ -13,10 +13,10 @@
 #include "source/Input.h"
 #include "source/KlvPackets.h"
 #include "source/LookAhead.h"
+#include "source/StepHold.h"
 #include "source/StreamClock.h"
 #include "source/StreamPaths.h"
 #include "source/UnitAssembler.h"
-#include "timing/ForwardSteps.h"
 
 namespace receiver {
 
@@ -24,8 +24,6 @@ namespace receiver {
 class Connection {
  public:
     using Clock = std::chrono::steady_clock;
-    /// Ticks behind a mark in which a late stamp is a loss.
-    static constexpr std::int64_t kUnclean = 90000;
 
     /// Chooses streams, looks at the first second, and decides what passes and what is converted. `before`:
     /// what the source was in an earlier connection and may be again, or null. Throws `ReceiverError`
@@ -77,14 +75,6 @@ class Connection {
     /// whose missing packets are marked. Of a file, where counters of four bits are all that tells, a loss
     /// would at times be taken for a step.
     std::optional<StepWatch::Medium> SteppingMedium(const AVPacket& packet) const;
-    /// True when nothing is known to be missing in front of the packet but its stamp is late.
-    bool LooksLikeAStep(StepWatch::Medium medium, const AVPacket& packet);
-    /// No packet was marked lately.
-    bool IsClean() const { return !marked_ || assembler_->LastPicture() - *marked_ > kUnclean; }
-    void Suspend(AVPacket& packet);
-    /// While packets are suspended.
-    void LookAtStep(AVPacket& packet);
-    void Release();
     /// The sound that waits for a stamp which the pictures have passed.
     void HandleExpired();
     void HandleVideo(AVPacket& packet);
@@ -115,12 +105,7 @@ class Connection {
     std::optional<FormatWatch> watch_;
     std::optional<StreamClock> clock_;
     KlvPackets klvPackets_;
-    /// Packets that wait until it is known whether the clock has made a step.
-    Packets suspended_;
-    ForwardSteps steps_;
-    /// The picture behind which a packet was last marked as damaged, or as one in front of which some are
-    /// missing.
-    std::optional<std::int64_t> marked_;
+    std::optional<StepHold> steps_;
     /// Of the audio of a transport stream.
     AudioRuns runs_;
     libav::Owner<AVPacket> packet_;
