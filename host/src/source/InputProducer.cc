@@ -169,10 +169,11 @@ void InputProducer::TryAgain() {
 }
 
 void InputProducer::Change(const std::string& reason) {
+    // What it still gives out stands in front of that.
+    const std::int64_t position = connection_->Position();
     connection_->Finish();
     ++changes_;
     KeepCounts();
-    const std::int64_t position = connection_->Position();
     const std::int64_t passed = recorded_ ? 0 : Ticks(Clock::now() - lastPicture_);
     Packets unread = connection_->TakeUnread();
     std::unique_ptr<Input> input = Connection::End(std::move(connection_));
