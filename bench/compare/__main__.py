@@ -24,6 +24,7 @@ SECTIONS = {
     "muxer": muxer.run,
     "job": job.run,
     "live": live.run,
+    "channels": live.channels,
     "latency": latency.run,
 }
 
@@ -38,6 +39,7 @@ def parse():
     parser.add_argument("--lengths", default="1,10,60,120", help="minutes of the muxer's files (1,10,60,120)")
     parser.add_argument("--job-minutes", default="10", help="minutes of MPEG-TS of the whole job (10)")
     parser.add_argument("--seconds", type=int, default=30, help="seconds of a live run (30)")
+    parser.add_argument("--most-channels", type=int, default=32, help="where the trial of channels ends (32)")
     parser.add_argument("--work", help="folder for material and recordings, best in memory; else one of /dev/shm")
     parser.add_argument("--json", metavar="FILE", help="where all figures go")
     parser.add_argument("--curves", metavar="FOLDER", help="where the curves go, as SVG")

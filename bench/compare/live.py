@@ -1,48 +1,66 @@
-"""Live: the same packets by UDP to ours and to ffmpeg at the same time."""
+"""Live, by UDP: one recording of the same packets by ours and by ffmpeg, and how many recordings the machine carries."""
 
 import os
+import re
 import shutil
 import socket
+import time
 
 import machine
 import material
 
 # Exit code of the receiver when units were lost.
 LOST = 8
+# What ffmpeg says of packets that did not come.
+TOLD_OF_LOSS = re.compile(r"corrupt|overrun|error while decoding", re.IGNORECASE)
 
 
-def free_port():
-    with socket.socket(socket.AF_INET, socket.SOCK_DGRAM) as probe:
+def free_ports(count):
+    probes = [socket.socket(socket.AF_INET, socket.SOCK_DGRAM) for _ in range(count)]
+    for probe in probes:
         probe.bind(("127.0.0.1", 0))
-        return probe.getsockname()[1]
+    ports = [probe.getsockname()[1] for probe in probes]
+    for probe in probes:
+        probe.close()
+    return ports
 
 
-def pair(options, source):
-    """Both receivers wait when the sender begins; it ends them, and their processor time is that of all its packets."""
-    ports = [free_port(), free_port()]
-    addresses = [f"udp://127.0.0.1:{port}" for port in ports]
-    folders = [os.path.join(options.work, "live", name) for name in ("ours", "peer")]
-    logs = [os.path.join(options.work, f"live{i}.log") for i in range(3)]
-    seconds = options.seconds
-    ours = machine.Run([os.path.join(options.build, "host", "receiver"), "-i", addresses[0], "-o", ".",
-                        "--max-minutes", "1", "--seconds", str(seconds)], folders[0], logs[0])
-    # Packets that come while it has no reader yet wait in the socket, as they do in ours.
-    peer = machine.Run(["ffmpeg", "-v", "error", "-i", addresses[1], "-map", "0", "-c", "copy", "-t", str(seconds),
-                        "-f", "segment", "-segment_time", "60", "-segment_format", "mp4", "%03d.mp4"], folders[1], logs[1])
+def receiver(options, address):
+    return [os.path.join(options.build, "host", "receiver"), "-i", address, "-o", ".", "--max-minutes", "1",
+            "--seconds", str(options.seconds)]
+
+
+def ffmpeg(options, address):
+    return ["ffmpeg", "-v", "warning", "-i", address, "-map", "0", "-c", "copy", "-t", str(options.seconds), "-f", "segment",
+            "-segment_time", "60", "-segment_format", "mp4", "%03d.mp4"]
+
+
+def record(options, source, makers):
+    """One run of each maker's command at the same time, from one sender: its figures, with `lost`. The recordings wait when
+    the sender begins; what comes while one has no reader yet waits in its socket."""
+    folder = os.path.join(options.work, "live")
+    addresses = [f"udp://127.0.0.1:{port}" for port in free_ports(len(makers))]
+    runs = [machine.Run(maker(options, address), os.path.join(folder, str(i)), os.path.join(options.work, f"live{i}.log"))
+            for i, (maker, address) in enumerate(zip(makers, addresses))]
+    time.sleep(1)
     outputs = "|".join(f"[f=mpegts]{address}?pkt_size=1316" for address in addresses)
-    sender = machine.Run(["ffmpeg", "-v", "error", "-re", "-stream_loop", "-1", "-i", source, "-t", str(seconds + 10),
-                          "-map", "0", "-c", "copy", "-f", "tee", outputs], options.work, logs[2])
+    sender = machine.Run(["ffmpeg", "-v", "error", "-re", "-stream_loop", "-1", "-i", source,
+                          "-t", str(options.seconds + 10), "-map", "0", "-c", "copy", "-f", "tee", outputs],
+                         options.work, os.path.join(options.work, "sender.log"))
+    figures = []
     try:
-        limit = seconds + 60
-        figures = {"receiver": ours.finish(allowed=(0, LOST), limit=limit), "ffmpeg": peer.finish(limit=limit)}
+        for run in runs:
+            figure = run.finish(allowed=(0, LOST), limit=options.seconds + 60)
+            with open(run.log, encoding="utf-8", errors="replace") as log:
+                figure["lost"] = run.process.returncode == LOST or bool(TOLD_OF_LOSS.search(log.read()))
+            figure["percent_of_a_core"] = figure["cpu_seconds"] / options.seconds * 100
+            figures.append(figure)
     finally:
-        sender.process.kill()
-        sender.process.wait()
-        shutil.rmtree(os.path.join(options.work, "live"))
-    if ours.process.returncode == LOST:
-        machine.tell("the receiver lost packets: the machine was too busy for this run")
-    for figure in figures.values():
-        figure["percent_of_a_core"] = figure["cpu_seconds"] / seconds * 100
+        for run in [*runs, sender]:
+            if run.process.returncode is None:
+                run.process.kill()
+                run.process.wait()
+        shutil.rmtree(folder)
     return figures
 
 
@@ -52,7 +70,9 @@ def run(options):
         source = material.clip(options, megabits)
         runs = {"receiver": [], "ffmpeg": []}
         for _ in range(options.pairs):
-            for name, figure in pair(options, source).items():
+            for name, figure in zip(runs, record(options, source, [receiver, ffmpeg])):
+                if figure["lost"]:
+                    machine.tell(f"{name} lost packets at {megabits} Mb/s")
                 runs[name].append(figure)
         tables.append({
             "title": f"UDP, 59.94, {megabits} Mb/s, {options.seconds} s",
@@ -60,3 +80,25 @@ def run(options):
             "runs": runs,
         })
     return tables
+
+
+def carried(options, source, maker):
+    """The most recordings at once of which none lost anything, by doubling; the sender runs on the same machine."""
+    most = 0
+    number = 1
+    while number <= (1 if options.smoke else options.most_channels):
+        if any(figure["lost"] for figure in record(options, source, [maker] * number)):
+            break
+        most = number
+        number *= 2
+    return most
+
+
+def channels(options):
+    source = material.clip(options, 6)
+    runs = {"receiver": [], "ffmpeg": []}
+    for _ in range(options.pairs):
+        for name, maker in zip(runs, (receiver, ffmpeg)):
+            runs[name].append({"channels": carried(options, source, maker)})
+    return [{"title": f"Recordings of 6 Mb/s at once, without a loss in {options.seconds} s, at most {options.most_channels}",
+             "figures": ["channels"], "runs": runs}]

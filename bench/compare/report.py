@@ -6,6 +6,7 @@ UNITS = {
     "cpu_seconds": "CPU s", "wall_seconds": "s", "peak_mb": "peak MB", "context_switches": "context switches",
     "percent_of_a_core": "% of a core", "ns_per_sample": "ns CPU/sample", "mb_per_second": "MB/s",
     "heap_bytes_per_sample": "heap bytes/sample", "close_ms": "Close ms", "microseconds": "us",
+    "channels": "channels",
     "median_us": "median us", "p99_9_us": "99.9th percentile us", "max_us": "maximum us",
 }
 

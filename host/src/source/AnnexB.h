@@ -13,6 +13,7 @@ namespace receiver {
 /// Types of NAL units (ITU-T H.264 table 7-1).
 inline constexpr unsigned int kNalSlice = 1;
 inline constexpr unsigned int kNalIdr = 5;
+inline constexpr unsigned int kNalMessages = 6;
 inline constexpr unsigned int kNalSequenceParameterSet = 7;
 inline constexpr unsigned int kNalPictureParameterSet = 8;
 inline constexpr unsigned int kNalAccessUnitDelimiter = 9;

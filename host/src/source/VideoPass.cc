@@ -97,7 +97,8 @@ void VideoPass::Push(const AVPacket& packet, const PictureSink& sink) {
         picture.data = libav::Share(stream);
         picture.size = bytes.size();
     }
-    if (picture.keyFrame) {
+    // Timecode stands in a message (ITU-T H.264 D.1.3); without one nothing needs to be decoded.
+    if (picture.keyFrame && Contains(units, kNalMessages)) {
         picture.timecode = timecodes_->Read({picture.data.get(), picture.size});
         if (picture.timecode) {
             picture.timecode->dropFrame = timing_.DropFrame();
