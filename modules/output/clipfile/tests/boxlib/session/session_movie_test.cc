@@ -194,47 +194,6 @@ TEST_F(SessionTrackTest, MoovMeasuresWhatItWrites) {
     }
 }
 
-TEST_F(SessionTrackTest, MeasuringMoovCostsTheSameAtAnyLength) {
-    session->config.chunk_offset_mode = MBX_OFFSETS_64;  // as in a normal file
-    ASSERT_EQ(MbxAddDataReference(session, 1, nullptr, 0, &number), MBX_OK);
-    const MbxVisualEntryParams entry = {1, 1, 16, 16, 72, 0, 72, 0};
-    ASSERT_EQ(MbxAddVideoEntry(session, 1, &entry, &number), MBX_OK);
-    uint32_t samples = 0;
-    // No table finds a run in these: 12 bytes a chunk in `stsc`, 8 in `co64`, and 20 a sample in `stts`,
-    // `ctts` and `stsz`, beside 2 in `stss`. Chunks have one sample and two by turns.
-    const auto addUpTo = [&](uint32_t count) {
-        for (; samples < count; samples++) {
-            MbxSampleInfo sample = {};
-            sample.size = samples;
-            sample.duration = samples % 2 + 1;
-            sample.compositionOffset = static_cast<int32_t>(samples % 2);
-            sample.isSync = samples % 2;
-            sample.descriptionIndex = 1;
-            ASSERT_EQ(MbxAddSample(session, 1, &sample, 0), MBX_OK);
-            if (samples % 3 != 1) {
-                ASSERT_EQ(MbxEndChunk(session, 1), MBX_OK);
-            }
-        }
-    };
-    struct Cost {
-        uint64_t allocations, clearedBytes, copies, peakBytes;
-        bool operator==(const Cost&) const = default;
-    };
-    const auto costOfMeasuring = [&] {
-        const Cost before = {host.allocations, host.clearedBytes, host.copies, host.liveBytes};
-        host.peakBytes = host.liveBytes;
-        EXPECT_EQ(MbxWriteMoov(session, nullptr, 0, &size), MBX_OK);
-        return Cost{host.allocations - before.allocations, host.clearedBytes - before.clearedBytes,
-                    host.copies - before.copies, host.peakBytes - before.peakBytes};
-    };
-    addUpTo(3000);  // every table fills a block
-    const Cost atFirst = costOfMeasuring();
-    const uint64_t sizeAtFirst = size;
-    addUpTo(240000);
-    EXPECT_EQ(costOfMeasuring(), atFirst);
-    EXPECT_EQ(size - sizeAtFirst, 237000 / 3 * (2 * (12 + 8) + 3 * (20 + 2)));
-}
-
 TEST_F(SessionTrackTest, MoovWaitsForTheEndOfEveryChunk) {
     ASSERT_EQ(MbxAddDataReference(session, 1, nullptr, 0, &number), MBX_OK);
     const MbxVisualEntryParams entry = {1, 1, 16, 16, 72, 0, 72, 0};
