@@ -42,6 +42,7 @@ TEST_F(SessionMovieTest, EveryCallThatNeedsAMovieSaysSo) {
     EXPECT_EQ(MbxAddTrackMetadata(session, 0, &item), MBX_ERR_BAD_STATE);
     EXPECT_EQ(MbxAddTrackReference(session, 1, &reference, &number), MBX_ERR_BAD_STATE);
     EXPECT_EQ(MbxAddEdit(session, 1, 0), MBX_ERR_BAD_STATE);
+    EXPECT_EQ(MbxSetEditDuration(session, 1, 0), MBX_ERR_BAD_STATE);
     EXPECT_EQ(MbxSetMovieTimes(session, 0, 1, 0, 0), MBX_ERR_BAD_STATE);
     EXPECT_EQ(MbxSetSignedOffsets(session, 1, 1), MBX_ERR_BAD_STATE);
     EXPECT_EQ(MbxWriteMoov(session, nullptr, 0, &size), MBX_ERR_BAD_STATE);
@@ -68,6 +69,7 @@ TEST_F(SessionMovieTest, NullSessionOrResultIsAnInvalidArgument) {
     EXPECT_EQ(MbxAddTrackReference(session, 1, nullptr, &number), MBX_ERR_INVALID_ARG);
     EXPECT_EQ(MbxAddTrackReference(session, 1, &reference, nullptr), MBX_ERR_INVALID_ARG);
     EXPECT_EQ(MbxAddEdit(nullptr, 1, 0), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxSetEditDuration(nullptr, 1, 0), MBX_ERR_INVALID_ARG);
     EXPECT_EQ(MbxSetMovieTimes(nullptr, 0, 1, 0, 0), MBX_ERR_INVALID_ARG);
     EXPECT_EQ(MbxSetSignedOffsets(nullptr, 1, 1), MBX_ERR_INVALID_ARG);
     EXPECT_EQ(MbxWriteMoov(nullptr, nullptr, 0, &size), MBX_ERR_INVALID_ARG);
@@ -161,7 +163,9 @@ TEST_F(SessionTrackTest, ReferencesEditsAndTimesReachTheTrack) {
     EXPECT_EQ(MbxAddTrackReference(session, 1, &reference, &number), MBX_ERR_INVALID_ARG);  // itself
     EXPECT_EQ(MbxAddTrackReference(session, 3, &reference, &number), MBX_ERR_NOT_FOUND);
     EXPECT_EQ(MbxAddEdit(session, 2, 0), MBX_OK);
+    EXPECT_EQ(MbxSetEditDuration(session, 2, 7), MBX_OK);
     EXPECT_EQ(MbxAddEdit(session, 3, 0), MBX_ERR_NOT_FOUND);
+    EXPECT_EQ(MbxSetEditDuration(session, 3, 0), MBX_ERR_NOT_FOUND);
     EXPECT_EQ(MbxAddEdit(session, 0, 0), MBX_ERR_INVALID_ARG);
     EXPECT_EQ(MbxSetMovieTimes(session, 0, UINT32_MAX, 11, 22), MBX_OK);
     EXPECT_EQ(MbxSetMovieTimes(session, 2, MBX_TIME_TRACK_CREATION, 33, 44), MBX_OK);
