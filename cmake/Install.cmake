@@ -37,7 +37,9 @@ install(FILES "${_packaging}/completion.bash" DESTINATION "${CMAKE_INSTALL_DATAD
 # The name of the program that a completion is for is the name of its file.
 install(FILES "${_packaging}/completion.bash" DESTINATION "${CMAKE_INSTALL_DATADIR}/bash-completion/completions"
     RENAME clipfile COMPONENT clipfile)
-install(FILES "${_packaging}/clipfile-receiver@.service" DESTINATION lib/systemd/system COMPONENT clipfile)
+set(_unit "${PROJECT_BINARY_DIR}/packaging/clipfile-receiver@.service")
+configure_file("${_packaging}/clipfile-receiver@.service.in" "${_unit}" @ONLY)
+install(FILES "${_unit}" DESTINATION lib/systemd/system COMPONENT clipfile)
 install(FILES "${_packaging}/clipfile.sysusers" DESTINATION lib/sysusers.d RENAME clipfile.conf COMPONENT clipfile)
 install(FILES "${_packaging}/example.toml" DESTINATION "${CMAKE_INSTALL_DOCDIR}/examples" COMPONENT clipfile)
 foreach(component clipfile libclipfile-dev)
@@ -57,6 +59,7 @@ write_basic_package_version_file("${PROJECT_BINARY_DIR}/packaging/clipfileConfig
     COMPATIBILITY SameMajorVersion)
 install(FILES "${PROJECT_BINARY_DIR}/packaging/clipfileConfig.cmake"
     "${PROJECT_BINARY_DIR}/packaging/clipfileConfigVersion.cmake" DESTINATION "${_config}" COMPONENT libclipfile-dev)
+file(RELATIVE_PATH CLIPFILE_PREFIX_FROM_PKGCONFIG "/${CMAKE_INSTALL_LIBDIR}/pkgconfig" "/")
 configure_file("${_packaging}/clipfile.pc.in" "${PROJECT_BINARY_DIR}/packaging/clipfile.pc" @ONLY)
 install(FILES "${PROJECT_BINARY_DIR}/packaging/clipfile.pc" DESTINATION "${CMAKE_INSTALL_LIBDIR}/pkgconfig"
     COMPONENT libclipfile-dev)
@@ -79,7 +82,8 @@ set(CPACK_DEBIAN_PACKAGE_SHLIBDEPS_PRIVATE_DIRS
 # Loaded when it is needed: the linker knows nothing of them.
 set(CPACK_DEBIAN_CLIPFILE_PACKAGE_DEPENDS "libavfilter8")
 set(CPACK_DEBIAN_CLIPFILE_PACKAGE_RECOMMENDS "libsmbclient, systemd")
-set(CPACK_DEBIAN_CLIPFILE_PACKAGE_CONTROL_EXTRA "${_packaging}/postinst;${_packaging}/postrm")
+set(CPACK_DEBIAN_CLIPFILE_PACKAGE_CONTROL_EXTRA "${_packaging}/postinst;${_packaging}/prerm;${_packaging}/postrm")
+set(CPACK_DEBIAN_PACKAGE_CONTROL_STRICT_PERMISSION TRUE)
 set(CPACK_DEBIAN_CLIPFILE_DESCRIPTION "recorder of live broadcast streams to MP4 files
 Records live H.264, AAC and timed metadata to rotating MP4 files,
 frame-accurately on record commands. This package has the receiver, which

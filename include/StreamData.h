@@ -12,11 +12,16 @@
 struct StreamData {
     virtual ~StreamData() = default;
 
-    /// Media clock of the unit: 90000 ticks a second for video and metadata, 48000 for audio.
+    /// Media clock of the unit: 90000 ticks a second for video and metadata, 48000 for audio. With the start
+    /// parameter "-pictureOrder" at "decoding", video is pushed in decoding order and these are its decoding
+    /// times; for audio and metadata they are the times at which they are presented in any case.
     std::uint64_t rtp_timestamp = 0;
     /// The same instant in milliseconds, on one clock for all three media.
     std::uint64_t timestamp = 0;
-    std::uint64_t reserved0 = 0;
+    /// Video with "-pictureOrder" at "decoding": when the picture is shown, in 90000 ticks a second of the
+    /// same clock as `rtp_timestamp`, and not before it. The low 32 bits count, so it may wrap as RTP
+    /// timestamps do: a picture is shown within 6 hours of its decoding. Not read otherwise.
+    std::uint64_t presentation_timestamp = 0;
     std::uint64_t reserved1 = 0;
     std::uint64_t reserved2 = 0;
     std::uint64_t reserved3 = 0;

@@ -25,6 +25,7 @@
 #include "module/SettingsFile.h"
 #include "operator/CommandQueue.h"
 #include "operator/Keyboard.h"
+#include "operator/Service.h"
 #include "output/FolderWatch.h"
 #include "output/ModuleLogFile.h"
 #include "output/OutputFolder.h"
@@ -55,10 +56,7 @@ void GiveToGroup() {
 class Running final : public SourceListenerInterface {
  public:
     Running(const Options& options, Signals& signals, DisplayInterface& display, int keyboard)
-        : options_(options), signals_(signals), display_(display), keyboard_(keyboard) {
-        current = this;
-    }
-    ~Running() { current = nullptr; }
+        : options_(options), signals_(signals), display_(display), keyboard_(keyboard) {}
     Running(const Running&) = delete;
     Running& operator=(const Running&) = delete;
 
@@ -84,23 +82,22 @@ class Running final : public SourceListenerInterface {
     void Command(RecordCommand command);
     void TellChanges(Recorder& recorder);
     void TellMissed();
-    static bool QuitAsked();
+    /// While the source is being opened.
+    bool QuitAsked();
     void TellLateStops(const Recorder& recorder);
     void Show(const SourceInterface& source, const Recorder& recorder);
     std::uint64_t Lost(const SourceInterface& source, const Recorder::Progress& progress) const;
     Summary Summarise(const SourceInterface& source, const Recorder::Progress& past);
 
-    /// The run, for the one callback that knows of no object. It comes on the thread of the run.
-    static Running* current;
-
     const Options& options_;
     Signals& signals_;
     DisplayInterface& display_;
     Keyboard keyboard_;
+    Service service_;
     std::unique_ptr<OutputFolder> folder_;
     std::optional<FolderWatch> watch_;
     std::optional<CrashRecovery> recovery_;
-    ModuleLog* log_ = nullptr;
+    std::optional<ModuleLog> log_;
     /// Each lives as long as the module, which may still hold one that a hanging disk has kept.
     std::vector<std::unique_ptr<Host>> hosts_;
     Host* host_ = nullptr;
@@ -123,8 +120,6 @@ class Running final : public SourceListenerInterface {
     std::optional<Clock::time_point> finishSince_;
     Clock::time_point shown_{};
 };
-
-Running* Running::current = nullptr;
 
 void Running::PrepareOutput(const OutputPlace& place) {
     if (options_.groupWrite) {
@@ -154,12 +149,12 @@ ExitCode Running::Record(const SourceOpener& open) {
     CheckUser(options_, place);
     PrepareOutput(place);
     const ModuleLibrary library(options_.module.value_or(ModuleLibrary::DefaultFile()));
-    ModuleLog log;
-    log_ = &log;
+    log_.emplace();
+    service_.Ready();
 
     std::unique_ptr<SourceInterface> source;
     try {
-        source = open(options_.source, *this, QuitAsked);
+        source = open(options_.source, *this, [this] { return QuitAsked(); });
     } catch (...) {
         // What it has found out is told before the reason of the end.
         recovery_->End(report_);
@@ -172,6 +167,7 @@ ExitCode Running::Record(const SourceOpener& open) {
     }
     display_.Notice("source: " + source->Description().summary);
     const Recorder::Progress progress = RecordAll(*source, library.Module(), place);
+    service_.Stopping();
     commands_.Close("the run is over");
     plan_.Finish();
     TellMissed();
@@ -332,13 +328,10 @@ void Running::Hear() {
 }
 
 bool Running::QuitAsked() {
-    Running* const run = current;
-    if (run == nullptr) {
-        return false;
-    }
-    run->TakeKeys();
-    run->recovery_->Follow(run->report_);
-    return run->quit_ || run->signals_.QuitRequested();
+    service_.Alive("waiting for the source");
+    TakeKeys();
+    recovery_->Follow(report_);
+    return quit_ || signals_.QuitRequested();
 }
 
 void Running::TakeKeys() {
@@ -426,6 +419,9 @@ void Running::Show(const SourceInterface& source, const Recorder& recorder) {
     snapshot.freeBytes = watch_->FreeBytes();
     snapshot.lost = Lost(source, recorder.Past());
     display_.Show(snapshot);
+    service_.Alive(!snapshot.recording     ? "not recording"
+                   : snapshot.file.empty() ? "recording, no file yet"
+                                           : "recording " + snapshot.file);
 }
 
 std::uint64_t Running::Lost(const SourceInterface& source, const Recorder::Progress& progress) const {

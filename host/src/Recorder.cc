@@ -16,7 +16,7 @@ namespace {
 constexpr std::array<unsigned char, 6> kDelimiter{0x00, 0x00, 0x00, 0x01, 0x09, 0xF0};
 
 /// Frames of silence behind the audio of a recording: one that may be written, and one behind that.
-constexpr int kSilentEnd = 2;
+constexpr std::int64_t kSilentEnd = 2;
 
 /// Half of the 48 chunks that may wait for the disk.
 constexpr std::size_t kChunksAhead = 24;
@@ -314,7 +314,7 @@ void Recorder::PushSilentEnd() {
         return;
     }
     const CodedAudio silence = SilentFrame();
-    for (int frame = 1; frame <= kSilentEnd; ++frame) {
+    for (std::int64_t frame = 1; frame <= kSilentEnd; ++frame) {
         feed_.PushAudio(lastAudio_->time + frame * kAudioFrame, silence.data, silence.size);
     }
 }

@@ -42,7 +42,7 @@ class ReceiverTest : public ::testing::Test {
     }
 
     ExitCode Record(std::unique_ptr<FakeSource> source) {
-        const auto open = [&](const SourceOptions&, SourceListenerInterface&, bool (*)()) {
+        const auto open = [&](const SourceOptions&, SourceListenerInterface&, const StopCheck&) {
             return std::move(source);
         };
         return RunReceiver(options_, open, signals_, display_, -1);
@@ -475,7 +475,7 @@ TEST_F(ReceiverTest, AFolderMayBeCalledNone) {
 
 TEST_F(ReceiverTest, ASourceThatCannotBeOpenedEndsTheRunWithItsSentence) {
     const auto open = [](const SourceOptions&, SourceListenerInterface&,
-                         bool (*)()) -> std::unique_ptr<SourceInterface> {
+                         const StopCheck&) -> std::unique_ptr<SourceInterface> {
         throw ReceiverError(ExitCode::kSourceUnavailable, "no answer from 'udp://:9'.");
     };
     EXPECT_EQ(RunReceiver(options_, open, signals_, display_, -1), ExitCode::kSourceUnavailable);
@@ -484,7 +484,7 @@ TEST_F(ReceiverTest, ASourceThatCannotBeOpenedEndsTheRunWithItsSentence) {
 
 TEST_F(ReceiverTest, AnEndDuringTheOpeningIsOrderly) {
     const auto open = [this](const SourceOptions&, SourceListenerInterface&,
-                             bool (*stop)()) -> std::unique_ptr<SourceInterface> {
+                             const StopCheck& stop) -> std::unique_ptr<SourceInterface> {
         EXPECT_FALSE(stop());
         kill(getpid(), SIGINT);
         while (!stop()) {

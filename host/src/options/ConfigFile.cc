@@ -2,8 +2,9 @@
 
 #include <toml++/toml.h>
 
+#include <array>
+#include <charconv>
 #include <optional>
-#include <sstream>
 
 #include "common/ReceiverError.h"
 
@@ -21,7 +22,8 @@ ReceiverError WrongAt(const std::string& place, const std::string& sentence) {
 /// As it would stand on the command line. Nothing for what no option takes: lists, tables, dates.
 std::optional<std::string> TextOf(const toml::node& value) {
     if (const auto* const text = value.as_string()) {
-        return text->get();
+        // A command line has no zero byte either.
+        return text->get().find('\0') == std::string::npos ? std::optional(text->get()) : std::nullopt;
     }
     if (const auto* const number = value.as_integer()) {
         return std::to_string(number->get());
@@ -30,9 +32,10 @@ std::optional<std::string> TextOf(const toml::node& value) {
         return truth->get() ? "true" : "false";
     }
     if (const auto* const number = value.as_floating_point()) {
-        std::ostringstream text;
-        text << number->get();
-        return text.str();
+        // As short as it can be without another value.
+        std::array<char, 32> text{};
+        const auto end = std::to_chars(text.data(), text.data() + text.size(), number->get()).ptr;
+        return std::string(text.data(), end);
     }
     return std::nullopt;
 }

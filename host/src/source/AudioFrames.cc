@@ -10,7 +10,7 @@ using Size = std::optional<std::size_t>;
 using Rates = std::array<std::size_t, 15>;
 
 /// `count` bits from bit `first` on.
-std::size_t Bits(Bytes bytes, std::size_t first, std::size_t count) {
+std::size_t BitsAt(Bytes bytes, std::size_t first, std::size_t count) {
     std::size_t value = 0;
     for (std::size_t bit = first; bit < first + count; ++bit) {
         value = value << 1 | (bytes[bit / 8] >> (7 - bit % 8) & 1U);
@@ -20,10 +20,10 @@ std::size_t Bits(Bytes bytes, std::size_t first, std::size_t count) {
 
 /// ADTS (ISO/IEC 14496-3 1.A.2.2): syncword, ID, layer 0, and further on aac_frame_length.
 Size AdtsSize(Bytes frame) {
-    if (frame.size() < 7 || Bits(frame, 0, 12) != 0xFFF || Bits(frame, 13, 2) != 0) {
+    if (frame.size() < 7 || BitsAt(frame, 0, 12) != 0xFFF || BitsAt(frame, 13, 2) != 0) {
         return std::nullopt;
     }
-    return Bits(frame, 30, 13);
+    return BitsAt(frame, 30, 13);
 }
 
 /// Kilobits a second of bitrate_index 1 to 14 (ISO/IEC 11172-3 2.4.2.3, 13818-3 2.4.2.3).
@@ -35,15 +35,15 @@ constexpr Rates kLow{0, 8, 16, 24, 32, 40, 48, 56, 64, 80, 96, 112, 128, 144, 16
 
 /// MPEG audio (ISO/IEC 11172-3 2.4.1.3 and 2.4.3.1).
 Size MpegSize(Bytes frame) {
-    if (frame.size() < 4 || Bits(frame, 0, 12) != 0xFFF) {
+    if (frame.size() < 4 || BitsAt(frame, 0, 12) != 0xFFF) {
         return std::nullopt;
     }
-    const bool low = Bits(frame, 12, 1) == 0;
+    const bool low = BitsAt(frame, 12, 1) == 0;
     // Written as 3, 2 and 1.
-    const std::size_t layer = 4 - Bits(frame, 13, 2);
-    const std::size_t index = Bits(frame, 16, 4);
-    const std::size_t frequency = Bits(frame, 20, 2);
-    const std::size_t padding = Bits(frame, 22, 1);
+    const std::size_t layer = 4 - BitsAt(frame, 13, 2);
+    const std::size_t index = BitsAt(frame, 16, 4);
+    const std::size_t frequency = BitsAt(frame, 20, 2);
+    const std::size_t padding = BitsAt(frame, 22, 1);
     if (layer > 3 || index == 0 || index == 15 || frequency == 3) {
         return std::nullopt;
     }
@@ -59,17 +59,17 @@ Size MpegSize(Bytes frame) {
 /// AC-3 and E-AC-3 (ETSI TS 102 366 4.4.1 and E.1.3.1): syncword, and by bsid the size of its frame or an
 /// index of the table of sizes.
 Size Ac3Size(Bytes frame) {
-    if (frame.size() < 6 || Bits(frame, 0, 16) != 0x0B77) {
+    if (frame.size() < 6 || BitsAt(frame, 0, 16) != 0x0B77) {
         return std::nullopt;
     }
     constexpr std::size_t kLastPlain = 10;
-    if (Bits(frame, 40, 5) > kLastPlain) {
-        return (Bits(frame, 21, 11) + 1) * 2;
+    if (BitsAt(frame, 40, 5) > kLastPlain) {
+        return (BitsAt(frame, 21, 11) + 1) * 2;
     }
     constexpr std::array<std::size_t, 19> kRates{32,  40,  48,  56,  64,  80,  96,  112, 128, 160,
                                                  192, 224, 256, 320, 384, 448, 512, 576, 640};
-    const std::size_t frequency = Bits(frame, 32, 2);
-    const std::size_t index = Bits(frame, 34, 6);
+    const std::size_t frequency = BitsAt(frame, 32, 2);
+    const std::size_t index = BitsAt(frame, 34, 6);
     if (frequency == 3 || index / 2 >= kRates.size()) {
         return std::nullopt;
     }

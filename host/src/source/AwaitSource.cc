@@ -18,7 +18,7 @@ constexpr std::chrono::milliseconds kAsk{50};
 
 void SteadyWaitClock::SleepUntil(TimePoint time) {
     while (Now() < time) {
-        if (stop_ != nullptr && stop_()) {
+        if (stop_ && stop_()) {
             throw Stopped();
         }
         std::this_thread::sleep_for(kAsk);

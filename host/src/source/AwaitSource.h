@@ -2,8 +2,10 @@
 
 #include <chrono>
 #include <functional>
+#include <utility>
 
 #include "source/SourceInterface.h"
+#include "source/StopCheck.h"
 
 namespace receiver {
 
@@ -24,15 +26,15 @@ class WaitClockInterface {
     virtual void SleepUntil(TimePoint time) = 0;
 };
 
-/// The time of this machine. `stop` may be null; true ends a wait.
+/// The time of this machine. `stop` ends a wait.
 class SteadyWaitClock final : public WaitClockInterface {
  public:
-    explicit SteadyWaitClock(bool (*stop)()) : stop_(stop) {}
+    explicit SteadyWaitClock(StopCheck stop) : stop_(std::move(stop)) {}
     TimePoint Now() override { return std::chrono::steady_clock::now(); }
     void SleepUntil(TimePoint time) override;
 
  private:
-    bool (*const stop_)();
+    const StopCheck stop_;
 };
 
 /// Calls `attempt` until it does not throw `SourceAbsent`, with pauses; `listens`: an attempt itself waits

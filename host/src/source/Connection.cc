@@ -72,6 +72,7 @@ Connection::Connection(std::unique_ptr<Input> input, const SourceOptions& option
     }
     watch_.emplace(video_->codecpar->codec_id, paths_.description.frameRate, paths_.passes);
     clock_.emplace(*video_, audio_, input_->Recorded());
+    steps_.emplace(*clock_);
     ReadTimecodeTag();
     paths_.description.summary += klv_.empty() ? "" : ", KLV";
 }
@@ -168,11 +169,13 @@ bool Connection::Pump() {
         av_packet_unref(untouched_.get());
         libav::Check(av_packet_ref(untouched_.get(), packet_.get()), "hold a packet");
     }
+    if ((packet_->flags & AV_PKT_FLAG_CORRUPT) != 0) {
+        steps_->Mark(assembler_->LastPicture());
+    }
     if (input_->Transport() && IsOf(*packet_, audio_)) {
         newSounds_ = 0;
         for (const auto& packet : runs_.Put(std::exchange(packet_, libav::NewPacket()),
                                             audio_->codecpar->codec_id, audio_->time_base)) {
-            position_ = packet->pos;
             Handle(*packet);
         }
         return true;
@@ -181,7 +184,6 @@ bool Connection::Pump() {
         ++damaged_;
         return true;
     }
-    position_ = packet_->pos;
     if (IsOf(*packet_, video_)) {
         input_->Alive();
         HandleExpired();
@@ -223,6 +225,21 @@ StreamClock::Track* Connection::KlvTrackOf(const AVPacket& packet) {
 }
 
 void Connection::Handle(AVPacket& packet) {
+    steps_->Put(packet, SteppingMedium(packet), assembler_->LastPicture(),
+                [this](AVPacket& next) { Process(next); });
+}
+
+std::optional<StepWatch::Medium> Connection::SteppingMedium(const AVPacket& packet) const {
+    const bool marked = input_->Transport() && !input_->Recorded() && paths_.passes && audio_ != nullptr &&
+                        clock_->Anchored();
+    if (marked && IsOf(packet, video_)) {
+        return StepWatch::Medium::kVideo;
+    }
+    return marked && IsOf(packet, audio_) ? std::optional(StepWatch::Medium::kAudio) : std::nullopt;
+}
+
+void Connection::Process(AVPacket& packet) {
+    position_ = packet.pos;
     const bool audio = IsOf(packet, audio_);
     newPictures_ = IsOf(packet, video_) ? 0 : newPictures_;
     newSounds_ = audio ? 0 : newSounds_;
@@ -345,6 +362,7 @@ void Connection::Finish() {
         for (const auto& packet : runs_.Finish()) {
             Handle(*packet);
         }
+        steps_->Release([this](AVPacket& packet) { Process(packet); });
     } catch (const FormatChanged&) {
         // Nothing follows in which the new format could go on.
     }

@@ -13,6 +13,7 @@
 #include "source/Input.h"
 #include "source/KlvPackets.h"
 #include "source/LookAhead.h"
+#include "source/StepHold.h"
 #include "source/StreamClock.h"
 #include "source/StreamPaths.h"
 #include "source/UnitAssembler.h"
@@ -69,6 +70,11 @@ class Connection {
     void CheckOther(const AVPacket& packet);
     bool NextPacket();
     void Handle(AVPacket& packet);
+    void Process(AVPacket& packet);
+    /// Which of the two media it is of, where steps of the clock can be told from losses: in a live stream
+    /// whose missing packets are marked. Of a file, where counters of four bits are all that tells, a loss
+    /// would at times be taken for a step.
+    std::optional<StepWatch::Medium> SteppingMedium(const AVPacket& packet) const;
     /// The sound that waits for a stamp which the pictures have passed.
     void HandleExpired();
     void HandleVideo(AVPacket& packet);
@@ -99,6 +105,7 @@ class Connection {
     std::optional<FormatWatch> watch_;
     std::optional<StreamClock> clock_;
     KlvPackets klvPackets_;
+    std::optional<StepHold> steps_;
     /// Of the audio of a transport stream.
     AudioRuns runs_;
     libav::Owner<AVPacket> packet_;

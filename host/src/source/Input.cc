@@ -93,7 +93,7 @@ std::string Reason(int result) {
 }  // namespace
 
 Input::Input(const std::string& url, double timeout, double patience, std::shared_ptr<Interrupt> interrupt,
-             bool (*stop)())
+             const StopCheck& stop)
     : url_(url),
       timeout_(timeout),
       patience_(patience),
@@ -112,7 +112,7 @@ int Input::OnWait(void* input) {
 
 bool Input::StopAsked() const {
     // The thread comes first: on another one not even the pointer may be read.
-    return interrupt_->Stopped() || (std::this_thread::get_id() == opener_ && stop_ != nullptr && stop_());
+    return interrupt_->Stopped() || (std::this_thread::get_id() == opener_ && stop_ && stop_());
 }
 
 void Input::Expect(double seconds) {

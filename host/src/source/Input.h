@@ -13,6 +13,7 @@
 #include "common/ReceiverError.h"
 #include "source/Interrupt.h"
 #include "source/Libav.h"
+#include "source/StopCheck.h"
 
 namespace receiver {
 
@@ -41,11 +42,11 @@ class Stopped : public std::runtime_error {
 class Input {
  public:
     /// Opens `url` and finds out what it carries. `patience`: seconds that it may take to answer. `timeout`:
-    /// seconds that may pass later between two calls of `Alive`, 30 at the least for HLS. `stop` may be null;
-    /// it is asked until this returns, on the calling thread alone. Throws `ReceiverError`
+    /// seconds that may pass later between two calls of `Alive`, 30 at the least for HLS. `stop` is
+    /// asked until this returns, on the calling thread alone. Throws `ReceiverError`
     /// (`kSourceUnavailable`), of it `SourceAbsent` where a later attempt may succeed, and `Stopped`.
     Input(const std::string& url, double timeout, double patience, std::shared_ptr<Interrupt> interrupt,
-          bool (*stop)());
+          const StopCheck& stop);
 
     AVFormatContext& Format() { return *format_; }
     /// Finds out anew what the source carries. A transport stream goes on from byte `position` of the
@@ -106,7 +107,7 @@ class Input {
     /// these.
     const std::thread::id opener_;
     /// Null once the source is open.
-    bool (*stop_)();
+    StopCheck stop_;
     /// When the present wait is over, on the steady clock.
     std::atomic<std::chrono::steady_clock::rep> deadline_{0};
     /// A wait was over. The libraries may give out what they still hold before they tell.

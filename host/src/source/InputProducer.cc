@@ -17,7 +17,7 @@ constexpr std::array<int, 5> kPauses{1, 2, 4, 8, 15};
 constexpr std::chrono::seconds kGood{30};
 
 std::unique_ptr<Connection> Connect(const SourceOptions& options, double patience,
-                                    const std::shared_ptr<Interrupt>& interrupt, bool (*stop)(),
+                                    const std::shared_ptr<Interrupt>& interrupt, const StopCheck& stop,
                                     const SourceDescription* before) {
     try {
         return std::make_unique<Connection>(
@@ -39,7 +39,7 @@ std::int64_t Ticks(std::chrono::steady_clock::duration time) {
 }  // namespace
 
 InputProducer::InputProducer(const SourceOptions& options, double patience,
-                             std::shared_ptr<Interrupt> interrupt, bool (*stop)())
+                             std::shared_ptr<Interrupt> interrupt, const StopCheck& stop)
     : options_(options),
       interrupt_(std::move(interrupt)),
       connection_(Connect(options_, patience, interrupt_, stop, nullptr)),
@@ -169,10 +169,11 @@ void InputProducer::TryAgain() {
 }
 
 void InputProducer::Change(const std::string& reason) {
+    // What it still gives out stands in front of that.
+    const std::int64_t position = connection_->Position();
     connection_->Finish();
     ++changes_;
     KeepCounts();
-    const std::int64_t position = connection_->Position();
     const std::int64_t passed = recorded_ ? 0 : Ticks(Clock::now() - lastPicture_);
     Packets unread = connection_->TakeUnread();
     std::unique_ptr<Input> input = Connection::End(std::move(connection_));

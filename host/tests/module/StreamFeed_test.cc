@@ -196,7 +196,7 @@ TEST(StreamFeed, AModuleThatHaltsIsWaitedForOnce) {
 TEST(StreamFeed, AQueueThatHaltsDoesNotLetTheOthersOverflow) {
     QueueingModule module;
     module.keepsAudio = true;
-    StreamFeed feed(module, std::chrono::milliseconds(500));
+    StreamFeed feed(module, std::chrono::seconds(3));
     for (int i = 0; i < 3000; ++i) {
         if (i < 60) {
             feed.PushAudio(i, Bytes(1), 1);

@@ -84,6 +84,11 @@ TEST_F(ConfigFileTest, HoldsOptionsUnderTheirNames) {
     EXPECT_EQ(options.record.size(), 2u);
 }
 
+TEST_F(ConfigFileTest, ANumberKeepsItsDigits) {
+    EXPECT_EQ(Parsed("seconds = 86401.25\n").seconds, 86401.25);
+    EXPECT_EQ(Parsed("seconds = 1234567.5\n").seconds, 1234567.5);
+}
+
 TEST_F(ConfigFileTest, AnEmptyOneChangesNothing) {
     EXPECT_EQ(Parsed("").source.url, "test:");
 }
@@ -128,6 +133,8 @@ TEST_F(ConfigFileTest, AValueThatNoOptionTakesIsRefusedWithLineAndColumn) {
     EXPECT_EQ(Refusal("[input]\nurl = 3\n"),
               "studio1.toml:1:1: input is a text or a number, and nothing else.");
     EXPECT_EQ(Refusal("prefix = true\n"),
+              "studio1.toml:1:10: prefix is a text or a number, and nothing else.");
+    EXPECT_EQ(Refusal("prefix = \"a\\u0000b\"\n"),
               "studio1.toml:1:10: prefix is a text or a number, and nothing else.");
     EXPECT_EQ(Refusal("json = 1\n"), "studio1.toml:1:8: json is true or false.");
 }

@@ -178,6 +178,10 @@ MbxStatus MbxAddTrackReference(MbxSession* session, uint32_t track, const MbxTra
 // bits in time_version_mode 0 and 2.
 MbxStatus MbxAddEdit(MbxSession* session, uint32_t track, uint32_t fromZero);
 
+// Overwrites how long the track's last edit lasts, in ticks of the movie. MBX_ERR_BAD_STATE for a track
+// without edits, and as above.
+MbxStatus MbxSetEditDuration(MbxSession* session, uint32_t track, uint64_t duration);
+
 // Sets the times that `selector` (MbxTimeSelector) names, in seconds since 1904: with track 0 on the movie,
 // every track and every metadata track, otherwise on that track's headers alone. MBX_ERR_BAD_STATE for a time
 // above 32 bits in time_version_mode 0 and 2.

@@ -244,11 +244,11 @@ TEST_F(ModuleAbi, ParametersAreAskedForInOrderWithTheirDefaults) {
     ConfigureIdle(host);
     ASSERT_TRUE(module_->Initialize(&host));
     EXPECT_TRUE(module_->Uninitialize());
-    EXPECT_THAT(
-        host.Questions(),
-        ElementsAre("-filePrefix=Unknown-Model", "-outputPath=none", "-userName=operator", "-password=a b;c",
-                    "-fileType=normal", "-naluType=normal", "-outputMode=on", "-encodedHeight=720",
-                    "-encodedWidth=1280", "-encodedFPS=29970", "-encodedBPS=60000", "-recordRules=kept"));
+    EXPECT_THAT(host.Questions(),
+                ElementsAre("-filePrefix=Unknown-Model", "-outputPath=none", "-userName=operator",
+                            "-password=a b;c", "-fileType=normal", "-naluType=normal", "-outputMode=on",
+                            "-encodedHeight=720", "-encodedWidth=1280", "-encodedFPS=29970",
+                            "-encodedBPS=60000", "-recordRules=kept", "-pictureOrder=presentation"));
 }
 
 TEST_F(ModuleAbi, ParametersOfTheHostArrive) {

@@ -45,7 +45,7 @@ void printRecords() {
     printSize<StreamData>("StreamData");
     printField("rtp_timestamp", unit, unit.rtp_timestamp);
     printField("timestamp", unit, unit.timestamp);
-    printField("word 1", unit, unit.reserved0);
+    printField("word 1", unit, unit.presentation_timestamp);
     printField("word 2", unit, unit.reserved1);
     printField("word 3", unit, unit.reserved2);
     printField("word 4", unit, unit.reserved3);

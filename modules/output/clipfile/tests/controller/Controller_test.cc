@@ -207,7 +207,7 @@ TEST_F(ControllerTest, StartParametersAreAskedForInTheirOrder) {
     EXPECT_EQ(host_.AskedParameters(),
               (std::vector<std::string>{"-filePrefix", "-outputPath", "-userName", "-password", "-fileType",
                                         "-naluType", "-outputMode", "-encodedHeight", "-encodedWidth",
-                                        "-encodedFPS", "-encodedBPS", "-recordRules"}));
+                                        "-encodedFPS", "-encodedBPS", "-recordRules", "-pictureOrder"}));
 }
 
 TEST_F(ControllerTest, RecordRulesAreKeptUnlessExactAreAskedFor) {
@@ -233,6 +233,33 @@ TEST_F(ControllerTest, UnknownRecordRulesAreSaidAndCountAsKept) {
     ASSERT_TRUE(Initialize());
     EXPECT_EQ(peer_.Settings().recordRules, RecordRules::kKept);
     const auto line = log_.Find("unknown record rules \"Exact\", \"kept\" is used.");
+    ASSERT_TRUE(line);
+    EXPECT_EQ(line->priority, LOG_PRIORITY_WARNING);
+}
+
+TEST_F(ControllerTest, PicturesComeInTheOrderOfShowingUnlessThatOfDecodingIsAnnounced) {
+    registry_.Set("MP4OutputPath", "a");
+    ASSERT_TRUE(Initialize());
+    EXPECT_EQ(peer_.Settings().pictureOrder, PictureOrder::kPresentation);
+    Uninitialize();
+    host_.texts["-pictureOrder"] = "decoding";
+    ASSERT_TRUE(Initialize());
+    EXPECT_EQ(peer_.Settings().pictureOrder, PictureOrder::kDecoding);
+    EXPECT_TRUE(log_.Contains(LOG_PRIORITY_TRACE, "clipfileModule::Controller::Initialize",
+                              "pictureOrder = decoding."));
+    Uninitialize();
+    host_.texts["-pictureOrder"] = "presentation";
+    ASSERT_TRUE(Initialize());
+    EXPECT_EQ(peer_.Settings().pictureOrder, PictureOrder::kPresentation);
+    EXPECT_FALSE(log_.Find("unknown picture order \"presentation\", \"presentation\" is used."));
+}
+
+TEST_F(ControllerTest, AnUnknownPictureOrderIsSaidAndCountsAsThatOfShowing) {
+    registry_.Set("MP4OutputPath", "a");
+    host_.texts["-pictureOrder"] = "Decoding";
+    ASSERT_TRUE(Initialize());
+    EXPECT_EQ(peer_.Settings().pictureOrder, PictureOrder::kPresentation);
+    const auto line = log_.Find("unknown picture order \"Decoding\", \"presentation\" is used.");
     ASSERT_TRUE(line);
     EXPECT_EQ(line->priority, LOG_PRIORITY_WARNING);
 }

@@ -38,6 +38,20 @@ class PreRollTest : public testing::Test {
     PreRoll preRoll_;
 };
 
+TEST_F(PreRollTest, PicturesInDecodingOrderBelongToTheInstantAtWhichTheyAreShown) {
+    preRoll_.SetPictureOrder(PictureOrder::kDecoding);
+    // Decoded at 960, 1000 and 1040 ms, shown at 1040, 1160 and 1000 ms.
+    const std::uint64_t shown[] = {1040, 1160, 1000};
+    for (std::uint64_t i = 0; i < 3; ++i) {
+        auto unit = unitAt(960 + 40 * i);
+        unit->rtp_timestamp = 90 * unit->timestamp;
+        unit->presentation_timestamp = 90 * shown[i];
+        preRoll_.Add(V, unit);
+    }
+    EXPECT_EQ(From(1040), (Names{"V960", "V1000"}));
+    EXPECT_EQ(From(1041), (Names{"V1000"}));
+}
+
 TEST_F(PreRollTest, GivesTheMediaInStepAndAtTheSameInstantMetadataAudioVideo) {
     for (const std::uint64_t t : {1000, 1040, 1080}) {
         Add(V, t);

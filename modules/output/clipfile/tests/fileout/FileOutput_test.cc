@@ -353,6 +353,32 @@ TEST_F(ExactFileOutputTest, AFileWaitsTwoMinutesForAnIdrFrame) {
                             "2 Write 6", "3 Write 7", "3 Write 8"));
 }
 
+TEST_F(ExactFileOutputTest, InDecodingOrderAFileNeverEndsInFrontOfAnythingButAnIdrFrame) {
+    // As above; the next IDR frame comes with chunk 8, where audio and video are not quite in step.
+    settings.pictureOrder = PictureOrder::kDecoding;
+    muxers.SetChunkDuration(25000 * 30);
+    settings.maxFileSize = 1;
+    Start();
+    for (std::uint64_t chunk = 0; chunk < 10; ++chunk) {
+        push(chunk, chunk != 3 && chunk != 7, chunk == 0 || chunk == 4 || chunk == 8);
+    }
+    Finish();
+    EXPECT_THAT(MuxerCalls(" Write "),
+                ElementsAre("2 Write 0", "2 Write 1", "2 Write 2", "2 Write 3", "2 Write 4", "2 Write 5",
+                            "2 Write 6", "2 Write 7", "3 Write 8", "3 Write 9"));
+}
+
+TEST_F(FileOutputTest, InDecodingOrderKeptRulesWaitForAnIdrFrameToo) {
+    settings.pictureOrder = PictureOrder::kDecoding;
+    settings.maxFileSize = 0;
+    Start();
+    output->PushChunk(MakeChunk(0, true, 10, true));
+    output->PushChunk(MakeChunk(1, true, 10, false));
+    output->PushChunk(MakeChunk(2, true, 10, true));
+    Finish();
+    EXPECT_THAT(MuxerCalls(" Write "), ElementsAre("2 Write 0", "2 Write 1", "3 Write 2"));
+}
+
 TEST_F(FileOutputTest, WithKeptRulesAFileEndsAtTheFirstCadencePoint) {
     settings.maxFileSize = 0;
     Start();

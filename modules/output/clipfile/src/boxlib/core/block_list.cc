@@ -10,8 +10,6 @@ MbxStatus MbxBlockListGrow(MbxContext* context, MbxBlockList* list, uint64_t ent
         return MBX_ERR_NO_MEMORY;
     }
     if (list->current != nullptr) {
-        const uint32_t room = UINT32_MAX - list->full;
-        list->full += list->current->count < room ? list->current->count : room;
         list->current->next = block;
     } else {
         list->first = block;
@@ -23,7 +21,10 @@ MbxStatus MbxBlockListGrow(MbxContext* context, MbxBlockList* list, uint64_t ent
 MbxStatus MbxBlockListCount(const MbxBlockList* list, uint32_t* total) {
     if (total == nullptr) return MBX_ERR_INVALID_ARG;
     uint64_t sum = 0;
-    if (list != nullptr && list->current != nullptr) sum = uint64_t{list->full} + list->current->count;
+    for (const MbxBlock* block = list != nullptr ? list->first : nullptr; block != nullptr;
+         block = block->next) {
+        sum += block->count;
+    }
     if (sum > UINT32_MAX) return MBX_ERR_OVERFLOW;
     *total = static_cast<uint32_t>(sum);
     return MBX_OK;
@@ -46,5 +47,4 @@ void MbxBlockListRelease(MbxContext* context, MbxBlockList* list) {
         MbxFree(context, block);
     }
     list->current = nullptr;
-    list->full = 0;
 }

@@ -14,7 +14,6 @@ struct MbxBlock {
 
 struct MbxBlockList {
     uint32_t capacity;  // entries per block
-    uint32_t full;      // entries in the blocks in front of the current one; all ones: or more
     MbxBlock* first;
     MbxBlock* current;
 };
@@ -50,8 +49,8 @@ inline const Entry* MbxBlockListFirst(const MbxBlockList* list) {
     return list->first != nullptr && list->first->count != 0 ? MbxBlockEntries<Entry>(list->first) : nullptr;
 }
 
-// The number of entries, at no cost for the length; a null list gives 0. MBX_ERR_INVALID_ARG for a null
-// result, MBX_ERR_OVERFLOW beyond 32 bits.
+// The number of entries; a null list gives 0. MBX_ERR_INVALID_ARG for a null result, MBX_ERR_OVERFLOW beyond
+// 32 bits.
 MbxStatus MbxBlockListCount(const MbxBlockList* list, uint32_t* total);
 
 // The same for a 16-bit field: MBX_ERR_OVERFLOW above 65535.

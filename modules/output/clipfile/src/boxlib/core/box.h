@@ -2,7 +2,7 @@
 //
 // A box is measured and written by the same code. Its payload writer is the one description of its bytes; run
 // with a null file it only counts. There is no other size calculation, so sizes cannot drift from what is
-// written. A box is measured once, when it is built; the box around it counts that size.
+// written.
 //
 // ---- How to write a box ----
 //
@@ -69,14 +69,12 @@ MbxStatus MbxMeasureBox(MbxContext* context, const MbxOptions* options, Box* box
 }
 
 // Writes the header with the stored size, then the payload right behind it. MBX_ERR_INVALID_ARG for a null
-// record. Without a file it is the stored size that counts: the builder has measured the payload with the
-// same writer, and each level of the tree is measured once.
+// record.
 template <typename Box, typename Payload>
 MbxStatus MbxWriteBox(MbxContext* context, const MbxOptions* options, MbxFile* file, uint64_t position,
                       uint32_t code, const Box* box, Payload&& payload, uint64_t* written,
                       uint64_t* accumulated) {
     if (box == nullptr) return MBX_ERR_INVALID_ARG;
-    if (file == nullptr) return MbxReportBytes(box->size, written, accumulated);
     uint64_t count = 0;
     MBX_TRY(MbxWriteBoxHeader(context, options, file, position, box->size, code, nullptr, &count));
     MBX_TRY(MbxCallPayload<Box>(payload, context, options, file, position + count, box, nullptr, &count));
@@ -205,25 +203,18 @@ MbxStatus MbxFreeBox(MbxContext* context, Record* record) {
 
 // Writes a block list as a table of `cells` words of type Cell per entry, where the stream stands: per block
 // one temporary array, filled by `convert(entry, row)` for each entry, and one write. An empty block ends the
-// walk.
-//
-// Measuring takes as long for a day as for a minute: nothing is converted that nobody would read, and only
-// the first block's array is taken. It is the largest, and each is released before the next one is taken, so
-// that a quota refuses measuring where it would refuse writing.
+// walk. Measuring makes the same calls of the context, and leaves out only the conversion, which nobody would
+// read.
 template <typename Entry, typename Cell, uint32_t cells, typename Convert>
 MbxStatus MbxWriteTable(MbxContext* context, MbxFile* file, const MbxBlockList* list, Convert&& convert,
                         uint64_t* accumulated) {
     for (const MbxBlock* block = list->first; block != nullptr && block->count != 0; block = block->next) {
         Cell* rows = nullptr;
         MBX_TRY(MbxNewArray(context, uint64_t{block->count} * cells, &rows));
-        if (file == nullptr) {
-            MbxFree(context, rows);
-            uint32_t entries = 0;
-            MBX_TRY(MbxBlockListCount(list, &entries));
-            return MbxReportBytes(uint64_t{entries} * cells * sizeof(Cell), nullptr, accumulated);
-        }
         const Entry* entries = MbxBlockEntries<Entry>(block);
-        for (uint32_t i = 0; i < block->count; i++) convert(entries[i], rows + i * cells);
+        if (file != nullptr) {
+            for (uint32_t i = 0; i < block->count; i++) convert(entries[i], rows + i * cells);
+        }
         const MbxStatus status = MbxWriteBytes(
             context, file, rows, uint64_t{block->count} * cells * sizeof(Cell), nullptr, accumulated);
         MbxFree(context, rows);

@@ -7,7 +7,7 @@ namespace {
 
 // Empty tables; the sign of the composition offsets stays.
 void clearTables(MbxSampleSegment* segment) {
-    constexpr MbxBlockList kEmpty = {MBX_BLOCK_CAPACITY, 0, nullptr, nullptr};
+    constexpr MbxBlockList kEmpty = {MBX_BLOCK_CAPACITY, nullptr, nullptr};
     segment->durations = {kEmpty, nullptr};
     segment->compositionOffsets.runs = {kEmpty, nullptr};
     segment->chunks = {0, 0, 0, 0, kEmpty, nullptr};

@@ -130,14 +130,6 @@ MbxStatus collectDependencies(ByteCollector* collector, const MbxDependencyList&
     return flush(collector);
 }
 
-// What the above writes, for measuring.
-MbxStatus countDependencies(const MbxDependencyList& dependencies, uint64_t* count) {
-    uint32_t listed = 0;
-    MBX_TRY(MbxBlockListCount(&dependencies.list, &listed));
-    *count += uint64_t{dependencies.first != nullptr} + dependencies.runCount + listed;
-    return MBX_OK;
-}
-
 }  // namespace
 
 // 8.6.4 Independent and Disposable Samples Box
@@ -156,8 +148,7 @@ MbxStatus MbxWriteSdtpPayload(MbxContext* context, MbxFile* file, uint64_t posit
     const uint64_t block = dependencies.list.first != nullptr ? dependencies.list.first->count : 0;
     ByteCollector collector = {context, file, nullptr, run > block ? run : block, 0, &count};
     MBX_TRY(MbxNewArray(context, collector.capacity, &collector.data));
-    const MbxStatus status = file != nullptr ? collectDependencies(&collector, dependencies)
-                                             : countDependencies(dependencies, &count);
+    const MbxStatus status = collectDependencies(&collector, dependencies);
     MbxFree(context, collector.data);
     MBX_TRY(status);
     return MbxReportBytes(count, written, accumulated);

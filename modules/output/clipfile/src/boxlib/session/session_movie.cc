@@ -84,6 +84,12 @@ MbxStatus MbxAddEdit(MbxSession* session, uint32_t track, uint32_t fromZero) {
     return MbxTrackAddEdit(session->context, &session->config, session->movie, found, fromZero);
 }
 
+MbxStatus MbxSetEditDuration(MbxSession* session, uint32_t track, uint64_t duration) {
+    MbxTrack* found = nullptr;
+    MBX_TRY(MbxRequireTrack(session, track, &found));
+    return MbxTrackSetEditDuration(&session->config, found, duration);
+}
+
 MbxStatus MbxSetMovieTimes(MbxSession* session, uint32_t track, uint32_t selector, uint64_t creation,
                            uint64_t modification) {
     MBX_TRY(MbxRequireMovie(session));
@@ -91,7 +97,7 @@ MbxStatus MbxSetMovieTimes(MbxSession* session, uint32_t track, uint32_t selecto
                             modification);
 }
 
-// Contract: operations-for-others. The module reorders nothing.
+// Contract: operations-for-others. The module's offsets are never below 0.
 MbxStatus MbxSetSignedOffsets(MbxSession* session, uint32_t track, uint32_t signedOffsets) {
     MbxTrack* found = nullptr;
     MBX_TRY(MbxRequireTrack(session, track, &found));

@@ -65,6 +65,10 @@ MbxStatus MbxAddTrackReference(MbxContext* context, const MbxMovie* movie, MbxTr
 MbxStatus MbxTrackAddEdit(MbxContext* context, const MbxOptions* options, const MbxMovie* movie,
                           MbxTrack* track, uint32_t fromZero);
 
+// Overwrites the duration of the track's last edit, in ticks of the movie. MBX_ERR_BAD_STATE without edits,
+// and in time_version_mode 0 and 2 for more than 32 bits.
+MbxStatus MbxTrackSetEditDuration(const MbxOptions* options, MbxTrack* track, uint64_t duration);
+
 // Sets those of the two times that the bits `creationBit` and the next one of `selector` name, and the same
 // two bits from `creationField` on in `fieldsSet`. MBX_ERR_BAD_STATE for a time above 32 bits in
 // time_version_mode 0 and 2.

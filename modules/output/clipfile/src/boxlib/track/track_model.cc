@@ -322,6 +322,14 @@ MbxStatus MbxTrackAddEdit(MbxContext* context, const MbxOptions* options, const 
     return MBX_OK;
 }
 
+MbxStatus MbxTrackSetEditDuration(const MbxOptions* options, MbxTrack* track, uint64_t duration) {
+    if (MbxAnyNull(options, track)) return MBX_ERR_INVALID_ARG;
+    if (hasNarrowTimes(options) && duration > UINT32_MAX) return MBX_ERR_BAD_STATE;
+    if (track->editList == nullptr || track->editList->edits.last == nullptr) return MBX_ERR_BAD_STATE;
+    track->editList->edits.last->segmentDuration = duration;
+    return MBX_OK;
+}
+
 MbxStatus MbxSetTimePair(const MbxOptions* options, const MbxTimePair& pair, uint32_t selector,
                          uint64_t creation, uint64_t modification) {
     const bool isNarrow = hasNarrowTimes(options);

@@ -14,6 +14,7 @@
 #include "common/JoinThread.h"
 #include "common/Log.h"
 #include "common/LogScope.h"
+#include "common/PresentationTime.h"
 
 namespace clipfileModule {
 
@@ -103,7 +104,7 @@ void StreamBuffer::Start(const OutputSettings& recordSettings) {
     {
         MutexLock lock(stateMutex);
         queues = started;
-        changeState(std::make_shared<WaitStartCacheState>(this, settings.recordRules));
+        changeState(std::make_shared<WaitStartCacheState>(this, settings.recordRules, settings.pictureOrder));
     }
     if (!startThreads(started)) {
         control.Unlock();
@@ -299,7 +300,8 @@ void StreamBuffer::SetVideoSequenceHeader(const nal_access::NalUnit& sps, const 
 
     MutexLock lock(bufferMutex);
     if (!isExact()) {
-        const std::uint64_t limit = unit->timestamp == 0 ? 0 : unit->timestamp - half;
+        const std::uint64_t shown = PresentationMilliSec(*unit, settings.pictureOrder);
+        const std::uint64_t limit = shown == 0 ? 0 : shown - half;
         removeBefore(videoBuffer, limit);
         removeBefore(audioBuffer, limit);
         removeBefore(metaBuffer, limit);
@@ -310,6 +312,9 @@ void StreamBuffer::SetVideoSequenceHeader(const nal_access::NalUnit& sps, const 
     // Contract: idr-frame-unsorted. The cache is empty here.
     videoBuffer.push_back(unit);
     firstPicture = unit;
+    if (hasTimeline()) {
+        presentationOrder.Begin(framesIn(static_cast<std::int64_t>(shownAt(*unit) - unit->rtp_timestamp)));
+    }
     if (isExact()) {
         startInStep();
     }
@@ -363,7 +368,7 @@ bool StreamBuffer::MakeFileTimecode(const std::shared_ptr<ChunkData>& chunk) {
     const std::int64_t duration = streamInfo.video_sample_duration;
     if (tcStatus == 2 && duration != 0) {
         const auto distance =
-            static_cast<std::int64_t>(chunk->firstVideo->rtp_timestamp - chunk->firstMeta->rtp_timestamp);
+            static_cast<std::int64_t>(shownAt(*chunk->firstVideo) - chunk->firstMeta->rtp_timestamp);
         if (isExact()) {
             offset = framesIn(distance);
         } else {
@@ -385,8 +390,12 @@ bool StreamBuffer::MakeFileTimecode(const std::shared_ptr<ChunkData>& chunk) {
     // Contract: file-first-without-timecode. Logged with zeros then.
     CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: FILE FIRST. %02d:%02d:%02d:%02d. RTPTS = %lld.",
                        fileTimecode[0], fileTimecode[1], fileTimecode[2], fileTimecode[3],
-                       static_cast<long long>(chunk->firstVideo->rtp_timestamp));
+                       static_cast<long long>(shownAt(*chunk->firstVideo)));
     return result;
+}
+
+std::uint64_t StreamBuffer::shownAt(const StreamData& unit) const {
+    return PresentationRtp(unit, settings.pictureOrder);
 }
 
 int StreamBuffer::framesIn(std::int64_t distance) const {

@@ -14,6 +14,7 @@
 #include "StreamAnalyzer.h"
 #include "StreamData.h"
 #include "buffer/ChunkPass.h"
+#include "buffer/PresentationOrder.h"
 #include "buffer/chunk/ChunkData.h"
 #include "buffer/queue/StreamQueue.h"
 #include "buffer/state/CacheState.h"
@@ -125,6 +126,9 @@ class StreamBuffer final : public QxModuleStreamInterface,
     void Cancel() REQUIRES(controlMutex) EXCLUDES(bufferMutex);
     bool startThreads(const std::vector<std::shared_ptr<StreamQueue>>& started) REQUIRES(controlMutex);
     bool isExact() const { return settings.recordRules == RecordRules::kExact; }
+    bool inDecodingOrder() const { return settings.pictureOrder == PictureOrder::kDecoding; }
+    /// When a video unit is shown, in ticks of its RTP clock.
+    std::uint64_t shownAt(const StreamData& unit) const;
     int framesIn(std::int64_t distance) const;
     static unsigned int getTimecodeFrameCount(std::uint32_t framerate);
 
@@ -135,13 +139,19 @@ class StreamBuffer final : public QxModuleStreamInterface,
     /// Whether a pass would do, log or decide anything: the chunk thread sleeps until then.
     bool isPassDue() const REQUIRES(bufferMutex);
     PassResult makePass() REQUIRES(bufferMutex);
-    ChunkEnd findChunkEnd(std::size_t pictures) REQUIRES(bufferMutex);
+    /// Where a chunk of so many pictures ends that belongs to a record with that end.
+    ChunkEnd findChunkEnd(std::size_t pictures, std::uint64_t end) REQUIRES(bufferMutex);
     std::optional<ChunkCounts> findChunk(std::size_t pictures, std::uint64_t end) REQUIRES(bufferMutex);
     PassResult pushChunk(const ChunkCounts& counts, std::uint64_t end) REQUIRES(bufferMutex);
     /// Units in front of `end`.
     static std::size_t countBefore(const UnitList& cache, std::uint64_t end);
     std::uint64_t rescale(std::uint64_t value, std::uint32_t from, std::uint32_t to) EXCLUDES(analyzerMutex);
     void splitVideo(ChunkData& chunk, std::size_t count, std::uint64_t end) REQUIRES(bufferMutex);
+    /// True when every picture is cached that is shown before one of the first `pictures`.
+    bool isOrderKnown(std::size_t pictures) const REQUIRES(bufferMutex);
+    /// Tells the order of the chunk's pictures. `shown`: the times of these and of all behind them.
+    void placePictures(ChunkData& chunk, const std::vector<std::uint64_t>& shown, std::uint64_t end)
+        REQUIRES(bufferMutex);
     void splitAudio(ChunkData& chunk, std::size_t count) REQUIRES(bufferMutex);
     void splitMeta(ChunkData& chunk, std::size_t count, std::uint64_t end) REQUIRES(bufferMutex);
     void setDurations(SampleList& samples, std::uint64_t next, std::uint32_t clock, std::uint32_t timescale)
@@ -155,6 +165,8 @@ class StreamBuffer final : public QxModuleStreamInterface,
     PassResult makeExactPass() REQUIRES(bufferMutex);
     void cutRest() REQUIRES(bufferMutex);
     bool hasTimeline() const;
+    /// Pictures in the cache that belong to a record with that end or are needed by one that does.
+    std::size_t countNeeded(std::uint64_t end) const REQUIRES(bufferMutex);
     std::uint64_t findEnd() const;
     bool startInStep() REQUIRES(bufferMutex);
     bool startInStep(UnitList& cache, std::uint32_t clock) REQUIRES(bufferMutex);
@@ -200,6 +212,7 @@ class StreamBuffer final : public QxModuleStreamInterface,
     UnitList metaBuffer GUARDED_BY(bufferMutex);
     /// The IDR frame that the record begins with.
     std::shared_ptr<StreamData> firstPicture GUARDED_BY(bufferMutex);
+    PresentationOrder presentationOrder GUARDED_BY(bufferMutex);
     /// With exact rules: its thread could not be started.
     bool writerMissing GUARDED_BY(bufferMutex) = false;
     /// Units moved into chunks.

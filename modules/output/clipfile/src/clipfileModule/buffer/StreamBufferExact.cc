@@ -10,6 +10,7 @@
 #include "buffer/StreamBuffer.h"
 #include "buffer/state/ErrorCacheState.h"
 #include "common/Log.h"
+#include "common/PresentationTime.h"
 
 namespace clipfileModule {
 
@@ -47,16 +48,17 @@ PassResult StreamBuffer::makeExactPass() {
     while (!videoBuffer.empty()) {
         const bool inStep = startInStep();
         const std::uint64_t end = findEnd();
-        const std::size_t pictures = countBefore(videoBuffer, end);
-        const bool reachesEnd = pictures < videoBuffer.size();
-        if (pictures == 0) {
+        const std::size_t pictures = countNeeded(end);
+        const bool reachesEnd = countBefore(videoBuffer, end) < videoBuffer.size();
+        if (pictures == 0 && reachesEnd) {
             return kRecordEnded;
         }
         if (!inStep || !hasTimeline() || (!reachesEnd && pictures < kMinimumVideoUnits)) {
             return kGoOn;
         }
+        const std::size_t cut = std::min<std::size_t>(chunkFrames, pictures);
         const std::optional<ChunkCounts> counts =
-            findChunk(std::min<std::size_t>(chunkFrames, pictures), end);
+            reachesEnd || isOrderKnown(cut) ? findChunk(cut, end) : std::nullopt;
         if (!counts) {
             return kGoOn;
         }
@@ -71,7 +73,7 @@ PassResult StreamBuffer::makeExactPass() {
 void StreamBuffer::cutRest() {
     const std::uint64_t end = findEnd();
     while (!writerMissing && !videoBuffer.empty() && hasTimeline() && startInStep()) {
-        std::size_t pictures = std::min<std::size_t>(chunkFrames, countBefore(videoBuffer, end));
+        std::size_t pictures = std::min<std::size_t>(chunkFrames, countNeeded(end));
         std::optional<ChunkCounts> counts;
         for (; pictures > 0 && !counts; --pictures) {
             counts = findCompleteChunk(pictures, end);
@@ -81,6 +83,15 @@ void StreamBuffer::cutRest() {
             return;
         }
     }
+}
+
+std::size_t StreamBuffer::countNeeded(std::uint64_t end) const {
+    std::size_t count = countBefore(videoBuffer, end);
+    // What is decoded behind the last picture that is shown is needed by none.
+    while (count > 0 && shownAt(*videoBuffer[count - 1]) >= end) {
+        --count;
+    }
+    return count;
 }
 
 bool StreamBuffer::hasTimeline() const {
@@ -106,8 +117,11 @@ bool StreamBuffer::startInStep() {
 bool StreamBuffer::startInStep(UnitList& cache, std::uint32_t clock) {
     const std::uint64_t frame =
         kCommonTicks * streamInfo.audio_sample_duration / streamInfo.audio_track_timescale;
+    StreamData shown;
+    shown.rtp_timestamp = shownAt(*firstPicture);
+    shown.timestamp = PresentationMilliSec(*firstPicture, settings.pictureOrder);
     const StartInStep start =
-        FindStart(cache, clock, {*firstPicture, videoRtpRate}, static_cast<std::int64_t>(frame / 2));
+        FindStart(cache, clock, {shown, videoRtpRate}, static_cast<std::int64_t>(frame / 2));
     removeFront(cache, start.early);
     return start.settled;
 }
@@ -124,7 +138,7 @@ void StreamBuffer::removeFront(UnitList& cache, std::size_t count) {
 
 std::optional<StreamBuffer::ChunkCounts> StreamBuffer::findCompleteChunk(std::size_t pictures,
                                                                          std::uint64_t end) {
-    const ChunkEnd chunkEnd = findChunkEnd(pictures);
+    const ChunkEnd chunkEnd = findChunkEnd(pictures, end);
     const int audioCount =
         CountUpTo(chunkEnd.audio, chunkedAudio, streamInfo.audio_sample_duration, audioBuffer.size());
     const int metaCount = CountUpTo(chunkEnd.video, chunkedMeta, streamInfo.video_sample_duration,

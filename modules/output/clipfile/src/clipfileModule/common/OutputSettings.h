@@ -15,6 +15,14 @@ enum class RecordRules {
     kExact,
 };
 
+/// The order in which the host pushes video.
+enum class PictureOrder {
+    /// The order in which pictures are shown: the default. None is decoded in another order.
+    kPresentation,
+    /// The order in which they are decoded. Each tells when it is shown.
+    kDecoding,
+};
+
 /// Values of the output mode: where record commands come from. With any other value nothing is recorded.
 constexpr const char* kOutputModeOn = "on";
 constexpr const char* kOutputModeSync = "sync";
@@ -36,6 +44,7 @@ struct OutputSettings {
     /// Where record commands come from: "on" or "sync".
     std::string outputMode;
     RecordRules recordRules = RecordRules::kKept;
+    PictureOrder pictureOrder = PictureOrder::kPresentation;
     std::uint64_t streamStart = 0;
     std::uint32_t bitrate = 0;
     /// Frames per 1000 seconds.

@@ -34,12 +34,16 @@ const std::string kParameterWidth = "-encodedWidth";
 const std::string kParameterFramerate = "-encodedFPS";
 const std::string kParameterBitrate = "-encodedBPS";
 const std::string kParameterRecordRules = "-recordRules";
+const std::string kParameterPictureOrder = "-pictureOrder";
 
 // Contract: output-path-none. A path of this name cannot be given as start parameter.
 constexpr const char* kNoOutputPath = "none";
 
 constexpr const char* kRecordRulesKept = "kept";
 constexpr const char* kRecordRulesExact = "exact";
+
+constexpr const char* kPictureOrderPresentation = "presentation";
+constexpr const char* kPictureOrderDecoding = "decoding";
 
 // Contract: text-ends-at-zero. A host may give a padded buffer; a path would be cut there by the system.
 std::string upToFirstZero(const std::string& text) {
@@ -68,6 +72,19 @@ RecordRules readRecordRules(QxModuleHostInterface& host) {
         CLIPFILE_LOG(LOG_PRIORITY_WARNING, "unknown record rules \"%s\", \"kept\" is used.", rules.c_str());
     }
     return RecordRules::kKept;
+}
+
+/// Anything but the two names counts as "presentation", which hosts push that never heard of the parameter.
+PictureOrder readPictureOrder(QxModuleHostInterface& host) {
+    const std::string order = readText(host, kParameterPictureOrder, kPictureOrderPresentation);
+    if (order == kPictureOrderDecoding) {
+        return PictureOrder::kDecoding;
+    }
+    if (order != kPictureOrderPresentation) {
+        CLIPFILE_LOG(LOG_PRIORITY_WARNING, "unknown picture order \"%s\", \"presentation\" is used.",
+                     order.c_str());
+    }
+    return PictureOrder::kPresentation;
 }
 
 }  // namespace
@@ -118,6 +135,13 @@ bool Controller::Initialize(QxModuleHostInterface* moduleHost) {
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "outputMode = %s.", now.outputMode.c_str());
     if (now.recordRules == RecordRules::kExact) {
         CLIPFILE_LOG(LOG_PRIORITY_TRACE, "recordRules = exact.");
+    }
+    if (now.pictureOrder == PictureOrder::kDecoding) {
+        CLIPFILE_LOG(LOG_PRIORITY_TRACE, "pictureOrder = decoding.");
+    }
+    {
+        MutexLock lock(streamBuffersMutex);
+        preRoll.SetPictureOrder(now.pictureOrder);
     }
 
     eventHandlers = {
@@ -213,6 +237,7 @@ bool Controller::getStartParameters() {
     const std::uint32_t framerate = readNumber(*host, kParameterFramerate, defaultFramerate);
     const std::uint32_t bitrate = readNumber(*host, kParameterBitrate, defaultBitrate);
     const RecordRules recordRules = readRecordRules(*host);
+    const PictureOrder pictureOrder = readPictureOrder(*host);
 
     MutexLock lock(settingsMutex);
     settings.filePrefix = filePrefix;
@@ -230,6 +255,7 @@ bool Controller::getStartParameters() {
     settings.naluType = naluType;
     settings.outputMode = outputMode;
     settings.recordRules = recordRules;
+    settings.pictureOrder = pictureOrder;
     // Contract: stream-start-is-0. Nothing else sets it.
     settings.streamStart = 0;
     settings.bitrate = bitrate;

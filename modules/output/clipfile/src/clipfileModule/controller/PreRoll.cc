@@ -2,6 +2,8 @@
 
 #include <algorithm>
 
+#include "common/PresentationTime.h"
+
 namespace clipfileModule {
 
 namespace {
@@ -84,6 +86,9 @@ std::vector<PreRoll::Entry> PreRoll::From(std::uint64_t timestamp) const {
     std::vector<Entry> entries;
     std::array<std::size_t, 3> next = {};
     const auto belongs = [&](Medium medium, const StreamData& unit) {
+        if (medium == Medium::kVideo) {
+            return PresentationMilliSec(unit, pictureOrder_) >= timestamp;
+        }
         const std::uint64_t lead = medium == Medium::kAudio ? kAudioLead : 0;
         return unit.timestamp + lead >= timestamp;
     };

@@ -9,6 +9,7 @@
 #include <vector>
 
 #include "StreamData.h"
+#include "common/OutputSettings.h"
 
 namespace clipfileModule {
 
@@ -37,6 +38,8 @@ class PreRoll {
     /// Half an audio frame in milliseconds, rounded up: audio of a record may begin so long before it.
     static constexpr std::uint64_t kAudioLead = 11;
 
+    /// How video comes. Before the first unit.
+    void SetPictureOrder(PictureOrder order) { pictureOrder_ = order; }
     /// Takes note that the stream of a medium has come to `timestamp`, in milliseconds. A leap of its clock
     /// drops what is kept, of all media, and keeps their units out until they have leapt as well: what was
     /// stamped by another clock is never replayed.
@@ -48,8 +51,9 @@ class PreRoll {
     /// Drops what is kept. The gap that follows is no leap.
     void Clear();
 
-    /// The units from `timestamp` on, and the audio from `kAudioLead` before it on, as they are to be
-    /// replayed: each medium in its own order, the media in step, at the same instant metadata, audio, video.
+    /// The units that are presented from `timestamp` on, and the audio from `kAudioLead` before it on, as
+    /// they are to be replayed: each medium in its own order, the media in step, at the same instant
+    /// metadata, audio, video.
     std::vector<Entry> From(std::uint64_t timestamp) const;
     /// The latest instant of all media so far, in milliseconds; nothing before the first unit.
     std::optional<std::uint64_t> Newest() const;
@@ -68,6 +72,7 @@ class PreRoll {
 
     void takeLeap(Track& leapt);
 
+    PictureOrder pictureOrder_ = PictureOrder::kPresentation;
     std::array<Track, 3> tracks_;
 };
 

@@ -136,7 +136,7 @@ bool FileWriter::outputFile(std::deque<std::shared_ptr<ChunkData>>& deque) {
         }
         if (limitReached) {
             // Contract: rotation-at-cadence. A file ends only where audio and video are in step.
-            if (lastChunk_ == nullptr || !lastChunk_->sync) {
+            if (lastChunk_ == nullptr || (!lastChunk_->sync && !endsOutOfStep(*chunk, excess))) {
                 CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "mp4 file over. no a/v sync. %d",
                              static_cast<int>(writtenVideoSamples_));
             } else if (waitsForIdrFrame(*chunk, excess)) {
@@ -189,9 +189,19 @@ bool FileWriter::outputFile(std::deque<std::shared_ptr<ChunkData>>& deque) {
 bool FileWriter::waitsForIdrFrame(const ChunkData& chunk, std::uint64_t excess) const {
     // Pictures in front of the first IDR frame could not be decoded in the file that begins here. A stream
     // whose IDR frames never meet the cadence must not make one endless file, though.
-    return settings_.recordRules == RecordRules::kExact &&
-           (chunk.video.empty() || !chunk.video.front()->GetSync()) &&
+    const bool startsWithIdr = !chunk.video.empty() && chunk.video.front()->GetSync();
+    if (settings_.pictureOrder == PictureOrder::kDecoding) {
+        // Anywhere else pictures of one file would stand in front of its first one, or need the file before.
+        return !startsWithIdr;
+    }
+    return settings_.recordRules == RecordRules::kExact && !startsWithIdr &&
            excess < muxer_->MinutesToDuration(idrWaitMinutes);
+}
+
+bool FileWriter::endsOutOfStep(const ChunkData& chunk, std::uint64_t excess) const {
+    // Less than an audio frame out of step is better than one endless file.
+    return settings_.pictureOrder == PictureOrder::kDecoding && !waitsForIdrFrame(chunk, excess) &&
+           excess >= muxer_->MinutesToDuration(idrWaitMinutes);
 }
 
 void FileWriter::notifyTransferStatus(const std::string& value) {

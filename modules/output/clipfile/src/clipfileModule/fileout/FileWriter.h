@@ -82,7 +82,7 @@ class FileWriter {
     static constexpr std::uint64_t minFreeSpaceWrite = 157286400;
     /// Added in the size log line, in bytes: 200 MiB.
     static constexpr std::uint64_t fileSizeMargin = 209715200;
-    /// How far beyond its length a file waits for an IDR frame, in minutes.
+    /// How far beyond its length a file waits for an IDR frame where audio and video are in step, in minutes.
     static constexpr std::uint64_t idrWaitMinutes = 2;
 
     // What follows runs on the thread.
@@ -95,6 +95,9 @@ class FileWriter {
     /// True when a file that is `excess` ticks past its length must go on with `chunk`, since a new one could
     /// not be decoded from there.
     bool waitsForIdrFrame(const ChunkData& chunk, std::uint64_t excess) const;
+    /// True when a file that is `excess` ticks past its length may end although audio and video are not quite
+    /// in step.
+    bool endsOutOfStep(const ChunkData& chunk, std::uint64_t excess) const;
     void notifyTransferStatus(const std::string& value);
 
     /// True when a step has failed, and when the writer has been given up, which is no fault and silent.

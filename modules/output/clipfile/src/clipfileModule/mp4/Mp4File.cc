@@ -92,6 +92,7 @@ void Mp4File::Reset() {
     m_info = {};
     m_open_ticks = 0;
     m_video_count = 0;
+    m_hidden_count = 0;
     m_audio_count = 0;
     m_meta_count = 0;
     m_video_duration = 0;

@@ -65,13 +65,17 @@ class Mp4File : public Mp4Muxer {
     /// the same.
     MbxStatus closeFile();
 
+    bool inDecodingOrder() const { return m_stream.pictureOrder == PictureOrder::kDecoding; }
     /// With exact rules, which the host asks for, some steps differ.
     bool isExact() const { return m_stream.recordRules == RecordRules::kExact; }
 
-    /// Whether the tracks get edits. A track without shows all of its media.
-    virtual bool hasEdits() const { return true; }
-    /// Adds the edit of each track, which spans what the track's tables hold by now.
+    /// Whether a track gets an edit. One without shows all of its media.
+    virtual bool hasEdit(TrackSlot /*track*/) const { return true; }
+    /// Adds the edit of each track, which spans what the track's tables hold by now, less pictures that are
+    /// not shown.
     MbxStatus createElst();
+    /// Ticks of video that are shown.
+    std::uint64_t shownDuration() const;
     /// Sets all times to that of `Open`.
     MbxStatus updateTimestamp();
 
@@ -116,6 +120,8 @@ class Mp4File : public Mp4Muxer {
     std::int64_t m_open_ticks = 0;
     /// Samples written.
     std::uint64_t m_video_count = 0;
+    /// Of these pictures, those that others need and that nobody is to see.
+    std::uint64_t m_hidden_count = 0;
     std::uint64_t m_audio_count = 0;
     std::uint64_t m_meta_count = 0;
     /// In ticks of the video's time scale.
@@ -139,6 +145,8 @@ class Mp4File : public Mp4Muxer {
         std::uint32_t duration;  // of each sample, in ticks of the track's time scale
         bool alwaysSync;
         std::uint64_t& counter;
+        /// As in `ChunkData`.
+        const std::vector<std::int32_t>* shownLater = nullptr;
     };
 
     bool createFilename(const std::array<unsigned char, 4>& timecode);
@@ -149,7 +157,7 @@ class Mp4File : public Mp4Muxer {
     MbxStatus createAprf();
     MbxStatus createVprf();
     MbxStatus createMoov();
-    MbxTrackParams trackParams(std::uint32_t trackId, std::uint32_t timescale) const;
+    MbxTrackParams trackParams(TrackSlot slot, std::uint32_t trackId, std::uint32_t timescale) const;
     MbxStatus createVideoTrack();
     MbxStatus createAudioTrack();
     MbxStatus createTimcdTrack();

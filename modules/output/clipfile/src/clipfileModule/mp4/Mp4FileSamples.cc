@@ -48,7 +48,8 @@ MbxStatus Mp4File::writeSampleInfo(const InputStreamInfo& info, const ChunkData&
     if (!chunk.video.empty()) {
         CLIPFILE_LOG(LOG_PRIORITY_SAMPLE, "write video  ----------.");
         MUXER_STEP(routine, enterSamples(routine, {chunk.video, kVideoTrack, info.video_sample_duration,
-                                                   false, m_video_count}));
+                                                   false, m_video_count, &chunk.shownLater}));
+        m_hidden_count = chunk.hiddenVideo;
     }
     m_video_duration += chunk.video.size() * info.video_sample_duration;
     return routine.Return(MBX_OK);
@@ -57,12 +58,17 @@ MbxStatus Mp4File::writeSampleInfo(const InputStreamInfo& info, const ChunkData&
 MbxStatus Mp4File::enterSamples(const MuxerRoutine& routine, const SamplePass& pass) {
     std::uint32_t randomAccess = IsFragmentOpen();
     const std::uint32_t track = m_track_ids[pass.track];
-    for (const auto& data : pass.samples) {
+    const bool isReordered = pass.shownLater != nullptr && inDecodingOrder();
+    for (std::size_t i = 0; i < pass.samples.size(); ++i) {
+        const auto& data = pass.samples[i];
         MbxSampleInfo sample = {};
         sample.size = static_cast<std::uint32_t>(data->GetDataSize());
         sample.offset = m_payload;
         // Contract: gaps-close-up. Samples are counted, their timestamps are only logged.
         sample.duration = pass.duration;
+        if (isReordered) {
+            sample.compositionOffset = pass.shownLater->at(i) * static_cast<std::int32_t>(pass.duration);
+        }
         sample.isSync = pass.alwaysSync || data->GetSync() ? 1 : 0;
         sample.descriptionIndex = m_entry_indexes[pass.track];
         if (const MbxStatus status = MbxAddSample(m_session.get(), track, &sample, randomAccess);
@@ -129,7 +135,7 @@ MbxStatus Mp4File::writeTmcd(const unsigned char* timecode) {
     MbxSampleInfo sample = {};
     sample.size = kTimecodeSize;
     sample.offset = m_payload;
-    sample.duration = static_cast<std::uint32_t>(m_video_count * m_info.video_sample_duration);
+    sample.duration = static_cast<std::uint32_t>(shownDuration());
     sample.isSync = 1;
     sample.descriptionIndex = m_entry_indexes[kTimecodeTrack];
     MUXER_STEP(routine, MbxAddSample(m_session.get(), m_track_ids[kTimecodeTrack], &sample, 0));

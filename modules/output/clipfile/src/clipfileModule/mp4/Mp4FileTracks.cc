@@ -91,9 +91,9 @@ MbxStatus Mp4File::createMoov() {
     return routine.Return(MBX_OK);
 }
 
-MbxTrackParams Mp4File::trackParams(std::uint32_t trackId, std::uint32_t timescale) const {
+MbxTrackParams Mp4File::trackParams(TrackSlot slot, std::uint32_t trackId, std::uint32_t timescale) const {
     MbxTrackParams params = {};
-    params.noEditList = hasEdits() ? 0 : 1;
+    params.noEditList = hasEdit(slot) ? 0 : 1;
     params.trackId = trackId;
     params.timescale = timescale;
     params.language = MBX_LANGUAGE_ENGLISH;
@@ -107,7 +107,7 @@ MbxStatus Mp4File::createVideoTrack() {
     std::uint32_t& track = m_track_ids[kVideoTrack];
     std::uint32_t& entry = m_entry_indexes[kVideoTrack];
 
-    MbxTrackParams params = trackParams(m_vprf.words[0], m_info.video_track_timescale);
+    MbxTrackParams params = trackParams(kVideoTrack, m_vprf.words[0], m_info.video_track_timescale);
     params.width = m_info.video_size_width;
     params.height = m_info.video_size_height;
     MUXER_STEP(routine, MbxAddVideoTrack(session, &params, &track));
@@ -144,7 +144,7 @@ MbxStatus Mp4File::createAudioTrack() {
     std::uint32_t& track = m_track_ids[kAudioTrack];
     std::uint32_t& entry = m_entry_indexes[kAudioTrack];
 
-    const MbxTrackParams params = trackParams(m_aprf.words[0], m_info.audio_track_timescale);
+    const MbxTrackParams params = trackParams(kAudioTrack, m_aprf.words[0], m_info.audio_track_timescale);
     MUXER_STEP(routine, MbxAddSoundTrack(session, &params, &track));
 
     MbxAudioEntryParams audio = {};
@@ -176,7 +176,7 @@ MbxStatus Mp4File::createTimcdTrack() {
 
     std::uint32_t trackId = 0;
     MUXER_STEP(routine, MbxGetNextTrackId(session, &trackId));
-    MbxTrackParams params = trackParams(trackId, m_info.video_track_timescale);
+    MbxTrackParams params = trackParams(kTimecodeTrack, trackId, m_info.video_track_timescale);
     if (!isExact()) {
         // Contract: timecode-size-in-trex. The one sample comes when the file is closed, and its fragment
         // leaves the size to `trex`. A file that is cut off before its `moov` is written again has to tell it
@@ -213,7 +213,7 @@ MbxStatus Mp4File::createRtmtaTrack() {
 
     std::uint32_t trackId = 0;
     MUXER_STEP(routine, MbxGetNextTrackId(session, &trackId));
-    const MbxTrackParams params = trackParams(trackId, m_info.video_track_timescale);
+    const MbxTrackParams params = trackParams(kMetaTrack, trackId, m_info.video_track_timescale);
     MUXER_STEP(routine, MbxAddMetaTrack(session, &params, &track));
 
     // The metadata describes the video.
@@ -232,9 +232,18 @@ MbxStatus Mp4File::createElst() {
     MUXER_ROUTINE(routine);
     for (std::size_t index = 0; index < m_track_ids.size(); ++index) {
         CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "index = %d.", static_cast<int>(index));
-        MUXER_STEP(routine, MbxAddEdit(m_session.get(), m_track_ids[index], 0));
+        if (hasEdit(static_cast<TrackSlot>(index))) {
+            MUXER_STEP(routine, MbxAddEdit(m_session.get(), m_track_ids[index], 0));
+        }
+    }
+    if (m_hidden_count != 0) {
+        MUXER_STEP(routine, MbxSetEditDuration(m_session.get(), m_track_ids[kVideoTrack], shownDuration()));
     }
     return routine.Return(MBX_OK);
+}
+
+std::uint64_t Mp4File::shownDuration() const {
+    return (m_video_count - m_hidden_count) * m_info.video_sample_duration;
 }
 
 MbxStatus Mp4File::updateTimestamp() {

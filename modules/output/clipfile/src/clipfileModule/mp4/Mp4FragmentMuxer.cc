@@ -13,6 +13,10 @@ namespace {
 
 constexpr std::uint32_t kFragmentProfile = 0x30000000;
 
+/// The edit of a file that may still grow, in ticks of the movie: longer than any part of it in `moov`, and
+/// than any file whose `moov` can be written again.
+constexpr std::uint64_t kOpenEdit = 0xFFFFFFFF;
+
 }  // namespace
 
 Mp4FragmentMuxer::~Mp4FragmentMuxer() = default;
@@ -108,8 +112,9 @@ MbxStatus Mp4FragmentMuxer::writeMoovAndMdat(MuxerRoutine& routine) {
         MUXER_STEP(routine, MbxSealFirstFragment(session));
         beginFlush();
     }
-    if (hasEdits()) {
+    if (hasEdit(kVideoTrack)) {
         MUXER_STEP(routine, createElst());
+        MUXER_STEP(routine, setExactEdit(kOpenEdit));
     }
     MUXER_STEP(routine, updateTimestamp());
 
@@ -185,6 +190,12 @@ MbxStatus Mp4FragmentMuxer::endFlush(MbxStatus status, std::uint64_t position) {
     m_payload += m_flush->payload;
     m_flush.reset();
     return status;
+}
+
+MbxStatus Mp4FragmentMuxer::setExactEdit(std::uint64_t duration) {
+    return isExact() && hasEdit(kVideoTrack)
+               ? MbxSetEditDuration(m_session.get(), m_track_ids[kVideoTrack], duration)
+               : MBX_OK;
 }
 
 MbxStatus Mp4FragmentMuxer::forceLateDefaults() {
@@ -264,6 +275,7 @@ bool Mp4FragmentMuxer::Close() {
 MbxStatus Mp4FragmentMuxer::completeFragments(MuxerRoutine& routine) {
     // Contract: fragment-of-a-timecode. Behind a multiple of 32 chunks it holds nothing else.
     MUXER_STEP(routine, closeMovie());
+    MUXER_STEP(routine, setExactEdit(shownDuration()));
 
     // Contract: moov-size-checked. The file's whole length is known only now. Where it needs more bits than
     // it got room for, writing it would run over the samples behind.

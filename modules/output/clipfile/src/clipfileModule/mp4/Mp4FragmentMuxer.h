@@ -40,9 +40,12 @@ class Mp4FragmentMuxer : public Mp4File {
     void FillSessionConfig(MbxSessionConfig& config) override;
     MbxStatus createFprf() override;
     std::uint32_t IsFragmentOpen() override;
-    /// With exact rules the tracks have none. The length of a fragmented file is not known before its end,
-    /// and readers differ in what an edit shorter than the file, or of duration 0, hides.
-    bool hasEdits() const override { return !isExact(); }
+    /// With exact rules the tracks have none, but for video in decoding order, which begins with one. The
+    /// length of a fragmented file is not known before its end, and readers differ in what an edit shorter
+    /// than the file, or of duration 0, hides.
+    bool hasEdit(TrackSlot track) const override {
+        return !isExact() || (track == kVideoTrack && inDecodingOrder());
+    }
     MbxStatus storeTimecode(const std::array<std::uint8_t, kTimecodeSize>& bytes) override;
     void Reset() override;
 
@@ -55,6 +58,8 @@ class Mp4FragmentMuxer : public Mp4File {
     void beginFlush();
     /// Leaves a flush that failed, which began at `position`, to the next one. Passes its status on.
     MbxStatus endFlush(MbxStatus status, std::uint64_t position);
+    /// With exact rules, sets how long the edit of the video lasts, if it has one.
+    MbxStatus setExactEdit(std::uint64_t duration);
     /// Makes each track without a sample in `moov` state its defaults in its fragments: until `moov` is
     /// written again at the end, its `trex` tells nothing that they could rest on.
     MbxStatus forceLateDefaults();

@@ -11,11 +11,11 @@ uint8_t kFirst[] = {0xA0, 0xA1};
 uint8_t kThird[] = {0xC0};
 MbxAuxSize kSizeEntries[] = {{2, kFirst}, {0, nullptr}, {1, kThird}};
 MbxBlock kSizeBlock = {3, kSizeEntries, nullptr};
-const MbxAuxSizeList kSizes = {0, 3, {1000, 0, &kSizeBlock, &kSizeBlock}};
+const MbxAuxSizeList kSizes = {0, 3, {1000, &kSizeBlock, &kSizeBlock}};
 
 MbxAuxOffset kOffsetEntries[] = {{1, 0x1010}, {5, 0x2020}};
 MbxBlock kOffsetBlock = {2, kOffsetEntries, nullptr};
-const MbxBlockList kOffsets = {1000, 0, &kOffsetBlock, &kOffsetBlock};
+const MbxBlockList kOffsets = {1000, &kOffsetBlock, &kOffsetBlock};
 
 constexpr MbxAuxInfo kCenc = {1, MbxCode("cenc"), 7};
 
@@ -127,8 +127,8 @@ class AuxiliaryInformationTest : public BoxTest {
     }
 
     MbxScratch scratch = {};
-    MbxBlockList offsets = {1000, 0, nullptr, nullptr};
-    MbxAuxSizeList sizes = {0, 0, {1000, 0, nullptr, nullptr}};
+    MbxBlockList offsets = {1000, nullptr, nullptr};
+    MbxAuxSizeList sizes = {0, 0, {1000, nullptr, nullptr}};
 };
 
 TEST_F(AuxiliaryInformationTest, SaioWithOneEntryWritesOneOffsetWhateverTheListHoldsBeyondIt) {

@@ -136,7 +136,7 @@ TEST_F(SampleGroupTest, SbgpRowsUseTheScratchUpTo8192Bytes) {
     // 1023, 1024 and 1025 rows of 8 bytes: 8184, 8192 and 8200.
     for (const uint32_t rows : {1023U, 1024U, 1025U}) {
         MbxSampleGroupParams params = kGroup;
-        params.rows = {100, 0, nullptr, nullptr};
+        params.rows = {100, nullptr, nullptr};
         for (uint32_t i = 0; i < rows; i++) {
             ASSERT_EQ(MbxBlockListAppend(context, &params.rows, MbxSampleGroupRow{i, i + 1}, nullptr),
                       MBX_OK);

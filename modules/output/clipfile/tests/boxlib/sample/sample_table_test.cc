@@ -7,12 +7,12 @@
 
 namespace {
 
-// A store of one block that stands in the test.
+// A block of a store that stands in the test.
 template <typename Entry>
-MbxBlockList listOf(std::vector<Entry>* entries) {
+MbxBlock* blockOf(std::vector<Entry>* entries) {
     static std::deque<MbxBlock> blocks;
     blocks.push_back({static_cast<uint32_t>(entries->size()), entries->data(), nullptr});
-    return {blocks.back().count, 0, &blocks.back(), &blocks.back()};
+    return &blocks.back();
 }
 
 // Three samples of sizes 5, 5, 7 in two chunks, with every table that a normal file can have.
@@ -26,23 +26,23 @@ const MbxTrack* track() {
         static std::vector<uint32_t> syncs = {1, 3};
         static std::vector<uint8_t> dependencies = {0x24};
         static MbxSampleSegment segment = {};
-        segment.durations.list = listOf(&durations);
+        segment.durations.list.first = blockOf(&durations);
         segment.durations.last = &durations.back();
-        segment.compositionOffsets.runs.list = listOf(&offsets);
+        segment.compositionOffsets.runs.list.first = blockOf(&offsets);
         segment.compositionOffsets.runs.last = &offsets.back();
-        segment.chunks.list = listOf(&chunks);
+        segment.chunks.list.first = blockOf(&chunks);
         segment.chunks.last = &chunks.back();
         segment.sizes.count = 3;
-        segment.sizes.list = listOf(&sizes);
-        segment.chunkOffsets.list = listOf(&chunkOffsets);
+        segment.sizes.list.first = blockOf(&sizes);
+        segment.chunkOffsets.list.first = blockOf(&chunkOffsets);
         segment.syncSamples.syncCount = 2;
-        segment.syncSamples.list = listOf(&syncs);
+        segment.syncSamples.list.first = blockOf(&syncs);
         segment.dependencies.store[0] = 0x10;
         segment.dependencies.store[1] = 0x18;
         segment.dependencies.first = &segment.dependencies.store[0];
         segment.dependencies.second = &segment.dependencies.store[1];
         segment.dependencies.runCount = 1;
-        segment.dependencies.list = listOf(&dependencies);
+        segment.dependencies.list.first = blockOf(&dependencies);
         MbxTrack made = {};
         made.segments = {&segment, &segment};
         return made;

@@ -42,6 +42,7 @@ TEST_F(SessionMovieTest, EveryCallThatNeedsAMovieSaysSo) {
     EXPECT_EQ(MbxAddTrackMetadata(session, 0, &item), MBX_ERR_BAD_STATE);
     EXPECT_EQ(MbxAddTrackReference(session, 1, &reference, &number), MBX_ERR_BAD_STATE);
     EXPECT_EQ(MbxAddEdit(session, 1, 0), MBX_ERR_BAD_STATE);
+    EXPECT_EQ(MbxSetEditDuration(session, 1, 0), MBX_ERR_BAD_STATE);
     EXPECT_EQ(MbxSetMovieTimes(session, 0, 1, 0, 0), MBX_ERR_BAD_STATE);
     EXPECT_EQ(MbxSetSignedOffsets(session, 1, 1), MBX_ERR_BAD_STATE);
     EXPECT_EQ(MbxWriteMoov(session, nullptr, 0, &size), MBX_ERR_BAD_STATE);
@@ -68,6 +69,7 @@ TEST_F(SessionMovieTest, NullSessionOrResultIsAnInvalidArgument) {
     EXPECT_EQ(MbxAddTrackReference(session, 1, nullptr, &number), MBX_ERR_INVALID_ARG);
     EXPECT_EQ(MbxAddTrackReference(session, 1, &reference, nullptr), MBX_ERR_INVALID_ARG);
     EXPECT_EQ(MbxAddEdit(nullptr, 1, 0), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxSetEditDuration(nullptr, 1, 0), MBX_ERR_INVALID_ARG);
     EXPECT_EQ(MbxSetMovieTimes(nullptr, 0, 1, 0, 0), MBX_ERR_INVALID_ARG);
     EXPECT_EQ(MbxSetSignedOffsets(nullptr, 1, 1), MBX_ERR_INVALID_ARG);
     EXPECT_EQ(MbxWriteMoov(nullptr, nullptr, 0, &size), MBX_ERR_INVALID_ARG);
@@ -161,7 +163,9 @@ TEST_F(SessionTrackTest, ReferencesEditsAndTimesReachTheTrack) {
     EXPECT_EQ(MbxAddTrackReference(session, 1, &reference, &number), MBX_ERR_INVALID_ARG);  // itself
     EXPECT_EQ(MbxAddTrackReference(session, 3, &reference, &number), MBX_ERR_NOT_FOUND);
     EXPECT_EQ(MbxAddEdit(session, 2, 0), MBX_OK);
+    EXPECT_EQ(MbxSetEditDuration(session, 2, 7), MBX_OK);
     EXPECT_EQ(MbxAddEdit(session, 3, 0), MBX_ERR_NOT_FOUND);
+    EXPECT_EQ(MbxSetEditDuration(session, 3, 0), MBX_ERR_NOT_FOUND);
     EXPECT_EQ(MbxAddEdit(session, 0, 0), MBX_ERR_INVALID_ARG);
     EXPECT_EQ(MbxSetMovieTimes(session, 0, UINT32_MAX, 11, 22), MBX_OK);
     EXPECT_EQ(MbxSetMovieTimes(session, 2, MBX_TIME_TRACK_CREATION, 33, 44), MBX_OK);
@@ -192,47 +196,6 @@ TEST_F(SessionTrackTest, MoovMeasuresWhatItWrites) {
         EXPECT_EQ(target.bytes.size(), 100 + size);
         EXPECT_EQ(host.live.size(), live);
     }
-}
-
-TEST_F(SessionTrackTest, MeasuringMoovCostsTheSameAtAnyLength) {
-    session->config.chunk_offset_mode = MBX_OFFSETS_64;  // as in a normal file
-    ASSERT_EQ(MbxAddDataReference(session, 1, nullptr, 0, &number), MBX_OK);
-    const MbxVisualEntryParams entry = {1, 1, 16, 16, 72, 0, 72, 0};
-    ASSERT_EQ(MbxAddVideoEntry(session, 1, &entry, &number), MBX_OK);
-    uint32_t samples = 0;
-    // No table finds a run in these: 12 bytes a chunk in `stsc`, 8 in `co64`, and 20 a sample in `stts`,
-    // `ctts` and `stsz`, beside 2 in `stss`. Chunks have one sample and two by turns.
-    const auto addUpTo = [&](uint32_t count) {
-        for (; samples < count; samples++) {
-            MbxSampleInfo sample = {};
-            sample.size = samples;
-            sample.duration = samples % 2 + 1;
-            sample.compositionOffset = static_cast<int32_t>(samples % 2);
-            sample.isSync = samples % 2;
-            sample.descriptionIndex = 1;
-            ASSERT_EQ(MbxAddSample(session, 1, &sample, 0), MBX_OK);
-            if (samples % 3 != 1) {
-                ASSERT_EQ(MbxEndChunk(session, 1), MBX_OK);
-            }
-        }
-    };
-    struct Cost {
-        uint64_t allocations, clearedBytes, copies, peakBytes;
-        bool operator==(const Cost&) const = default;
-    };
-    const auto costOfMeasuring = [&] {
-        const Cost before = {host.allocations, host.clearedBytes, host.copies, host.liveBytes};
-        host.peakBytes = host.liveBytes;
-        EXPECT_EQ(MbxWriteMoov(session, nullptr, 0, &size), MBX_OK);
-        return Cost{host.allocations - before.allocations, host.clearedBytes - before.clearedBytes,
-                    host.copies - before.copies, host.peakBytes - before.peakBytes};
-    };
-    addUpTo(3000);  // every table fills a block
-    const Cost atFirst = costOfMeasuring();
-    const uint64_t sizeAtFirst = size;
-    addUpTo(240000);
-    EXPECT_EQ(costOfMeasuring(), atFirst);
-    EXPECT_EQ(size - sizeAtFirst, 237000 / 3 * (2 * (12 + 8) + 3 * (20 + 2)));
 }
 
 TEST_F(SessionTrackTest, MoovWaitsForTheEndOfEveryChunk) {

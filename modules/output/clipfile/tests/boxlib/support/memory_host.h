@@ -36,7 +36,6 @@ class MemoryHost {
     uint64_t failAllocation = 0;  // number of the allocation, from 1, that is refused; 0 for none
     uint64_t copies = 0;          // calls of `memcpy`, `memmove` and `strncpy`
     uint64_t failCopy = 0;
-    uint64_t clearedBytes = 0;       // by `memset`
     std::map<void*, uint64_t> live;  // blocks not yet freed, with their sizes
     uint64_t liveBytes = 0;
     uint64_t peakBytes = 0;
@@ -68,11 +67,8 @@ class MemoryHost {
             .memcmp = [](void*, const void* a, const void* b, uint64_t n) { return std::memcmp(a, b, n); },
             .memcpy = copy,
             .memmove = copy,
-            .memset =
-                [](void* host, void* pointer, int byte, uint64_t count) {
-                    static_cast<MemoryHost*>(host)->clearedBytes += count;
-                    return std::memset(pointer, byte, count);
-                },
+            .memset = [](void*, void* pointer, int byte,
+                         uint64_t count) { return std::memset(pointer, byte, count); },
         };
     }
 

@@ -89,5 +89,5 @@ template <typename Entry, size_t count>
 struct StaticList {
     Entry entries[count];
     MbxBlock block = {count, entries, nullptr};
-    MbxBlockList list = {count, 0, &block, &block};
+    MbxBlockList list = {count, &block, &block};
 };

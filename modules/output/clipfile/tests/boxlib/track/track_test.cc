@@ -474,6 +474,28 @@ TEST_F(EditTest, MediaTimeIsZeroWhenAskedForOrWithoutSamples) {
     EXPECT_EQ(last()->editList->edits.last->segmentDuration, 1000U);
 }
 
+TEST_F(EditTest, TheDurationOfTheLastEditIsOverwritten) {
+    EXPECT_EQ(MbxTrackSetEditDuration(&options, last(), 1), MBX_ERR_BAD_STATE);
+    addSegment(last(), 48000);
+    ASSERT_EQ(add(0), MBX_OK);
+    ASSERT_EQ(add(0), MBX_OK);
+    ASSERT_EQ(MbxTrackSetEditDuration(&options, last(), 70), MBX_OK);
+    EXPECT_EQ(last()->editList->edits.first->segmentDuration, 1000U);
+    EXPECT_EQ(last()->editList->edits.last->segmentDuration, 70U);
+    EXPECT_EQ(last()->editList->edits.last->rateInteger, 1);
+    for (const uint32_t mode : {0U, 2U}) {
+        options.time_version_mode = mode;
+        EXPECT_EQ(MbxTrackSetEditDuration(&options, last(), 1ULL << 32), MBX_ERR_BAD_STATE);
+        EXPECT_EQ(last()->editList->edits.last->segmentDuration, 70U);
+        EXPECT_EQ(MbxTrackSetEditDuration(&options, last(), UINT32_MAX), MBX_OK);
+        last()->editList->edits.last->segmentDuration = 70;
+    }
+    options.time_version_mode = 1;
+    EXPECT_EQ(MbxTrackSetEditDuration(&options, last(), 1ULL << 32), MBX_OK);
+    EXPECT_EQ(MbxTrackSetEditDuration(nullptr, last(), 1), MBX_ERR_INVALID_ARG);
+    EXPECT_EQ(MbxTrackSetEditDuration(&options, nullptr, 1), MBX_ERR_INVALID_ARG);
+}
+
 TEST_F(EditTest, NegativePresentationTimeIsRescaledTowardsZero) {
     MbxSampleSegment* segment = addSegment(last(), 48000);
     segment->earliestPresentation = -4847;

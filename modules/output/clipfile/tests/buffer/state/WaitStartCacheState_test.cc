@@ -69,6 +69,22 @@ TEST_F(WaitStartCacheStateTest, TakesUnitsAtTheStart) {
     EXPECT_NE(execute(video(1000), "video"), nullptr);
 }
 
+TEST_F(WaitStartCacheStateTest, InDecodingOrderAPictureCountsFromWhenItIsShown) {
+    WaitStartCacheState decoding(&buffer, RecordRules::kExact, PictureOrder::kDecoding);
+    buffer.start = 90000;
+    buffer.stop = 99000;
+    const auto execute = [&](std::uint64_t milliSec, std::uint64_t shown) {
+        const auto unit = video(milliSec);
+        unit->presentation_timestamp = 90 * shown;
+        const std::shared_ptr<CacheState> next = decoding.Execute(unit, queue, "video");
+        return next == nullptr ? 0 : next->GetId();
+    };
+    EXPECT_EQ(execute(920, 999), 0);
+    EXPECT_EQ(execute(920, 1000), kStartState);
+    EXPECT_EQ(execute(1020, 1099), kStartState);
+    EXPECT_EQ(execute(1020, 1100), kEndSyncRecState);
+}
+
 TEST_F(WaitStartCacheStateTest, TheStartIsTestedBeforeTheStop) {
     buffer.start = 180000;
     buffer.stop = 90000;

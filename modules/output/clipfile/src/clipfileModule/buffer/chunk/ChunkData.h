@@ -26,6 +26,11 @@ struct ChunkData {
     /// First units of the chunk, before conversion. The timecode of a file is read from `firstMeta`.
     std::shared_ptr<StreamData> firstVideo;
     std::shared_ptr<StreamData> firstMeta;
+    /// Of video in decoding order: by how many pictures each of `video` is shown later than it is decoded.
+    /// Empty where both orders are one.
+    std::vector<std::int32_t> shownLater;
+    /// Pictures of the record so far, this chunk included, that others need and that lie behind its end.
+    std::uint64_t hiddenVideo = 0;
 };
 
 }  // namespace clipfileModule

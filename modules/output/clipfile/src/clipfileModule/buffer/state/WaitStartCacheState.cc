@@ -5,6 +5,7 @@
 #include "buffer/state/EndSyncRecState.h"
 #include "buffer/state/StartCacheState.h"
 #include "common/Log.h"
+#include "common/PresentationTime.h"
 #include "common/RtpClock.h"
 
 namespace clipfileModule {
@@ -30,28 +31,35 @@ std::uint64_t toMilliSec(std::int64_t ticks) {
 
 }  // namespace
 
-WaitStartCacheState::WaitStartCacheState(StreamBufferInterface* owner, RecordRules recordRules)
-    : CacheState("wait_state", kWaitStartState, owner), rules(recordRules) {}
+WaitStartCacheState::WaitStartCacheState(StreamBufferInterface* owner, RecordRules recordRules,
+                                         PictureOrder pictureOrder)
+    : CacheState("wait_state", kWaitStartState, owner), rules(recordRules), order(pictureOrder) {}
+
+std::uint64_t WaitStartCacheState::presentedAt(const StreamData& unit, std::string_view mediaType) const {
+    return mediaType == kVideoName ? PresentationMilliSec(unit, order) : unit.timestamp;
+}
 
 bool WaitStartCacheState::isBeforeStart(const StreamData& unit, std::string_view mediaType) const {
     // An IDR frame on the start itself needs the audio that begins up to half a frame ahead of it.
     const bool mayLead = rules == RecordRules::kExact && mediaType == kAudioName;
-    return unit.timestamp + (mayLead ? kHalfAudioFrameMilliSec : 0) < toMilliSec(buffer->GetStartTimestamp());
+    return presentedAt(unit, mediaType) + (mayLead ? kHalfAudioFrameMilliSec : 0) <
+           toMilliSec(buffer->GetStartTimestamp());
 }
 
 std::optional<std::int64_t> WaitStartCacheState::stopPassedBy(const StreamData& unit,
                                                               std::string_view mediaType) const {
     // Contract: stop-read-once. It may be set at any moment, and the line shall show what the test saw.
     const std::int64_t stop = buffer->GetStopTimestamp();
+    const std::uint64_t presented = presentedAt(unit, mediaType);
     if (rules == RecordRules::kKept) {
         // Contract: stop-in-two-units. In milliseconds here, in ticks in the chunk thread.
-        return unit.timestamp > toMilliSec(stop) ? std::optional(stop) : std::nullopt;
+        return presented > toMilliSec(stop) ? std::optional(stop) : std::nullopt;
     }
     const std::int64_t commandedEnd = buffer->GetEndTimestamp();
     const std::int64_t end = commandedEnd != -1 ? commandedEnd : stop;
     // The other media may have overtaken a picture that still belongs to the record.
     const std::uint64_t lag = mediaType == kVideoName ? 0 : kVideoLagMilliSec;
-    return unit.timestamp >= toMilliSec(end) + lag ? std::optional(end) : std::nullopt;
+    return presented >= toMilliSec(end) + lag ? std::optional(end) : std::nullopt;
 }
 
 std::shared_ptr<CacheState> WaitStartCacheState::Execute(const std::shared_ptr<StreamData>& unit,

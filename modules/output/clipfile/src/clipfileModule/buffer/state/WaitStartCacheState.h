@@ -14,7 +14,8 @@ namespace clipfileModule {
 /// the start timestamp on, video is dropped.
 class WaitStartCacheState : public CacheState {
  public:
-    explicit WaitStartCacheState(StreamBufferInterface* owner, RecordRules recordRules = RecordRules::kKept);
+    explicit WaitStartCacheState(StreamBufferInterface* owner, RecordRules recordRules = RecordRules::kKept,
+                                 PictureOrder pictureOrder = PictureOrder::kPresentation);
 
     /// Drops or queues the unit, or takes it as the start of the recording. The IDR frame that starts it is
     /// not queued: it reaches the video cache on entry of the start state.
@@ -26,7 +27,11 @@ class WaitStartCacheState : public CacheState {
     /// The stop timestamp to cancel the recording with, when the unit says that it can begin no more.
     std::optional<std::int64_t> stopPassedBy(const StreamData& unit, std::string_view mediaType) const;
 
+    /// When the unit is presented, in milliseconds.
+    std::uint64_t presentedAt(const StreamData& unit, std::string_view mediaType) const;
+
     const RecordRules rules;
+    const PictureOrder order;
     nal_access::NalUnit sps;
     nal_access::NalUnit pps;
 };
