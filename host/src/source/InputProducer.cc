@@ -166,6 +166,7 @@ void InputProducer::TryAgain() {
     assembler_.AddNotice("the source is back after " + std::to_string(away) + " s");
     const std::int64_t passed = Ticks(connection->Arrived() - lastPicture_);
     GoOn(std::move(connection), passed, false);
+    changedFor_.clear();
 }
 
 void InputProducer::Change(const std::string& reason) {
@@ -175,17 +176,21 @@ void InputProducer::Change(const std::string& reason) {
     ++changes_;
     KeepCounts();
     const std::int64_t passed = recorded_ ? 0 : Ticks(Clock::now() - lastPicture_);
+    // What was opened anew for this and shows it again at once would do so for ever.
+    const bool again = !connection_->Used() && reason == changedFor_;
     Packets unread = connection_->TakeUnread();
     std::unique_ptr<Input> input = Connection::End(std::move(connection_));
     lost_ = Clock::now();
     try {
-        if (!input->Renew(position, std::move(unread))) {
-            throw ReceiverError(ExitCode::kSourceUnsuitable,
-                                reason + ": what follows in this file cannot be understood, and is left out");
+        if (again || !input->Renew(position, std::move(unread))) {
+            throw ReceiverError(ExitCode::kSourceUnsuitable, reason + ": what follows " +
+                                                                 (recorded_ ? "in this file " : "") +
+                                                                 "cannot be understood, and is left out");
         }
         auto connection = std::make_unique<Connection>(std::move(input), options_, nullptr);
         assembler_.AddNotice(reason + ": the recording goes on in a new file");
         GoOn(std::move(connection), passed, true);
+        changedFor_ = reason;
     } catch (const SourceLost& loss) {
         EndWith(ReceiverError(ExitCode::kSourceUnavailable,
                               reason + ", and the source was lost: " + loss.what()));

@@ -4,6 +4,7 @@
 #include <chrono>
 #include <memory>
 #include <optional>
+#include <string>
 
 #include "common/ReceiverError.h"
 #include "source/Connection.h"
@@ -64,6 +65,8 @@ class InputProducer final : public ProducerInterface {
     Clock::time_point connected_;
     Clock::time_point lastPicture_;
     Clock::time_point lost_;
+    /// Why the present connection follows another one as another source; empty when it does not.
+    std::string changedFor_;
     /// Which pause comes next.
     std::size_t attempts_ = 0;
     /// When the last attempt began and when one was told of; where a sender is waited for.
