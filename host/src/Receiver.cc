@@ -427,7 +427,8 @@ void Running::Show(const SourceInterface& source, const Recorder& recorder) {
 std::uint64_t Running::Lost(const SourceInterface& source, const Recorder::Progress& progress) const {
     const SourceCounts counts = source.Counts();
     const std::uint64_t reported = log_->Losses().Total();
-    return reported - std::min(reported, progress.droppedMarks) + counts.lostFrames + counts.damagedPackets;
+    return reported - std::min(reported, progress.droppedMarks) + progress.droppedPackets +
+           counts.lostFrames + counts.damagedPackets;
 }
 
 Summary Running::Summarise(const SourceInterface& source, const Recorder::Progress& past) {
