@@ -276,7 +276,7 @@ void Recorder::PushRest() {
 void Recorder::Interrupt() {
     PushRest();
     if (endedByGap_) {
-        // A gap in front of the last units: what they are to the next recorder it finds out itself.
+        // The rest held a gap, which has ended the recording. What lies behind it is for the next recorder.
         return;
     }
     const bool recording = plan_.Recording();
