@@ -1,8 +1,10 @@
+#include <algorithm>
 #include <future>
 
 #include "SentMedia.h"
 #include "SourceTesting.h"
 #include "StreamServer.h"
+#include "damaged/TransportStream.h"
 #include "support/CodedMedia.h"
 #include "support/FreePorts.h"
 #include "support/Senders.h"
@@ -93,6 +95,59 @@ TEST_F(Joining, ADamagedFirstStampMovesNothing) {
         EXPECT_EQ(source->Counts().lostFrames, 0u);
         ExpectNothingTold();
     }
+}
+
+/// The same where it is ahead of those behind it, which must not pass for reordered pictures.
+TEST_F(Joining, AFirstStampThatIsDamagedUpwardsMovesNothing) {
+    Make("a.ts", "4");
+    Ffmpeg("-copyts -i a.ts -c copy -bsf:v 'setts=pts=if(eq(N\\,0)\\,PTS+90000\\,PTS):dts=DTS' shown.ts");
+    endtoend::Pieces pieces = endtoend::ReadPieces(Path("a.ts"));
+    const auto first = std::find_if(pieces.begin(), pieces.end(), [](const endtoend::Bytes& piece) {
+        return endtoend::PidOf(piece) == endtoend::kVideoPid && endtoend::BeginsUnit(piece);
+    });
+    ASSERT_NE(first, pieces.end());
+    for (const std::size_t at : endtoend::transport::CountersOf(*first).stamps) {
+        endtoend::transport::WriteStamp(*first, at, endtoend::transport::ReadStamp(*first, at) + 90000);
+    }
+    endtoend::WritePieces(pieces, Path("both.ts"));
+    for (const char* const file : {"shown.ts", "both.ts"}) {
+        SCOPED_TRACE(file);
+        StreamServer server({HttpStream(FileBytes(Path(file)))});
+        SourceOptions options = Live(server.Http());
+        options.reconnect = false;
+        const auto source = OpenSource(options, notices_, nullptr);
+        ExpectInStep(SentMedia(Path("a.ts")), ReadAll(*source), 0);
+        EXPECT_EQ(source->Counts().lostFrames, 0u);
+        ExpectNothingTold();
+    }
+}
+
+/// Pictures that are missing behind the first one leave what a damaged stamp would, but the sound goes on.
+TEST_F(Joining, PicturesThatAreLostBehindTheFirstOneAreCounted) {
+    Make("a.ts", "4");
+    for (const std::uint64_t lost : {3U, 30U}) {
+        SCOPED_TRACE(lost);
+        Ffmpeg("-copyts -i a.ts -c copy -bsf:v 'noise=drop=between(n\\,1\\," + std::to_string(lost) +
+               ")' cut.ts");
+        StreamServer server({HttpStream(FileBytes(Path("cut.ts")))});
+        SourceOptions options = Live(server.Http());
+        options.reconnect = false;
+        const auto source = OpenSource(options, notices_, nullptr);
+        const auto units = ReadAll(*source);
+        const auto pictures = Of(Medium::kVideo, units);
+        ASSERT_GE(pictures.size(), 2u);
+        EXPECT_EQ(pictures[1].time - pictures[0].time, static_cast<std::int64_t>(lost + 1) * 3600);
+        EXPECT_EQ(source->Counts().lostFrames, lost);
+    }
+}
+
+/// A file of a container that tells how long each picture stands.
+TEST_F(Joining, AFirstPictureThatStandsForLongKeepsItsTime) {
+    Make("a.ts", "4");
+    Ffmpeg("-i a.ts -c copy -bsf:a aac_adtstoasc -bsf:v 'noise=drop=between(n\\,1\\,49)' a.mp4");
+    const auto pictures = Of(Medium::kVideo, ReadFile("a.mp4"));
+    ASSERT_GE(pictures.size(), 2u);
+    EXPECT_EQ(pictures[1].time - pictures[0].time, 2 * 90000);
 }
 
 /// Whether there is audio beside the pictures and their metadata.
