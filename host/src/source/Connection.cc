@@ -68,9 +68,9 @@ void Connection::Choose(const SourceOptions& options) {
 }
 
 std::int64_t Connection::SinceFirst(std::int64_t stamp) const {
-    const FrameRate& rate = paths_.description.frameRate;
-    const std::int64_t counted = static_cast<std::int64_t>(earlyPictures_) * kVideoClock * rate.denominator /
-                                 std::max<std::int64_t>(1, rate.numerator);
+    const AVRational rate = paths_.sourceRate;
+    const std::int64_t counted =
+        av_rescale(static_cast<std::int64_t>(earlyPictures_) * kVideoClock, rate.den, rate.num);
     const std::int64_t told = *firstVideoStamp_ > stamp ? -1 : stamp - *firstVideoStamp_;
     const bool likely = told >= 0 && Distance(told, counted) <= std::uint64_t{Timeline::kLongestGap};
     return likely ? told : counted;

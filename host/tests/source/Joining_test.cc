@@ -228,6 +228,30 @@ TEST_F(Joining, ASourceThatComesBackIsInStepFromItsFirstIdrFrameOn) {
     ExpectNothingTold();
 }
 
+/// Its pictures come more slowly than they are recorded: 95 of them in front of the IDR frame are 19 s.
+TEST_F(Joining, AConvertedSourceThatComesBackBeginsWhereItsFirstIdrFrameDoes) {
+    const auto make = [this](const string& name, const string& seconds) {
+        Ffmpeg("-f lavfi -i testsrc2=size=128x96:rate=5:duration=" + seconds +
+               " -f lavfi -i sine=sample_rate=48000:duration=" + seconds + kPlainH264 +
+               "-g 100 -x264-params repeat-headers=1" + kPlainAac + name);
+    };
+    make("a.ts", "5");
+    make("b.ts", "22");
+    // Its parameter sets come with every picture.
+    Ffmpeg("-i b.ts -c copy -copyts -bsf:v 'noise=drop=lt(n\\,5),dump_extra=freq=all' cut.ts");
+    StreamServer server({HttpStream(FileBytes(Path("a.ts"))), HttpStream(FileBytes(Path("cut.ts")))});
+    SourceOptions options = Live(server.Http());
+    options.transcode = true;
+    options.frameRate = ParseFrameRate("25");
+    const auto source = OpenSource(options, notices_, nullptr);
+    const auto pictures = Of(Medium::kVideo, ReadPictures(*source, 130));
+    std::int64_t longest = 0;
+    for (std::size_t at = 1; at < pictures.size(); ++at) {
+        longest = std::max(longest, pictures[at].time - pictures[at - 1].time);
+    }
+    EXPECT_GE(longest, 19 * 90000);
+}
+
 /// The sender's clocks of picture and sound are tied to each other by reports, five seconds apart.
 TEST_F(Joining, RtpThatIsFoundBetweenTwoReportsIsInStepFromItsFirstIdrFrameOn) {
     Make("a.ts", "9");
