@@ -14,7 +14,7 @@ constexpr std::size_t kWitnesses = 4;
 /// What senders put into one unit of sound at the most, in ticks: as much may be missing between two packets.
 constexpr std::int64_t kSoundUnit = 45000;
 /// So many pictures back it may be one that is sent before those that are shown before it.
-constexpr std::int64_t kReorderDepth = 16;
+constexpr std::int64_t kLongestReorder = 16;
 
 /// The pictures at the beginning, as many as tell where the first one should stand, or none.
 std::vector<AVPacket*> Witnesses(const Packets& packets, const AVStream& video) {
@@ -79,7 +79,7 @@ void MendFirstStamp(const Packets& packets, const AVStream& video, const AVStrea
     if (Distance(step, *period) <= static_cast<std::uint64_t>(*period)) {
         return;
     }
-    if (step <= 0 && -(step / kReorderDepth) < *period) {
+    if (step <= 0 && -(step / kLongestReorder) < *period) {
         return;
     }
     if (step > 0) {
