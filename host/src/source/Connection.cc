@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <utility>
 
+#include "source/FirstStamp.h"
 #include "source/StreamChoice.h"
 #include "timing/Saturating.h"
 
@@ -15,8 +16,6 @@ constexpr std::size_t kLongestWait = 4000;
 constexpr std::uint64_t kWithoutStart = 300;
 /// Packets of a new stream, while none of the one before comes, that show a medium to have moved.
 constexpr int kMoved = 25;
-/// Pictures whose stamps tell where the first one should stand.
-constexpr std::size_t kWitnesses = 4;
 
 /// False for a stream of which the tables tell and nothing has come.
 bool HasBegun(const AVStream& stream) {
@@ -26,37 +25,6 @@ bool HasBegun(const AVStream& stream) {
                                                          : true;
 }
 
-/// Corrects the stamp of the first picture where it is at odds with those behind it, which agree.
-void MendFirstStamp(const Packets& packets, const AVStream& video, const FrameRate& rate) {
-    std::vector<AVPacket*> pictures;
-    for (const auto& packet : packets) {
-        if (packet->stream_index == video.index && pictures.size() <= kWitnesses) {
-            pictures.push_back(packet.get());
-        }
-    }
-    const bool told = std::all_of(pictures.begin(), pictures.end(), [](const AVPacket* picture) {
-        return picture->pts != AV_NOPTS_VALUE && (picture->flags & AV_PKT_FLAG_CORRUPT) == 0;
-    });
-    if (!told || pictures.size() <= kWitnesses) {
-        return;
-    }
-    const AVRational frame{static_cast<int>(rate.denominator), static_cast<int>(rate.numerator)};
-    const std::int64_t period = av_rescale_q(1, frame, video.time_base);
-    const auto isOff = [&](std::size_t at, std::int64_t tolerance) {
-        return Distance(pictures[at + 1]->pts - pictures[at]->pts, period) >
-               static_cast<std::uint64_t>(tolerance);
-    };
-    for (std::size_t at = 1; at < kWitnesses; ++at) {
-        if (isOff(at, period / 2)) {
-            return;
-        }
-    }
-    if (isOff(0, period)) {
-        pictures[0]->pts = pictures[1]->pts - period;
-        pictures[0]->dts = AV_NOPTS_VALUE;
-    }
-}
-
 }  // namespace
 
 Connection::Connection(std::unique_ptr<Input> input, const SourceOptions& options,
@@ -64,12 +32,13 @@ Connection::Connection(std::unique_ptr<Input> input, const SourceOptions& option
     : input_(std::move(input)), packet_(libav::NewPacket()), untouched_(libav::NewPacket()) {
     Choose(options);
     ahead_ = LookAhead(*input_, *video_, audio_);
+    // A file of another container tells of each picture how long it stands.
+    if (input_->Transport() || !input_->Recorded()) {
+        MendFirstStamp(ahead_.packets, *video_, audio_);
+    }
     AVFormatContext& format = input_->Format();
     paths_ = DecidePaths(format, *format.streams[video_->index], audio_, ahead_.packets, options, before);
     notices_.insert(notices_.end(), paths_.notices.begin(), paths_.notices.end());
-    if (paths_.passes) {
-        MendFirstStamp(ahead_.packets, *video_, paths_.description.frameRate);
-    }
     watch_.emplace(video_->codecpar->codec_id, paths_.description.frameRate, paths_.passes);
     clock_.emplace(*video_, audio_, input_->Recorded());
     steps_.emplace(*clock_);
@@ -99,9 +68,9 @@ void Connection::Choose(const SourceOptions& options) {
 }
 
 std::int64_t Connection::SinceFirst(std::int64_t stamp) const {
-    const FrameRate& rate = paths_.description.frameRate;
-    const std::int64_t counted = static_cast<std::int64_t>(earlyPictures_) * kVideoClock * rate.denominator /
-                                 std::max<std::int64_t>(1, rate.numerator);
+    const AVRational rate = paths_.sourceRate;
+    const std::int64_t counted =
+        av_rescale(static_cast<std::int64_t>(earlyPictures_) * kVideoClock, rate.den, rate.num);
     const std::int64_t told = *firstVideoStamp_ > stamp ? -1 : stamp - *firstVideoStamp_;
     const bool likely = told >= 0 && Distance(told, counted) <= std::uint64_t{Timeline::kLongestGap};
     return likely ? told : counted;

@@ -105,6 +105,10 @@ void DecideVideo(AVFormatContext& format, AVStream& stream, const Packets& ahead
     SourceDescription& description = paths.description;
     description = Describe(format, parameters, findings);
     const VideoEncoding encoding = EncodingOf(options, description);
+    const FrameRate& likely = encoding.frameRate;
+    paths.sourceRate = findings.toldRate.num > 0 ? findings.toldRate
+                                                 : AVRational{static_cast<int>(likely.numerator),
+                                                              static_cast<int>(likely.denominator)};
     paths.passes = reason.empty() && (!options.transcode || (encoding.frameRate == description.frameRate &&
                                                              encoding.width == description.width &&
                                                              encoding.height == description.height));

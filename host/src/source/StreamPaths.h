@@ -17,6 +17,8 @@ struct StreamPaths {
     /// Sentences about what is converted.
     std::vector<std::string> notices;
     std::unique_ptr<VideoPathInterface> video;
+    /// Of the pictures as they come.
+    AVRational sourceRate{0, 1};
     /// The video is recorded as it comes.
     bool passes = true;
     /// Null: there is no audio.

@@ -1,8 +1,10 @@
+#include <algorithm>
 #include <future>
 
 #include "SentMedia.h"
 #include "SourceTesting.h"
 #include "StreamServer.h"
+#include "damaged/TransportStream.h"
 #include "support/CodedMedia.h"
 #include "support/FreePorts.h"
 #include "support/Senders.h"
@@ -95,6 +97,59 @@ TEST_F(Joining, ADamagedFirstStampMovesNothing) {
     }
 }
 
+/// The same where it is ahead of those behind it, which must not pass for reordered pictures.
+TEST_F(Joining, AFirstStampThatIsDamagedUpwardsMovesNothing) {
+    Make("a.ts", "4");
+    Ffmpeg("-copyts -i a.ts -c copy -bsf:v 'setts=pts=if(eq(N\\,0)\\,PTS+90000\\,PTS):dts=DTS' shown.ts");
+    endtoend::Pieces pieces = endtoend::ReadPieces(Path("a.ts"));
+    const auto first = std::find_if(pieces.begin(), pieces.end(), [](const endtoend::Bytes& piece) {
+        return endtoend::PidOf(piece) == endtoend::kVideoPid && endtoend::BeginsUnit(piece);
+    });
+    ASSERT_NE(first, pieces.end());
+    for (const std::size_t at : endtoend::transport::CountersOf(*first).stamps) {
+        endtoend::transport::WriteStamp(*first, at, endtoend::transport::ReadStamp(*first, at) + 90000);
+    }
+    endtoend::WritePieces(pieces, Path("both.ts"));
+    for (const char* const file : {"shown.ts", "both.ts"}) {
+        SCOPED_TRACE(file);
+        StreamServer server({HttpStream(FileBytes(Path(file)))});
+        SourceOptions options = Live(server.Http());
+        options.reconnect = false;
+        const auto source = OpenSource(options, notices_, nullptr);
+        ExpectInStep(SentMedia(Path("a.ts")), ReadAll(*source), 0);
+        EXPECT_EQ(source->Counts().lostFrames, 0u);
+        ExpectNothingTold();
+    }
+}
+
+/// Pictures that are missing behind the first one leave what a damaged stamp would, but the sound goes on.
+TEST_F(Joining, PicturesThatAreLostBehindTheFirstOneAreCounted) {
+    Make("a.ts", "4");
+    for (const std::uint64_t lost : {3U, 30U}) {
+        SCOPED_TRACE(lost);
+        Ffmpeg("-copyts -i a.ts -c copy -bsf:v 'noise=drop=between(n\\,1\\," + std::to_string(lost) +
+               ")' cut.ts");
+        StreamServer server({HttpStream(FileBytes(Path("cut.ts")))});
+        SourceOptions options = Live(server.Http());
+        options.reconnect = false;
+        const auto source = OpenSource(options, notices_, nullptr);
+        const auto units = ReadAll(*source);
+        const auto pictures = Of(Medium::kVideo, units);
+        ASSERT_GE(pictures.size(), 2u);
+        EXPECT_EQ(pictures[1].time - pictures[0].time, static_cast<std::int64_t>(lost + 1) * 3600);
+        EXPECT_EQ(source->Counts().lostFrames, lost);
+    }
+}
+
+/// A file of a container that tells how long each picture stands.
+TEST_F(Joining, AFirstPictureThatStandsForLongKeepsItsTime) {
+    Make("a.ts", "4");
+    Ffmpeg("-i a.ts -c copy -bsf:a aac_adtstoasc -bsf:v 'noise=drop=between(n\\,1\\,49)' a.mp4");
+    const auto pictures = Of(Medium::kVideo, ReadFile("a.mp4"));
+    ASSERT_GE(pictures.size(), 2u);
+    EXPECT_EQ(pictures[1].time - pictures[0].time, 2 * 90000);
+}
+
 /// Whether there is audio beside the pictures and their metadata.
 class FirstPicture : public Joining, public testing::WithParamInterface<bool> {};
 
@@ -171,6 +226,30 @@ TEST_F(Joining, ASourceThatComesBackIsInStepFromItsFirstIdrFrameOn) {
     ExpectInStep(SentMedia(Path("b.ts")), units, 50, 10);
     EXPECT_EQ(source->Counts().lostFrames, 0u);
     ExpectNothingTold();
+}
+
+/// Its pictures come more slowly than they are recorded: 95 of them in front of the IDR frame are 19 s.
+TEST_F(Joining, AConvertedSourceThatComesBackBeginsWhereItsFirstIdrFrameDoes) {
+    const auto make = [this](const string& name, const string& seconds) {
+        Ffmpeg("-f lavfi -i testsrc2=size=128x96:rate=5:duration=" + seconds +
+               " -f lavfi -i sine=sample_rate=48000:duration=" + seconds + kPlainH264 +
+               "-g 100 -x264-params repeat-headers=1" + kPlainAac + name);
+    };
+    make("a.ts", "5");
+    make("b.ts", "22");
+    // Its parameter sets come with every picture.
+    Ffmpeg("-i b.ts -c copy -copyts -bsf:v 'noise=drop=lt(n\\,5),dump_extra=freq=all' cut.ts");
+    StreamServer server({HttpStream(FileBytes(Path("a.ts"))), HttpStream(FileBytes(Path("cut.ts")))});
+    SourceOptions options = Live(server.Http());
+    options.transcode = true;
+    options.frameRate = ParseFrameRate("25");
+    const auto source = OpenSource(options, notices_, nullptr);
+    const auto pictures = Of(Medium::kVideo, ReadPictures(*source, 130));
+    std::int64_t longest = 0;
+    for (std::size_t at = 1; at < pictures.size(); ++at) {
+        longest = std::max(longest, pictures[at].time - pictures[at - 1].time);
+    }
+    EXPECT_GE(longest, 19 * 90000);
 }
 
 /// The sender's clocks of picture and sound are tied to each other by reports, five seconds apart.
