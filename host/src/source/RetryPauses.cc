@@ -8,13 +8,12 @@
 namespace receiver {
 namespace {
 
-using std::chrono::milliseconds;
-using std::chrono::seconds;
-
 /// In front of each attempt; the last one repeats.
-constexpr std::array<seconds, 5> kPauses{seconds(1), seconds(2), seconds(4), seconds(8), seconds(15)};
+constexpr std::array<std::chrono::seconds, 5> kPauses{std::chrono::seconds(1), std::chrono::seconds(2),
+                                                      std::chrono::seconds(4), std::chrono::seconds(8),
+                                                      std::chrono::seconds(15)};
 /// A connection that has held so long was a good one.
-constexpr seconds kGood{30};
+constexpr std::chrono::seconds kGood{30};
 
 }  // namespace
 
@@ -24,7 +23,8 @@ void RetryPauses::Lost(Clock::duration held) {
     }
 }
 
-milliseconds RetryPauses::Next(Clock::time_point now) const {
+std::chrono::milliseconds RetryPauses::Next(Clock::time_point now) const {
+    using std::chrono::milliseconds;
     if (!listens_) {
         return kPauses[attempts_];
     }
