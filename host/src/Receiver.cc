@@ -40,7 +40,7 @@ constexpr std::chrono::milliseconds kDisplayInterval{250};
 /// The run ends with the frame behind the last one; when the stream has dried up, nobody waits for it.
 constexpr std::chrono::seconds kFinishPatience{2};
 
-constexpr const char* kOneRecording = "in mode on everything is recorded; --mode sync takes record commands";
+constexpr const char* kNoCommands = "in mode on everything is recorded; --mode sync takes record commands";
 
 std::string WithFullStop(std::string sentence) {
     return sentence.ends_with('.') ? sentence : sentence + ".";
@@ -72,6 +72,7 @@ class Running final : public SourceListenerInterface {
     /// Records in a session of the module what the session before has left, and the source up to where it
     /// needs another session. False when the run has failed.
     bool RecordSession(SourceInterface& source, QxModuleInterface& module, Recorder::Settings& settings);
+    void RecordIn(ModuleSession& session, SourceInterface& source, Recorder::Settings& settings);
     void Loop(SourceInterface& source, Recorder& recorder);
     void CheckFolder();
     void TakeCommands(Recorder& recorder);
@@ -105,6 +106,8 @@ class Running final : public SourceListenerInterface {
     CommandQueue commands_;
     /// The operator ends the run.
     bool quit_ = false;
+    /// He did so while the source went on.
+    bool endedByOperator_ = false;
     StreamRates rates_;
     ModuleReport report_{display_};
     std::optional<GroupWatch> groups_;
@@ -142,7 +145,7 @@ void Running::PrepareOutput(const OutputPlace& place) {
 
 ExitCode Running::Record(const SourceOpener& open) {
     if (options_.mode == OutputMode::kOn) {
-        commands_.Close(kOneRecording);
+        commands_.Close(kNoCommands);
     }
     const SettingsFile settings(options_.settings, options_.maxMinutes);
     const OutputPlace place = PlaceOf(options_);
@@ -215,7 +218,20 @@ Recorder::Progress Running::RecordAll(SourceInterface& source, QxModuleInterface
 
 bool Running::RecordSession(SourceInterface& source, QxModuleInterface& module,
                             Recorder::Settings& settings) {
-    ModuleSession session(module, *host_);
+    try {
+        ModuleSession session(module, *host_);
+        RecordIn(session, source, settings);
+    } catch (const ReceiverError& error) {
+        // The sessions before have left files.
+        if (!settings.past) {
+            throw;
+        }
+        failure_ = error;
+    }
+    return !failure_ && !host_->Failed();
+}
+
+void Running::RecordIn(ModuleSession& session, SourceInterface& source, Recorder::Settings& settings) {
     if (options_.mode == OutputMode::kSync) {
         session.GoOnline();
     }
@@ -230,6 +246,8 @@ bool Running::RecordSession(SourceInterface& source, QxModuleInterface& module,
     } catch (const ReceiverError& error) {
         failure_ = error;
     }
+    // What is heard from here on comes too late to have ended anything.
+    endedByOperator_ = quit_;
     if (!host_->Failed()) {
         recorder.Close();
     }
@@ -245,7 +263,6 @@ bool Running::RecordSession(SourceInterface& source, QxModuleInterface& module,
     plan_.Interrupt();
     gap_ = recorder.EndedByGap();
     rest_ = recorder.TakeRest();
-    return !failure_ && !host_->Failed();
 }
 
 void Running::Loop(SourceInterface& source, Recorder& recorder) {
@@ -427,15 +444,16 @@ void Running::Show(const SourceInterface& source, const Recorder& recorder) {
 std::uint64_t Running::Lost(const SourceInterface& source, const Recorder::Progress& progress) const {
     const SourceCounts counts = source.Counts();
     const std::uint64_t reported = log_->Losses().Total();
-    return reported - std::min(reported, progress.droppedMarks) + counts.lostFrames + counts.damagedPackets;
+    return reported - std::min(reported, progress.droppedMarks) + progress.droppedPackets +
+           counts.lostFrames + counts.damagedPackets;
 }
 
 Summary Running::Summarise(const SourceInterface& source, const Recorder::Progress& past) {
     RunRecord run;
-    run.endedByOperator = quit_;
+    run.endedByOperator = endedByOperator_;
     run.anyFrame = past.firstFrame.has_value();
     run.recordedFrames = past.recorded;
-    run.oneRecording = options_.mode == OutputMode::kOn;
+    run.everything = options_.mode == OutputMode::kOn;
     run.length = run.anyFrame ? past.lastFrame - *past.firstFrame : 0;
     run.unreached = plan_.Unreached();
     const SourceCounts counts = source.Counts();

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <array>
 #include <chrono>
+#include <limits>
 #include <memory>
 #include <utility>
 
@@ -24,10 +25,6 @@ constexpr std::size_t kChunksAhead = 24;
 constexpr std::size_t kKeptChunks = 2;
 /// A fragment is written when it has so many chunks.
 constexpr std::size_t kFragmentChunks = 32;
-
-/// A disk is slow, not hung, as long as it needs less than this for the chunks that wait at the end. The
-/// module itself gives a writer 3.5 s to end.
-constexpr std::chrono::seconds kDiskPatience{30};
 
 std::int64_t Period(const FrameRate& rate) {
     return kVideoClock * rate.denominator / rate.numerator;
@@ -73,6 +70,7 @@ Recorder::Recorder(const Settings& settings, ModuleSession& session, const Modul
     lastFrame_ = past.lastFrame;
     lateStops_ = past.lateStops;
     recorded_ = past.recorded;
+    droppedPackets_ = past.droppedPackets;
     timecode_ = past.timecode;
     if (past.timecode) {
         // The present rate's frame in front of the one that would have come next.
@@ -112,7 +110,8 @@ Recorder::Progress Recorder::Past() const {
             settings_.frameRate,
             lateStops_,
             recorded_,
-            before + feed_.DroppedMarks()};
+            before + feed_.DroppedMarks(),
+            droppedPackets_};
 }
 
 std::int64_t Recorder::Elapsed() const {
@@ -178,6 +177,7 @@ void Recorder::PushFrame(const SourceUnit& unit) {
     } else if (unit.time - lastFrame_ > kLongestStep) {
         // The module does not notice what is missing: it counts units, so its media would drift apart and the
         // timecode of the file would be wrong behind the gap.
+        DropPackets(unit.time - Period(settings_.frameRate));
         EndBeforeGap();
         if (endedByGap_) {
             KeepRest(unit);
@@ -275,7 +275,12 @@ void Recorder::PushRest() {
 
 void Recorder::Interrupt() {
     PushRest();
+    if (endedByGap_) {
+        // The rest held a gap, which has ended the recording. What lies behind it is for the next recorder.
+        return;
+    }
     const bool recording = plan_.Recording();
+    DropPackets(std::numeric_limits<std::int64_t>::max());
     EndBeforeGap();
     if (recording && !plan_.Recording()) {
         PushEndMark();
@@ -295,6 +300,15 @@ void Recorder::EndBeforeGap() {
         NoteEndBehindLast();
         PushFlag(FrameTime(lastFrame_, 1), false, BuildMetadata(false, std::nullopt, {}));
         PushSilentEnd();
+    }
+}
+
+void Recorder::DropPackets(std::int64_t end) {
+    const std::size_t dropped =
+        std::erase_if(packets_, [end](const SourceUnit& packet) { return packet.time <= end; });
+    // What belongs to no recording is missed by nobody.
+    if (settings_.mode == OutputMode::kOn ? online_ : plan_.Recording()) {
+        droppedPackets_ += dropped;
     }
 }
 
@@ -373,7 +387,7 @@ void Recorder::Close() {
     PushRest();
     feed_.Settle();
     CheckStops(kStopPatience);
-    feed_.WaitForChunks(KeptChunks(), kDiskPatience);
+    feed_.WaitForChunks(KeptChunks(), endedByGap_ ? settings_.gapPatience : settings_.diskPatience);
 }
 
 std::vector<std::vector<unsigned char>> Recorder::Packets() const {

@@ -55,6 +55,8 @@ class Recorder {
         std::uint64_t recorded = 0;
         /// Of what the module reported as lost: marks, which nobody misses.
         std::uint64_t droppedMarks = 0;
+        /// KLV packets of recordings whose picture did not come.
+        std::uint64_t droppedPackets = 0;
     };
 
     struct Settings {
@@ -72,7 +74,13 @@ class Recorder {
         /// Called from time to time where the module is waited for, for what must not wait. It must not call
         /// the recorder.
         std::function<void()> meanwhile;
-        /// Of an earlier recorder of the run, whose source has become another one.
+        /// At its end a recording waits so long for a slow disk; one that needs longer counts as hung. The
+        /// module itself gives a writer 3.5 s to end.
+        std::chrono::milliseconds diskPatience{30000};
+        /// The same in front of a gap, where the source goes on meanwhile and not more than 15 s of it can
+        /// wait.
+        std::chrono::milliseconds gapPatience{5000};
+        /// Of the run's recorder before this one, which a gap or a source that has become another one ended.
         std::optional<Progress> past;
     };
 
@@ -84,7 +92,8 @@ class Recorder {
 
     /// The source is away: what waits for order is pushed, and a recording ends with its last frame, so that
     /// its file is closed and holds nothing of what comes behind the gap. The next one begins with the first
-    /// IDR frame there. A repetition has no effect.
+    /// IDR frame there. KLV packets that still wait for their picture are dropped, since the next picture is
+    /// another one. A repetition has no effect.
     void Interrupt();
 
     /// In mode on a gap ends the recording and this recorder, since the module goes on in one file as long as
@@ -136,6 +145,8 @@ class Recorder {
     void BeginBalance(std::int64_t time);
     /// The recording, if any, ends with the last frame.
     void EndBeforeGap();
+    /// Drops the KLV packets up to `end`, whose picture lies in the gap that begins here.
+    void DropPackets(std::int64_t end);
     void KeepRest(const SourceUnit& unit);
     /// The recording, if any, has ended with the last frame, and so has what stops commanded.
     void NoteEndBehindLast();
@@ -169,6 +180,7 @@ class Recorder {
     /// What the last change was.
     bool open_ = false;
     std::uint64_t recorded_ = 0;
+    std::uint64_t droppedPackets_ = 0;
     std::optional<std::int64_t> firstFrame_;
     std::int64_t lastFrame_ = 0;
     /// That went to the module.

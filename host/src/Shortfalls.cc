@@ -38,7 +38,7 @@ std::vector<std::string> ShortfallsOf(const RunRecord& run) {
                         "groups of pictures") +
             (run.transcode ? "" : ", or use --transcode"));
     }
-    if (run.oneRecording && run.anyFrame && run.recordedFrames == 0) {
+    if (run.everything && run.anyFrame && run.recordedFrames == 0) {
         sentences.emplace_back("nothing was recorded: no IDR frame came");
     }
     if (run.unreached && run.anyFrame && !run.endedByOperator) {

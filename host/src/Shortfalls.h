@@ -21,8 +21,8 @@ struct RunRecord {
     /// The pictures are converted.
     bool transcode = false;
     std::uint64_t recordedFrames = 0;
-    /// The whole run was one recording.
-    bool oneRecording = false;
+    /// Everything from the first IDR frame on was to be recorded, without a command.
+    bool everything = false;
     /// Length of the stream in ticks of 90000 a second.
     std::int64_t length = 0;
     /// The first range that the stream did not come to.

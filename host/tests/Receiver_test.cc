@@ -2,6 +2,7 @@
 
 #include "Receiver.h"
 
+#include <dlfcn.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <stdlib.h>
@@ -53,6 +54,31 @@ class ReceiverTest : public ::testing::Test {
         setenv("FAKE_MODULE", behaviour, 1);
         options_.module = FAKE_MODULE;
         return Record(60);
+    }
+
+    /// A source whose operator ends the run when all its units are read, so that nobody hears of it before
+    /// the end waits for a module that keeps everything. That lets go when the operator has been answered.
+    ExitCode RecordEndedBehind(std::int64_t frames) {
+        setenv("FAKE_MODULE", "keep", 1);
+        options_.module = FAKE_MODULE;
+        display_.onNotice = [](const std::string& sentence) {
+            if (sentence.starts_with("ending in order")) {
+                // The module is in memory by now and stays there.
+                void* const library = dlopen(FAKE_MODULE, RTLD_NOW | RTLD_NOLOAD);
+                reinterpret_cast<void (*)()>(dlsym(library, "FakeModuleLetGo"))();
+                dlclose(library);
+            }
+        };
+        auto source = std::make_unique<FakeSource>(frames);
+        source->Before([this, &units = source->Units()](std::size_t) {
+            if (units.empty()) {
+                kill(getpid(), SIGTERM);
+                while (!signals_.QuitRequested()) {
+                    std::this_thread::yield();
+                }
+            }
+        });
+        return Record(std::move(source));
     }
 
     /// Sends a signal to this process and waits until it has been seen.
@@ -135,7 +161,7 @@ TEST_F(ReceiverTest, TheLengthOfAFragmentedFileIsThatOfAllItsFrames) {
     EXPECT_NEAR(display_.summary.files.front().seconds, 12.16, 0.0005);
 }
 
-TEST_F(ReceiverTest, InModeOnTheRunIsOneRecording) {
+TEST_F(ReceiverTest, InModeOnARunWithoutAGapIsOneRecording) {
     options_.mode = OutputMode::kOn;
     options_.seconds = 1;
     EXPECT_EQ(Record(150), ExitCode::kSuccess);
@@ -190,6 +216,106 @@ TEST_F(GapTest, WhatIsBehindItIsInAFileOfItsOwnWithItsTimecode) {
         EXPECT_FALSE(HoldsAudioBehind(display_.summary.files[0]));
         EXPECT_TRUE(HoldsAudioBehind(display_.summary.files[1]));
     }
+}
+
+/// Pictures with a first IDR frame each, and the audio beside them, which comes a second later.
+class SpansTest : public ReceiverTest {
+ protected:
+    struct Span {
+        std::int64_t begin;
+        std::int64_t end;
+    };
+
+    static std::unique_ptr<FakeSource> Of(const std::vector<Span>& spans) {
+        auto source = std::make_unique<FakeSource>(0);
+        std::deque<SourceUnit>& units = source->Units();
+        for (const Span& span : spans) {
+            for (std::int64_t frame = span.begin; frame < span.end; ++frame) {
+                units.push_back(MakeFrame(frame * FakeSource::kFrame, frame == span.begin,
+                                          static_cast<std::uint32_t>(frame)));
+            }
+            for (std::int64_t time = span.begin * 1920; time < span.end * 1920; time += 1024) {
+                units.push_back(MakeAudio(time));
+            }
+        }
+        std::stable_sort(units.begin(), units.end(),
+                         [](const SourceUnit& a, const SourceUnit& b) { return ComesAt(a) < ComesAt(b); });
+        return source;
+    }
+    static void ChangeInFrontOf(std::int64_t frame, FakeSource& source) {
+        const std::deque<SourceUnit>& units = source.Units();
+        const auto change = std::find_if(units.begin(), units.end(), [frame](const SourceUnit& unit) {
+            return unit.medium == Medium::kVideo && unit.time == frame * FakeSource::kFrame;
+        });
+        SourceDescription other = source.Description();
+        other.width = 640;
+        other.summary = "another source of the tests";
+        source.ChangeBehind(static_cast<std::size_t>(change - units.begin()), other);
+    }
+    /// In ticks of 720000 a second.
+    static std::int64_t ComesAt(const SourceUnit& unit) {
+        return unit.medium == Medium::kAudio ? unit.time * 15 + 720000 : unit.time * 8;
+    }
+};
+
+TEST_F(SpansTest, TwoGapsWithinTwoSecondsGiveThreeFiles) {
+    for (const OutputMode mode : {OutputMode::kSync, OutputMode::kOn}) {
+        options_.mode = mode;
+        EXPECT_EQ(Record(Of({{0, 25}, {45, 55}, {75, 100}})), ExitCode::kSuccess);
+        EXPECT_THAT(Frames(), ElementsAre(25, 10, 25));
+        EXPECT_THAT(Starts(), ElementsAre("10:00:00:00", "10:00:01:20", "10:00:03:00"));
+    }
+}
+
+TEST_F(SpansTest, AGapRightInFrontOfAChangeGivesThreeFiles) {
+    for (const OutputMode mode : {OutputMode::kSync, OutputMode::kOn}) {
+        options_.mode = mode;
+        auto source = Of({{0, 25}, {45, 55}, {85, 110}});
+        ChangeInFrontOf(85, *source);
+        EXPECT_EQ(Record(std::move(source)), ExitCode::kSuccess);
+        EXPECT_THAT(display_.notices, Contains("source: another source of the tests"));
+        EXPECT_THAT(Frames(), ElementsAre(25, 10, 25));
+        EXPECT_THAT(Starts(), ElementsAre("10:00:00:00", "10:00:01:20", "10:00:03:10"));
+    }
+}
+
+// The pictures behind the gap have waited for audio in vain, without which the module writes none. The gap is
+// found when the change ends the wait.
+TEST_F(SpansTest, AGapThatIsFoundAtAChangeGoesBeforeIt) {
+    for (const OutputMode mode : {OutputMode::kSync, OutputMode::kOn}) {
+        options_.mode = mode;
+        auto source = Of({{0, 25}, {45, 55}, {85, 110}});
+        std::erase_if(source->Units(), [](const SourceUnit& unit) {
+            return unit.medium == Medium::kAudio && unit.time >= 45 * 1920 && unit.time < 55 * 1920;
+        });
+        ChangeInFrontOf(85, *source);
+        EXPECT_EQ(Record(std::move(source)), ExitCode::kLost);
+        EXPECT_THAT(display_.notices, Contains("source: another source of the tests"));
+        EXPECT_THAT(display_.notices, Contains("10 frames that should have been recorded are in no file"));
+        EXPECT_THAT(Frames(), ElementsAre(25, 25));
+        EXPECT_THAT(Starts(), ElementsAre("10:00:00:00", "10:00:03:10"));
+    }
+}
+
+TEST_F(GapTest, AModuleThatRefusesBehindItStillLeavesASummary) {
+    setenv("FAKE_MODULE", "refuse second", 1);
+    options_.module = FAKE_MODULE;
+    options_.mode = OutputMode::kOn;
+    EXPECT_EQ(Record(WithGap()), ExitCode::kModule);
+    EXPECT_EQ(display_.finished, 1);
+    EXPECT_EQ(display_.summary.exitCode, ExitCode::kModule);
+    EXPECT_EQ(display_.failureCode, ExitCode::kModule);
+    EXPECT_THAT(display_.failure, HasSubstr("refuses to start"));
+}
+
+TEST_F(ReceiverTest, ASignalIsHeardWhileAFullModuleIsWaitedFor) {
+    RecordEndedBehind(10);
+    EXPECT_THAT(display_.notices, Contains("ending in order; a second signal ends at once"));
+}
+
+TEST_F(ReceiverTest, AnOperatorWhoEndsARunBehindItsSourceExcusesNothing) {
+    EXPECT_EQ(RecordEndedBehind(0), ExitCode::kLost);
+    EXPECT_THAT(display_.notices, Contains(HasSubstr("the source has sent no IDR frame")));
 }
 
 TEST_F(ReceiverTest, SigtermEndsInOrderWithTheFileClosed) {

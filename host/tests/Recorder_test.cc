@@ -45,7 +45,12 @@ class ScriptedModule final : public QxModuleInterface,
     int ReservedOperationC() override { return 0; }
 
     void PushReserved(const std::shared_ptr<StreamData>&) override {}
-    void PushVideo(const std::shared_ptr<StreamData>& unit) override { Write("v", *unit, 3600); }
+    void PushVideo(const std::shared_ptr<StreamData>& unit) override {
+        Write("v", *unit, 3600);
+        if (unit->payload != nullptr && kept_.size() < keeps) {
+            kept_.push_back(unit);
+        }
+    }
     void PushAudio(const std::shared_ptr<StreamData>& unit) override { Write("a", *unit, 1024); }
     void PushMeta(const std::shared_ptr<StreamData>& unit) override {
         if (unit->payload == nullptr) {
@@ -76,6 +81,8 @@ class ScriptedModule final : public QxModuleInterface,
 
     /// Carries out no stop.
     bool deaf = false;
+    /// Frames that it does not let go of.
+    std::size_t keeps = 0;
     /// "v3": the fourth frame; "M3" and "m3" its metadata with and without record flag; "a2" the third audio
     /// frame; "v-" and so on a mark.
     std::vector<std::string> calls;
@@ -105,6 +112,7 @@ class ScriptedModule final : public QxModuleInterface,
     }
 
     bool recording_ = false;
+    std::vector<std::shared_ptr<StreamData>> kept_;
 };
 
 class RecorderTest : public ::testing::Test {
@@ -129,6 +137,11 @@ class RecorderTest : public ::testing::Test {
     }
     /// Audio 1.9 s ahead, so that no frame waits for it; itself it comes after the frames of a test.
     void PutLateAudio() { recorder_->Put(MakeAudio(std::int64_t{1024} * 89)); }
+
+    /// The last bytes of a metadata unit: those of the timecode, and what follows.
+    std::vector<unsigned char> Tail(std::size_t unit, std::ptrdiff_t count) const {
+        return {module_.metas.at(unit).end() - count, module_.metas.at(unit).end()};
+    }
 
     /// A recording that begins with that frame, or ends in front of it.
     static Recorder::Change Begin(std::uint8_t frame) { return {true, Timecode{10, 0, 0, frame, false}}; }
@@ -191,12 +204,9 @@ TEST_F(RecorderTest, TheUnitOfAFrameHoldsItsTimecodeAndThePacketsSinceTheLastOne
     PutFrame(1, false);
     PutFrame(2, false);
     ASSERT_EQ(module_.metas.size(), 3u);
-    const auto tail = [&](std::size_t unit, std::ptrdiff_t count) {
-        return std::vector<unsigned char>(module_.metas[unit].end() - count, module_.metas[unit].end());
-    };
-    EXPECT_THAT(tail(0, 5), ElementsAre(10, 0, 0, 0, 0));
-    EXPECT_THAT(tail(1, 9), ElementsAre(10, 0, 0, 1, 0, 0x01, 0xAA, 0x01, 0xBB));
-    EXPECT_THAT(tail(2, 7), ElementsAre(10, 0, 0, 2, 0, 0x01, 0xCC));
+    EXPECT_THAT(Tail(0, 5), ElementsAre(10, 0, 0, 0, 0));
+    EXPECT_THAT(Tail(1, 9), ElementsAre(10, 0, 0, 1, 0, 0x01, 0xAA, 0x01, 0xBB));
+    EXPECT_THAT(Tail(2, 7), ElementsAre(10, 0, 0, 2, 0, 0x01, 0xCC));
 }
 
 TEST_F(RecorderTest, TheSourcesTimecodeGoesBeforeTheOperators) {
@@ -308,6 +318,48 @@ TEST_F(RecorderTest, ASourceThatIsAwayEndsTheRecordingBehindItsLastFrame) {
     EXPECT_THAT(recorder_->TakeChanges(), ElementsAre(Begin(0), End(2)));
     recorder_->Interrupt();
     EXPECT_EQ(module_.Units().size(), 10u);
+}
+
+TEST_F(RecorderTest, PacketsWhosePictureAnOutageTookAreDroppedAndCounted) {
+    Make(Sync());
+    PutLateAudio();
+    PutFrame(0, true);
+    recorder_->Put(MakeSourceUnit(Medium::kKlv, 3600, {0xAA}));
+    recorder_->Interrupt();
+    recorder_->Put(MakeSourceUnit(Medium::kKlv, 45 * 3600, {0xBB}));
+    PutFrame(45, true);
+    // The stop stands between the two frames.
+    ASSERT_EQ(module_.metas.size(), 3u);
+    EXPECT_THAT(Tail(2, 7), ElementsAre(10, 0, 1, 20, 0, 0x01, 0xBB));
+    EXPECT_EQ(module_.metas[2].size(), module_.metas[0].size() + 2);
+    EXPECT_EQ(recorder_->Past().droppedPackets, 1u);
+}
+
+TEST_F(RecorderTest, OfThePacketsInAGapOnlyThoseOfThePictureBehindItAreKept) {
+    Make(Sync());
+    PutLateAudio();
+    PutFrame(0, true);
+    recorder_->Put(MakeSourceUnit(Medium::kKlv, 3600, {0xAA}));
+    recorder_->Put(MakeSourceUnit(Medium::kKlv, 24 * 3600, {0xBB}));
+    recorder_->Put(MakeSourceUnit(Medium::kKlv, 24 * 3600 + 1, {0xCC}));
+    PutFrame(25, true);
+    ASSERT_EQ(module_.metas.size(), 3u);
+    EXPECT_THAT(Tail(2, 7), ElementsAre(10, 0, 1, 0, 0, 0x01, 0xCC));
+    EXPECT_EQ(module_.metas[2].size(), module_.metas[0].size() + 2);
+    EXPECT_EQ(recorder_->Past().droppedPackets, 2u);
+}
+
+TEST_F(RecorderTest, PacketsOfNoRecordingAreDroppedWithoutALoss) {
+    plan_.Stop();
+    Make(Sync());
+    PutLateAudio();
+    PutFrame(0, true);
+    recorder_->Put(MakeSourceUnit(Medium::kKlv, 3600, {0xAA}));
+    recorder_->Interrupt();
+    PutFrame(45, true);
+    ASSERT_EQ(module_.metas.size(), 2u);
+    EXPECT_EQ(module_.metas[1].size(), module_.metas[0].size());
+    EXPECT_EQ(recorder_->Past().droppedPackets, 0u);
 }
 
 // The module may write one frame of audio more than there is in front of the gap.
@@ -469,6 +521,60 @@ TEST_F(RecorderTest, InModeOnASourceThatIsAwayEndsTheRecording) {
     recorder_->Interrupt();
     EXPECT_TRUE(recorder_->EndedByGap());
     EXPECT_THAT(module_.Units(), ElementsAre("online", "M0", "v0", "a0", "a1", "a2"));
+}
+
+TEST_F(RecorderTest, InModeOnPacketsWhosePictureAnOutageTookAreDroppedAndCountedOverTheWholeRun) {
+    Make(On());
+    PutLateAudio();
+    PutFrame(0, true);
+    recorder_->Put(MakeSourceUnit(Medium::kKlv, 3600, {0xAA}));
+    recorder_->Interrupt();
+    EXPECT_EQ(recorder_->Past().droppedPackets, 1u);
+    Recorder::Settings settings = On();
+    settings.past = recorder_->Past();
+    for (const SourceUnit& unit : recorder_->TakeRest()) {
+        EXPECT_NE(unit.medium, Medium::kKlv);
+    }
+    EXPECT_EQ(Make(settings).Past().droppedPackets, 1u);
+}
+
+// Silence ends the recording once.
+TEST_F(RecorderTest, InModeOnASourceThatIsAwayBehindAGapLeavesWhatIsBehindItToTheNextRecorder) {
+    Make(On());
+    PutFrame(0, true);
+    recorder_->Put(MakeAudio(0));
+    // Waits for audio of its time.
+    PutFrame(20, true);
+    recorder_->Put(MakeSourceUnit(Medium::kKlv, 21 * 3600, {0xAA}));
+    recorder_->Interrupt();
+    EXPECT_TRUE(recorder_->EndedByGap());
+    EXPECT_THAT(module_.Units(), ElementsAre("online", "M0", "v0", "a0", "a1", "a2"));
+    const std::vector<SourceUnit> rest = recorder_->TakeRest();
+    ASSERT_EQ(rest.size(), 2u);
+    EXPECT_EQ(rest[0].time, 20 * 3600);
+    EXPECT_EQ(rest[1].medium, Medium::kKlv);
+}
+
+// The source goes on meanwhile.
+TEST_F(RecorderTest, InModeOnAGapWaitsForASlowDiskForAShorterTimeThanTheEnd) {
+    EXPECT_EQ(Recorder::Settings{}.diskPatience, std::chrono::seconds(30));
+    EXPECT_EQ(Recorder::Settings{}.gapPatience, std::chrono::seconds(5));
+    // Frames that are held although a later one is not are chunks that wait.
+    module_.keeps = 4;
+    int asked = 0;
+    Recorder::Settings settings = On();
+    settings.gapPatience = 2 * StreamFeed::kMeanwhile;
+    settings.meanwhile = [&asked] { ++asked; };
+    Make(settings);
+    PutLateAudio();
+    for (std::int64_t frame = 0; frame <= 4; ++frame) {
+        PutFrame(frame, frame == 0);
+    }
+    PutFrame(20, true);
+    ASSERT_TRUE(recorder_->EndedByGap());
+    recorder_->Close();
+    EXPECT_GE(asked, 1);
+    EXPECT_LE(asked, 2);
 }
 
 // What is still in there is lost when the host goes offline.

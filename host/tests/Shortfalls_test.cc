@@ -51,10 +51,10 @@ TEST(Shortfalls, TheAdviceToTranscodeIsNotGivenToWhomHasDoneSo) {
                             "closed groups of pictures"));
 }
 
-TEST(Shortfalls, ARunThatIsOneRecordingNeedsAnIdrFrame) {
+TEST(Shortfalls, ARunThatRecordsEverythingNeedsAnIdrFrame) {
     RunRecord run;
     run.anyFrame = true;
-    run.oneRecording = true;
+    run.everything = true;
     EXPECT_THAT(ShortfallsOf(run), ElementsAre("nothing was recorded: no IDR frame came"));
 }
 

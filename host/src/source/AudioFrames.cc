@@ -105,6 +105,9 @@ std::optional<std::size_t> AudioFrameSize(AVCodecID codec, std::span<const std::
 
 bool IsWholeAudioFrame(AVCodecID codec, const AVPacket& packet) {
     Bytes left(packet.data, static_cast<std::size_t>(packet.size));
+    if (codec != AV_CODEC_ID_AC3 && codec != AV_CODEC_ID_EAC3) {
+        return AudioFrameSize(codec, left) == left.size();
+    }
     do {
         const Size size = AudioFrameSize(codec, left);
         if (!size || *size == 0 || *size > left.size()) {

@@ -245,11 +245,7 @@ void AudioConverter::Enter(std::uint8_t** samples, int count, std::int64_t time)
     }
     std::array<std::uint8_t*, 2> planes{samples[0], samples[1]};
     if (distance > kJitter) {
-        std::vector<float> silence(static_cast<std::size_t>(distance));
-        auto* const plane = reinterpret_cast<std::uint8_t*>(silence.data());
-        std::array<void*, 2> silent{plane, plane};
-        libav::Check(av_audio_fifo_write(fifo_.get(), silent.data(), static_cast<int>(distance)),
-                     "hold audio");
+        Fill(distance);
     } else if (distance < -kJitter) {
         const int skip = static_cast<int>(std::min<std::int64_t>(-distance, count));
         for (std::uint8_t*& plane : planes) {
@@ -261,15 +257,39 @@ void AudioConverter::Enter(std::uint8_t** samples, int count, std::int64_t time)
     libav::Check(av_audio_fifo_write(fifo_.get(), pointers.data(), count), "hold audio");
 }
 
+void AudioConverter::Fill(std::int64_t count) {
+    fillBegin_ = fifoTime_ + av_audio_fifo_size(fifo_.get());
+    fillEnd_ = fillBegin_ + count;
+    std::vector<float> silence(static_cast<std::size_t>(count));
+    auto* const plane = reinterpret_cast<std::uint8_t*>(silence.data());
+    std::array<void*, 2> silent{plane, plane};
+    libav::Check(av_audio_fifo_write(fifo_.get(), silent.data(), static_cast<int>(count)), "hold audio");
+}
+
 void AudioConverter::EncodeWhole(const AudioSink& sink) {
     while (av_audio_fifo_size(fifo_.get()) >= kAudioFrame) {
         const libav::Owner<AVFrame> samples = AudioEncoder::NewSamples();
         std::array<void*, 2> planes{samples->data[0], samples->data[1]};
         libav::Check(av_audio_fifo_read(fifo_.get(), planes.data(), kAudioFrame), "hold audio");
         samples->pts = fifoTime_;
-        fifoTime_ += kAudioFrame;
-        encoder_.Encode(samples.get(), sink);
+        const std::int64_t end = fifoTime_ + kAudioFrame;
+        if (std::min(end, fillEnd_) - std::max(fifoTime_, fillBegin_) >= kAudioFrame / 2) {
+            filled_.push_back(fifoTime_);
+        }
+        fifoTime_ = end;
+        Encode(samples.get(), sink);
     }
+}
+
+void AudioConverter::Encode(AVFrame* samples, const AudioSink& sink) {
+    encoder_.Encode(samples, [&](const CodedAudio& coded) {
+        CodedAudio marked = coded;
+        if (!filled_.empty() && filled_.front() == coded.time) {
+            marked.filled = true;
+            filled_.pop_front();
+        }
+        sink(marked);
+    });
 }
 
 void AudioConverter::Finish(const AudioSink& sink) {
@@ -284,7 +304,7 @@ void AudioConverter::Finish(const AudioSink& sink) {
         libav::Check(av_audio_fifo_write(fifo_.get(), planes.data(), kAudioFrame - rest), "hold audio");
     }
     EncodeWhole(sink);
-    encoder_.Encode(nullptr, sink);
+    Encode(nullptr, sink);
 }
 
 }  // namespace receiver

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstdint>
+#include <deque>
 #include <memory>
 #include <optional>
 #include <string>
@@ -64,7 +65,11 @@ class AudioConverter final : public AudioPathInterface {
     /// Null: what the resampler holds.
     void Resample(const AVFrame* frame, std::int64_t time);
     void Enter(std::uint8_t** samples, int count, std::int64_t time);
+    /// Holds `count` samples of silence where those of the source are missing.
+    void Fill(std::int64_t count);
     void EncodeWhole(const AudioSink& sink);
+    /// Null drains the encoder.
+    void Encode(AVFrame* samples, const AudioSink& sink);
 
     libav::Owner<AVCodecContext> decoder_;
     libav::Owner<SwrContext> resampler_;
@@ -80,6 +85,11 @@ class AudioConverter final : public AudioPathInterface {
     /// empty.
     std::int64_t fifoTime_ = 0;
     bool begun_ = false;
+    /// Where the last silence that was filled in begins and ends, and the frames made of it that the encoder
+    /// holds.
+    std::int64_t fillBegin_ = 0;
+    std::int64_t fillEnd_ = 0;
+    std::deque<std::int64_t> filled_;
     std::uint64_t damaged_ = 0;
     /// Packets in a row that could not be decoded.
     int failures_ = 0;

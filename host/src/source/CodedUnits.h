@@ -28,6 +28,8 @@ struct CodedAudio {
     std::size_t size = 0;
     /// Ticks of 48000 a second, on the line of the source.
     std::int64_t time = 0;
+    /// At least half of it is silence that stands in for what did not come.
+    bool filled = false;
 };
 
 using PictureSink = std::function<void(const CodedPicture&)>;

@@ -202,6 +202,9 @@ void Connection::HandleExpired() {
 }
 
 Packets Connection::TakeUnread() {
+    if (newPictures_ >= kMoved || newSounds_ >= kMoved) {
+        return {};
+    }
     Packets unread = std::exchange(ahead_.packets, {});
     if (untouched_->data != nullptr) {
         unread.push_front(std::move(untouched_));
@@ -245,6 +248,7 @@ void Connection::Process(AVPacket& packet) {
     newSounds_ = audio ? 0 : newSounds_;
     if (IsOf(packet, video_)) {
         HandleVideo(packet);
+        used_ |= position_ >= input_->CarriedFrom();
     } else if (!audio && KlvTrackOf(packet) == nullptr) {
         CheckOther(packet);
     } else if (!clock_->Anchored()) {

@@ -47,7 +47,8 @@ class Connection {
     /// anew.
     void Finish();
     /// What was read and not used, when a change of the format has ended the connection: the packet that
-    /// showed it, as it came, and what was read ahead behind it. Of files alone. Once.
+    /// showed it, as it came, and what was read ahead behind it. Of files alone, and nothing where a medium
+    /// moved, of which packets are gone. Once.
     Packets TakeUnread();
     /// Ends the connection, all but the input, and gives that away.
     static std::unique_ptr<Input> End(std::unique_ptr<Connection> connection);
@@ -57,6 +58,9 @@ class Connection {
     Clock::time_point Arrived() const { return ahead_.arrived; }
     /// Byte of the input at which what was not used begins, -1 when not known.
     std::int64_t Position() const { return position_; }
+
+    /// A picture was taken that came behind the last change.
+    bool Used() const { return used_; }
 
     /// Packets that could not be used, and were left out.
     std::uint64_t Damaged() const;
@@ -121,6 +125,7 @@ class Connection {
     std::uint64_t damaged_ = 0;
     std::uint64_t earlyPictures_ = 0;
     std::int64_t position_ = -1;
+    bool used_ = false;
     /// Packets of new streams since the last of our own.
     int newPictures_ = 0;
     /// Of the first of these.

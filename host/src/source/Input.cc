@@ -190,6 +190,7 @@ void Input::FindStreams() {
 bool Input::Renew(std::int64_t position, Packets unread) {
     if (format_->pb != nullptr && std::string_view(format_->iformat->name) == "mpegts") {
         CarryOn(position);
+        carriedFrom_ = position;
     } else if (recorded_) {
         return GoOnWith(std::move(unread));
     } else {

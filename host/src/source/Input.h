@@ -54,6 +54,8 @@ class Input {
     /// first is the packet that showed the change; all else is opened again. Streams of before are gone.
     /// False for a file of which that packet tells nothing. Throws like the constructor, and `SourceLost`.
     bool Renew(std::int64_t position, Packets unread);
+    /// The byte from which on packets have not been read before, -1 where none are read twice.
+    std::int64_t CarriedFrom() const { return carriedFrom_; }
     /// True the first time that somebody asks for the stream with that number of the container, also after
     /// `Renew`: what is still not understood then never will be.
     bool AskFor(int stream) { return asked_.insert(stream).second; }
@@ -122,6 +124,7 @@ class Input {
     std::set<int> damagedNext_;
     /// Where the last unit of any stream ends, in microseconds.
     std::int64_t reached_ = std::numeric_limits<std::int64_t>::min();
+    std::int64_t carriedFrom_ = -1;
     /// Of a connection that has been taken over from an earlier context.
     std::unique_ptr<AVIOContext, CloseConnection> connection_;
     libav::Owner<AVFormatContext> format_;

@@ -1,7 +1,6 @@
 #include "source/InputProducer.h"
 
 #include <algorithm>
-#include <array>
 #include <utility>
 
 #include "common/ReceiverError.h"
@@ -10,11 +9,6 @@
 
 namespace receiver {
 namespace {
-
-/// Seconds before each attempt; the last one repeats.
-constexpr std::array<int, 5> kPauses{1, 2, 4, 8, 15};
-/// A connection that has held so long was a good one, and the pauses begin anew behind it.
-constexpr std::chrono::seconds kGood{30};
 
 std::unique_ptr<Connection> Connect(const SourceOptions& options, double patience,
                                     const std::shared_ptr<Interrupt>& interrupt, const StopCheck& stop,
@@ -46,6 +40,7 @@ InputProducer::InputProducer(const SourceOptions& options, double patience,
       description_(connection_->Description()),
       recorded_(connection_->Recorded()),
       assembler_(description_.frameRate),
+      pauses_(Listens(options_.url)),
       connected_(Clock::now()),
       lastPicture_(connected_) {
     connection_->Begin(assembler_, 0);
@@ -128,9 +123,7 @@ void InputProducer::Fail(const ReceiverError& error) {
 
 void InputProducer::Drop() {
     lost_ = Clock::now();
-    if (lost_ - connected_ > kGood) {
-        attempts_ = 0;
-    }
+    pauses_.Lost(lost_ - connected_);
     KeepCounts();
     connection_.reset();
 }
@@ -141,20 +134,14 @@ void InputProducer::KeepCounts() {
 }
 
 void InputProducer::TryAgain() {
-    using std::chrono::milliseconds;
-    // Where the sender comes to us it is refused while nobody listens.
-    const bool listens = Listens(options_.url);
-    const milliseconds pause = listens ? std::chrono::ceil<milliseconds>(tried_ + kListenEvery - Clock::now())
-                                       : std::chrono::seconds(kPauses[attempts_]);
-    if (interrupt_->Wait(std::max(milliseconds(0), pause))) {
+    if (interrupt_->Wait(pauses_.Next(Clock::now()))) {
         throw Stopped();
     }
-    attempts_ = std::min(attempts_ + 1, kPauses.size() - 1);
-    tried_ = Clock::now();
+    pauses_.Tried(Clock::now());
     std::unique_ptr<Connection> connection;
     try {
-        connection = Connect(options_, listens ? kListeningPatience : options_.timeout, interrupt_, nullptr,
-                             &description_);
+        connection = Connect(options_, Listens(options_.url) ? kListeningPatience : options_.timeout,
+                             interrupt_, nullptr, &description_);
     } catch (const ReceiverError& error) {
         TellFailure(error);
         return;
@@ -166,6 +153,7 @@ void InputProducer::TryAgain() {
     assembler_.AddNotice("the source is back after " + std::to_string(away) + " s");
     const std::int64_t passed = Ticks(connection->Arrived() - lastPicture_);
     GoOn(std::move(connection), passed, false);
+    changedFor_.clear();
 }
 
 void InputProducer::Change(const std::string& reason) {
@@ -175,17 +163,21 @@ void InputProducer::Change(const std::string& reason) {
     ++changes_;
     KeepCounts();
     const std::int64_t passed = recorded_ ? 0 : Ticks(Clock::now() - lastPicture_);
+    // What was opened anew for this and shows it again at once would do so for ever.
+    const bool again = !connection_->Used() && reason == changedFor_;
     Packets unread = connection_->TakeUnread();
     std::unique_ptr<Input> input = Connection::End(std::move(connection_));
     lost_ = Clock::now();
     try {
-        if (!input->Renew(position, std::move(unread))) {
-            throw ReceiverError(ExitCode::kSourceUnsuitable,
-                                reason + ": what follows in this file cannot be understood, and is left out");
+        if (again || !input->Renew(position, std::move(unread))) {
+            throw ReceiverError(ExitCode::kSourceUnsuitable, reason + ": what follows " +
+                                                                 (recorded_ ? "in this file " : "") +
+                                                                 "cannot be understood, and is left out");
         }
         auto connection = std::make_unique<Connection>(std::move(input), options_, nullptr);
         assembler_.AddNotice(reason + ": the recording goes on in a new file");
         GoOn(std::move(connection), passed, true);
+        changedFor_ = reason;
     } catch (const SourceLost& loss) {
         EndWith(ReceiverError(ExitCode::kSourceUnavailable,
                               reason + ", and the source was lost: " + loss.what()));
@@ -203,8 +195,9 @@ void InputProducer::EndWith(const ReceiverError& error) {
 }
 
 std::string InputProducer::NextAttempt() const {
+    const auto pause = std::chrono::duration_cast<std::chrono::seconds>(pauses_.Next(Clock::now()));
     return Listens(options_.url) ? "; waiting for it"
-                                 : "; trying again in " + std::to_string(kPauses[attempts_]) + " s";
+                                 : "; trying again in " + std::to_string(pause.count()) + " s";
 }
 
 void InputProducer::TellFailure(const ReceiverError& error) {

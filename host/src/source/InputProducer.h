@@ -4,11 +4,13 @@
 #include <chrono>
 #include <memory>
 #include <optional>
+#include <string>
 
 #include "common/ReceiverError.h"
 #include "source/Connection.h"
 #include "source/Interrupt.h"
 #include "source/ProducerInterface.h"
+#include "source/RetryPauses.h"
 #include "source/StopCheck.h"
 
 namespace receiver {
@@ -60,14 +62,14 @@ class InputProducer final : public ProducerInterface {
     SourceDescription description_;
     bool recorded_ = false;
     UnitAssembler assembler_;
+    RetryPauses pauses_;
     /// When the present connection began, and when the source last gave a picture.
     Clock::time_point connected_;
     Clock::time_point lastPicture_;
     Clock::time_point lost_;
-    /// Which pause comes next.
-    std::size_t attempts_ = 0;
-    /// When the last attempt began and when one was told of; where a sender is waited for.
-    Clock::time_point tried_;
+    /// Why the present connection follows another one as another source; empty when it does not.
+    std::string changedFor_;
+    /// When a failed attempt was told of; where a sender is waited for.
     Clock::time_point told_;
     std::uint64_t damagedBefore_ = 0;
     std::uint64_t earlyBefore_ = 0;

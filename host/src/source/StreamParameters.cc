@@ -19,14 +19,16 @@ void SetExtradata(AVCodecParameters& parameters, const std::uint8_t* data, std::
     parameters.extradata_size = static_cast<int>(size);
 }
 
-void RenewVideo(AVCodecParameters& parameters, const AVPacket& packet) {
+bool RenewVideo(AVCodecParameters& parameters, const AVPacket& packet) {
     PictureParser parser(parameters);
     const auto picture = parser.Parse({packet.data, static_cast<std::size_t>(packet.size)});
-    if (picture.width != 0) {
-        parameters.width = static_cast<int>(picture.width);
-        parameters.height = static_cast<int>(picture.height);
-        parameters.profile = parser.Profile();
+    if (picture.width == 0) {
+        return false;
     }
+    parameters.width = static_cast<int>(picture.width);
+    parameters.height = static_cast<int>(picture.height);
+    parameters.profile = parser.Profile();
+    return true;
 }
 
 bool RenewAudio(AVCodecParameters& parameters, const AVPacket& packet) {
@@ -55,11 +57,8 @@ bool RenewParameters(AVStream& stream, const AVPacket& packet) {
     if (told != nullptr) {
         SetExtradata(parameters, told, size);
     }
-    if (parameters.codec_type == AVMEDIA_TYPE_AUDIO) {
-        return RenewAudio(parameters, packet);
-    }
-    RenewVideo(parameters, packet);
-    return true;
+    return parameters.codec_type == AVMEDIA_TYPE_AUDIO ? RenewAudio(parameters, packet)
+                                                       : RenewVideo(parameters, packet);
 }
 
 }  // namespace receiver

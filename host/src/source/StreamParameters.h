@@ -6,7 +6,7 @@ namespace receiver {
 
 /// Renews what a container has told of a stream at its beginning by `packet`, with which it goes on as
 /// another one: by new parameters that come with the packet, and by what it shows itself. False where both
-/// tell nothing, as of audio that cannot be decoded.
+/// tell nothing, as of audio that cannot be decoded and of a picture of another codec.
 bool RenewParameters(AVStream& stream, const AVPacket& packet);
 
 }  // namespace receiver

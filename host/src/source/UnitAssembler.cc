@@ -150,6 +150,9 @@ void UnitAssembler::PlaceAudio(const CodedAudio& audio) {
                 continue;
             case AudioGrid::Action::kAccept:
                 audioBegun_ = true;
+                if (audio.filled) {
+                    CountSilence();
+                }
                 EmitAudio(place.time, audio);
                 return;
             case AudioGrid::Action::kOverlap:

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <functional>
 #include <string>
 #include <vector>
 
@@ -10,7 +11,12 @@ namespace receiver {
 /// Keeps what it is told.
 class FakeDisplay final : public DisplayInterface {
  public:
-    void Notice(const std::string& sentence) override { notices.push_back(sentence); }
+    void Notice(const std::string& sentence) override {
+        notices.push_back(sentence);
+        if (onNotice) {
+            onNotice(sentence);
+        }
+    }
     void Failure(ExitCode code, const std::string& sentence) override {
         failureCode = code;
         failure = sentence;
@@ -26,6 +32,8 @@ class FakeDisplay final : public DisplayInterface {
         ++finished;
     }
 
+    /// Called with each notice.
+    std::function<void(const std::string& sentence)> onNotice;
     std::vector<std::string> notices;
     ExitCode failureCode = ExitCode::kSuccess;
     std::string failure;

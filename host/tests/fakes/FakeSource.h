@@ -5,6 +5,7 @@
 #include <deque>
 #include <functional>
 #include <memory>
+#include <optional>
 #include <utility>
 #include <vector>
 
@@ -82,6 +83,10 @@ class FakeSource final : public SourceInterface {
         if (before_) {
             before_(read_);
         }
+        if (change_ && change_->first == read_) {
+            description_ = std::exchange(change_, {})->second;
+            return Result::kChanged;
+        }
         if (units_.empty()) {
             return endless_ ? Result::kIdle : Result::kEnd;
         }
@@ -97,6 +102,10 @@ class FakeSource final : public SourceInterface {
     SourceDescription& ChangeDescription() { return description_; }
     /// Called before each unit with the number of units read so far.
     void Before(std::function<void(std::size_t)> hook) { before_ = std::move(hook); }
+    /// The source is another one behind `read` units.
+    void ChangeBehind(std::size_t read, const SourceDescription& description) {
+        change_.emplace(read, description);
+    }
     /// Idle at the end instead of over.
     void MakeEndless() { endless_ = true; }
     SourceCounts& ChangeCounts() { return counts_; }
@@ -106,6 +115,7 @@ class FakeSource final : public SourceInterface {
     SourceCounts counts_;
     std::deque<SourceUnit> units_;
     std::function<void(std::size_t)> before_;
+    std::optional<std::pair<std::size_t, SourceDescription>> change_;
     std::size_t read_ = 0;
     bool endless_ = false;
     std::atomic<bool> stopped_{false};

@@ -1,10 +1,14 @@
 // A module that records nothing but the calls that it gets. The environment variable FAKE_MODULE makes it
-// misbehave: "none" gives no object, "refuse" fails its initialisation, "fail" sets status 7 with the first
-// video unit, "overflow" reports the first video unit as lost, "fault" sets status 6 with it, "hang" carries
-// out no command, "crowded" has room for one mark among the video and reports the second one as lost.
+// misbehave: "none" gives no object, "refuse" fails its initialisation, "refuse second" every other one,
+// "keep" holds every unit until it is told to let go, "fail" sets status 7 with the first video unit,
+// "overflow" reports the first video unit as lost, "fault" sets status 6 with it, "hang" carries out no
+// command, "crowded" has room for one mark among the video and reports the second one as lost.
 
 #include <cstdlib>
+#include <memory>
 #include <string>
+#include <utility>
+#include <vector>
 
 #include "Logger.h"
 #include "QxModuleInterface.h"
@@ -34,13 +38,16 @@ class FakeModule final : public QxModuleInterface,
         host->GetParameter("-encodedFPS", rate, 0);
         Calls() = "Initialize(" + mode + "," + std::to_string(rate) + ")";
         pushed_ = false;
-        if (Behaves("refuse")) {
+        if (Behaves("refuse") || (Behaves("refuse second") && std::exchange(refuses_, !refuses_))) {
             host->SetStatus(QxStatus::kFailed, QxFailure::kInitialize);
             return false;
         }
         return true;
     }
-    bool Uninitialize() override { return Called("Uninitialize"); }
+    bool Uninitialize() override {
+        LetGo();
+        return Called("Uninitialize");
+    }
     bool Execute() override {
         host_->SendTransmissionStatus({{"file_output_status", "standby"}});
         return Called("Execute");
@@ -63,6 +70,7 @@ class FakeModule final : public QxModuleInterface,
 
     void PushReserved(const std::shared_ptr<StreamData>&) override {}
     void PushVideo(const std::shared_ptr<StreamData>& unit) override {
+        Keep(unit);
         if (unit->payload == nullptr && Behaves("crowded")) {
             TakeMark(unit);
         }
@@ -79,8 +87,8 @@ class FakeModule final : public QxModuleInterface,
             Logger::Put(LOG_PRIORITY_WARNING, nullptr, nullptr, 0, "queue overflow (video)");
         }
     }
-    void PushAudio(const std::shared_ptr<StreamData>&) override {}
-    void PushMeta(const std::shared_ptr<StreamData>&) override {}
+    void PushAudio(const std::shared_ptr<StreamData>& unit) override { Keep(unit); }
+    void PushMeta(const std::shared_ptr<StreamData>& unit) override { Keep(unit); }
 
     std::uint32_t NotifyInputOutputConnectRequest(const QxInputOutputConnectRequest*) override {
         Called("Connect");
@@ -103,7 +111,15 @@ class FakeModule final : public QxModuleInterface,
         }
     }
 
+    void LetGo() { kept_.clear(); }
+
  private:
+    void Keep(const std::shared_ptr<StreamData>& unit) {
+        if (Behaves("keep")) {
+            kept_.push_back(unit);
+        }
+    }
+
     static bool Called(const char* name) {
         Calls().append(" ").append(name);
         return true;
@@ -121,6 +137,10 @@ class FakeModule final : public QxModuleInterface,
 
     QxModuleHostInterface* host_ = nullptr;
     bool pushed_ = false;
+    /// Of "refuse second": the next initialisation.
+    bool refuses_ = false;
+    /// Of "keep".
+    std::vector<std::shared_ptr<StreamData>> kept_;
     /// Of "crowded": how many came, and the one that is held until the third.
     int marks_ = 0;
     std::shared_ptr<StreamData> mark_;
@@ -136,6 +156,11 @@ extern "C" bool GetQxModuleInterface(QxModuleInterface** out) {
     }
     *out = &fakeModule;
     return true;
+}
+
+/// On the thread that pushes.
+extern "C" void FakeModuleLetGo() {
+    fakeModule.LetGo();
 }
 
 /// The calls since `Initialize`, with blanks between them.

@@ -1,6 +1,9 @@
+#include <fstream>
+
 #include "SentMedia.h"
 #include "SourceTesting.h"
 #include "StreamServer.h"
+#include "damaged/TransportStream.h"
 
 namespace receiver {
 namespace {
@@ -316,6 +319,79 @@ TEST_P(MovedMedium, IsToldAndRecordedOn) {
 INSTANTIATE_TEST_SUITE_P(All, MovedMedium,
                          testing::Values(Move{"audio", "1:300", "the audio moved to another stream", 15},
                                          Move{"video", "0:301", "the video moved to another stream", 2}));
+
+/// Files whose change cannot be followed: what came before is there, and a sentence tells of the rest.
+class FormatChangeToTheUnknown : public SourceTest {
+ protected:
+    static constexpr const char* kHevc =
+        " -pix_fmt yuv420p -c:v libx265 -preset ultrafast -x265-params "
+        "log-level=none:bframes=0:keyint=12:repeat-headers=1 ";
+
+    /// A complete playlist of two segments.
+    void WritePlaylist(const string& seconds) const {
+        std::ofstream(Path("vod.m3u8"))
+            << "#EXTM3U\n#EXT-X-VERSION:3\n#EXT-X-TARGETDURATION:10\n#EXTINF:" << seconds
+            << ",\na.ts\n#EXTINF:" << seconds << ",\nb.ts\n#EXT-X-ENDLIST\n";
+    }
+    void ExpectLeftOut(const string& file, const string& notice, std::size_t pictures) {
+        const auto source = OpenSource(Fast(file), notices_, nullptr);
+        std::size_t came = 0;
+        string sentence;
+        try {
+            // A change that is followed over and over again would not end.
+            for (int changes = 0; changes < kManyChanges;) {
+                SourceUnit unit;
+                const auto result = source->Read(unit);
+                ASSERT_NE(result, SourceInterface::Result::kEnd);
+                changes += result == SourceInterface::Result::kChanged ? 1 : 0;
+                came += result == SourceInterface::Result::kUnit && unit.medium == Medium::kVideo ? 1 : 0;
+            }
+        } catch (const ReceiverError& error) {
+            EXPECT_EQ(error.Code(), ExitCode::kSourceUnsuitable);
+            sentence = error.what();
+        }
+        EXPECT_EQ(sentence, notice + ": what follows in this file cannot be understood, and is left out");
+        EXPECT_GE(came, pictures);
+    }
+
+ private:
+    static constexpr int kManyChanges = 5;
+};
+
+TEST_F(FormatChangeToTheUnknown, EndsAPlaylistWhoseCodecChanges) {
+    Ffmpeg(Plain("128x96", "25") + " -muxdelay 0 a.ts");
+    Ffmpeg(Picture("128x96", "25") + Tone(48000) + kHevc + kPlainAac +
+           " -muxdelay 0 -output_ts_offset 1 b.ts");
+    WritePlaylist("1.0");
+    ExpectLeftOut("vod.m3u8", "the video changed from h264 to hevc", 24);
+}
+
+TEST_F(FormatChangeToTheUnknown, EndsAPlaylistWhoseVideoMoves) {
+    const string source =
+        " -f lavfi -i testsrc2=size=128x96:rate=25:duration=7 -f lavfi -i "
+        "sine=frequency=500:sample_rate=48000:duration=7 ";
+    Ffmpeg(source + H264() + kPlainAac + "-muxdelay 0 a.ts");
+    Ffmpeg(source + H264() + kPlainAac + "-muxdelay 0 -output_ts_offset 7 -streamid 0:301 b.ts");
+    WritePlaylist("7.0");
+    ExpectLeftOut("vod.m3u8", "the video moved to another stream", 173);
+}
+
+/// The tables go on to tell of H.264, and pictures of it stand right in front of the change.
+TEST_F(FormatChangeToTheUnknown, EndsATransportStreamWhoseTablesAreWrong) {
+    const string black = " -f lavfi -i color=black:size=128x96:rate=25:duration=2 ";
+    Ffmpeg(black + H264("-bf 0 -g 1 -x264-params repeat-headers=1") + "-muxdelay 0 a.ts");
+    Ffmpeg(black + kHevc + "-muxdelay 0 -output_ts_offset 2 b.ts");
+    endtoend::Pieces pieces = endtoend::ReadPieces(Path("a.ts"));
+    const auto isMap = [](const endtoend::Bytes& piece) {
+        return endtoend::PidOf(piece) == endtoend::kMapPid;
+    };
+    const endtoend::Bytes map = *std::find_if(pieces.begin(), pieces.end(), isMap);
+    for (const endtoend::Bytes& piece : endtoend::ReadPieces(Path("b.ts"))) {
+        pieces.push_back(isMap(piece) ? map : piece);
+    }
+    endtoend::WritePieces(pieces, Path("ab.ts"));
+    ExpectLeftOut("ab.ts", "the video changed from h264 to hevc", 49);
+}
 
 }  // namespace
 }  // namespace receiver

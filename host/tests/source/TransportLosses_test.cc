@@ -95,5 +95,66 @@ TEST_F(TransportLosses, LeaveAacInStepThatComesFrameByFrame) {
     ExpectInStepBehindLosses(1100);
 }
 
+/// Sound that is converted is not left to the stamps of its frames alone: what is missing is told all the
+/// same.
+struct Converted {
+    const char* name;
+    /// Arguments of ffmpeg.
+    const char* codec;
+    /// Samples of a frame at 48 kHz.
+    std::int64_t frame;
+};
+void PrintTo(const Converted& sound, std::ostream* out) {
+    *out << sound.name;
+}
+
+class ConvertedSound : public TransportLosses, public testing::WithParamInterface<Converted> {
+ protected:
+    /// Takes the frames `first` to `last` out.
+    std::vector<SourceUnit> ReadWithout(int first, int last) {
+        Make(GetParam().codec);
+        Ffmpeg("-copyts -i whole.ts -c copy -bsf:a 'noise=drop=between(n\\," + std::to_string(first) + "\\," +
+               std::to_string(last) + ")' -muxdelay 0 cut.ts");
+        source_ = OpenSource(Fast("cut.ts"), notices_, nullptr);
+        return ReadAll(*source_);
+    }
+    /// No frame of audio may be missing, whatever stands in for it.
+    static void ExpectSteady(const std::vector<SourceUnit>& units) {
+        const auto sounds = Of(Medium::kAudio, units);
+        ASSERT_FALSE(sounds.empty());
+        for (std::size_t at = 1; at < sounds.size(); ++at) {
+            EXPECT_EQ(sounds[at].time - sounds[at - 1].time, 1024);
+        }
+    }
+    std::unique_ptr<SourceInterface> source_;
+};
+
+TEST_P(ConvertedSound, ThatIsMissingIsCountedFrameByFrame) {
+    ExpectSteady(ReadWithout(400, 439));
+    const double missing = static_cast<double>(40 * GetParam().frame) / 1024;
+    EXPECT_NEAR(static_cast<double>(source_->Counts().silentFrames), missing, 1);
+    EXPECT_EQ(source_->Counts().lostFrames, 0u);
+    EXPECT_GE(notices_.CountOf("missing and filled with silence"), 1u)
+        << testing::PrintToString(notices_.sentences);
+}
+
+TEST_P(ConvertedSound, OfASingleFrameThatIsMissingIsTold) {
+    ExpectSteady(ReadWithout(400, 400));
+    EXPECT_GE(source_->Counts().silentFrames, 1u);
+    EXPECT_LE(source_->Counts().silentFrames, 2u);
+    EXPECT_GE(notices_.CountOf("missing and filled with silence"), 1u)
+        << testing::PrintToString(notices_.sentences);
+}
+
+TEST_P(ConvertedSound, ThatIsWholeHasNoSilence) {
+    ExpectSteady(ReadWithout(-1, -1));
+    EXPECT_EQ(source_->Counts().silentFrames, 0u);
+    EXPECT_EQ(notices_.CountOf("gaps"), 0u) << testing::PrintToString(notices_.sentences);
+}
+
+INSTANTIATE_TEST_SUITE_P(All, ConvertedSound,
+                         testing::Values(Converted{"MP2", "-c:a mp2 -ar 48000 -ac 2", 1152},
+                                         Converted{"AC-3", "-c:a ac3 -ar 48000 -ac 2", 1536}));
+
 }  // namespace
 }  // namespace receiver
