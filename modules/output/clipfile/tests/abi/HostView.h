@@ -14,7 +14,7 @@ struct StreamData {
 
     std::uint64_t rtp_timestamp = 0;
     std::uint64_t timestamp = 0;
-    std::uint64_t reserved0 = 0;
+    std::uint64_t presentation_timestamp = 0;
     std::uint64_t reserved1 = 0;
     std::uint64_t reserved2 = 0;
     std::uint64_t reserved3 = 0;
