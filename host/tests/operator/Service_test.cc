@@ -8,11 +8,9 @@
 #include <unistd.h>
 
 #include <array>
-#include <chrono>
 #include <cstring>
 #include <filesystem>
 #include <string>
-#include <thread>
 
 namespace receiver {
 namespace {
@@ -67,14 +65,16 @@ TEST_F(ServiceTest, TellsBeginStateAndEnd) {
 }
 
 TEST_F(ServiceTest, GivesSignsOfLifeInHalfTheTimeThatIsAskedForAndNoMoreOften) {
-    setenv("WATCHDOG_USEC", "2000", 1);
+    setenv("WATCHDOG_USEC", "2", 1);
     Service often;
     often.Alive("a");
     EXPECT_EQ(Hear(), "WATCHDOG=1\nSTATUS=a");
-    const auto due = std::chrono::steady_clock::now() + std::chrono::milliseconds(1);
-    std::this_thread::sleep_until(due);
-    often.Alive("a");
-    EXPECT_EQ(Hear(), "WATCHDOG=1\n");
+    std::string next;
+    while (next.empty()) {
+        often.Alive("a");
+        next = Hear();
+    }
+    EXPECT_EQ(next, "WATCHDOG=1\n");
 
     setenv("WATCHDOG_USEC", "3600000000", 1);
     Service seldom;
