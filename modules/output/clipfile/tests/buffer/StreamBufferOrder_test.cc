@@ -397,17 +397,26 @@ TEST_F(StreamBufferOrder, PicturesThatStandBehindTheEndInAnEarlierGroupCountAsSh
 }
 
 TEST_F(StreamBufferOrder, PicturesWithoutATimeAreShownAsTheyAreDecoded) {
-    auto units = unitsOf(MakePictures(kPyramid, 25, 50), 2);
-    for (const auto& unit : units) {
-        unit->presentation_timestamp = 0;
-    }
-    harness.Start();
-    push(units);
-    pushMediaUpTo(60);
-    harness.buffer->Stop();
-    EXPECT_EQ(cutRecord().places.size(), 50u);
-    for (const auto& chunk : harness.Chunks()) {
-        EXPECT_THAT(chunk->shownLater, Each(0));
+    const auto pictures = MakePictures(kPyramid, 25, 50);
+    for (const std::size_t output : {0, 1}) {
+        auto units = unitsOf(pictures, 2);
+        for (const auto& unit : units) {
+            // Never set, and 12 s later.
+            unit->presentation_timestamp = output == 0 ? 0 : unit->rtp_timestamp + 12 * 90000;
+        }
+        harness.Start();
+        // A record from here on: none of the pictures may lie before it.
+        harness.buffer->SetStartTimestamp(static_cast<std::int64_t>(harness.clock.VideoRtp(0)));
+        metaPushed = 0;
+        harness.nextAudio = 0;
+        push(units);
+        pushMediaUpTo(60);
+        harness.buffer->Stop();
+        EXPECT_EQ(cutRecord(output).places.size(), 50u);
+        EXPECT_EQ(recordedBy(harness, output).meta, Range(0, 50));
+        for (const auto& chunk : harness.Chunks(output)) {
+            EXPECT_THAT(chunk->shownLater, Each(0));
+        }
     }
 }
 
