@@ -360,6 +360,28 @@ TEST_F(StreamBufferOrder, JitterOfAlmostHalfAPictureChangesNothing) {
     EXPECT_EQ(harness.Chunks()[0]->shownLater[0], 2);
 }
 
+TEST_F(StreamBufferOrder, TheDelayOfARecordRestsOnMoreThanTheStampsOfItsFirstPicture) {
+    // In order, so that nothing tells how many pictures wait but the stamps; reordered later.
+    auto pictures = MakePictures(kInOrder, 1000, 48);
+    for (Picture picture : MakePictures(kPyramid, 1000, 41)) {
+        pictures.push_back({picture.shown + 48, false});
+    }
+    auto units = unitsOf(pictures, 2);
+    // Decoded 0.44 pictures too late, shown as much too early: one picture between them, where there are two.
+    units[0]->rtp_timestamp += 1600;
+    units[0]->presentation_timestamp -= 1600;
+    harness.Start();
+    push(units);
+    pushMediaUpTo(96);
+    harness.buffer->Stop();
+    const CutRecord record = cutRecord();
+    ASSERT_EQ(record.places.size(), pictures.size());
+    for (std::size_t i = 0; i < record.places.size(); ++i) {
+        EXPECT_EQ(static_cast<std::uint64_t>(record.places[i]), pictures[i].shown) << i;
+    }
+    EXPECT_EQ(harness.Chunks()[0]->shownLater[0], 2);
+}
+
 TEST_F(StreamBufferOrder, TimesThatStepBackAtAnIdrFrameMoveNoPicturesOfTheOneBefore) {
     const auto pictures = MakePictures(kPyramid, 25, 75);
     auto units = unitsOf(pictures, 5);
@@ -370,6 +392,7 @@ TEST_F(StreamBufferOrder, TimesThatStepBackAtAnIdrFrameMoveNoPicturesOfTheOneBef
     harness.buffer->SetEndTimestamp(static_cast<std::int64_t>(harness.clock.VideoRtp(62)));
     push(units);
     pushMediaUpTo(80);
+    ASSERT_TRUE(harness.controller.WaitForCall("post 5"));
     harness.buffer->Stop();
     const CutRecord record = cutRecord();
     for (std::size_t i = 0; i < record.places.size(); ++i) {
@@ -391,6 +414,7 @@ TEST_F(StreamBufferOrder, PicturesThatStandBehindTheEndInAnEarlierGroupCountAsSh
     harness.buffer->SetEndTimestamp(static_cast<std::int64_t>(harness.clock.VideoRtp(28)));
     push(units);
     pushMediaUpTo(64);
+    ASSERT_TRUE(harness.controller.WaitForCall("post 5"));
     harness.buffer->Stop();
     EXPECT_EQ(cutRecord().places.size() - cutRecord().hidden, 28u);
     EXPECT_EQ(recordedBy(harness).meta, Range(5, 23));
