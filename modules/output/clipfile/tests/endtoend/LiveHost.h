@@ -5,6 +5,7 @@
 #include <atomic>
 #include <chrono>
 #include <cstdint>
+#include <map>
 #include <memory>
 #include <stdexcept>
 #include <string>
@@ -72,11 +73,14 @@ struct Delivery {
 /// does not wait: what finds the module's queues full is lost.
 class LiveHost {
  public:
-    explicit LiveHost(const Delivery& delivery) : delivery_(delivery), stream(delivery.rate) {
-        host_.texts = {{"-outputPath", directory.Path().string()},
-                       {"-filePrefix", "Cam"},
-                       {"-outputMode", "sync"},
-                       {"-recordRules", "exact"}};
+    /// `texts` are start parameters in the place of what the host would say, or beside it.
+    explicit LiveHost(const Delivery& delivery, const std::map<std::string, std::string>& texts = {})
+        : delivery_(delivery), stream(delivery.rate) {
+        host_.texts = texts;
+        host_.texts.insert({{"-outputPath", directory.Path().string()},
+                            {"-filePrefix", "Cam"},
+                            {"-outputMode", "sync"},
+                            {"-recordRules", "exact"}});
         host_.numbers["-encodedFPS"] = static_cast<int>(delivery.rate.key);
         if (!delivery.pattern.empty()) {
             host_.texts["-pictureOrder"] = "decoding";
