@@ -497,7 +497,7 @@ ExitCode RunReceiver(const Options& options, const SourceOpener& open, Signals& 
         code = error.Code();
         display.Failure(code, WithFullStop(error.what()));
     } catch (const std::exception& error) {
-        display.Failure(code, WithFullStop(error.what()));
+        display.Failure(code, WithFullStop(SentenceOf(error)));
     }
     return code;
 }
