@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cerrno>
 #include <chrono>
+#include <cstdlib>
 #include <cstring>
 #include <fstream>
 #include <map>
@@ -20,6 +21,7 @@ constexpr std::chrono::seconds kDeadline{60};
 
 constexpr int kSignalled = 125;
 
+constexpr std::size_t kPicturesOfAChunk = 8;
 /// The module keeps a fragment in memory until it is whole: 32 chunks of 8 pictures.
 constexpr std::size_t kPicturesOfAFragment = 256;
 
@@ -115,6 +117,17 @@ Progress WrittenIn(const std::vector<std::string>& log) {
     return progress;
 }
 
+/// Pictures in front of the first one that a line of verify names, or whose metadata one names.
+std::size_t IntactBefore(const std::string& defects) {
+    std::size_t first = std::string::npos;
+    for (const std::string word : {" picture ", " unit "}) {
+        for (std::size_t at = defects.find(word); at != std::string::npos; at = defects.find(word, at + 1)) {
+            first = std::min(first, std::strtoul(defects.c_str() + at + word.size(), nullptr, 10));
+        }
+    }
+    return first == 0 || first == std::string::npos ? first : first - 1;
+}
+
 std::optional<int> CauseIn(const std::string& said) {
     const std::string words = "(status 7, cause ";
     const std::size_t at = said.find(words);
@@ -180,6 +193,7 @@ std::string NameOf(FileType type) {
 std::string NameOf(LeftFile::State state) {
     return state == LeftFile::State::kWhole       ? "whole"
            : state == LeftFile::State::kRecovered ? "recovered"
+           : state == LeftFile::State::kDamaged   ? "damaged"
                                                   : "empty";
 }
 
@@ -283,6 +297,8 @@ FaultOutcome FaultRunner::RunIn(const std::filesystem::path& folder, const Fault
     outcome.cause = CauseIn(outcome.said);
     const Progress written = WrittenIn(LinesOf(outcome.log));
     outcome.taken = Contains(outcome.log, "mp4 file write error.") ? written.before : written.last;
+    // The end of a chunk waits in its stream for the next one.
+    outcome.taken -= std::min(outcome.taken, kPicturesOfAChunk);
     if (type_ == FileType::kFragmented) {
         outcome.taken -= outcome.taken % kPicturesOfAFragment;
     }
@@ -316,7 +332,12 @@ LeftFile FaultRunner::Judge(const std::filesystem::path& file, const std::filesy
     if (!like_.empty()) {
         command.insert(command.end() - 1, {"--like", like_});
     }
-    RunProgram(command);
+    const Outcome recovery = RunProgram(command);
+    if (Contains(recovery.output + recovery.errors, "is closed: nothing to recover.")) {
+        left.state = LeftFile::State::kDamaged;
+        left.pictures = std::min(picturesOf(file), IntactBefore(left.defects));
+        return left;
+    }
     const std::filesystem::path recovered = scratch / file.filename();
     if (std::filesystem::exists(recovered) && defectsOf(recovered).code == 0) {
         left.state = LeftFile::State::kRecovered;

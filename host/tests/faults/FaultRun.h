@@ -45,11 +45,14 @@ struct LeftFile {
         kWhole,
         /// `clipfile recover` makes such a file of it.
         kRecovered,
+        /// It is closed, and verify finds fault with its last pictures.
+        kDamaged,
         /// There is no picture in it, or none that can be had.
         kNothing,
     };
     std::filesystem::path path;
     State state = State::kNothing;
+    /// Those with which nothing is wrong.
     std::size_t pictures = 0;
     /// What verify says.
     std::string defects;
@@ -74,8 +77,8 @@ struct FaultOutcome {
     std::vector<LeftFile> files;
     /// Those in all files.
     std::size_t pictures = 0;
-    /// Pictures of the chunks, and where files are fragmented of the fragments, whose writing was over when
-    /// the fault came, as the module's log has them.
+    /// Pictures of the chunks, and where files are fragmented of the fragments, that the system had been
+    /// given whole when the fault came, as the module's log has them.
     std::size_t taken = 0;
     /// The fault has come.
     bool hit = false;
