@@ -129,7 +129,8 @@ void Running::PrepareOutput(const OutputPlace& place) {
         GiveToGroup();
     }
     folder_ = OpenOutputFolder(place);
-    if (folder_->Prepare()) {
+    const bool folderIsNew = folder_->Prepare();
+    if (folderIsNew) {
         display_.Notice("made the output folder " + place.folder);
     }
     ExpectDatedFolders(*folder_, place.prefix, std::time(nullptr));
@@ -140,7 +141,7 @@ void Running::PrepareOutput(const OutputPlace& place) {
         display_.Notice(*warning);
     }
     watch_.emplace(OpenOutputFolder(place), place.prefix);
-    recovery_.emplace(options_, place, display_, keyboard_.IsThere());
+    recovery_.emplace(options_, place, folderIsNew, display_, keyboard_.IsThere());
 }
 
 ExitCode Running::Record(const SourceOpener& open) {
@@ -434,6 +435,7 @@ void Running::Show(const SourceInterface& source, const Recorder& recorder) {
     snapshot.status = host_->Status();
     snapshot.file = report_.OpenFile();
     snapshot.freeBytes = watch_->FreeBytes();
+    snapshot.syncTime = recovery_->SyncLatency();
     snapshot.lost = Lost(source, recorder.Past());
     display_.Show(snapshot);
     service_.Alive(!snapshot.recording     ? "not recording"
@@ -476,8 +478,9 @@ Summary Running::Summarise(const SourceInterface& source, const Recorder::Progre
     summary.lost = Lost(source, past);
     if (host_->Failed()) {
         summary.exitCode = ExitCode::kRecordingFailed;
-    } else if (summary.lost != 0 || report_.Faults() != 0 || lateStops_ != 0 || missed_ ||
-               !shortfalls.empty() || counts.reconnections != 0 || counts.changes != 0) {
+    } else if (summary.lost != 0 || report_.Faults() != 0 || recovery_->SyncFaults() != 0 ||
+               lateStops_ != 0 || missed_ || !shortfalls.empty() || counts.reconnections != 0 ||
+               counts.changes != 0) {
         summary.exitCode = ExitCode::kLost;
     }
     return summary;
@@ -494,7 +497,7 @@ ExitCode RunReceiver(const Options& options, const SourceOpener& open, Signals& 
         code = error.Code();
         display.Failure(code, WithFullStop(error.what()));
     } catch (const std::exception& error) {
-        display.Failure(code, WithFullStop(error.what()));
+        display.Failure(code, WithFullStop(SentenceOf(error)));
     }
     return code;
 }

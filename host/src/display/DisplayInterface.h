@@ -1,5 +1,6 @@
 #pragma once
 
+#include <chrono>
 #include <cstdint>
 #include <optional>
 #include <string>
@@ -31,6 +32,8 @@ struct Snapshot {
     std::string file;
     /// Bytes that may still be written where files go.
     std::optional<std::uint64_t> freeBytes;
+    /// How long the disk takes to make durable what is recorded; nothing when that is not asked of it.
+    std::optional<std::chrono::milliseconds> syncTime;
     /// Units that were lost anywhere between the source and the files.
     std::uint64_t lost = 0;
 };

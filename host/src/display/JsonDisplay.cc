@@ -100,6 +100,8 @@ void JsonDisplay::Show(const Snapshot& snapshot) {
     object["cause"] = snapshot.status.cause;
     object["file"] = TextOrNull(snapshot.file);
     object["free_bytes"] = snapshot.freeBytes ? ordered_json(*snapshot.freeBytes) : ordered_json(nullptr);
+    object["sync_milliseconds"] =
+        snapshot.syncTime ? ordered_json(snapshot.syncTime->count()) : ordered_json(nullptr);
     object["lost"] = snapshot.lost;
     Write("progress", object);
 }

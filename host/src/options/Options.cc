@@ -237,6 +237,13 @@ void AddFileOptions(CLI::App& app, Options& options, Texts& texts) {
         ->type_name("no|ask|yes")
         ->capture_default_str()
         ->group(group);
+    app.add_option(
+           "--durable", options.durable,
+           "Seconds after which what was recorded must survive a power cut, 0 for as the system likes; "
+           "not on a share; 2 when not given")
+        ->check(NumberFrom(0, 3600.0))
+        ->type_name("SECONDS")
+        ->group(group);
     app.add_option("--user", options.user, "User name for a network share: NAME, DOMAIN\\NAME or NAME@DOMAIN")
         ->type_name("NAME")
         ->group(group);

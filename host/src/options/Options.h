@@ -35,6 +35,8 @@ struct Options {
     OutputMode mode = OutputMode::kSync;
     std::optional<unsigned int> maxMinutes;
     RecoverMode recover = RecoverMode::kYes;
+    /// Seconds after which what was recorded is made durable; 0 for never. 2 when not set.
+    std::optional<double> durable;
 
     /// Empty: from the start. Only in mode "sync".
     std::vector<RecordRange> record;
