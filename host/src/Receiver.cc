@@ -41,6 +41,7 @@ constexpr std::chrono::milliseconds kDisplayInterval{250};
 /// The run ends with the frame behind the last one; when the stream has dried up, nobody waits for it.
 constexpr std::chrono::seconds kFinishPatience{2};
 
+constexpr const char* kOver = "the run is over";
 constexpr const char* kNoCommands = "in mode on everything is recorded; --mode sync takes record commands";
 
 std::string WithFullStop(std::string sentence) {
@@ -64,6 +65,8 @@ class Running final : public SourceListenerInterface {
           display_(observers.Display()),
           commands_(commands),
           keyboard_(keyboard) {}
+    /// What waits to be carried out is answered by this object.
+    ~Running() { commands_.Close(kOver); }
     Running(const Running&) = delete;
     Running& operator=(const Running&) = delete;
 
@@ -180,7 +183,7 @@ ExitCode Running::Record(const SourceOpener& open) {
     display_.Notice("source: " + source->Description().summary);
     const Recorder::Progress progress = RecordAll(*source, library.Module(), place);
     service_.Stopping();
-    commands_.Close("the run is over");
+    commands_.Close(kOver);
     plan_.Finish();
     TellMissed();
     recovery_->End(report_);
@@ -528,7 +531,7 @@ ExitCode RunReceiver(const Options& options, const SourceOpener& open, Signals& 
     } catch (const std::exception& error) {
         observers.Display().Failure(code, WithFullStop(error.what()));
     }
-    commands->Close("the run is over");
+    commands->Close(kOver);
     observers.End();
     return code;
 }

@@ -5,6 +5,7 @@
 #include <CLI/CLI.hpp>
 #include <charconv>
 #include <cstring>
+#include <filesystem>
 #include <limits>
 #include <sstream>
 
@@ -118,9 +119,11 @@ CLI::Validator NumberFrom(double low, double high) {
 /// The path of a program: found now, and not when the first file is closed.
 CLI::Validator Program() {
     return {[](std::string& text) {
-                return text.empty() || access(text.c_str(), X_OK) == 0
-                           ? std::string()
-                           : text + " is no program that could be run: write its path";
+                std::error_code ignored;
+                const bool runs =
+                    std::filesystem::is_regular_file(text, ignored) && access(text.c_str(), X_OK) == 0;
+                return text.empty() || runs ? std::string()
+                                            : text + " is no program that could be run: write its path";
             },
             ""};
 }

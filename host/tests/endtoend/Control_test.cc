@@ -286,6 +286,19 @@ TEST_F(ControlSocketRunTest, TheSocketOfALivingRunIsRefusedAndThatOfADeadOneTake
     ExpectWholeEnd();
 }
 
+TEST_F(ControlSocketRunTest, KeysOfARunThatNeverBeganAreAnsweredAtItsEnd) {
+    const FreePorts ports;
+    run_ = Start(
+        {"--input", "udp://127.0.0.1:" + std::to_string(ports.First()), "--no-reconnect", "--timeout", "2"},
+        Process::Terminal::kPseudoTerminal);
+    // Some come before anybody listens to keys.
+    for (int i = 0; i < 1000 && !run_->Wait(std::chrono::milliseconds(100)); ++i) {
+        run_->Type("r");
+    }
+    EXPECT_EQ(run_->Wait(), 3);
+    EXPECT_THAT(run_->AllText(), HasSubstr("no effect: the run is over"));
+}
+
 class HookRunTest : public ControlSocketRunTest {
  protected:
     /// A script that notes each event it hears of and leaves with `code`.
