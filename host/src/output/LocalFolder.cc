@@ -80,6 +80,10 @@ std::string LocalFolder::Obstacle(const std::string& date, const std::string& pr
         }
         return {};
     }
+    struct stat status = {};
+    if (stat(folder_.c_str(), &status) == 0 && !S_ISDIR(status.st_mode)) {
+        return UnusableSentence(folder_, "is no folder");
+    }
     return {};
 }
 

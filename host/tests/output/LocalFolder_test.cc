@@ -115,6 +115,13 @@ TEST_F(LocalFolderTest, ADatedFolderThatIsNotThereIsNoObstacle) {
     EXPECT_EQ(ObstacleForSomebodyElse(""), "");
 }
 
+TEST_F(LocalFolderTest, AFileInThePlaceOfTheOutputFolderIsAnObstacle) {
+    const std::string file = folder_ + "/file";
+    std::ofstream(file) << "text";
+    EXPECT_THAT(OpenLocalFolder(file)->Obstacle("20261121", "CAM1"),
+                StartsWith("the folder '" + file + "' is no folder"));
+}
+
 TEST_F(LocalFolderTest, ADatedFolderOfAnothersUmaskIsAnObstacle) {
     const std::string dated = Make("20261121", 0700);
     EXPECT_THAT(ObstacleForSomebodyElse("CAM1"),
