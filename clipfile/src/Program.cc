@@ -11,6 +11,8 @@
 #include <string_view>
 #include <system_error>
 
+#include "Output.h"
+#include "RetentionCommand.h"
 #include "control/ControlCall.h"
 #include "inspect/BoxTree.h"
 #include "inspect/Inspection.h"
@@ -23,7 +25,6 @@
 #include "recover/Recovery.h"
 #include "recover/Unattended.h"
 #include "recover/UnfinishedFiles.h"
-#include "retention/Retention.h"
 #include "verify/Verification.h"
 
 namespace clipfile {
@@ -48,28 +49,14 @@ struct Options {
     bool unattended = false;
     bool deep = false;
     ControlCall call;
-    RetentionOptions retention;
+    RetentionCommand retention;
 };
-
-/// Writes one JSON value on a line. Names of files need not be UTF-8.
-void PrintJson(std::ostream& out, const Json& json) {
-    out << json.dump(-1, ' ', false, Json::error_handler_t::replace) << '\n';
-}
-
-void TellFault(const std::string& path, const std::string& sentence, const Options& options,
-               std::ostream& out, std::ostream& errors) {
-    if (options.json) {
-        PrintJson(out, {{"file", path}, {"error", sentence}});
-    } else {
-        errors << "clipfile: " << sentence << '\n';
-    }
-}
 
 /// Tells which folders could not be read.
 ExitCode TellFaults(const std::string& folder, const FolderListing& listing, const Options& options,
                     std::ostream& out, std::ostream& errors) {
     for (const std::string& fault : listing.faults) {
-        TellFault(folder, fault, options, out, errors);
+        TellFault(folder, fault, options.json, out, errors);
     }
     return listing.faults.empty() ? ExitCode::kSuccess : ExitCode::kUnreadable;
 }
@@ -97,7 +84,7 @@ ExitCode ForEachFile(const Options& options, std::ostream& out, std::ostream& er
             sentence = path + " cannot be worked on: " + error.what();
         }
         if (!sentence.empty()) {
-            TellFault(path, sentence, options, out, errors);
+            TellFault(path, sentence, options.json, out, errors);
         }
         out.flush();  // an archive takes hours
         result = Worse(result, code);
@@ -374,78 +361,6 @@ CLI::App* AddControl(CLI::App& app, Options& options) {
     return command;
 }
 
-/// A validator that makes of a text what `read` reads in it.
-template <typename Value>
-CLI::Validator ReadBy(std::optional<Value> (*read)(std::string_view), std::optional<Value>& value,
-                      const char* form) {
-    return {[read, &value, form](std::string& text) {
-                value = read(text);
-                return value ? std::string() : text + " is not understood: write " + form;
-            },
-            ""};
-}
-
-CLI::App* AddRetention(CLI::App& app, Options& options) {
-    RetentionOptions& retention = options.retention;
-    CLI::App* const command = app.add_subcommand(
-        "retention", "Remove the oldest closed recordings of a folder, by age or for room on the disk.");
-    command->add_option("DIR", retention.folder, "Folder with recordings")
-        ->required()
-        ->check(CLI::ExistingDirectory);
-    command->add_option("--older-than", "Remove what was closed longer ago: 30d, 12h")
-        ->check(ReadBy(ParseAge, retention.olderThan, "30d or 12h"));
-    command->add_option("--keep-free", "Remove the oldest until so much of the disk is free: 500M, 200G, 1T")
-        ->check(ReadBy(ParseBytes, retention.keepFree, "500M, 200G or 1T"));
-    command->add_flag("--dry-run", retention.dryRun, "Tell what would be removed, and remove nothing");
-    command->add_flag("--json", options.json, "One JSON object a file and line");
-    return command;
-}
-
-void PrintStep(const RetentionStep& step, const Options& options, std::ostream& out) {
-    if (options.json) {
-        PrintJson(out, {{"file", step.path},
-                        {"bytes", step.bytes},
-                        {"removed", step.removed && !options.retention.dryRun},
-                        {"goes", step.removed},
-                        {"reason", step.reason}});
-    } else {
-        const char* const what = !step.removed              ? " stays: "
-                                 : options.retention.dryRun ? " would be removed: "
-                                                            : " is removed: ";
-        out << step.path << what << step.reason << (step.reason.ends_with('.') ? "\n" : ".\n");
-    }
-    out.flush();  // who follows it knows at once what is gone
-}
-
-/// Tells each file that goes, or that stays though it should go.
-ExitCode Retention(const Options& options, std::ostream& out, std::ostream& errors) {
-    if (!options.retention.olderThan && !options.retention.keepFree) {
-        errors << "clipfile: --older-than or --keep-free has to say what may go.\n";
-        return ExitCode::kUsage;
-    }
-    ExitCode code = ExitCode::kSuccess;
-    try {
-        const RetentionResult result =
-            Retain(options.retention, ThisSystem(), [&](const RetentionStep& step) {
-                code = step.removed ? code : ExitCode::kDefects;
-                PrintStep(step, options, out);
-            });
-        for (const std::string& fault : result.faults) {
-            TellFault(options.retention.folder.string(), fault, options, out, errors);
-            code = ExitCode::kUnreadable;
-        }
-        if (!result.isRoom) {
-            TellFault(options.retention.folder.string(), "less of the disk is free than is to be kept free.",
-                      options, out, errors);
-            code = Worse(code, ExitCode::kDefects);
-        }
-    } catch (const ToolError& error) {
-        TellFault(options.retention.folder.string(), error.what(), options, out, errors);
-        code = error.Code();
-    }
-    return code;
-}
-
 /// Asks a receiver, and tells why not.
 ExitCode Control(const ControlCall& call, std::ostream& out, std::ostream& errors) {
     try {
@@ -465,7 +380,7 @@ ExitCode RunProgram(const std::vector<std::string>& arguments, std::ostream& out
     AddInspect(app, options);
     const CLI::App* const verify = AddVerify(app, options);
     const CLI::App* const recover = AddRecover(app, options);
-    const CLI::App* const retention = AddRetention(app, options);
+    const CLI::App* const retention = options.retention.AddTo(app);
     const CLI::App* const control = AddControl(app, options);
     std::vector<std::string> reversed(arguments.rbegin(), arguments.rend() - 1);
     try {
@@ -485,7 +400,7 @@ ExitCode RunProgram(const std::vector<std::string>& arguments, std::ostream& out
         return Control(options.call, out, errors);
     }
     if (retention->parsed()) {
-        return Retention(options, out, errors);
+        return options.retention.Run(out, errors);
     }
     if (verify->parsed()) {
         return Verify(options, out, errors);

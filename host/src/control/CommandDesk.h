@@ -24,8 +24,9 @@ class CommandDesk {
 
     /// Commands that may wait at a time, those of clients that are gone included.
     static constexpr std::size_t kMostCommands = 64;
-    /// A command that has taken effect is answered without its file when that has not come so far.
-    static constexpr std::chrono::seconds kFilePatience{10};
+    /// A command that has taken effect is answered without its file when that has not come so far: as long as
+    /// the end of a recording waits for a slow disk.
+    static constexpr std::chrono::seconds kFilePatience{30};
 
     /// What a client is told of its command.
     struct Outcome {

@@ -18,9 +18,8 @@
 namespace receiver {
 namespace {
 
-/// How long the end of a run waits for clients to read what is left, and for the thread.
+/// How long the end of a run waits for clients to read what is left.
 constexpr std::chrono::milliseconds kReaderPatience{1000};
-constexpr std::chrono::milliseconds kThreadPatience{2000};
 /// Above that of the process: recording comes first.
 constexpr int kNicer = 10;
 
@@ -74,11 +73,11 @@ void Control::LookAt(const SourceUnit& unit) {
     state_->preview.LookAt(unit);
 }
 
-void Control::End() {
+void Control::End(std::chrono::milliseconds patience) {
     state_->socket.Remove();
     state_->ending = true;
     state_->wakeUp->Signal();
-    thread_.End(kThreadPatience);
+    thread_.End(patience);
 }
 
 void Control::Run(State& state) {

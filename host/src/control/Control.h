@@ -1,5 +1,6 @@
 #pragma once
 
+#include <chrono>
 #include <memory>
 #include <string>
 #include <vector>
@@ -17,6 +18,9 @@ namespace receiver {
 /// nobody waits for.
 class Control {
  public:
+    /// Of the end of a run. The thread gives way to everything else, and may take its time.
+    static constexpr std::chrono::milliseconds kPatience{5000};
+
     /// Listens from now on. Throws `ReceiverError` (`kUsage`) where it can't. `sizer` tells the sizes of
     /// files.
     Control(const std::string& path, std::shared_ptr<CommandQueue> commands, FileSizer sizer);
@@ -32,8 +36,9 @@ class Control {
     /// A unit of the source goes by.
     void LookAt(const SourceUnit& unit);
     /// The run is over and the command queue closed: clients are told what is left to be told, those that
-    /// read it soon, and the socket is removed.
-    void End();
+    /// read it soon, and the socket is removed. A thread that a disk keeps for longer than `patience` is left
+    /// to itself. A second time does nothing.
+    void End(std::chrono::milliseconds patience = kPatience);
 
  private:
     struct State;

@@ -96,7 +96,7 @@ TEST_F(ControlTest, ADiskThatHangsHoldsUpNeitherTheRunNorItsEnd) {
         lock.unlock();
         state.FileClosed("/srv/10_00_00_00.MP4");
         control.LookAt(MakeFrame(0, true, 0));
-        control.End();
+        control.End(std::chrono::milliseconds(1));
         EXPECT_FALSE(std::filesystem::exists(Path()));
     }
     std::unique_lock lock(gate->mutex);

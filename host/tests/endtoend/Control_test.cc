@@ -232,8 +232,8 @@ TEST_F(ControlSocketRunTest, HostileClientsHarmNobody) {
     EXPECT_EQ(Reply(garbage)["error"]["code"], -32700);
     LineClient sleeper(Path());
     sleeper.Send(Request("events"));
-    for (int i = 0; i < 40; ++i) {
-        sleeper.Send(Request("preview", {{"width", 320 + i * 2}}));
+    for (int i = 0; i < 10; ++i) {
+        sleeper.Send(Request("preview", {{"width", 1280 + i * 2}}));
     }
     std::list<LineClient> crowd;
     for (int i = 0; i < 200; ++i) {
