@@ -11,6 +11,7 @@
 #include <string_view>
 #include <system_error>
 
+#include "control/ControlCall.h"
 #include "inspect/BoxTree.h"
 #include "inspect/Inspection.h"
 #include "inspect/JsonReport.h"
@@ -22,6 +23,7 @@
 #include "recover/Recovery.h"
 #include "recover/Unattended.h"
 #include "recover/UnfinishedFiles.h"
+#include "retention/Retention.h"
 #include "verify/Verification.h"
 
 namespace clipfile {
@@ -45,6 +47,8 @@ struct Options {
     RecoveryOptions recovery;
     bool unattended = false;
     bool deep = false;
+    ControlCall call;
+    RetentionOptions retention;
 };
 
 /// Writes one JSON value on a line. Names of files need not be UTF-8.
@@ -358,6 +362,100 @@ CLI::App* AddRecover(CLI::App& app, Options& options) {
     return command;
 }
 
+CLI::App* AddControl(CLI::App& app, Options& options) {
+    CLI::App* const command =
+        app.add_subcommand("control", "Ask a running receiver, and print its answer (JSON).");
+    command->add_option("SOCKET", options.call.socket, "Its control socket")->required();
+    command
+        ->add_option("METHOD", options.call.method,
+                     "status, record.start, record.stop, record.split, files, preview, events")
+        ->required();
+    command->add_option("PARAMS", options.call.params, "An object of JSON, as '{\"width\": 640}'");
+    return command;
+}
+
+/// A validator that makes of a text what `read` reads in it.
+template <typename Value>
+CLI::Validator ReadBy(std::optional<Value> (*read)(std::string_view), std::optional<Value>& value,
+                      const char* form) {
+    return {[read, &value, form](std::string& text) {
+                value = read(text);
+                return value ? std::string() : text + " is not understood: write " + form;
+            },
+            ""};
+}
+
+CLI::App* AddRetention(CLI::App& app, Options& options) {
+    RetentionOptions& retention = options.retention;
+    CLI::App* const command = app.add_subcommand(
+        "retention", "Remove the oldest closed recordings of a folder, by age or for room on the disk.");
+    command->add_option("DIR", retention.folder, "Folder with recordings")
+        ->required()
+        ->check(CLI::ExistingDirectory);
+    command->add_option("--older-than", "Remove what was closed longer ago: 30d, 12h")
+        ->check(ReadBy(ParseAge, retention.olderThan, "30d or 12h"));
+    command->add_option("--keep-free", "Remove the oldest until so much of the disk is free: 500M, 200G, 1T")
+        ->check(ReadBy(ParseBytes, retention.keepFree, "500M, 200G or 1T"));
+    command->add_flag("--dry-run", retention.dryRun, "Tell what would be removed, and remove nothing");
+    command->add_flag("--json", options.json, "One JSON object a file and line");
+    return command;
+}
+
+void PrintStep(const RetentionStep& step, const Options& options, std::ostream& out) {
+    if (options.json) {
+        PrintJson(out, {{"file", step.path},
+                        {"bytes", step.bytes},
+                        {"removed", step.removed && !options.retention.dryRun},
+                        {"goes", step.removed},
+                        {"reason", step.reason}});
+    } else {
+        const char* const what = !step.removed              ? " stays: "
+                                 : options.retention.dryRun ? " would be removed: "
+                                                            : " is removed: ";
+        out << step.path << what << step.reason << (step.reason.ends_with('.') ? "\n" : ".\n");
+    }
+    out.flush();  // who follows it knows at once what is gone
+}
+
+/// Tells each file that goes, or that stays though it should go.
+ExitCode Retention(const Options& options, std::ostream& out, std::ostream& errors) {
+    if (!options.retention.olderThan && !options.retention.keepFree) {
+        errors << "clipfile: --older-than or --keep-free has to say what may go.\n";
+        return ExitCode::kUsage;
+    }
+    ExitCode code = ExitCode::kSuccess;
+    try {
+        const RetentionResult result =
+            Retain(options.retention, ThisSystem(), [&](const RetentionStep& step) {
+                code = step.removed ? code : ExitCode::kDefects;
+                PrintStep(step, options, out);
+            });
+        for (const std::string& fault : result.faults) {
+            TellFault(options.retention.folder.string(), fault, options, out, errors);
+            code = ExitCode::kUnreadable;
+        }
+        if (!result.isRoom) {
+            TellFault(options.retention.folder.string(), "less of the disk is free than is to be kept free.",
+                      options, out, errors);
+            code = Worse(code, ExitCode::kDefects);
+        }
+    } catch (const ToolError& error) {
+        TellFault(options.retention.folder.string(), error.what(), options, out, errors);
+        code = error.Code();
+    }
+    return code;
+}
+
+/// Asks a receiver, and tells why not.
+ExitCode Control(const ControlCall& call, std::ostream& out, std::ostream& errors) {
+    try {
+        return CallControl(call, out, errors);
+    } catch (const ToolError& error) {
+        errors << "clipfile: " << error.what() << '\n';
+        return error.Code();
+    }
+}
+
 }  // namespace
 
 ExitCode RunProgram(const std::vector<std::string>& arguments, std::ostream& out, std::ostream& errors) {
@@ -367,6 +465,8 @@ ExitCode RunProgram(const std::vector<std::string>& arguments, std::ostream& out
     AddInspect(app, options);
     const CLI::App* const verify = AddVerify(app, options);
     const CLI::App* const recover = AddRecover(app, options);
+    const CLI::App* const retention = AddRetention(app, options);
+    const CLI::App* const control = AddControl(app, options);
     std::vector<std::string> reversed(arguments.rbegin(), arguments.rend() - 1);
     try {
         app.parse(reversed);
@@ -380,6 +480,12 @@ ExitCode RunProgram(const std::vector<std::string>& arguments, std::ostream& out
     if (options.unattended) {
         GiveWay();
         EndWithParent();
+    }
+    if (control->parsed()) {
+        return Control(options.call, out, errors);
+    }
+    if (retention->parsed()) {
+        return Retention(options, out, errors);
     }
     if (verify->parsed()) {
         return Verify(options, out, errors);
