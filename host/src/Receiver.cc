@@ -166,6 +166,7 @@ ExitCode Running::Record(const SourceOpener& open) {
     do {
         changed_ = false;
         recorderSettings.frameRate = source->Description().frameRate;
+        recorderSettings.reordering = source->Description().reordering;
         hosts.push_back(std::make_unique<Host>(ParametersOf(options_, place, source->Description())));
         host_ = hosts.back().get();
         recovery_->Describe(source->Description());

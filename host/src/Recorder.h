@@ -55,6 +55,8 @@ class Recorder {
     struct Settings {
         OutputMode mode = OutputMode::kSync;
         FrameRate frameRate;
+        /// As in `SourceDescription`.
+        std::uint32_t reordering = 0;
         /// Address of the first frame where the source has none; time of day when not set.
         std::optional<Timecode> timecode;
         bool dropFrame = true;
@@ -126,6 +128,9 @@ class Recorder {
     void NoteChange(bool begins, const Timecode& at);
     /// The address behind that of the last frame.
     Timecode NextAddress() const;
+    void PushVideo(const SourceUnit& unit);
+    /// When a picture is decoded whose turn it is to be shown at `time`.
+    std::int64_t DecodedAt(std::int64_t time) const;
     /// A picture and audio behind the end of a recording. They are never written: the module ends a recording
     /// when each medium has reached its end, and while the source is away nothing else gets there.
     void PushEndMarks();
@@ -157,6 +162,8 @@ class Recorder {
     /// KLV packets since the last frame.
     std::vector<std::vector<unsigned char>> packets_;
     bool finishing_ = false;
+    /// The first frame that is not recorded any more.
+    std::optional<std::int64_t> finishedAt_;
     bool done_ = false;
     /// In mode on: the module records.
     bool online_ = false;

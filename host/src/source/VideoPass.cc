@@ -78,7 +78,8 @@ void VideoPass::Push(const AVPacket& packet, const PictureSink& sink) {
     const auto bytes = BytesOf(stream);
     const auto units = NalUnits(bytes);
     CodedPicture picture;
-    picture.time = packet.pts;
+    picture.time = packet.dts != AV_NOPTS_VALUE ? packet.dts : packet.pts;
+    picture.later = packet.pts - picture.time;
     picture.keyFrame = Contains(units, kNalIdr);
     CheckParameterSets(units);
     sets_.Learn(units);
