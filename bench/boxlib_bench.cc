@@ -159,16 +159,16 @@ void BM_AddSample(benchmark::State& state) {
 }
 BENCHMARK(BM_AddSample)->ArgName("varies")->Arg(0)->Arg(1)->Unit(benchmark::kMillisecond);
 
-/// Two hours: 60 pictures and metadata units a second, audio at 48 kHz, 54,000 chunks a track.
-void addTwoHours(Movie* movie) {
-    constexpr std::uint64_t kChunks = 54000;
-    constexpr std::uint64_t kAudioSamples = 337500;
+/// 60 pictures and metadata units a second, audio at 48 kHz, 450 chunks a track and minute.
+void addMinutes(Movie* movie, std::uint64_t minutes) {
+    const std::uint64_t chunks = 450 * minutes;
+    const std::uint64_t audioSamples = minutes * 60 * 48000 / 1024;
     const std::uint32_t video = movie->addVideo();
     const std::uint32_t sound = movie->addSound();
     const std::uint32_t meta = movie->addMeta();
     MbxSession* session = movie->session();
     std::uint64_t audio = 0;
-    for (std::uint64_t chunk = 0; chunk < kChunks; ++chunk) {
+    for (std::uint64_t chunk = 0; chunk < chunks; ++chunk) {
         for (std::uint64_t i = 0; i < kSamplesPerChunk; ++i) {
             const std::uint64_t number = chunk * kSamplesPerChunk + i;
             const MbxSampleInfo picture = sampleAt(number, true);
@@ -177,7 +177,7 @@ void addTwoHours(Movie* movie) {
             unit.isSync = 1;
             check(MbxAddSample(session, meta, &unit, 0));
         }
-        for (; audio < (chunk + 1) * kAudioSamples / kChunks; ++audio) {
+        for (; audio < (chunk + 1) * audioSamples / chunks; ++audio) {
             MbxSampleInfo frame = sampleAt(audio, true);
             frame.duration = 1024;
             frame.isSync = 1;
@@ -187,10 +187,33 @@ void addTwoHours(Movie* movie) {
     }
 }
 
+constexpr std::uint64_t kTwoHours = 120;
+
+/// What is done before each chunk of a normal file: `moov` is measured, after so many minutes.
+void BM_SpaceCheck(benchmark::State& state) {
+    Movie movie;
+    addMinutes(&movie, static_cast<std::uint64_t>(state.range(0)));
+    std::uint64_t size = 0;
+    for (auto _ : state) {
+        check(MbxWriteMoov(movie.session(), nullptr, 0, &size));
+        benchmark::DoNotOptimize(size);
+    }
+    state.counters["moov_bytes"] = static_cast<double>(size);
+}
+BENCHMARK(BM_SpaceCheck)
+    ->ArgName("minutes")
+    ->Arg(1)
+    ->Arg(10)
+    ->Arg(60)
+    ->Arg(120)
+    ->Arg(480)
+    ->Arg(1440)
+    ->Unit(benchmark::kMicrosecond);
+
 /// `state.range(0)` 0: measured alone. 1: measured and written, to memory.
 void BM_WriteMoov(benchmark::State& state) {
     Movie movie;
-    addTwoHours(&movie);
+    addMinutes(&movie, kTwoHours);
     std::uint64_t size = 0;
     check(MbxWriteMoov(movie.session(), nullptr, 0, &size));
     Target target;
@@ -208,7 +231,7 @@ BENCHMARK(BM_WriteMoov)->ArgName("written")->Arg(0)->Arg(1)->Unit(benchmark::kMi
 /// What copying as many bytes as that `moov` has costs: the measure for the above.
 void BM_CopyMoovBytes(benchmark::State& state) {
     Movie movie;
-    addTwoHours(&movie);
+    addMinutes(&movie, kTwoHours);
     std::uint64_t size = 0;
     check(MbxWriteMoov(movie.session(), nullptr, 0, &size));
     std::vector<std::uint8_t> source(size, 1);

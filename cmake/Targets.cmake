@@ -29,6 +29,15 @@ if(_flags)
 endif()
 target_link_options(clipfile_sanitizers INTERFACE ${_flags})
 
+# What is delivered is built so that a mistake that got through cannot be used easily; scripts/check-package looks. Where a
+# sanitizer watches, or nothing is optimised, the checks of the library say nothing.
+add_library(clipfile_hardening INTERFACE)
+if(CMAKE_BUILD_TYPE STREQUAL "Release" AND NOT CLIPFILE_SANITIZE)
+    target_compile_options(clipfile_hardening INTERFACE
+        -fstack-protector-strong -fstack-clash-protection -fcf-protection -U_FORTIFY_SOURCE -D_FORTIFY_SOURCE=2)
+    target_link_options(clipfile_hardening INTERFACE -Wl,-z,relro,-z,now,-z,noexecstack)
+endif()
+
 # Log lines carry source paths; they are relative to the tree whatever folder it was built in. A compiler cache makes
 # the paths that it is given relative to the build folder, and another clone finds its objects only where no option names
 # the tree. A unity build names the tree in the sources that it makes.
@@ -41,7 +50,7 @@ if(CMAKE_UNITY_BUILD OR NOT CLIPFILE_COMPILER_CACHE)
     target_compile_options(clipfile_paths INTERFACE "-fmacro-prefix-map=${PROJECT_SOURCE_DIR}/=")
 endif()
 
-# Everything that a target of ours takes over: warnings, sanitizers, source paths, threads.
+# Everything that a target of ours takes over: warnings, sanitizers, hardening, source paths, threads.
 add_library(clipfile_common INTERFACE)
 target_link_libraries(clipfile_common INTERFACE
-    clipfile_warnings clipfile_sanitizers clipfile_paths Threads::Threads)
+    clipfile_warnings clipfile_sanitizers clipfile_hardening clipfile_paths Threads::Threads)

@@ -23,17 +23,18 @@ if(CLIPFILE_TEST_PCH)
 endif()
 
 # clipfile_add_test(NAME SOURCES x_test.cc ... [LIBRARIES ...] [TIMEOUT seconds] [ENVIRONMENT A=b ...] [SERIAL]
-#                   [FILTER pattern] [UNSANITIZED] [SINGLE_THREADED] [ONLY_IF variable])
+#                   [FILTER pattern] [UNSANITIZED] [SINGLE_THREADED] [POOLED] [ONLY_IF variable])
 #
 # Registers the sources, builds the program NAME from them and enters each of its cases with ctest. A *_test.cc
 # that no call names fails the configure step (clipfile_check_tests_registered). SERIAL is for measurements of a
 # whole process (memory, open files); everything else runs in parallel. Of a FILTER, in the form of --gtest_filter, only
 # the cases that it matches are entered. UNSANITIZED leaves the program out of builds with sanitizers: what it watches
 # is another process, or memory that a sanitizer changes. SINGLE_THREADED leaves it out of builds with the thread
-# sanitizer, which would find nothing in it and takes minutes to build it. ONLY_IF leaves it out where the variable is
+# sanitizer, which would find nothing in it and takes minutes to build it. Cases that are POOLED leave nothing behind in their process:
+# under sanitizers, where the start of a process takes longer than most of them, four processes share them. ONLY_IF leaves it out where the variable is
 # false, since what it tests is not built there.
 function(clipfile_add_test name)
-    cmake_parse_arguments(ARG "SERIAL;UNSANITIZED;SINGLE_THREADED" "TIMEOUT;FILTER;ONLY_IF" "SOURCES;LIBRARIES;ENVIRONMENT" ${ARGN})
+    cmake_parse_arguments(ARG "SERIAL;UNSANITIZED;SINGLE_THREADED;POOLED" "TIMEOUT;FILTER;ONLY_IF" "SOURCES;LIBRARIES;ENVIRONMENT" ${ARGN})
     if(ARG_UNPARSED_ARGUMENTS OR NOT ARG_SOURCES)
         message(FATAL_ERROR "clipfile_add_test(${name}): SOURCES are missing or '${ARG_UNPARSED_ARGUMENTS}' is not understood.")
     endif()
@@ -70,6 +71,17 @@ function(clipfile_add_test name)
     endif()
     if(ARG_ENVIRONMENT)
         list(APPEND properties ENVIRONMENT "${ARG_ENVIRONMENT}")
+    endif()
+    if(ARG_POOLED AND ARG_FILTER)
+        message(FATAL_ERROR "clipfile_add_test(${name}): POOLED takes no FILTER.")
+    endif()
+    if(ARG_POOLED AND CLIPFILE_SANITIZE)
+        foreach(pool RANGE 0 3)
+            add_test(NAME ${name}.pool${pool} COMMAND ${name})
+            set_tests_properties(${name}.pool${pool} PROPERTIES ${properties}
+                ENVIRONMENT "GTEST_TOTAL_SHARDS=4;GTEST_SHARD_INDEX=${pool};GTEST_BRIEF=1;${ARG_ENVIRONMENT}")
+        endforeach()
+        return()
     endif()
     set(filter)
     if(ARG_FILTER)

@@ -2,6 +2,7 @@
 
 #include <sys/stat.h>
 
+#include <algorithm>
 #include <chrono>
 #include <ctime>
 #include <exception>
@@ -24,6 +25,7 @@
 #include "module/SettingsFile.h"
 #include "operator/CommandQueue.h"
 #include "operator/Keyboard.h"
+#include "operator/Service.h"
 #include "output/FolderWatch.h"
 #include "output/ModuleLogFile.h"
 #include "output/OutputFolder.h"
@@ -38,8 +40,7 @@ constexpr std::chrono::milliseconds kDisplayInterval{250};
 /// The run ends with the frame behind the last one; when the stream has dried up, nobody waits for it.
 constexpr std::chrono::seconds kFinishPatience{2};
 
-constexpr const char* kOneRecording =
-    "in mode on the whole run is one recording; --mode sync takes record commands";
+constexpr const char* kOneRecording = "in mode on everything is recorded; --mode sync takes record commands";
 
 std::string WithFullStop(std::string sentence) {
     return sentence.ends_with('.') ? sentence : sentence + ".";
@@ -55,10 +56,7 @@ void GiveToGroup() {
 class Running final : public SourceListenerInterface {
  public:
     Running(const Options& options, Signals& signals, DisplayInterface& display, int keyboard)
-        : options_(options), signals_(signals), display_(display), keyboard_(keyboard) {
-        current = this;
-    }
-    ~Running() { current = nullptr; }
+        : options_(options), signals_(signals), display_(display), keyboard_(keyboard) {}
     Running(const Running&) = delete;
     Running& operator=(const Running&) = delete;
 
@@ -68,31 +66,40 @@ class Running final : public SourceListenerInterface {
 
  private:
     void PrepareOutput(const OutputPlace& place);
+    /// Records the source, in one session of the module after the other. Gives how far the run has come.
+    Recorder::Progress RecordAll(SourceInterface& source, QxModuleInterface& module,
+                                 const OutputPlace& place);
+    /// Records in a session of the module what the session before has left, and the source up to where it
+    /// needs another session. False when the run has failed.
+    bool RecordSession(SourceInterface& source, QxModuleInterface& module, Recorder::Settings& settings);
     void Loop(SourceInterface& source, Recorder& recorder);
     void CheckFolder();
     void TakeCommands(Recorder& recorder);
+    /// Takes what has been commanded, for the next frame to carry out.
+    void Hear();
     void TakeKeys();
     void TakeKey(char key);
     void Command(RecordCommand command);
     void TellChanges(Recorder& recorder);
     void TellMissed();
-    static bool QuitAsked();
+    /// While the source is being opened.
+    bool QuitAsked();
     void TellLateStops(const Recorder& recorder);
     void Show(const SourceInterface& source, const Recorder& recorder);
-    std::uint64_t Lost(const SourceInterface& source) const;
+    std::uint64_t Lost(const SourceInterface& source, const Recorder::Progress& progress) const;
     Summary Summarise(const SourceInterface& source, const Recorder::Progress& past);
-
-    /// The run, for the one callback that knows of no object. It comes on the thread of the run.
-    static Running* current;
 
     const Options& options_;
     Signals& signals_;
     DisplayInterface& display_;
     Keyboard keyboard_;
+    Service service_;
     std::unique_ptr<OutputFolder> folder_;
     std::optional<FolderWatch> watch_;
     std::optional<CrashRecovery> recovery_;
-    ModuleLog* log_ = nullptr;
+    std::optional<ModuleLog> log_;
+    /// Each lives as long as the module, which may still hold one that a hanging disk has kept.
+    std::vector<std::unique_ptr<Host>> hosts_;
     Host* host_ = nullptr;
     RecordPlan plan_{options_.record};
     CommandQueue commands_;
@@ -104,13 +111,15 @@ class Running final : public SourceListenerInterface {
     std::uint64_t lateStops_ = 0;
     /// Recordings of which there is nothing.
     bool missed_ = false;
-    /// The source has become another one.
+    /// The source has become another one, which is for the next session.
     bool changed_ = false;
+    /// A gap has ended a session, and what came behind it is for the next one.
+    bool gap_ = false;
+    std::vector<SourceUnit> rest_;
+    std::optional<ReceiverError> failure_;
     std::optional<Clock::time_point> finishSince_;
     Clock::time_point shown_{};
 };
-
-Running* Running::current = nullptr;
 
 void Running::PrepareOutput(const OutputPlace& place) {
     if (options_.groupWrite) {
@@ -140,12 +149,12 @@ ExitCode Running::Record(const SourceOpener& open) {
     CheckUser(options_, place);
     PrepareOutput(place);
     const ModuleLibrary library(options_.module.value_or(ModuleLibrary::DefaultFile()));
-    ModuleLog log;
-    log_ = &log;
+    log_.emplace();
+    service_.Ready();
 
     std::unique_ptr<SourceInterface> source;
     try {
-        source = open(options_.source, *this, QuitAsked);
+        source = open(options_.source, *this, [this] { return QuitAsked(); });
     } catch (...) {
         // What it has found out is told before the reason of the end.
         recovery_->End(report_);
@@ -157,66 +166,91 @@ ExitCode Running::Record(const SourceOpener& open) {
         return ExitCode::kSuccess;
     }
     display_.Notice("source: " + source->Description().summary);
-    Recorder::Settings recorderSettings = RecorderSettingsOf(options_, source->Description().frameRate);
-
-    // Each lives as long as the module, which may still hold one that a hanging disk has kept.
-    std::vector<std::unique_ptr<Host>> hosts;
-    std::optional<ReceiverError> failure;
-    // One session for each of what the source is: the module learns rate and size when it starts.
-    do {
-        changed_ = false;
-        recorderSettings.frameRate = source->Description().frameRate;
-        recorderSettings.reordering = source->Description().reordering;
-        hosts.push_back(std::make_unique<Host>(ParametersOf(options_, place, source->Description())));
-        host_ = hosts.back().get();
-        recovery_->Describe(source->Description());
-        ModuleSession session(library.Module(), *host_);
-        if (options_.mode == OutputMode::kSync) {
-            session.GoOnline();
-        }
-        Recorder recorder(recorderSettings, session, log, plan_, commands_);
-        // A run that is shorter than a file has one only.
-        if (const std::int64_t minutes = FileMinutes();
-            !options_.seconds || *options_.seconds > static_cast<double>(minutes * 60)) {
-            groups_.emplace(recorderSettings.frameRate, minutes, options_.source.pictureGroup);
-        }
-        try {
-            Loop(*source, recorder);
-        } catch (const ReceiverError& error) {
-            failure = error;
-        }
-        if (!host_->Failed()) {
-            recorder.Close();
-        }
-        recorder.NoteEnd();
-        TellChanges(recorder);
-        TellLateStops(recorder);
-        report_.Tell(host_->TakeStatuses(), false);
-        session.End();
-        report_.Tell(log.TakeEvents());
-        report_.Tell(host_->TakeStatuses(), true);
-        recovery_->Follow(report_);
-        recorderSettings.past = recorder.Past();
-        plan_.Interrupt();
-    } while (changed_ && !host_->Failed());
-
+    const Recorder::Progress progress = RecordAll(*source, library.Module(), place);
+    service_.Stopping();
     commands_.Close("the run is over");
     plan_.Finish();
     TellMissed();
     recovery_->End(report_);
-    Summary summary = Summarise(*source, *recorderSettings.past);
-    if (failure) {
-        summary.exitCode = failure->Code();
+    Summary summary = Summarise(*source, progress);
+    if (failure_) {
+        summary.exitCode = failure_->Code();
     }
     display_.Finish(summary);
-    if (failure) {
-        display_.Failure(failure->Code(), WithFullStop(failure->what()));
+    if (failure_) {
+        display_.Failure(failure_->Code(), WithFullStop(failure_->what()));
     }
     return summary.exitCode;
 }
 
+Recorder::Progress Running::RecordAll(SourceInterface& source, QxModuleInterface& module,
+                                      const OutputPlace& place) {
+    SourceDescription description;
+    Recorder::Settings settings = RecorderSettingsOf(options_, source.Description().frameRate);
+    settings.meanwhile = [this] { Hear(); };
+    const std::int64_t minutes = FileMinutes();
+    bool gap = false;
+    bool changed = true;
+    while (changed || gap) {
+        if (changed) {
+            changed_ = false;
+            description = source.Description();
+            settings.frameRate = description.frameRate;
+            settings.reordering = description.reordering;
+            recovery_->Describe(description);
+            // A run that is shorter than a file has one only.
+            if (!options_.seconds || *options_.seconds > static_cast<double>(minutes * 60)) {
+                groups_.emplace(settings.frameRate, minutes, options_.source.pictureGroup);
+            }
+        }
+        // The module learns rate and size when it starts.
+        hosts_.push_back(std::make_unique<Host>(ParametersOf(options_, place, description)));
+        host_ = hosts_.back().get();
+        const bool over = !RecordSession(source, module, settings);
+        // What came behind a gap is of the source as it was.
+        gap = !over && gap_;
+        changed = !over && changed_ && !gap_;
+    }
+    return *settings.past;
+}
+
+bool Running::RecordSession(SourceInterface& source, QxModuleInterface& module,
+                            Recorder::Settings& settings) {
+    ModuleSession session(module, *host_);
+    if (options_.mode == OutputMode::kSync) {
+        session.GoOnline();
+    }
+    Recorder recorder(settings, session, *log_, plan_, commands_);
+    for (SourceUnit& unit : std::exchange(rest_, {})) {
+        recorder.Put(std::move(unit));
+    }
+    try {
+        if (!changed_) {
+            Loop(source, recorder);
+        }
+    } catch (const ReceiverError& error) {
+        failure_ = error;
+    }
+    if (!host_->Failed()) {
+        recorder.Close();
+    }
+    recorder.NoteEnd();
+    TellChanges(recorder);
+    TellLateStops(recorder);
+    report_.Tell(host_->TakeStatuses(), false);
+    session.End();
+    report_.Tell(log_->TakeEvents());
+    report_.Tell(host_->TakeStatuses(), true);
+    recovery_->Follow(report_);
+    settings.past = recorder.Past();
+    plan_.Interrupt();
+    gap_ = recorder.EndedByGap();
+    rest_ = recorder.TakeRest();
+    return !failure_ && !host_->Failed();
+}
+
 void Running::Loop(SourceInterface& source, Recorder& recorder) {
-    while (!host_->Failed()) {
+    while (!host_->Failed() && !recorder.EndedByGap()) {
         SourceUnit unit;
         const SourceInterface::Result result = source.Read(unit);
         if (result == SourceInterface::Result::kEnd || result == SourceInterface::Result::kStopped) {
@@ -271,6 +305,14 @@ void Running::CheckFolder() {
 }
 
 void Running::TakeCommands(Recorder& recorder) {
+    Hear();
+    commands_.Apply(plan_);
+    if (quit_ && !recorder.Finishing()) {
+        recorder.Finish();
+    }
+}
+
+void Running::Hear() {
     const SignalCommands commands = signals_.Take();
     for (const RecordCommand command : commands.record) {
         Command(command);
@@ -280,24 +322,17 @@ void Running::TakeCommands(Recorder& recorder) {
         display_.Notice("the terminal is gone; the run goes on until SIGTERM");
     }
     TakeKeys();
-    if (commands.quit && !recorder.Finishing()) {
-        display_.Notice("ending in order; a second signal ends at once");
-    }
-    commands_.Apply(plan_);
-    if ((quit_ || commands.quit) && !recorder.Finishing()) {
+    if (commands.quit && !quit_ && !plan_.Finished()) {
         quit_ = true;
-        recorder.Finish();
+        display_.Notice("ending in order; a second signal ends at once");
     }
 }
 
 bool Running::QuitAsked() {
-    Running* const run = current;
-    if (run == nullptr) {
-        return false;
-    }
-    run->TakeKeys();
-    run->recovery_->Follow(run->report_);
-    return run->quit_ || run->signals_.QuitRequested();
+    service_.Alive("waiting for the source");
+    TakeKeys();
+    recovery_->Follow(report_);
+    return quit_ || signals_.QuitRequested();
 }
 
 void Running::TakeKeys() {
@@ -383,13 +418,17 @@ void Running::Show(const SourceInterface& source, const Recorder& recorder) {
     snapshot.status = host_->Status();
     snapshot.file = report_.OpenFile();
     snapshot.freeBytes = watch_->FreeBytes();
-    snapshot.lost = Lost(source);
+    snapshot.lost = Lost(source, recorder.Past());
     display_.Show(snapshot);
+    service_.Alive(!snapshot.recording     ? "not recording"
+                   : snapshot.file.empty() ? "recording, no file yet"
+                                           : "recording " + snapshot.file);
 }
 
-std::uint64_t Running::Lost(const SourceInterface& source) const {
+std::uint64_t Running::Lost(const SourceInterface& source, const Recorder::Progress& progress) const {
     const SourceCounts counts = source.Counts();
-    return log_->Losses().Total() + counts.lostFrames + counts.damagedPackets;
+    const std::uint64_t reported = log_->Losses().Total();
+    return reported - std::min(reported, progress.droppedMarks) + counts.lostFrames + counts.damagedPackets;
 }
 
 Summary Running::Summarise(const SourceInterface& source, const Recorder::Progress& past) {
@@ -417,7 +456,7 @@ Summary Running::Summarise(const SourceInterface& source, const Recorder::Progre
     }
     Summary summary;
     summary.files = std::move(run.files);
-    summary.lost = Lost(source);
+    summary.lost = Lost(source, past);
     if (host_->Failed()) {
         summary.exitCode = ExitCode::kRecordingFailed;
     } else if (summary.lost != 0 || report_.Faults() != 0 || lateStops_ != 0 || missed_ ||

@@ -13,7 +13,7 @@ namespace receiver {
 
 /// Opens a source, as `OpenSource` does.
 using SourceOpener = std::function<std::unique_ptr<SourceInterface>(
-    const SourceOptions& options, SourceListenerInterface& listener, bool (*stop)())>;
+    const SourceOptions& options, SourceListenerInterface& listener, const StopCheck& stop)>;
 
 /// One run: opens source and module, records until the stream or the operator ends it, and closes every file.
 /// Everything that happens is said through `display`, failures included. Returns how the program ends.

@@ -7,12 +7,16 @@
 #include <utility>
 
 #include "metadata/RecordMetadata.h"
+#include "source/AudioEncoder.h"
 
 namespace receiver {
 namespace {
 
 /// An access unit delimiter (ISO/IEC 14496-10 7.3.2.4): a unit that holds no picture.
 constexpr std::array<unsigned char, 6> kDelimiter{0x00, 0x00, 0x00, 0x01, 0x09, 0xF0};
+
+/// Frames of silence behind the audio of a recording: one that may be written, and one behind that.
+constexpr std::int64_t kSilentEnd = 2;
 
 /// Half of the 48 chunks that may wait for the disk.
 constexpr std::size_t kChunksAhead = 24;
@@ -59,7 +63,7 @@ Recorder::Recorder(const Settings& settings, ModuleSession& session, const Modul
       log_(log),
       plan_(plan),
       commands_(commands),
-      feed_(session.Stream()),
+      feed_(session.Stream(), StreamFeed::kPatience, settings.meanwhile),
       stops_(log.Stops()) {
     if (!settings_.past) {
         return;
@@ -100,12 +104,27 @@ bool Recorder::Waiting() const {
     return plan_.Wanted() && !(settings_.mode == OutputMode::kOn ? online_ : plan_.Recording());
 }
 
+Recorder::Progress Recorder::Past() const {
+    const std::uint64_t before = settings_.past ? settings_.past->droppedMarks : 0;
+    return {firstFrame_,
+            lastFrame_,
+            timecode_,
+            settings_.frameRate,
+            lateStops_,
+            recorded_,
+            before + feed_.DroppedMarks()};
+}
+
 std::int64_t Recorder::Elapsed() const {
     return firstFrame_ ? lastFrame_ - *firstFrame_ : 0;
 }
 
 void Recorder::Push(const SourceUnit& unit) {
     if (done_) {
+        return;
+    }
+    if (endedByGap_) {
+        rest_.push_back(unit);
         return;
     }
     switch (unit.medium) {
@@ -116,7 +135,7 @@ void Recorder::Push(const SourceUnit& unit) {
             PushAudio(unit);
             break;
         case Medium::kKlv:
-            packets_.emplace_back(unit.data.get(), unit.data.get() + unit.size);
+            packets_.push_back(unit);
             break;
     }
 }
@@ -127,6 +146,23 @@ void Recorder::BeginBalance(std::int64_t time) {
 }
 
 void Recorder::PushAudio(const SourceUnit& unit) {
+    // Audio behind a gap may begin half a frame before the picture there.
+    constexpr std::int64_t kLead = kAudioFrame / 2 * kVideoClock / kAudioClock;
+    const std::int64_t time = unit.time * kVideoClock / kAudioClock;
+    if (firstFrame_ && time - lastFrame_ > kLongestStep - kLead) {
+        heldAudio_.push_back(unit);
+    } else {
+        PutAudio(unit);
+    }
+}
+
+void Recorder::PutHeldAudio() {
+    for (const SourceUnit& unit : std::exchange(heldAudio_, {})) {
+        PutAudio(unit);
+    }
+}
+
+void Recorder::PutAudio(const SourceUnit& unit) {
     if (!balance_.Takes(unit.time, unit.passed)) {
         return;
     }
@@ -143,7 +179,12 @@ void Recorder::PushFrame(const SourceUnit& unit) {
         // The module does not notice what is missing: it counts units, so its media would drift apart and the
         // timecode of the file would be wrong behind the gap.
         EndBeforeGap();
+        if (endedByGap_) {
+            KeepRest(unit);
+            return;
+        }
     }
+    PutHeldAudio();
     lastFrame_ = unit.time;
     if (settings_.length && Elapsed() >= *settings_.length) {
         Finish();
@@ -194,7 +235,7 @@ bool Recorder::PushOnlineMeta(const SourceUnit& unit, const Timecode& timecode) 
         }
     }
     ++recorded_;
-    feed_.PushMeta(unit.time, BuildMetadata(true, timecode, packets_));
+    feed_.PushMeta(unit.time, BuildMetadata(true, timecode, Packets()));
     return true;
 }
 
@@ -213,7 +254,7 @@ bool Recorder::PushSyncMeta(const SourceUnit& unit, const Timecode& timecode) {
         PushFlag(JustBefore(unit.time), false, BuildMetadata(false, std::nullopt, {}));
     }
     recorded_ += decision.record ? 1 : 0;
-    PushFlag(unit.time, decision.record, BuildMetadata(decision.record, timecode, packets_));
+    PushFlag(unit.time, decision.record, BuildMetadata(decision.record, timecode, Packets()));
     commands_.Settle(decision, timecode);
     return true;
 }
@@ -253,21 +294,48 @@ void Recorder::Interrupt() {
     const bool recording = plan_.Recording();
     EndBeforeGap();
     if (recording && !plan_.Recording()) {
-        PushEndMarks();
+        PushEndMark();
     }
     CheckStops(std::chrono::milliseconds(0));
 }
 
 void Recorder::EndBeforeGap() {
-    if (settings_.mode == OutputMode::kSync && plan_.Recording()) {
+    if (settings_.mode == OutputMode::kOn) {
+        if (online_ && !finishing_) {
+            endedByGap_ = true;
+            PushSilentEnd();
+        }
+    } else if (plan_.Recording()) {
         plan_.Interrupt();
         balance_.End();
         NoteEndBehindLast();
         PushFlag(FrameTime(lastFrame_, 1), false, BuildMetadata(false, std::nullopt, {}));
+        PushSilentEnd();
     }
 }
 
-void Recorder::PushEndMarks() {
+void Recorder::KeepRest(const SourceUnit& unit) {
+    rest_ = std::exchange(packets_, {});
+    rest_.insert(rest_.end(), heldAudio_.begin(), heldAudio_.end());
+    heldAudio_.clear();
+    rest_.push_back(unit);
+}
+
+std::vector<SourceUnit> Recorder::TakeRest() {
+    return std::exchange(rest_, {});
+}
+
+void Recorder::PushSilentEnd() {
+    if (!lastAudio_) {
+        return;
+    }
+    const CodedAudio silence = SilentFrame();
+    for (std::int64_t frame = 1; frame <= kSilentEnd; ++frame) {
+        feed_.PushAudio(lastAudio_->time + frame * kAudioFrame, silence.data, silence.size);
+    }
+}
+
+void Recorder::PushEndMark() {
     const std::shared_ptr<unsigned char> delimiter(new unsigned char[kDelimiter.size()],
                                                    std::default_delete<unsigned char[]>());
     std::copy(kDelimiter.begin(), kDelimiter.end(), delimiter.get());
@@ -276,11 +344,6 @@ void Recorder::PushEndMarks() {
         feed_.PushVideo(end, delimiter, kDelimiter.size());
     } else {
         feed_.PushReordered(end, end, delimiter, kDelimiter.size());
-    }
-    if (lastAudio_) {
-        const std::int64_t behind =
-            std::max(lastAudio_->time + kAudioFrame, end * kAudioClock / kVideoClock + kAudioFrame);
-        feed_.PushAudio(behind, lastAudio_->data, lastAudio_->size);
     }
 }
 
@@ -331,7 +394,15 @@ void Recorder::Close() {
     PushRest();
     feed_.Settle();
     CheckStops(kStopPatience);
-    feed_.Frames().WaitForChunks(KeptChunks(), kDiskPatience);
+    feed_.WaitForChunks(KeptChunks(), kDiskPatience);
+}
+
+std::vector<std::vector<unsigned char>> Recorder::Packets() const {
+    std::vector<std::vector<unsigned char>> packets;
+    for (const SourceUnit& unit : packets_) {
+        packets.emplace_back(unit.data.get(), unit.data.get() + unit.size);
+    }
+    return packets;
 }
 
 std::size_t Recorder::KeptChunks() const {

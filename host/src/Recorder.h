@@ -2,6 +2,7 @@
 
 #include <chrono>
 #include <cstdint>
+#include <functional>
 #include <optional>
 #include <vector>
 
@@ -21,11 +22,13 @@ namespace receiver {
 /// Brings a source's units into the module: in one order of time, each frame behind its metadata unit with
 /// timecode, record flag and the source's own packets.
 ///
-/// Relies on the module's exact record rules. A record command travels in the metadata unit of its frame, and
-/// no schedule of the module's threads moves it: a recording holds the frames from the first IDR frame with
-/// the flag to the last one that has it, with the audio that belongs to them, and what has been pushed when
-/// the session ends is written. So everything is pushed from the first frame on, also while nothing is
-/// recorded, for the audio in front of a recording to be there when it begins.
+/// What is left to do here is what the module cannot know: the order across media, gaps, addresses of frames,
+/// and whether a stop was carried out. The rest is left to its exact record rules. A record command travels
+/// in the metadata unit of its frame, and no schedule of the module's threads moves it: a recording holds the
+/// frames from the first IDR frame with the flag to the last one that has it, with the audio that belongs to
+/// them, and what has been pushed when the session ends is written. So everything is pushed from the first
+/// frame on, also while nothing is recorded, for the audio in front of a recording to be there when it
+/// begins.
 ///
 /// One thread at a time.
 class Recorder {
@@ -50,6 +53,8 @@ class Recorder {
         FrameRate frameRate;
         std::uint64_t lateStops = 0;
         std::uint64_t recorded = 0;
+        /// Of what the module reported as lost: marks, which nobody misses.
+        std::uint64_t droppedMarks = 0;
     };
 
     struct Settings {
@@ -66,6 +71,9 @@ class Recorder {
         bool followDisk = false;
         /// Files are fragmented.
         bool fragments = false;
+        /// Called from time to time where the module is waited for, for what must not wait. It must not call
+        /// the recorder.
+        std::function<void()> meanwhile;
         /// Of an earlier recorder of the run, whose source has become another one.
         std::optional<Progress> past;
     };
@@ -76,10 +84,16 @@ class Recorder {
 
     void Put(SourceUnit unit);
 
-    /// The source is away: what waits for order is pushed, and a recording in mode sync ends with its last
-    /// frame, so that its file is closed and holds nothing of what comes behind the gap. The next one begins
-    /// with the first IDR frame there. A repetition has no effect.
+    /// The source is away: what waits for order is pushed, and a recording ends with its last frame, so that
+    /// its file is closed and holds nothing of what comes behind the gap. The next one begins with the first
+    /// IDR frame there. A repetition has no effect.
     void Interrupt();
+
+    /// In mode on a gap ends the recording and this recorder, since the module goes on in one file as long as
+    /// the host is online. What comes from there on is for the recorder of another session.
+    bool EndedByGap() const { return endedByGap_; }
+    /// What has come behind the gap, in its order. Once, behind `Close`.
+    std::vector<SourceUnit> TakeRest();
 
     /// The run is to end: nothing is recorded from the next frame on. That frame is needed until `Done`,
     /// since it tells that the audio of the last one is complete.
@@ -103,9 +117,7 @@ class Recorder {
     void NoteEnd();
     /// Frames that belong to recordings.
     std::uint64_t Recorded() const { return recorded_; }
-    Progress Past() const {
-        return {firstFrame_, lastFrame_, timecode_, settings_.frameRate, lateStops_, recorded_};
-    }
+    Progress Past() const;
     /// Stream time of the last frame since the first one, in ticks of 90000 a second.
     std::int64_t Elapsed() const;
 
@@ -115,6 +127,8 @@ class Recorder {
     void Push(const SourceUnit& unit);
     void PushRest();
     void PushAudio(const SourceUnit& unit);
+    void PutAudio(const SourceUnit& unit);
+    void PutHeldAudio();
     void PushFrame(const SourceUnit& unit);
     /// False when the frame does not go to the module.
     bool PushOnlineMeta(const SourceUnit& unit, const Timecode& timecode);
@@ -122,7 +136,9 @@ class Recorder {
     void PushFlag(std::int64_t time, bool record, const std::vector<unsigned char>& meta);
     /// A recording begins with the frame at `time`.
     void BeginBalance(std::int64_t time);
+    /// The recording, if any, ends with the last frame.
     void EndBeforeGap();
+    void KeepRest(const SourceUnit& unit);
     /// The recording, if any, has ended with the last frame, and so has what stops commanded.
     void NoteEndBehindLast();
     void NoteChange(bool begins, const Timecode& at);
@@ -131,15 +147,19 @@ class Recorder {
     void PushVideo(const SourceUnit& unit);
     /// When a picture is decoded whose turn it is to be shown at `time`.
     std::int64_t DecodedAt(std::int64_t time) const;
-    /// A picture and audio behind the end of a recording. They are never written: the module ends a recording
-    /// when each medium has reached its end, and while the source is away nothing else gets there.
-    void PushEndMarks();
+    /// Silence behind the audio of a recording that ends in front of a gap. The module counts the frames of
+    /// audio that its pictures need, which may be one more than there are, and looks at the one behind.
+    void PushSilentEnd();
+    /// A picture behind the end of a recording. It is never written: the module ends a recording when the
+    /// pictures have reached its end, and while the source is away no other one gets there.
+    void PushEndMark();
     /// Sees whether the module has carried out the stops so far, and waits for that within `patience`. The
     /// recording ends on its frame all the same, but a module that carries out nothing closes no file.
     void CheckStops(std::chrono::milliseconds patience);
     Timecode NextTimecode(const SourceUnit& unit);
     std::int64_t FrameTime(std::int64_t from, std::int64_t frames) const;
     std::size_t KeptChunks() const;
+    std::vector<std::vector<unsigned char>> Packets() const;
 
     const Settings settings_;
     ModuleSession& session_;
@@ -159,8 +179,12 @@ class Recorder {
     /// That went to the module.
     std::optional<SourceUnit> lastAudio_;
     AudioBalance balance_;
+    /// Stands so far behind the last frame that the next one tells whether a gap lies between.
+    std::vector<SourceUnit> heldAudio_;
     /// KLV packets since the last frame.
-    std::vector<std::vector<unsigned char>> packets_;
+    std::vector<SourceUnit> packets_;
+    bool endedByGap_ = false;
+    std::vector<SourceUnit> rest_;
     bool finishing_ = false;
     /// The first frame that is not recorded any more.
     std::optional<std::int64_t> finishedAt_;

@@ -7,11 +7,15 @@
 #include <stdlib.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <csignal>
 #include <filesystem>
+#include <fstream>
+#include <iterator>
 
 #include "fakes/FakeDisplay.h"
 #include "fakes/FakeSource.h"
+#include "support/WaitUntil.h"
 
 namespace receiver {
 namespace {
@@ -38,7 +42,7 @@ class ReceiverTest : public ::testing::Test {
     }
 
     ExitCode Record(std::unique_ptr<FakeSource> source) {
-        const auto open = [&](const SourceOptions&, SourceListenerInterface&, bool (*)()) {
+        const auto open = [&](const SourceOptions&, SourceListenerInterface&, const StopCheck&) {
             return std::move(source);
         };
         return RunReceiver(options_, open, signals_, display_, -1);
@@ -54,11 +58,11 @@ class ReceiverTest : public ::testing::Test {
     /// Sends a signal to this process and waits until it has been seen.
     static void Send(int number) {
         kill(getpid(), number);
-        sigset_t pending;
-        do {
-            std::this_thread::sleep_for(std::chrono::milliseconds(1));
+        EXPECT_TRUE(WaitUntil([number] {
+            sigset_t pending;
             sigpending(&pending);
-        } while (sigismember(&pending, number) == 1);
+            return sigismember(&pending, number) != 1;
+        }));
     }
 
     /// Frames of the files, in their order.
@@ -137,6 +141,55 @@ TEST_F(ReceiverTest, InModeOnTheRunIsOneRecording) {
     EXPECT_EQ(Record(150), ExitCode::kSuccess);
     EXPECT_THAT(Frames(), ElementsAre(25));
     EXPECT_THAT(display_.statuses, ElementsAre(ModuleStatus{4, 0}, ModuleStatus{3, 0}));
+}
+
+/// A gap of two seconds behind three, and audio that begins 500 samples behind each picture's. The audio
+/// behind the gap has bytes of its own.
+class GapTest : public ReceiverTest {
+ protected:
+    static constexpr std::string_view kBehind = "audio behind it!";
+
+    static std::unique_ptr<FakeSource> WithGap() {
+        auto source = std::make_unique<FakeSource>(0);
+        std::deque<SourceUnit>& units = source->Units();
+        for (std::uint32_t frame = 0; frame < 200; frame = frame == 74 ? 125 : frame + 1) {
+            units.push_back(MakeFrame(frame * FakeSource::kFrame, frame % FakeSource::kGroup == 0, frame));
+        }
+        // The pictures in front of the gap end at 144000.
+        for (std::int64_t time = 500; time < 144000 - 512; time += 1024) {
+            units.push_back(MakeAudio(time));
+        }
+        std::vector<unsigned char> bytes{0xFF, 0xF1, 0x4C, 0x80, 0x02, 0xFF, 0xFC};
+        bytes.insert(bytes.end(), kBehind.begin(), kBehind.end());
+        for (std::int64_t time = 240000 - 100; time < 384000; time += 1024) {
+            units.push_back(MakeSourceUnit(Medium::kAudio, time, bytes));
+        }
+        std::stable_sort(units.begin(), units.end(), [](const SourceUnit& a, const SourceUnit& b) {
+            return SecondsOf(a) < SecondsOf(b);
+        });
+        return source;
+    }
+    static double SecondsOf(const SourceUnit& unit) {
+        return static_cast<double>(unit.time) /
+               static_cast<double>(unit.medium == Medium::kAudio ? kAudioClock : kVideoClock);
+    }
+    static bool HoldsAudioBehind(const RecordedFile& file) {
+        std::ifstream in(file.path, std::ios::binary);
+        const std::string bytes{std::istreambuf_iterator<char>(in), {}};
+        return bytes.find(kBehind) != std::string::npos;
+    }
+};
+
+TEST_F(GapTest, WhatIsBehindItIsInAFileOfItsOwnWithItsTimecode) {
+    for (const OutputMode mode : {OutputMode::kSync, OutputMode::kOn}) {
+        options_.mode = mode;
+        EXPECT_EQ(Record(WithGap()), ExitCode::kSuccess);
+        EXPECT_THAT(Frames(), ElementsAre(75, 75));
+        EXPECT_THAT(Starts(), ElementsAre("10:00:00:00", "10:00:05:00"));
+        ASSERT_EQ(display_.summary.files.size(), 2u);
+        EXPECT_FALSE(HoldsAudioBehind(display_.summary.files[0]));
+        EXPECT_TRUE(HoldsAudioBehind(display_.summary.files[1]));
+    }
 }
 
 TEST_F(ReceiverTest, SigtermEndsInOrderWithTheFileClosed) {
@@ -253,12 +306,13 @@ TEST_F(ReceiverTest, ARangeBehindTheEndOfTheStreamIsToldAndIsALoss) {
 TEST_F(ReceiverTest, AFileThatIsDeletedDuringTheRunIsToldAndIsALoss) {
     options_.record = {{0, 90000}, {2 * 90000, 3 * 90000}};
     auto source = std::make_unique<FakeSource>(150);
-    source->Before([this, deleted = false](std::size_t) mutable {
+    source->MakeEndless();
+    source->Before([this, &ended = *source](std::size_t) {
         // The first file is complete, which takes the module a moment.
-        if (!deleted && !display_.closed.empty()) {
-            deleted = std::filesystem::remove(display_.closed.front());
+        if (!display_.closed.empty()) {
+            std::filesystem::remove(display_.closed.front());
+            ended.Stop();
         }
-        std::this_thread::sleep_for(std::chrono::milliseconds(2));
     });
     EXPECT_EQ(Record(std::move(source)), ExitCode::kLost);
     EXPECT_THAT(display_.notices, Contains(HasSubstr("is gone: it was deleted")));
@@ -279,10 +333,13 @@ TEST_F(ReceiverTest, ASourceThatDriesUpAtTheEndHoldsNobodyUp) {
 
 TEST_F(ReceiverTest, SnapshotsTellOfTheRecording) {
     auto source = std::make_unique<FakeSource>(200);
-    source->Before([](std::size_t read) {
-        if (read == 250) {
-            // Longer than the display's interval.
-            std::this_thread::sleep_for(std::chrono::milliseconds(300));
+    source->MakeEndless();
+    source->Before([this, &ended = *source, before = std::optional<std::size_t>()](std::size_t) mutable {
+        if (ended.Units().empty()) {
+            before = before.value_or(display_.snapshots.size());
+            if (display_.snapshots.size() > *before) {
+                ended.Stop();
+            }
         }
     });
     EXPECT_EQ(Record(std::move(source)), ExitCode::kSuccess);
@@ -342,6 +399,11 @@ TEST_F(ReceiverTest, AModuleThatFailsEndsTheRun) {
 TEST_F(ReceiverTest, LostUnitsMakeTheRunALoss) {
     EXPECT_EQ(RecordWith("overflow"), ExitCode::kLost);
     EXPECT_EQ(display_.summary.lost, 1u);
+}
+
+TEST_F(ReceiverTest, AMarkThatTheModuleHasNoRoomForIsNoLoss) {
+    RecordWith("crowded");
+    EXPECT_EQ(display_.summary.lost, 0u);
 }
 
 TEST_F(ReceiverTest, AFaultOfTheStreamMakesTheRunALoss) {
@@ -413,7 +475,7 @@ TEST_F(ReceiverTest, AFolderMayBeCalledNone) {
 
 TEST_F(ReceiverTest, ASourceThatCannotBeOpenedEndsTheRunWithItsSentence) {
     const auto open = [](const SourceOptions&, SourceListenerInterface&,
-                         bool (*)()) -> std::unique_ptr<SourceInterface> {
+                         const StopCheck&) -> std::unique_ptr<SourceInterface> {
         throw ReceiverError(ExitCode::kSourceUnavailable, "no answer from 'udp://:9'.");
     };
     EXPECT_EQ(RunReceiver(options_, open, signals_, display_, -1), ExitCode::kSourceUnavailable);
@@ -422,7 +484,7 @@ TEST_F(ReceiverTest, ASourceThatCannotBeOpenedEndsTheRunWithItsSentence) {
 
 TEST_F(ReceiverTest, AnEndDuringTheOpeningIsOrderly) {
     const auto open = [this](const SourceOptions&, SourceListenerInterface&,
-                             bool (*stop)()) -> std::unique_ptr<SourceInterface> {
+                             const StopCheck& stop) -> std::unique_ptr<SourceInterface> {
         EXPECT_FALSE(stop());
         kill(getpid(), SIGINT);
         while (!stop()) {

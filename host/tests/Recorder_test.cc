@@ -330,12 +330,28 @@ TEST_F(RecorderTest, ASourceThatIsAwayEndsTheRecordingBehindItsLastFrame) {
     recorder_->Put(MakeAudio(0));
     recorder_->Put(MakeAudio(1024));
     recorder_->Interrupt();
-    // The pictures end at 80 ms; audio from 106.7 ms on lies behind that whatever its place was.
-    EXPECT_THAT(module_.Units(), ElementsAre("M0", "v0", "a0", "a1", "M1", "v1", "m2", "v2", "a4"));
+    EXPECT_THAT(module_.Units(), ElementsAre("M0", "v0", "a0", "a1", "M1", "v1", "m2", "a2", "a3", "v2"));
     // The place where it stopped, which lies behind its last frame.
     EXPECT_THAT(recorder_->TakeChanges(), ElementsAre(Begin(0), End(2)));
     recorder_->Interrupt();
-    EXPECT_EQ(module_.Units().size(), 9u);
+    EXPECT_EQ(module_.Units().size(), 10u);
+}
+
+// The module may write one frame of audio more than there is in front of the gap.
+TEST_F(RecorderTest, SilenceStandsInFrontOfTheAudioBehindAGap) {
+    Make(Sync());
+    PutFrame(0, true);
+    PutFrame(1, false);
+    recorder_->Put(MakeAudio(0));
+    recorder_->Put(MakeAudio(1024));
+    PutFrame(20, true);
+    // Half a frame before that picture.
+    SourceUnit behind = MakeAudio(20 * 1920 - 512);
+    behind.passed = 18 * 1920;
+    recorder_->Put(std::move(behind));
+    PutLateAudio();
+    EXPECT_THAT(module_.Units(),
+                ElementsAre("M0", "v0", "a0", "a1", "M1", "v1", "m2", "a2", "a3", "a37", "M20", "v20"));
 }
 
 TEST_F(RecorderTest, AStopThatFindsTheSourceGoneHasEndedTheRecordingBehindItsLastFrame) {
@@ -435,6 +451,51 @@ TEST_F(RecorderTest, InModeOnTheRunEndsWithTheLastFrameBeforeTheEnd) {
     EXPECT_TRUE(recorder_->Done());
     PutFrame(3, true);
     EXPECT_THAT(module_.Units(), ElementsAre("online", "M0", "v0", "M1", "v1"));
+}
+
+TEST_F(RecorderTest, InModeOnAGapEndsTheRecordingAndWhatFollowsIsForAnotherRecorder) {
+    Make(On());
+    PutFrame(0, true);
+    PutFrame(1, false);
+    recorder_->Put(MakeAudio(0));
+    recorder_->Put(MakeSourceUnit(Medium::kKlv, 72000, {0xAA}));
+    PutFrame(20, false);
+    PutFrame(21, true);
+    recorder_->Put(MakeAudio(20 * 1920 - 512));
+    EXPECT_FALSE(recorder_->EndedByGap());
+    PutLateAudio();
+    EXPECT_TRUE(recorder_->EndedByGap());
+    recorder_->Close();
+    recorder_->NoteEnd();
+    EXPECT_THAT(module_.Units(), ElementsAre("online", "M0", "v0", "a0", "M1", "v1", "a1", "a2"));
+    EXPECT_THAT(recorder_->TakeChanges(), ElementsAre(Begin(0), End(2)));
+
+    Recorder::Settings settings = On();
+    settings.past = recorder_->Past();
+    const std::vector<SourceUnit> rest = recorder_->TakeRest();
+    std::vector<std::pair<Medium, std::int64_t>> kept;
+    for (const SourceUnit& unit : rest) {
+        kept.emplace_back(unit.medium, unit.time);
+    }
+    EXPECT_THAT(kept, ElementsAre(std::pair(Medium::kKlv, 72000), std::pair(Medium::kAudio, 37888),
+                                  std::pair(Medium::kVideo, 72000), std::pair(Medium::kVideo, 75600),
+                                  std::pair(Medium::kAudio, 1024 * 89)));
+    Make(settings);
+    for (const SourceUnit& unit : rest) {
+        recorder_->Put(unit);
+    }
+    EXPECT_FALSE(recorder_->EndedByGap());
+    EXPECT_THAT(recorder_->TakeChanges(), ElementsAre(Begin(21)));
+    EXPECT_EQ(recorder_->Recorded(), 3u);
+}
+
+TEST_F(RecorderTest, InModeOnASourceThatIsAwayEndsTheRecording) {
+    Make(On());
+    PutFrame(0, true);
+    recorder_->Put(MakeAudio(0));
+    recorder_->Interrupt();
+    EXPECT_TRUE(recorder_->EndedByGap());
+    EXPECT_THAT(module_.Units(), ElementsAre("online", "M0", "v0", "a0", "a1", "a2"));
 }
 
 // What is still in there is lost when the host goes offline.

@@ -12,7 +12,8 @@ namespace receiver {
 
 /// Keeps count of the video units that the module still holds, by their numbers, and so of what waits where:
 /// the module releases the units of a chunk when it cuts the chunk, all but the first, which goes with the
-/// chunk until that is written.
+/// chunk until that is written. It tells nothing else of the disk, and a recording fails when 48 chunks wait,
+/// with exact rules too.
 ///
 /// Units are released on the module's threads; any thread may ask.
 class FrameLedger {

@@ -49,8 +49,9 @@ ModuleLibrary::~ModuleLibrary() {
 std::string ModuleLibrary::DefaultFile() {
     std::error_code error;
     const std::filesystem::path program = std::filesystem::read_symlink("/proc/self/exe", error);
+    // Beside the program, in a build, where it is installed.
     constexpr std::array<const char*, 3> kPlaces{"", "../modules/output/clipfile/src/clipfileModule",
-                                                 "../lib"};
+                                                 RECEIVER_MODULE_FOLDER};
     for (const char* const place : kPlaces) {
         const std::filesystem::path file = program.parent_path() / place / kName;
         if (!error && std::filesystem::exists(file, error)) {

@@ -13,7 +13,7 @@
 
 namespace receiver {
 
-/// Units that the module could not take because one of its queues was full.
+/// Units, marks among them, that the module could not take because one of its queues was full.
 struct QueueLosses {
     std::uint64_t video = 0;
     std::uint64_t audio = 0;

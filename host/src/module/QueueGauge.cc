@@ -11,6 +11,7 @@ void QueueGauge::State::Release(std::uint64_t mark) {
         return;
     }
     marks.erase(std::find(marks.begin(), marks.end(), mark));
+    ++dropped;
     // No mark would ever tell that what entered behind the newest one has left.
     entered = marks.back();
 }
@@ -49,6 +50,11 @@ bool QueueGauge::WaitForBound(std::uint64_t bound, std::chrono::milliseconds pat
 std::uint64_t QueueGauge::Passed() const {
     const std::lock_guard lock(state_->mutex);
     return state_->passed;
+}
+
+std::uint64_t QueueGauge::Dropped() const {
+    const std::lock_guard lock(state_->mutex);
+    return state_->dropped;
 }
 
 }  // namespace receiver

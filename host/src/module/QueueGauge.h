@@ -11,10 +11,10 @@
 
 namespace receiver {
 
-/// Tells how full one of the module's queues can be. The module says nothing about its queues but that it
-/// dropped a unit, when it is too late; so marks travel with the units: a mark is a unit without payload,
-/// which the queue's thread lets go unseen. When that releases a mark, everything in front of it has left the
-/// queue. A mark that is released before an earlier one never got in: the queue was full.
+/// Tells how full one of the module's queues can be. With exact rules, too, the module says nothing about its
+/// queues but that it dropped a unit, when it is too late; so marks travel with the units: a mark is a unit
+/// without payload, which the queue's thread lets go unseen. When that releases a mark, everything in front
+/// of it has left the queue. A mark that is released before an earlier one never got in: the queue was full.
 ///
 /// One thread enters and waits; marks are released on the module's threads.
 class QueueGauge {
@@ -32,6 +32,8 @@ class QueueGauge {
     bool WaitForBound(std::uint64_t bound, std::chrono::milliseconds patience) const;
     /// How far the queue has come: greater as soon as another mark comes through.
     std::uint64_t Passed() const;
+    /// Marks that never got in.
+    std::uint64_t Dropped() const;
 
  private:
     struct State {
@@ -44,6 +46,7 @@ class QueueGauge {
         std::uint64_t entered = 0;
         /// How many had entered when the last mark that came through was made.
         std::uint64_t passed = 0;
+        std::uint64_t dropped = 0;
         /// The same of the marks that are in the queue.
         std::deque<std::uint64_t> marks;
     };

@@ -79,16 +79,37 @@ void StreamFeed::Push(Queue& queue, const std::shared_ptr<StreamData>& unit) {
 
 void StreamFeed::PushMark(Queue& queue) {
     queue.sinceMark = 0;
+    // Others that get lost do so later, in a flush, and nobody reports them.
+    const std::uint64_t before = queue.gauge.Dropped();
     (stream_.*queue.push)(queue.gauge.MakeMark());
+    droppedMarks_ += queue.gauge.Dropped() - before;
 }
 
 void StreamFeed::WaitFor(Queue& queue, std::uint64_t bound) {
     const bool stalled = queue.stalledAt == queue.gauge.Passed();
-    if (queue.gauge.WaitForBound(bound, stalled ? std::chrono::milliseconds(0) : patience_)) {
+    const auto wait = [&](std::chrono::milliseconds part) { return queue.gauge.WaitForBound(bound, part); };
+    if (WaitInParts(wait, stalled ? std::chrono::milliseconds(0) : patience_)) {
         queue.stalledAt.reset();
     } else {
         queue.stalledAt = queue.gauge.Passed();
     }
+}
+
+bool StreamFeed::WaitInParts(const std::function<bool(std::chrono::milliseconds)>& wait,
+                             std::chrono::milliseconds patience) const {
+    using std::chrono::steady_clock;
+    const auto end = steady_clock::now() + patience;
+    auto left = patience;
+    while (!wait(std::min(left, kMeanwhile))) {
+        left = std::chrono::ceil<std::chrono::milliseconds>(end - steady_clock::now());
+        if (left <= std::chrono::milliseconds(0)) {
+            return false;
+        }
+        if (meanwhile_) {
+            meanwhile_();
+        }
+    }
+    return true;
 }
 
 void StreamFeed::Settle() {
@@ -101,8 +122,13 @@ void StreamFeed::Settle() {
 }
 
 void StreamFeed::WaitForDisk(std::size_t chunks) {
-    frames_.WaitForChunks(chunks, kDiskPause);
+    WaitForChunks(chunks, kDiskPause);
     frames_.WaitForUncut(kUncutBound, kUncutPause);
+}
+
+bool StreamFeed::WaitForChunks(std::size_t chunks, std::chrono::milliseconds patience) const {
+    return WaitInParts([&](std::chrono::milliseconds part) { return frames_.WaitForChunks(chunks, part); },
+                       patience);
 }
 
 }  // namespace receiver

@@ -1,7 +1,10 @@
 #pragma once
 
 #include <chrono>
+#include <cstddef>
 #include <cstdint>
+#include <functional>
+#include <memory>
 #include <optional>
 #include <vector>
 
@@ -12,8 +15,9 @@
 
 namespace receiver {
 
-/// Pushes a stream into the module, no faster than it can take it: the module drops what its queues have no
-/// room for and has no other way of saying that it is too much.
+/// Pushes a stream into the module, no faster than it can take it: with exact rules, too, the module drops
+/// what its queues have no room for, has no other way of saying that it is too much, and forgets what is in
+/// them when the host goes offline.
 ///
 /// Timestamps. `rtp_timestamp` is the unit's time plus ten seconds on the clock of its medium, 64 bits wide
 /// and never wrapped. `timestamp` is the same in whole milliseconds, rounded down for all media, as the
@@ -24,10 +28,14 @@ class StreamFeed {
  public:
     /// The module can be held up for 3.5 s by a disk that hangs, and goes on then.
     static constexpr std::chrono::milliseconds kPatience{5000};
+    static constexpr std::chrono::milliseconds kMeanwhile{50};
 
     /// A queue of the module that has not moved for `patience` is not waited for again until it does.
-    explicit StreamFeed(QxModuleStreamInterface& stream, std::chrono::milliseconds patience = kPatience)
-        : stream_(stream), patience_(patience) {}
+    /// `meanwhile`, which may be null, is called every `kMeanwhile` of a wait, on the waiting thread. It must
+    /// not call the feed.
+    explicit StreamFeed(QxModuleStreamInterface& stream, std::chrono::milliseconds patience = kPatience,
+                        std::function<void()> meanwhile = nullptr)
+        : stream_(stream), patience_(patience), meanwhile_(std::move(meanwhile)) {}
     StreamFeed(const StreamFeed&) = delete;
     StreamFeed& operator=(const StreamFeed&) = delete;
 
@@ -48,6 +56,11 @@ class StreamFeed {
     /// module is behind with cutting them. A file at full speed would otherwise outrun the disk, which costs
     /// a recording.
     void WaitForDisk(std::size_t chunks);
+    /// Waits until no more than `chunks` wait for the disk. False after `patience`.
+    bool WaitForChunks(std::size_t chunks, std::chrono::milliseconds patience) const;
+
+    /// Marks that the module had no room for, and reports as it does lost units.
+    std::uint64_t DroppedMarks() const { return droppedMarks_; }
 
     /// What the module holds of the video.
     const FrameLedger& Frames() const { return frames_; }
@@ -64,13 +77,18 @@ class StreamFeed {
     void Push(Queue& queue, const std::shared_ptr<StreamData>& unit);
     void PushMark(Queue& queue);
     void WaitFor(Queue& queue, std::uint64_t bound);
+    /// Calls `wait` with parts of `patience` until it gives true. False when it never does.
+    bool WaitInParts(const std::function<bool(std::chrono::milliseconds)>& wait,
+                     std::chrono::milliseconds patience) const;
 
     QxModuleStreamInterface& stream_;
     const std::chrono::milliseconds patience_;
+    const std::function<void()> meanwhile_;
     Queue video_{&QxModuleStreamInterface::PushVideo};
     Queue audio_{&QxModuleStreamInterface::PushAudio};
     Queue meta_{&QxModuleStreamInterface::PushMeta};
     FrameLedger frames_;
+    std::uint64_t droppedMarks_ = 0;
 };
 
 }  // namespace receiver

@@ -9,6 +9,7 @@
 #include "common/Credentials.h"
 #include "common/ReceiverError.h"
 #include "options/AddressCheck.h"
+#include "options/ConfigFile.h"
 #include "options/OptionText.h"
 #include "options/Password.h"
 
@@ -33,6 +34,7 @@ struct Texts {
     std::string passwordFile;
     bool noDropFrame = false;
     bool noReconnect = false;
+    bool check = false;
 };
 
 std::uint32_t ParseDimension(std::string_view text, const std::string& size) {
@@ -89,7 +91,6 @@ void Interpret(const Texts& texts, Options& options) {
         options.password = PasswordOfService();
     }
     options.mode = texts.mode == "on" ? OutputMode::kOn : OutputMode::kSync;
-    options.source.continuous = options.mode == OutputMode::kOn;
     options.recover = texts.recover == "no"    ? RecoverMode::kNo
                       : texts.recover == "ask" ? RecoverMode::kAsk
                                                : RecoverMode::kYes;
@@ -137,7 +138,7 @@ void CheckTogether(const CLI::App& app, const Options& options) {
         throw Wrong("--speed goes with files and test:; a live source has the speed that it has.");
     }
     if (!options.record.empty() && options.mode == OutputMode::kOn) {
-        throw Wrong("--record goes with --mode sync; in mode on the whole run is one recording.");
+        throw Wrong("--record goes with --mode sync; in mode on everything is recorded.");
     }
     if (options.timecode && options.timecode->dropFrame && !options.dropFrame) {
         throw Wrong("--timecode with ';' asks for drop frame and --no-drop-frame forbids it.");
@@ -277,8 +278,14 @@ void AddRecordOptions(CLI::App& app, Options& options, Texts& texts) {
         ->group(group);
 }
 
-void AddProgramOptions(CLI::App& app, Options& options) {
+void AddProgramOptions(CLI::App& app, Options& options, Texts& texts) {
     const auto group = "Program";
+    app.set_config("--config", "", "Read options from this TOML file too; the command line has precedence")
+        ->type_name("FILE")
+        ->group(group);
+    app.add_flag("--check", texts.check, "Say what is wrong with the options, and exit")
+        ->configurable(false)
+        ->group(group);
     app.add_option("--module", options.module, "Another build of the module than the one beside this program")
         ->type_name("FILE")
         ->group(group);
@@ -306,6 +313,16 @@ void AddProgramOptions(CLI::App& app, Options& options) {
     app.set_help_flag("-h,--help", "Print this and exit")->group(group);
 }
 
+/// Makes of options that can be read what they mean. Throws `ReceiverError` (`kUsage`) for a mistake in it.
+void Complete(const CLI::App& app, const Texts& texts, Options& options) {
+    CheckEmpty(app);
+    if (const std::string mistake = AddressMistake(options.source.url); !mistake.empty()) {
+        throw Wrong("--input " + WithoutCredentials(options.source.url) + ": " + mistake + ".");
+    }
+    Interpret(texts, options);
+    CheckTogether(app, options);
+}
+
 }  // namespace
 
 std::optional<Options> ParseOptions(int argc, const char* const* argv, std::string& text) {
@@ -318,26 +335,32 @@ std::optional<Options> ParseOptions(int argc, const char* const* argv, std::stri
     AddSourceOptions(app, options, texts);
     AddFileOptions(app, options, texts);
     AddRecordOptions(app, options, texts);
-    AddProgramOptions(app, options);
+    AddProgramOptions(app, options, texts);
+    const auto config = std::make_shared<ConfigFile>(app);
+    app.config_formatter(config);
     try {
-        app.parse(argc, argv);
-    } catch (const CLI::CallForHelp&) {
-        text = app.help();
-        return std::nullopt;
-    } catch (const CLI::CallForVersion& version) {
-        text = std::string("receiver ") + version.what() + "\n";
-        return std::nullopt;
-    } catch (const CLI::ParseError& error) {
-        std::string reason = error.what();
-        std::replace(reason.begin(), reason.end(), '\n', ' ');
-        throw Wrong(reason + "; receiver --help lists the options.");
+        try {
+            app.parse(argc, argv);
+        } catch (const CLI::CallForHelp&) {
+            text = app.help();
+            return std::nullopt;
+        } catch (const CLI::CallForVersion& version) {
+            text = std::string("receiver ") + version.what() + "\n";
+            return std::nullopt;
+        } catch (const CLI::ParseError& error) {
+            std::string reason = error.what();
+            std::replace(reason.begin(), reason.end(), '\n', ' ');
+            throw Wrong(reason + "; receiver --help lists the options.");
+        }
+        Complete(app, texts, options);
+    } catch (const ReceiverError& error) {
+        const std::string place = config->PlaceOf(error.what());
+        throw ReceiverError(error.Code(), place + error.what());
     }
-    CheckEmpty(app);
-    if (const std::string mistake = AddressMistake(options.source.url); !mistake.empty()) {
-        throw Wrong("--input " + WithoutCredentials(options.source.url) + ": " + mistake + ".");
+    if (texts.check) {
+        text = "receiver: nothing is wrong with the options.\n";
+        return std::nullopt;
     }
-    Interpret(texts, options);
-    CheckTogether(app, options);
     return options;
 }
 

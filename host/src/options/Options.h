@@ -53,7 +53,8 @@ struct Options {
 
 /// Reads a command line. Throws `ReceiverError` with `kUsage` and a sentence that names the option when
 /// something is wrong with it. Gives nothing, and the text to print in `text`, when that is all that was
-/// asked for (`--help`, `--version`).
+/// asked for (`--help`, `--version`, `--check`). A sentence about what a configuration file says begins with
+/// file, line and column.
 std::optional<Options> ParseOptions(int argc, const char* const* argv, std::string& text);
 
 /// Overwrites the value of `--password`, the credentials in addresses, and the variable with a password, in

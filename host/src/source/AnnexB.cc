@@ -37,21 +37,47 @@ void Append(const std::map<std::uint32_t, std::string>& sets, std::string& text)
     }
 }
 
+unsigned int TypeOf(unsigned char header) {
+    return header & 0x1FU;
+}
+
+bool BeginsSlice(std::span<const unsigned char> bytes) {
+    return !bytes.empty() && (TypeOf(bytes[0]) == kNalSlice || TypeOf(bytes[0]) == kNalIdr);
+}
+
+/// Enters a NAL unit of the stream, which ends the one before it.
+void Append(std::span<const unsigned char> bytes, std::span<const unsigned char> stream,
+            std::vector<NalUnit>& units) {
+    constexpr std::size_t kStartCode = 3;
+    std::size_t begin = static_cast<std::size_t>(bytes.data() - stream.data()) - kStartCode;
+    while (begin > 0 && stream[begin - 1] == 0) {
+        --begin;
+    }
+    if (!units.empty()) {
+        units.back().end = begin;
+    }
+    units.push_back({TypeOf(bytes[0]), begin, stream.size(), bytes});
+}
+
 }  // namespace
 
 std::vector<NalUnit> NalUnits(std::span<const unsigned char> stream) {
-    constexpr std::size_t kStartCode = 3;
     std::vector<NalUnit> units;
     nal_access::AnnexBReader reader(stream);
     for (std::span<const unsigned char> bytes; reader.Next(bytes);) {
-        std::size_t begin = static_cast<std::size_t>(bytes.data() - stream.data()) - kStartCode;
-        while (begin > 0 && stream[begin - 1] == 0) {
-            --begin;
-        }
-        if (!units.empty()) {
-            units.back().end = begin;
-        }
-        units.push_back({bytes[0] & 0x1FU, begin, stream.size(), bytes});
+        Append(bytes, stream, units);
+    }
+    return units;
+}
+
+std::vector<NalUnit> LeadingNalUnits(std::span<const unsigned char> stream) {
+    std::vector<NalUnit> units;
+    nal_access::AnnexBReader reader(stream);
+    for (std::span<const unsigned char> bytes; !BeginsSlice(reader.Rest()) && reader.Next(bytes);) {
+        Append(bytes, stream, units);
+    }
+    if (BeginsSlice(reader.Rest())) {
+        Append(reader.Rest(), stream, units);
     }
     return units;
 }

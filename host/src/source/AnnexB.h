@@ -11,7 +11,9 @@
 namespace receiver {
 
 /// Types of NAL units (ITU-T H.264 table 7-1).
+inline constexpr unsigned int kNalSlice = 1;
 inline constexpr unsigned int kNalIdr = 5;
+inline constexpr unsigned int kNalMessages = 6;
 inline constexpr unsigned int kNalSequenceParameterSet = 7;
 inline constexpr unsigned int kNalPictureParameterSet = 8;
 inline constexpr unsigned int kNalAccessUnitDelimiter = 9;
@@ -27,6 +29,10 @@ struct NalUnit {
 
 /// The NAL units of a byte stream (ITU-T H.264 annex B), which is not copied.
 std::vector<NalUnit> NalUnits(std::span<const unsigned char> stream);
+
+/// Those up to the first slice, to which all that follows it is counted. Parameter sets and messages stand in
+/// front of it (7.4.1.2.3), so nobody needs to walk through the picture for them.
+std::vector<NalUnit> LeadingNalUnits(std::span<const unsigned char> stream);
 
 /// Knows the parameter sets of a stream, each by its number, the last that came.
 class ParameterSets {

@@ -13,6 +13,7 @@ extern "C" {
 }
 
 #include "common/ReceiverError.h"
+#include "source/AudioFrames.h"
 #include "source/FormatWatch.h"
 
 namespace receiver {
@@ -27,12 +28,6 @@ bool HasAdtsHeader(const AVPacket& packet) {
 bool IsRecordedFormat(const AVPacket& packet) {
     // profile 1, sampling_frequency_index 3; private_bit may be anything; channel_configuration 2.
     return (packet.data[2] & 0xFD) == 0x4C && (packet.data[3] & 0xC0) == 0x80 && (packet.data[6] & 0x03) == 0;
-}
-
-/// aac_frame_length of an ADTS header (ISO/IEC 14496-3 1.A.2.2.1), which counts the header.
-std::size_t FrameLength(const AVPacket& packet) {
-    return (packet.data[3] & 0x03U) << 11 | static_cast<unsigned int>(packet.data[4]) << 3 |
-           static_cast<unsigned int>(packet.data[5]) >> 5;
 }
 
 /// AudioSpecificConfig (ISO/IEC 14496-3 1.6.2.1) of the same, with frames of 1024 samples.
@@ -77,10 +72,6 @@ std::string AudioSummary(const AVCodecParameters& parameters) {
            RateAndLayout(parameters.sample_rate, parameters.ch_layout);
 }
 
-bool IsAdtsFrame(const AVPacket& packet) {
-    return HasAdtsHeader(packet) && static_cast<std::size_t>(packet.size) == FrameLength(packet);
-}
-
 bool CanPass(const AVCodecParameters& parameters, const AVPacket* first) {
     if (parameters.codec_id != AV_CODEC_ID_AAC) {
         return false;
@@ -112,7 +103,7 @@ void AudioPass::Push(const AVPacket& packet, const AudioSink& sink) {
     damaged_ += std::exchange(foreign_, 0);
     const auto size = static_cast<std::size_t>(packet.size);
     const std::int64_t time = av_rescale(packet.pts, kAudioRate, 90000);
-    if (*headers_ && size != FrameLength(packet)) {
+    if (*headers_ && !IsWholeAudioFrame(AV_CODEC_ID_AAC, packet)) {
         // Cut short, as the last frame of a stream that breaks off is.
         ++damaged_;
     } else if (size == 0 || size + kAdtsHeader > kLongestAdtsFrame) {
@@ -146,6 +137,12 @@ AudioConverter::AudioConverter(const AVCodecParameters& parameters) : frame_(lib
 }
 
 void AudioConverter::Push(const AVPacket& packet, const AudioSink& sink) {
+    std::size_t told = 0;
+    const std::uint8_t* const config = av_packet_get_side_data(&packet, AV_PKT_DATA_NEW_EXTRADATA, &told);
+    if (config != nullptr && !std::equal(config, config + told, decoder_->extradata,
+                                         decoder_->extradata + std::max(0, decoder_->extradata_size))) {
+        throw FormatChanged("the parameters of the audio changed");
+    }
     if (avcodec_send_packet(decoder_.get(), &packet) < 0) {
         ++damaged_;
         if (++failures_ >= kUndecodable) {

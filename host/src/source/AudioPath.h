@@ -26,8 +26,6 @@ class AudioPathInterface {
 
 /// "MP2 48 kHz stereo"
 std::string AudioSummary(const AVCodecParameters& parameters);
-/// True when the packet is an ADTS header with as many bytes behind it as that tells.
-bool IsAdtsFrame(const AVPacket& packet);
 /// True when the frames of such a stream, of which `first` is one (or null), can be recorded as they are.
 bool CanPass(const AVCodecParameters& parameters, const AVPacket* first);
 

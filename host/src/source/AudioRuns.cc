@@ -3,7 +3,7 @@
 #include <algorithm>
 #include <utility>
 
-#include "source/AudioPath.h"
+#include "source/AudioFrames.h"
 #include "timing/Timeline.h"
 
 namespace receiver {
@@ -23,11 +23,12 @@ bool IsMarked(const AVPacket& packet) {
 
 }  // namespace
 
-Packets AudioRuns::Put(libav::Owner<AVPacket> packet, AVRational base) {
+Packets AudioRuns::Put(libav::Owner<AVPacket> packet, AVCodecID codec, AVRational base) {
+    codec_ = codec;
     base_ = base;
     Packets passing;
-    adts_ = adts_ || IsAdtsFrame(*packet);
-    if (!adts_) {
+    tellsLengths_ = tellsLengths_ || IsWholeAudioFrame(codec, *packet);
+    if (!tellsLengths_) {
         if (IsMarked(*packet)) {
             ++damaged_;
         } else {
@@ -75,8 +76,9 @@ Packets AudioRuns::Close(std::optional<std::int64_t> next) {
     Packets run = std::exchange(run_, {});
     const bool marked =
         std::any_of(run.begin(), run.end(), [](const auto& packet) { return IsMarked(*packet); });
-    const bool frames = !run.empty() && std::all_of(run.begin(), run.end(),
-                                                    [](const auto& packet) { return IsAdtsFrame(*packet); });
+    const bool frames = !run.empty() && std::all_of(run.begin(), run.end(), [this](const auto& packet) {
+        return IsWholeAudioFrame(codec_, *packet);
+    });
     const Length length = next && !run.empty() ? Measure(run, *next) : Length::kUnknown;
     // A mark may be for what was lost in front of the run, and frames may be missing behind it: where the
     // loss is inside, bytes are left over that are no frame, and may take the first frames of the next run

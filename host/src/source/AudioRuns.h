@@ -8,16 +8,17 @@
 
 namespace receiver {
 
-/// Checks the AAC of a transport stream run by run: a unit of the stream holds several frames, of which the
+/// Checks the audio of a transport stream run by run: a unit of the stream holds several frames, of which the
 /// sender stamps the first one. The libraries count on from there, so that behind a loss each frame stands
 /// too early, or has what is left of another one's bytes, up to the next stamp. A run is held until that
 /// stamp shows whether its frames fill the time up to there, and goes as a whole or not at all; but no longer
 /// than 0.4 s of sound, and not when the pictures are a second further. Of audio whose frames do not tell
-/// their length (MP2, AC-3) only what is marked as damaged is left out.
+/// their length (AAC in LATM) only what is marked as damaged is left out.
 class AudioRuns {
  public:
-    /// Takes the next packet, stamped in ticks of `base`, and gives those that may go on, in their order.
-    Packets Put(libav::Owner<AVPacket> packet, AVRational base);
+    /// Takes the next packet, coded by `codec` and stamped in ticks of `base`, and gives those that may go
+    /// on, in their order.
+    Packets Put(libav::Owner<AVPacket> packet, AVCodecID codec, AVRational base);
     /// Tells that a picture stamped `stamp`, in ticks of `base`, has come, and gives what waits for a stamp
     /// that may be far away: the sound may pause.
     Packets Expire(std::int64_t stamp, AVRational base);
@@ -45,8 +46,9 @@ class AudioRuns {
     std::int64_t position_ = -1;
     /// What came before the run has lost bytes.
     bool behindDamage_ = false;
-    /// The stream is one of AAC frames with headers that tell their length.
-    bool adts_ = false;
+    AVCodecID codec_ = AV_CODEC_ID_NONE;
+    /// The stream is one of frames with headers that tell their length.
+    bool tellsLengths_ = false;
     std::uint64_t damaged_ = 0;
 };
 

@@ -18,7 +18,7 @@ constexpr std::chrono::milliseconds kAsk{50};
 
 void SteadyWaitClock::SleepUntil(TimePoint time) {
     while (Now() < time) {
-        if (stop_ != nullptr && stop_()) {
+        if (stop_ && stop_()) {
             throw Stopped();
         }
         std::this_thread::sleep_for(kAsk);
@@ -40,7 +40,7 @@ void AwaitSource(bool listens, const std::function<void(bool told)>& attempt,
                 told = now;
             }
         }
-        clock.SleepUntil((listens ? tried : clock.Now()) + kPause);
+        clock.SleepUntil(listens ? tried + kListenEvery : clock.Now() + kPause);
     }
 }
 

@@ -4,6 +4,7 @@
 #include <utility>
 
 #include "source/StreamChoice.h"
+#include "timing/Saturating.h"
 
 namespace receiver {
 namespace {
@@ -14,8 +15,8 @@ constexpr std::size_t kLongestWait = 4000;
 constexpr std::uint64_t kWithoutStart = 300;
 /// Packets of a new stream, while none of the one before comes, that show a medium to have moved.
 constexpr int kMoved = 25;
-/// What came between the first picture and the first IDR frame is counted on no further than this.
-constexpr std::int64_t kLongestCount = std::int64_t{3600} * 90000;
+/// Pictures whose stamps tell where the first one should stand.
+constexpr std::size_t kWitnesses = 4;
 
 /// False for a stream of which the tables tell and nothing has come.
 bool HasBegun(const AVStream& stream) {
@@ -25,18 +26,53 @@ bool HasBegun(const AVStream& stream) {
                                                          : true;
 }
 
+/// Corrects the stamp of the first picture where it is at odds with those behind it, which agree.
+void MendFirstStamp(const Packets& packets, const AVStream& video, const FrameRate& rate) {
+    std::vector<AVPacket*> pictures;
+    for (const auto& packet : packets) {
+        if (packet->stream_index == video.index && pictures.size() <= kWitnesses) {
+            pictures.push_back(packet.get());
+        }
+    }
+    const bool told = std::all_of(pictures.begin(), pictures.end(), [](const AVPacket* picture) {
+        return picture->pts != AV_NOPTS_VALUE && (picture->flags & AV_PKT_FLAG_CORRUPT) == 0;
+    });
+    if (!told || pictures.size() <= kWitnesses) {
+        return;
+    }
+    const AVRational frame{static_cast<int>(rate.denominator), static_cast<int>(rate.numerator)};
+    const std::int64_t period = av_rescale_q(1, frame, video.time_base);
+    const auto isOff = [&](std::size_t at, std::int64_t tolerance) {
+        return Distance(pictures[at + 1]->pts - pictures[at]->pts, period) >
+               static_cast<std::uint64_t>(tolerance);
+    };
+    for (std::size_t at = 1; at < kWitnesses; ++at) {
+        if (isOff(at, period / 2)) {
+            return;
+        }
+    }
+    if (isOff(0, period)) {
+        pictures[0]->pts = pictures[1]->pts - period;
+        pictures[0]->dts = AV_NOPTS_VALUE;
+    }
+}
+
 }  // namespace
 
 Connection::Connection(std::unique_ptr<Input> input, const SourceOptions& options,
                        const SourceDescription* before)
-    : input_(std::move(input)), packet_(libav::NewPacket()) {
+    : input_(std::move(input)), packet_(libav::NewPacket()), untouched_(libav::NewPacket()) {
     Choose(options);
     ahead_ = LookAhead(*input_, *video_, audio_);
     AVFormatContext& format = input_->Format();
     paths_ = DecidePaths(format, *format.streams[video_->index], audio_, ahead_.packets, options, before);
     notices_.insert(notices_.end(), paths_.notices.begin(), paths_.notices.end());
+    if (paths_.passes && !Reordered()) {
+        MendFirstStamp(ahead_.packets, *video_, paths_.description.frameRate);
+    }
     watch_.emplace(video_->codecpar->codec_id, paths_.description.frameRate, paths_.passes, Reordered());
     clock_.emplace(*video_, audio_, input_->Recorded());
+    steps_.emplace(*clock_);
     ReadTimecodeTag();
     paths_.description.summary += klv_.empty() ? "" : ", KLV";
 }
@@ -60,6 +96,15 @@ void Connection::Choose(const SourceOptions& options) {
             stream->discard = AVDISCARD_ALL;
         }
     }
+}
+
+std::int64_t Connection::SinceFirst(std::int64_t stamp) const {
+    const FrameRate& rate = paths_.description.frameRate;
+    const std::int64_t counted = static_cast<std::int64_t>(earlyPictures_) * kVideoClock * rate.denominator /
+                                 std::max<std::int64_t>(1, rate.numerator);
+    const std::int64_t told = *firstVideoStamp_ > stamp ? -1 : stamp - *firstVideoStamp_;
+    const bool likely = told >= 0 && Distance(told, counted) <= std::uint64_t{Timeline::kLongestGap};
+    return likely ? told : counted;
 }
 
 void Connection::CheckOther(const AVPacket& packet) {
@@ -120,10 +165,17 @@ bool Connection::Pump() {
     if (!NextPacket()) {
         return false;
     }
+    if (input_->Recorded()) {
+        av_packet_unref(untouched_.get());
+        libav::Check(av_packet_ref(untouched_.get(), packet_.get()), "hold a packet");
+    }
+    if ((packet_->flags & AV_PKT_FLAG_CORRUPT) != 0) {
+        steps_->Mark(assembler_->LastPicture());
+    }
     if (input_->Transport() && IsOf(*packet_, audio_)) {
         newSounds_ = 0;
-        for (const auto& packet : runs_.Put(std::exchange(packet_, libav::NewPacket()), audio_->time_base)) {
-            position_ = packet->pos;
+        for (const auto& packet : runs_.Put(std::exchange(packet_, libav::NewPacket()),
+                                            audio_->codecpar->codec_id, audio_->time_base)) {
             Handle(*packet);
         }
         return true;
@@ -132,7 +184,6 @@ bool Connection::Pump() {
         ++damaged_;
         return true;
     }
-    position_ = packet_->pos;
     if (IsOf(*packet_, video_)) {
         input_->Alive();
         HandleExpired();
@@ -148,6 +199,14 @@ void Connection::HandleExpired() {
     for (const auto& sound : runs_.Expire(packet_->pts, video_->time_base)) {
         Handle(*sound);
     }
+}
+
+Packets Connection::TakeUnread() {
+    Packets unread = std::exchange(ahead_.packets, {});
+    if (untouched_->data != nullptr) {
+        unread.push_front(std::move(untouched_));
+    }
+    return unread;
 }
 
 std::unique_ptr<Input> Connection::End(std::unique_ptr<Connection> connection) {
@@ -166,6 +225,21 @@ StreamClock::Track* Connection::KlvTrackOf(const AVPacket& packet) {
 }
 
 void Connection::Handle(AVPacket& packet) {
+    steps_->Put(packet, SteppingMedium(packet), assembler_->LastPicture(),
+                [this](AVPacket& next) { Process(next); });
+}
+
+std::optional<StepWatch::Medium> Connection::SteppingMedium(const AVPacket& packet) const {
+    const bool marked = input_->Transport() && !input_->Recorded() && paths_.passes && audio_ != nullptr &&
+                        clock_->Anchored();
+    if (marked && IsOf(packet, video_)) {
+        return StepWatch::Medium::kVideo;
+    }
+    return marked && IsOf(packet, audio_) ? std::optional(StepWatch::Medium::kAudio) : std::nullopt;
+}
+
+void Connection::Process(AVPacket& packet) {
+    position_ = packet.pos;
     const bool audio = IsOf(packet, audio_);
     newPictures_ = IsOf(packet, video_) ? 0 : newPictures_;
     newSounds_ = audio ? 0 : newSounds_;
@@ -208,8 +282,7 @@ bool Connection::Start(const AVPacket& packet, std::optional<std::int64_t> stamp
         }
         return false;
     }
-    const std::int64_t told = *stamp - *firstVideoStamp_;
-    const std::int64_t passed = told >= 0 && told < kLongestCount ? told : 0;
+    const std::int64_t passed = SinceFirst(*stamp);
     const FrameRate& rate = paths_.description.frameRate;
     if (begin_ > 0) {
         begin_ = assembler_->Resume(rate, begin_ + passed);
@@ -305,6 +378,7 @@ void Connection::Finish() {
         for (const auto& packet : runs_.Finish()) {
             Handle(*packet);
         }
+        steps_->Release([this](AVPacket& packet) { Process(packet); });
     } catch (const FormatChanged&) {
         // Nothing follows in which the new format could go on.
     }

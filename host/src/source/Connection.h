@@ -13,6 +13,7 @@
 #include "source/Input.h"
 #include "source/KlvPackets.h"
 #include "source/LookAhead.h"
+#include "source/StepHold.h"
 #include "source/StreamClock.h"
 #include "source/StreamPaths.h"
 #include "source/UnitAssembler.h"
@@ -45,6 +46,9 @@ class Connection {
     /// Gives out what is still on its way. Once, when the connection is over; then its input may be asked
     /// anew.
     void Finish();
+    /// What was read and not used, when a change of the format has ended the connection: the packet that
+    /// showed it, as it came, and what was read ahead behind it. Of files alone. Once.
+    Packets TakeUnread();
     /// Ends the connection, all but the input, and gives that away.
     static std::unique_ptr<Input> End(std::unique_ptr<Connection> connection);
     /// The wait for the source is over: what still comes was held by the libraries.
@@ -66,6 +70,11 @@ class Connection {
     void CheckOther(const AVPacket& packet);
     bool NextPacket();
     void Handle(AVPacket& packet);
+    void Process(AVPacket& packet);
+    /// Which of the two media it is of, where steps of the clock can be told from losses: in a live stream
+    /// whose missing packets are marked. Of a file, where counters of four bits are all that tells, a loss
+    /// would at times be taken for a step.
+    std::optional<StepWatch::Medium> SteppingMedium(const AVPacket& packet) const;
     /// The sound that waits for a stamp which the pictures have passed.
     void HandleExpired();
     void HandleVideo(AVPacket& packet);
@@ -74,6 +83,9 @@ class Connection {
     void HandleAudio(AVPacket& packet, bool waited);
     void HandleKlv(const AVPacket& packet);
     void KeepEarly(AVPacket& packet);
+    /// How long after the first picture the one stamped with `stamp` comes, by the stamps, or by the count
+    /// of pictures where the first stamp is none to believe.
+    std::int64_t SinceFirst(std::int64_t stamp) const;
     static bool IsOf(const AVPacket& packet, const AVStream* stream);
     StreamClock::Track* KlvTrackOf(const AVPacket& packet);
     /// The pictures are recorded as they come, which is not the order in which they are shown.
@@ -98,9 +110,12 @@ class Connection {
     std::optional<FormatWatch> watch_;
     std::optional<StreamClock> clock_;
     KlvPackets klvPackets_;
+    std::optional<StepHold> steps_;
     /// Of the audio of a transport stream.
     AudioRuns runs_;
     libav::Owner<AVPacket> packet_;
+    /// The same as it came. Of files alone.
+    libav::Owner<AVPacket> untouched_;
 
     UnitAssembler* assembler_ = nullptr;
     std::int64_t begin_ = 0;

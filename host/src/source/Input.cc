@@ -10,6 +10,7 @@
 #include "common/Credentials.h"
 #include "common/ReceiverError.h"
 #include "source/Address.h"
+#include "source/StreamParameters.h"
 #include "timing/Saturating.h"
 
 namespace receiver {
@@ -92,7 +93,7 @@ std::string Reason(int result) {
 }  // namespace
 
 Input::Input(const std::string& url, double timeout, double patience, std::shared_ptr<Interrupt> interrupt,
-             bool (*stop)())
+             const StopCheck& stop)
     : url_(url),
       timeout_(timeout),
       patience_(patience),
@@ -111,7 +112,7 @@ int Input::OnWait(void* input) {
 
 bool Input::StopAsked() const {
     // The thread comes first: on another one not even the pointer may be read.
-    return interrupt_->Stopped() || (std::this_thread::get_id() == opener_ && stop_ != nullptr && stop_());
+    return interrupt_->Stopped() || (std::this_thread::get_id() == opener_ && stop_ && stop_());
 }
 
 void Input::Expect(double seconds) {
@@ -186,11 +187,11 @@ void Input::FindStreams() {
     }
 }
 
-bool Input::Renew(std::int64_t position) {
+bool Input::Renew(std::int64_t position, Packets unread) {
     if (format_->pb != nullptr && std::string_view(format_->iformat->name) == "mpegts") {
         CarryOn(position);
     } else if (recorded_) {
-        return false;
+        return GoOnWith(std::move(unread));
     } else {
         format_.reset();
         Open();
@@ -198,6 +199,15 @@ bool Input::Renew(std::int64_t position) {
     damagedNext_.clear();
     Alive();
     return true;
+}
+
+bool Input::GoOnWith(Packets unread) {
+    unread_ = std::move(unread);
+    if (unread_.empty()) {
+        return false;
+    }
+    const AVPacket& first = *unread_.front();
+    return RenewParameters(*format_->streams[first.stream_index], first);
 }
 
 void Input::CarryOn(std::int64_t position) {
@@ -208,7 +218,12 @@ void Input::CarryOn(std::int64_t position) {
     format_.reset();
     if (position >= 0) {
         // The tables stand right in front of the picture. A live source has only what is still in memory.
-        avio_seek(connection_.get(), std::max<std::int64_t>(0, position - kTables), SEEK_SET);
+        const std::int64_t reached =
+            avio_seek(connection_.get(), std::max<std::int64_t>(0, position - kTables), SEEK_SET);
+        if (reached < 0 && recorded_) {
+            throw SourceLost("the file cannot be read where it changes: " +
+                             libav::ErrorText(static_cast<int>(reached)));
+        }
     }
     AVFormatContext* format = NewFormat();
     format->pb = connection_.get();
@@ -323,6 +338,12 @@ void Input::CheckLength() const {
 }
 
 bool Input::Read(AVPacket& packet) {
+    if (!unread_.empty()) {
+        av_packet_unref(&packet);
+        av_packet_move_ref(&packet, unread_.front().get());
+        unread_.pop_front();
+        return true;
+    }
     libav::ForgetErrors();
     const int result = ReadFrame(packet);
     if (StopAsked()) {

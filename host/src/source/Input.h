@@ -2,6 +2,7 @@
 
 #include <atomic>
 #include <chrono>
+#include <deque>
 #include <limits>
 #include <memory>
 #include <set>
@@ -12,8 +13,11 @@
 #include "common/ReceiverError.h"
 #include "source/Interrupt.h"
 #include "source/Libav.h"
+#include "source/StopCheck.h"
 
 namespace receiver {
+
+using Packets = std::deque<libav::Owner<AVPacket>>;
 
 /// The source ended or broke, for the reason that `what()` tells in a few words.
 class SourceLost : public std::runtime_error {
@@ -38,17 +42,18 @@ class Stopped : public std::runtime_error {
 class Input {
  public:
     /// Opens `url` and finds out what it carries. `patience`: seconds that it may take to answer. `timeout`:
-    /// seconds that may pass later between two calls of `Alive`, 30 at the least for HLS. `stop` may be null;
-    /// it is asked until this returns, on the calling thread alone. Throws `ReceiverError`
+    /// seconds that may pass later between two calls of `Alive`, 30 at the least for HLS. `stop` is
+    /// asked until this returns, on the calling thread alone. Throws `ReceiverError`
     /// (`kSourceUnavailable`), of it `SourceAbsent` where a later attempt may succeed, and `Stopped`.
     Input(const std::string& url, double timeout, double patience, std::shared_ptr<Interrupt> interrupt,
-          bool (*stop)());
+          const StopCheck& stop);
 
     AVFormatContext& Format() { return *format_; }
-    /// Finds out anew what the source carries, from byte `position` of the connection on where that can still
-    /// be had (-1: where it is). Streams and packets of before are gone. False for a file that would begin
-    /// again with its first byte. Throws like the constructor, and `SourceLost`.
-    bool Renew(std::int64_t position);
+    /// Finds out anew what the source carries. A transport stream goes on from byte `position` of the
+    /// connection where that can still be had (-1: where it is), another file with `unread`, of which the
+    /// first is the packet that showed the change; all else is opened again. Streams of before are gone.
+    /// False for a file of which that packet tells nothing. Throws like the constructor, and `SourceLost`.
+    bool Renew(std::int64_t position, Packets unread);
     /// True the first time that somebody asks for the stream with that number of the container, also after
     /// `Renew`: what is still not understood then never will be.
     bool AskFor(int stream) { return asked_.insert(stream).second; }
@@ -84,6 +89,7 @@ class Input {
     void Classify();
     void FindStreams();
     void CarryOn(std::int64_t position);
+    bool GoOnWith(Packets unread);
     int ReadFrame(AVPacket& packet);
     /// Moves the mark of a damaged packet to the picture that it is for.
     void MarkDamage(AVPacket& packet);
@@ -101,7 +107,7 @@ class Input {
     /// these.
     const std::thread::id opener_;
     /// Null once the source is open.
-    bool (*stop_)();
+    StopCheck stop_;
     /// When the present wait is over, on the steady clock.
     std::atomic<std::chrono::steady_clock::rep> deadline_{0};
     /// A wait was over. The libraries may give out what they still hold before they tell.
@@ -119,6 +125,8 @@ class Input {
     /// Of a connection that has been taken over from an earlier context.
     std::unique_ptr<AVIOContext, CloseConnection> connection_;
     libav::Owner<AVFormatContext> format_;
+    /// Packets that `Read` gives once more.
+    Packets unread_;
 };
 
 }  // namespace receiver

@@ -17,7 +17,7 @@ constexpr std::array<int, 5> kPauses{1, 2, 4, 8, 15};
 constexpr std::chrono::seconds kGood{30};
 
 std::unique_ptr<Connection> Connect(const SourceOptions& options, double patience,
-                                    const std::shared_ptr<Interrupt>& interrupt, bool (*stop)(),
+                                    const std::shared_ptr<Interrupt>& interrupt, const StopCheck& stop,
                                     const SourceDescription* before) {
     try {
         return std::make_unique<Connection>(
@@ -39,13 +39,13 @@ std::int64_t Ticks(std::chrono::steady_clock::duration time) {
 }  // namespace
 
 InputProducer::InputProducer(const SourceOptions& options, double patience,
-                             std::shared_ptr<Interrupt> interrupt, bool (*stop)())
+                             std::shared_ptr<Interrupt> interrupt, const StopCheck& stop)
     : options_(options),
       interrupt_(std::move(interrupt)),
       connection_(Connect(options_, patience, interrupt_, stop, nullptr)),
       description_(connection_->Description()),
       recorded_(connection_->Recorded()),
-      assembler_(description_.frameRate, options.continuous),
+      assembler_(description_.frameRate),
       connected_(Clock::now()),
       lastPicture_(connected_) {
     connection_->Begin(assembler_, 0);
@@ -141,12 +141,12 @@ void InputProducer::KeepCounts() {
 }
 
 void InputProducer::TryAgain() {
-    // Where the sender comes to us nothing is left out while nobody listens; only what fails at once is not
-    // tried in a hurry.
+    using std::chrono::milliseconds;
+    // Where the sender comes to us it is refused while nobody listens.
     const bool listens = Listens(options_.url);
-    const bool hurried = Clock::now() - tried_ < std::chrono::seconds(kPauses[0]);
-    const int pause = !listens ? kPauses[attempts_] : hurried ? kPauses[0] : 0;
-    if (interrupt_->Wait(std::chrono::seconds(pause))) {
+    const milliseconds pause = listens ? std::chrono::ceil<milliseconds>(tried_ + kListenEvery - Clock::now())
+                                       : std::chrono::seconds(kPauses[attempts_]);
+    if (interrupt_->Wait(std::max(milliseconds(0), pause))) {
         throw Stopped();
     }
     attempts_ = std::min(attempts_ + 1, kPauses.size() - 1);
@@ -169,17 +169,19 @@ void InputProducer::TryAgain() {
 }
 
 void InputProducer::Change(const std::string& reason) {
+    // What it still gives out stands in front of that.
+    const std::int64_t position = connection_->Position();
     connection_->Finish();
     ++changes_;
     KeepCounts();
-    const std::int64_t position = connection_->Position();
     const std::int64_t passed = recorded_ ? 0 : Ticks(Clock::now() - lastPicture_);
+    Packets unread = connection_->TakeUnread();
     std::unique_ptr<Input> input = Connection::End(std::move(connection_));
     lost_ = Clock::now();
     try {
-        if (!input->Renew(position)) {
+        if (!input->Renew(position, std::move(unread))) {
             throw ReceiverError(ExitCode::kSourceUnsuitable,
-                                reason + ": what follows in this file is left out");
+                                reason + ": what follows in this file cannot be understood, and is left out");
         }
         auto connection = std::make_unique<Connection>(std::move(input), options_, nullptr);
         assembler_.AddNotice(reason + ": the recording goes on in a new file");

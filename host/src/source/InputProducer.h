@@ -9,6 +9,7 @@
 #include "source/Connection.h"
 #include "source/Interrupt.h"
 #include "source/ProducerInterface.h"
+#include "source/StopCheck.h"
 
 namespace receiver {
 
@@ -19,11 +20,10 @@ inline constexpr double kListeningPatience = 60;
 /// again, after pauses that grow, until it is back or somebody stops.
 class InputProducer final : public ProducerInterface {
  public:
-    /// Opens the source, which may take `patience` seconds to answer. `stop` may be null; asked until this
-    /// returns. Throws `ReceiverError`, of it `SourceAbsent` where a later attempt may succeed, and
-    /// `Stopped`.
+    /// Opens the source, which may take `patience` seconds to answer. `stop` is asked until this returns.
+    /// Throws `ReceiverError`, of it `SourceAbsent` where a later attempt may succeed, and `Stopped`.
     InputProducer(const SourceOptions& options, double patience, std::shared_ptr<Interrupt> interrupt,
-                  bool (*stop)());
+                  const StopCheck& stop);
 
     const SourceDescription& Description() const override { return description_; }
     bool Produce(Batch& batch) override;

@@ -1,13 +1,10 @@
 #pragma once
 
 #include <chrono>
-#include <deque>
 
 #include "source/Input.h"
 
 namespace receiver {
-
-using Packets = std::deque<libav::Owner<AVPacket>>;
 
 /// The beginning of an input, which is looked at before it is decided what becomes of its streams.
 struct Beginning {

@@ -20,7 +20,7 @@ constexpr double kBurst = 8;
 
 /// Opens the source, and waits for a live one until it is there, unless that is not wanted.
 std::unique_ptr<InputProducer> Open(const SourceOptions& options, const std::shared_ptr<Interrupt>& interrupt,
-                                    SourceListenerInterface& listener, bool (*stop)()) {
+                                    SourceListenerInterface& listener, const StopCheck& stop) {
     const bool listens = Listens(options.url);
     std::unique_ptr<InputProducer> producer;
     const auto attempt = [&](bool told) {
@@ -39,7 +39,7 @@ std::unique_ptr<InputProducer> Open(const SourceOptions& options, const std::sha
 }  // namespace
 
 std::unique_ptr<SourceInterface> OpenSource(const SourceOptions& options, SourceListenerInterface& listener,
-                                            bool (*stop)()) {
+                                            const StopCheck& stop) {
     libav::CollectMessages();
     auto interrupt = std::make_shared<Interrupt>();
     if (options.url == "test:") {

@@ -25,6 +25,8 @@ class PictureParser {
     Picture Parse(std::span<const unsigned char> picture);
     /// Frames a second as the pictures tell; 0/1 while they do not.
     AVRational FrameRate() const { return codec_->framerate; }
+    /// Of the last one, as libavcodec numbers profiles.
+    int Profile() const { return codec_->profile; }
 
  private:
     libav::Owner<AVCodecContext> codec_;

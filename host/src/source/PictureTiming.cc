@@ -7,7 +7,6 @@
 namespace receiver {
 namespace {
 
-constexpr unsigned int kNalMessages = 6;
 /// payloadType of a picture timing message (D.1.1).
 constexpr unsigned int kPictureTiming = 1;
 /// counting_type of the drop-frame rule (table D-2): 0 and 1 are left out in each minute but every tenth.

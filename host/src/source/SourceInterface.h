@@ -8,6 +8,7 @@
 
 #include "common/FrameRate.h"
 #include "common/Timecode.h"
+#include "source/StopCheck.h"
 
 namespace receiver {
 
@@ -135,8 +136,6 @@ struct SourceOptions {
     bool transcode = false;
     /// Goes on trying while a network source is not there yet, and when it is lost.
     bool reconnect = true;
-    /// What is recorded goes on over outages as one recording, whose counts have to stay together.
-    bool continuous = false;
     /// "test:" and conversions. A rate and a size that are not set are 25 and 1280x720 for "test:" and those
     /// of the source for a conversion.
     std::optional<FrameRate> frameRate;
@@ -156,9 +155,9 @@ struct SourceOptions {
 
 /// Opens a source. A live one that is not there yet is waited for, told once and then every minute, unless
 /// `reconnect` is off. Throws `ReceiverError` with `kSourceUnavailable` or `kSourceUnsuitable`. `listener`
-/// must live as long as the source. `stop` may be null; while the source is being opened, it is asked from
-/// time to time, and true ends the attempt with a null pointer.
+/// must live as long as the source. While the source is being opened, `stop` is asked from time to time, and
+/// true ends the attempt with a null pointer.
 std::unique_ptr<SourceInterface> OpenSource(const SourceOptions& options, SourceListenerInterface& listener,
-                                            bool (*stop)());
+                                            const StopCheck& stop);
 
 }  // namespace receiver

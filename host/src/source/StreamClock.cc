@@ -104,6 +104,27 @@ std::int64_t StreamClock::Elapsed(Track& track, std::int64_t usual) const {
     return std::max<std::int64_t>(0, ticks - usual);
 }
 
+std::optional<StreamClock::Offset> StreamClock::OffsetOf(StepWatch::Medium medium, const AVPacket& packet) {
+    Track& track = TrackOf(medium);
+    const bool joined = medium == StepWatch::Medium::kVideo || joined_;
+    const auto stamp = joined ? StampOf(track, packet) : std::nullopt;
+    if (!stamp) {
+        return std::nullopt;
+    }
+    return Offset{track.expected, SaturatingSubtract(line_.Nearest(*stamp, track.expected), track.expected)};
+}
+
+bool StreamClock::HasPaused(StepWatch::Medium medium, std::int64_t ticks) const {
+    const auto arrived = (medium == StepWatch::Medium::kVideo ? video_ : *audio_).arrived;
+    return arrived != Clock::time_point() &&
+           Clock::now() - arrived > std::chrono::microseconds(ticks * 100 / 9) * 3 / 4;
+}
+
+void StreamClock::StepForward(std::int64_t ticks) {
+    line_.Step(ticks, std::max(video_.expected, audio_->expected));
+    TellJump(ticks);
+}
+
 void StreamClock::TellJump(std::int64_t ticks) const {
     tell_("the source's clock jumped by " + std::to_string(ticks / 90) +
           " ms; the recording goes on without the jump");

@@ -47,6 +47,18 @@ class StreamClock {
     /// The same, also a stamp that comes again.
     std::optional<std::int64_t> StampOf(Track& track, const AVPacket& packet);
 
+    /// Where a packet is expected, and how far behind that it stands by its stamp.
+    struct Offset {
+        std::int64_t expected = 0;
+        std::int64_t distance = 0;
+    };
+    /// Of a packet that is not entered yet. Nothing when it has no stamp, and of audio that has not joined.
+    std::optional<Offset> OffsetOf(StepWatch::Medium medium, const AVPacket& packet);
+    /// Most of so many ticks have passed since the last packet came: the source did pause.
+    bool HasPaused(StepWatch::Medium medium, std::int64_t ticks) const;
+    /// The source's clock made a step forward where its next packets are expected.
+    void StepForward(std::int64_t ticks);
+
     /// Where a picture of `usual` ticks stands. It is stamped with `stamp`, if at all, and stamps follow each
     /// other in the order of time unless `reordered`.
     std::int64_t VideoTime(std::optional<std::int64_t> stamp, std::int64_t usual, bool reordered);
@@ -59,6 +71,9 @@ class StreamClock {
     std::optional<std::int64_t> TimeNear(std::int64_t stamp, std::int64_t time) const;
 
  private:
+    Track& TrackOf(StepWatch::Medium medium) {
+        return medium == StepWatch::Medium::kVideo ? video_ : *audio_;
+    }
     std::optional<std::int64_t> NewStampOf(Track& track, const AVPacket& packet, std::size_t kept);
     std::int64_t Elapsed(Track& track, std::int64_t usual) const;
     std::int64_t TimeOf(Track& track, std::int64_t stamp, std::int64_t usual, std::int64_t back);

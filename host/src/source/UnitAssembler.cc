@@ -32,8 +32,7 @@ std::string Count(std::uint64_t count, const char* what) {
 
 }  // namespace
 
-UnitAssembler::UnitAssembler(const FrameRate& rate, bool continuous)
-    : rate_(rate), grid_(rate), audioGrid_(continuous), silence_(SilentFrame()) {}
+UnitAssembler::UnitAssembler(const FrameRate& rate) : rate_(rate), grid_(rate), silence_(SilentFrame()) {}
 
 void UnitAssembler::Begin(bool audio) {
     audio_ = audio;

@@ -16,8 +16,7 @@ namespace receiver {
 /// the timecode on from picture to picture. Times in are those of the source's time line.
 class UnitAssembler {
  public:
-    /// `continuous`: one recording goes on over all connections.
-    explicit UnitAssembler(const FrameRate& rate, bool continuous = false);
+    explicit UnitAssembler(const FrameRate& rate);
 
     /// A connection begins; `audio` tells whether it carries audio. A gap before its first picture is no loss
     /// of frames, since nobody knows what was sent.

@@ -76,7 +76,10 @@ void VideoPass::Push(const AVPacket& packet, const PictureSink& sink) {
         return;
     }
     const auto bytes = BytesOf(stream);
-    const auto units = NalUnits(bytes);
+    // Nothing behind the first slice matters here. Where an IDR frame begins behind a rest of another
+    // picture, which a loss may leave, the packet is marked.
+    const bool marked = (packet.flags & AV_PKT_FLAG_KEY) != 0;
+    const auto units = marked ? NalUnits(bytes) : LeadingNalUnits(bytes);
     CodedPicture picture;
     picture.time = packet.dts != AV_NOPTS_VALUE ? packet.dts : packet.pts;
     picture.later = packet.pts - picture.time;
@@ -95,7 +98,8 @@ void VideoPass::Push(const AVPacket& packet, const PictureSink& sink) {
         picture.data = libav::Share(stream);
         picture.size = bytes.size();
     }
-    if (picture.keyFrame) {
+    // Timecode stands in a message (ITU-T H.264 D.1.3); without one nothing needs to be decoded.
+    if (picture.keyFrame && Contains(units, kNalMessages)) {
         picture.timecode = timecodes_->Read({picture.data.get(), picture.size});
         if (picture.timecode) {
             picture.timecode->dropFrame = timing_.DropFrame();

@@ -47,8 +47,7 @@ std::int64_t AudioGrid::Earliest() const {
     if (!rejoining_) {
         return next_ - kTolerance;
     }
-    return continuous_ ? next_ - joined_ - kFrame / 2
-                       : std::max(last_ + kFrame / 2, origin_.value_or(next_) - kFrame / 2);
+    return std::max(last_ + kFrame / 2, origin_.value_or(next_) - kFrame / 2);
 }
 
 AudioGrid::Place AudioGrid::Next(std::int64_t time) {
@@ -72,10 +71,8 @@ AudioGrid::Place AudioGrid::Next(std::int64_t time) {
 
 void AudioGrid::Join(std::int64_t time) {
     rejoining_ = false;
-    const std::int64_t counted = continuous_ ? next_ - joined_ : origin_.value_or(next_);
-    const std::int64_t silent = std::max<std::int64_t>(0, Frames(time - counted));
+    const std::int64_t silent = std::max<std::int64_t>(0, Frames(time - origin_.value_or(next_)));
     next_ = time - silent * kFrame;
-    joined_ = next_ - counted;
 }
 
 }  // namespace receiver

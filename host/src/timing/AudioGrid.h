@@ -26,10 +26,6 @@ class AudioGrid {
     /// earliest.
     static constexpr std::int64_t kEarliest = -kFrame / 2;
 
-    /// `continuous`: what follows a source that begins anew goes on in the recording of what came before, so
-    /// that counts have to stay together over it. Else another recording begins there.
-    explicit AudioGrid(bool continuous = false) : continuous_(continuous) {}
-
     /// Video is missing from `begin` on for `length` samples. `rejoin`: what follows begins another
     /// recording, and audio rejoins there.
     void AddVideoGap(std::int64_t begin, std::int64_t length, bool rejoin = false);
@@ -52,8 +48,8 @@ class AudioGrid {
     /// and silence leads up to it from the frame on that is nearest to 0.
     Place Next(std::int64_t time);
 
-    /// The source begins anew: its next frame stands where it is, as the first one did, and the others in
-    /// line with it.
+    /// The source begins anew, and another recording with it: its next frame stands where it is, as the first
+    /// one did, and the others in line with it.
     void Rejoin() {
         rejoining_ = true;
         origin_.reset();
@@ -81,7 +77,6 @@ class AudioGrid {
     std::int64_t Earliest() const;
     void Join(std::int64_t time);
 
-    const bool continuous_;
     std::deque<Gap> gaps_;
     /// Where the first picture behind the last gap stands, and the last frame that was entered.
     std::optional<std::int64_t> origin_;
@@ -90,9 +85,6 @@ class AudioGrid {
     std::int64_t passed_ = 0;
     std::int64_t surplus_ = 0;
     std::int64_t next_ = 0;
-    /// How far frames stand behind a line of whole frames from the first one on, since they joined. At most
-    /// half a frame either way, however often they do, or the counts would drift apart.
-    std::int64_t joined_ = 0;
     /// End of the time that was passed over last.
     std::int64_t passedUntil_ = 0;
     bool begun_ = false;

@@ -8,8 +8,8 @@
 namespace receiver {
 
 /// Finds steps back of a source's clock that are too small to be told from jitter by one medium alone: all
-/// media make the same step within a few seconds. A step forward needs no finding, since it looks like a loss
-/// of both and is placed like one. Ticks of 90000 a second. Not for several threads.
+/// media make the same step within a few seconds. A step forward looks like a loss of both, and is placed
+/// like one unless `ForwardSteps` has told it from that. Ticks of 90000 a second. Not for several threads.
 class StepWatch {
  public:
     /// Two media.

@@ -153,12 +153,16 @@ TEST_F(JoiningTest, OverRtpPictureAndSoundAreInStepFromTheFirstIdrFrameOn) {
     ExpectJoined(*receiver, sent, expected);
 }
 
-TEST_F(JoiningTest, BehindAnOutagePictureAndSoundAreInStepFromTheFirstIdrFrameOn) {
-    const auto whole = Make(6.5);
+class OutageTest : public JoiningTest, public ::testing::WithParamInterface<const char*> {};
+
+TEST_P(OutageTest, PictureSoundAndMetadataAreInStepBehindIt) {
+    const auto whole = Make(6.5, 1);
     const auto cut = CutBeginning(whole);
-    const auto begin = Cut(whole, "begin.ts", "gte(n\\,50)", "gte(n\\,94)");
+    const auto begin =
+        Cut(whole, "begin.ts", "gte(n\\,50)", "gte(n\\,94)", {"-bsf:d", "noise=drop=gte(n\\,50)"});
     const std::string url = "udp://127.0.0.1:" + port;
-    const auto receiver = Start({"--input", url, "--timeout", "2", "--timecode", "10:00:00:00"});
+    const auto receiver =
+        Start({"--input", url, "--timeout", "2", "--timecode", "10:00:00:00", "--mode", GetParam()});
     ASSERT_TRUE(WaitUntilBound(ports.First())) << receiver->AllText();
     ASSERT_EQ(SendTransportStream(begin, url + "?pkt_size=1316")->Wait(), 0);
     ASSERT_TRUE(receiver->WaitForText("the source was lost")) << receiver->AllText();
@@ -182,10 +186,19 @@ TEST_F(JoiningTest, BehindAnOutagePictureAndSoundAreInStepFromTheFirstIdrFrameOn
         EXPECT_LE(verdict.unknownSounds, 2U);
         EXPECT_EQ(verdict.missingSounds, 0U);
         EXPECT_LE(verdict.outOfStep, 0.011);
-        EXPECT_EQ(FindRun(sent.video, ReadCodedMedia(recordings[at]).video), first[at]);
+        const CodedMedia recorded = ReadCodedMedia(recordings[at]);
+        EXPECT_EQ(FindRun(sent.video, recorded.video), first[at]);
         EXPECT_EQ(DecodeVideo(recordings[at]).messages, "");
+        for (std::size_t picture = 0; picture < recorded.data.size(); ++picture) {
+            EXPECT_THAT(SourcePacketsOf(recorded.data[picture]),
+                        ElementsAre(MakeKlvPacket(first[at] + picture)))
+                << picture;
+        }
     }
 }
+
+INSTANTIATE_TEST_SUITE_P(Modes, OutageTest, ::testing::Values("sync", "on"),
+                         [](const auto& mode) { return std::string(mode.param); });
 
 /// Audio used to be out of step by almost all of the step.
 TEST_F(JoiningTest, AStepBackOfTheClockLosesNothingAndLeavesPictureAndSoundInStep) {

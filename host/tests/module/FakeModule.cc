@@ -1,7 +1,7 @@
 // A module that records nothing but the calls that it gets. The environment variable FAKE_MODULE makes it
 // misbehave: "none" gives no object, "refuse" fails its initialisation, "fail" sets status 7 with the first
 // video unit, "overflow" reports the first video unit as lost, "fault" sets status 6 with it, "hang" carries
-// out no command.
+// out no command, "crowded" has room for one mark among the video and reports the second one as lost.
 
 #include <cstdlib>
 #include <string>
@@ -63,6 +63,9 @@ class FakeModule final : public QxModuleInterface,
 
     void PushReserved(const std::shared_ptr<StreamData>&) override {}
     void PushVideo(const std::shared_ptr<StreamData>& unit) override {
+        if (unit->payload == nullptr && Behaves("crowded")) {
+            TakeMark(unit);
+        }
         if (pushed_ || unit->payload == nullptr) {
             return;
         }
@@ -106,8 +109,21 @@ class FakeModule final : public QxModuleInterface,
         return true;
     }
 
+    void TakeMark(const std::shared_ptr<StreamData>& mark) {
+        if (marks_++ == 0) {
+            mark_ = mark;
+        } else if (marks_ == 2) {
+            Logger::Put(LOG_PRIORITY_WARNING, nullptr, nullptr, 0, "queue overflow (video)");
+        } else {
+            mark_.reset();
+        }
+    }
+
     QxModuleHostInterface* host_ = nullptr;
     bool pushed_ = false;
+    /// Of "crowded": how many came, and the one that is held until the third.
+    int marks_ = 0;
+    std::shared_ptr<StreamData> mark_;
 };
 
 FakeModule fakeModule;

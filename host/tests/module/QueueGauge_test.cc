@@ -33,6 +33,7 @@ TEST(QueueGauge, AMarkThatAFullQueueDropsHasNotComeThrough) {
     gauge.MakeMark().reset();
     EXPECT_EQ(gauge.Bound(), 2u);
     EXPECT_EQ(gauge.Passed(), 0u);
+    EXPECT_EQ(gauge.Dropped(), 1u);
     first.reset();
     EXPECT_EQ(gauge.Bound(), 0u);
     EXPECT_EQ(gauge.Passed(), 2u);

@@ -196,7 +196,7 @@ TEST(StreamFeed, AModuleThatHaltsIsWaitedForOnce) {
 TEST(StreamFeed, AQueueThatHaltsDoesNotLetTheOthersOverflow) {
     QueueingModule module;
     module.keepsAudio = true;
-    StreamFeed feed(module, std::chrono::milliseconds(500));
+    StreamFeed feed(module, std::chrono::seconds(3));
     for (int i = 0; i < 3000; ++i) {
         if (i < 60) {
             feed.PushAudio(i, Bytes(1), 1);
@@ -204,6 +204,49 @@ TEST(StreamFeed, AQueueThatHaltsDoesNotLetTheOthersOverflow) {
         feed.PushVideo(i, Bytes(1), 1);
     }
     EXPECT_EQ(module.dropped, 0);
+}
+
+TEST(StreamFeed, WhileTheModuleIsWaitedForItsOwnerGoesOnWithOtherThings) {
+    KeepingModule module;
+    int calls = 0;
+    // A wait of an hour, but for what happens meanwhile.
+    StreamFeed feed(module, std::chrono::hours(1), [&] {
+        ++calls;
+        module.video.clear();
+    });
+    for (int i = 0; i < 100; ++i) {
+        feed.PushVideo(i, Bytes(1), 1);
+    }
+    EXPECT_GT(calls, 0);
+}
+
+TEST(StreamFeed, WhileTheDiskIsWaitedForItsOwnerGoesOnWithOtherThings) {
+    KeepingModule module;
+    int calls = 0;
+    StreamFeed feed(module, StreamFeed::kPatience, [&] {
+        ++calls;
+        module.video.clear();
+    });
+    for (int i = 0; i < 3; ++i) {
+        feed.PushVideo(i, Bytes(1), 1);
+    }
+    // A chunk of two is cut, and its first one waits for the disk.
+    module.video.erase(module.video.begin() + 1);
+    EXPECT_TRUE(feed.WaitForChunks(0, std::chrono::hours(1)));
+    EXPECT_EQ(calls, 1);
+}
+
+TEST(StreamFeed, MarksThatTheModuleDropsAreCounted) {
+    QueueingModule module;
+    StreamFeed feed(module, std::chrono::milliseconds(0));
+    EXPECT_EQ(feed.DroppedMarks(), 0u);
+    module.Halt();
+    // The queue takes 44 units and the 5 marks behind each eight, one unit more, and then drops.
+    for (int i = 0; i < 64; ++i) {
+        feed.PushVideo(i, Bytes(1), 1);
+    }
+    EXPECT_EQ(module.dropped, 64 + 8 - 50);
+    EXPECT_EQ(feed.DroppedMarks(), 3u);
 }
 
 /// Lets go of everything, on a thread of its own, when the last of the three marks has come.

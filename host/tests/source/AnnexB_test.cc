@@ -57,6 +57,33 @@ TEST(NalUnits, ZeroBytesBehindAUnitDoNotBelongToIt) {
     EXPECT_EQ(units[0].end, kPictureSet.size());
 }
 
+TEST(LeadingNalUnits, EndAtTheFirstSliceToWhichTheRestIsCounted) {
+    for (const Bytes& slice : {kSlice, kIdr}) {
+        const Bytes stream = kDelimiter + kSequenceSet + kSei + slice + kPictureSet + kSlice;
+        const auto units = LeadingNalUnits(stream);
+        const auto all = NalUnits(stream);
+        ASSERT_EQ(units.size(), 4u);
+        for (std::size_t i = 0; i < 3; ++i) {
+            EXPECT_EQ(units[i].type, all[i].type);
+            EXPECT_EQ(units[i].begin, all[i].begin);
+            EXPECT_EQ(units[i].end, all[i].end);
+            EXPECT_EQ(units[i].bytes.data(), all[i].bytes.data());
+            EXPECT_EQ(units[i].bytes.size(), all[i].bytes.size());
+        }
+        EXPECT_EQ(units[3].type, all[3].type);
+        EXPECT_EQ(units[3].begin, all[3].begin);
+        EXPECT_EQ(units[3].end, stream.size());
+        EXPECT_EQ(units[3].bytes.size(), slice.size() - 3 + kPictureSet.size() + kSlice.size());
+    }
+}
+
+TEST(LeadingNalUnits, AreAllOfThemWithoutASlice) {
+    const Bytes stream = kDelimiter + kSequenceSet + kPictureSet;
+    EXPECT_EQ(LeadingNalUnits(stream).size(), 3u);
+    EXPECT_TRUE(LeadingNalUnits(Bytes{}).empty());
+    EXPECT_TRUE(LeadingNalUnits(Bytes{0, 0, 0, 5, 0x65}).empty());
+}
+
 TEST(NalUnits, NothingIsFoundInBytesWithoutStartCode) {
     EXPECT_TRUE(NalUnits(Bytes{}).empty());
     EXPECT_TRUE(NalUnits(Bytes{0, 0, 1}).empty());

@@ -28,7 +28,7 @@ class AudioRunsTest : public testing::Test {
         return packet;
     }
     /// Puts a frame, and keeps the numbers of those that go on.
-    void Put(libav::Owner<AVPacket> packet) { Keep(runs_.Put(std::move(packet), kTicks)); }
+    void Put(libav::Owner<AVPacket> packet) { Keep(runs_.Put(std::move(packet), AV_CODEC_ID_AAC, kTicks)); }
     /// Puts the first one of a unit.
     void PutFirst(std::int64_t number, int flags = 0) {
         auto packet = Frame(number);
@@ -129,7 +129,7 @@ TEST_F(AudioRunsTest, ARunInFrontOfAStepBackGoesOn) {
     EXPECT_EQ(Passed(), (Numbers{100, 101}));
 }
 
-/// A frame of MP2 (ISO/IEC 11172-3): it has a header of its own, which is none of AAC.
+/// A frame of AAC in LATM (ISO/IEC 14496-3 1.7), which has no header of ADTS.
 libav::Owner<AVPacket> OtherFrame(std::int64_t pts, std::int64_t pos) {
     libav::Owner<AVPacket> packet = libav::NewPacket();
     EXPECT_EQ(av_new_packet(packet.get(), kSize), 0);
@@ -144,13 +144,36 @@ libav::Owner<AVPacket> OtherFrame(std::int64_t pts, std::int64_t pos) {
 TEST_F(AudioRunsTest, WithoutFrameHeadersAllThatIsNotMarkedGoesOnAtOnce) {
     std::int64_t pos = 0;
     for (const std::int64_t pts : {0, 2160 + 1300, 4320, 6480 + 1300, 120000}) {
-        EXPECT_EQ(runs_.Put(OtherFrame(pts, pos += 188), kTicks).size(), 1u);
+        EXPECT_EQ(runs_.Put(OtherFrame(pts, pos += 188), AV_CODEC_ID_AAC_LATM, kTicks).size(), 1u);
     }
     EXPECT_EQ(runs_.Damaged(), 0u);
     auto marked = OtherFrame(122160, pos);
     marked->flags |= AV_PKT_FLAG_CORRUPT;
-    EXPECT_TRUE(runs_.Put(std::move(marked), kTicks).empty());
+    EXPECT_TRUE(runs_.Put(std::move(marked), AV_CODEC_ID_AAC_LATM, kTicks).empty());
     EXPECT_EQ(runs_.Damaged(), 1u);
+}
+
+/// Frames of MP2 (ISO/IEC 11172-3): layer II, 32 kbit/s at 48 kHz, 96 bytes and 1152 samples.
+TEST_F(AudioRunsTest, OtherAudioWhoseFramesTellTheirLengthIsCheckedTheSame) {
+    const auto put = [this](std::int64_t number, std::int64_t pos, int flags) {
+        libav::Owner<AVPacket> packet = libav::NewPacket();
+        EXPECT_EQ(av_new_packet(packet.get(), 96), 0);
+        std::memset(packet->data, 0, 96);
+        constexpr std::array<unsigned char, 4> kMp2{0xFF, 0xFD, 0x14, 0x00};
+        std::copy(kMp2.begin(), kMp2.end(), packet->data);
+        packet->pts = number * 2160;
+        packet->duration = 2160;
+        packet->pos = pos;
+        packet->flags |= flags;
+        return runs_.Put(std::move(packet), AV_CODEC_ID_MP2, kTicks).size();
+    };
+    EXPECT_EQ(put(0, 188, 0), 0u);
+    EXPECT_EQ(put(1, -1, 0), 0u);
+    EXPECT_EQ(put(2, 376, AV_PKT_FLAG_CORRUPT), 2u);
+    EXPECT_EQ(put(3, -1, 0), 0u);
+    // A frame is missing in front of this stamp.
+    EXPECT_EQ(put(5, 564, 0), 0u);
+    EXPECT_EQ(runs_.Damaged(), 2u);
 }
 
 TEST_F(AudioRunsTest, NoMoreThanFourTenthsOfASecondAreHeld) {

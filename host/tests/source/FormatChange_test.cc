@@ -171,6 +171,96 @@ INSTANTIATE_TEST_SUITE_P(
                            "the video changed from h264 to hevc", "H.264 128x96 25 fps, AAC LC 48 kHz stereo",
                            25, true}));
 
+/// A file of a container that describes its streams at its beginning, and in which they become others.
+struct FileChange {
+    const char* name;
+    const char* file;
+    string before;
+    string after;
+    const char* notice;
+    const char* summary;
+    std::size_t pictures;
+};
+void PrintTo(const FileChange& change, std::ostream* out) {
+    *out << change.name;
+}
+
+class FormatChangeInAFile : public SourceTest, public testing::WithParamInterface<FileChange> {
+ protected:
+    void Make() {
+        const string file = GetParam().file;
+        if (file.ends_with(".flv")) {
+            Ffmpeg(GetParam().before + " a.flv");
+            Ffmpeg(GetParam().after + " -output_ts_offset 1 b.flv");
+            // Header and first size, which the second part does not need.
+            Shell("(cat a.flv; tail -c +14 b.flv) > " + file);
+        } else {
+            // The first part begins with the priming of its audio, 1024 samples before its pictures.
+            Ffmpeg(GetParam().before + " -muxdelay 0 a.ts");
+            Ffmpeg(GetParam().after +
+                   " -muxdelay 0 -output_ts_offset 1.021333 -mpegts_flags +initial_discontinuity b.ts");
+            Shell("cat a.ts b.ts > ab.ts");
+            Ffmpeg("-i ab.ts -c copy " + file);
+        }
+    }
+};
+
+TEST_P(FormatChangeInAFile, IsToldAndEverythingBehindItComes) {
+    Make();
+    const auto source = OpenSource(Fast(GetParam().file), notices_, nullptr);
+    std::vector<SourceUnit> before;
+    std::vector<SourceUnit> after;
+    string summary;
+    for (auto result = SourceInterface::Result::kIdle; result != SourceInterface::Result::kEnd;) {
+        SourceUnit unit;
+        result = source->Read(unit);
+        if (result == SourceInterface::Result::kChanged) {
+            EXPECT_EQ(summary, "") << "a second change";
+            summary = source->Description().summary;
+        } else if (result == SourceInterface::Result::kUnit) {
+            (summary.empty() ? before : after).push_back(unit);
+        }
+    }
+    EXPECT_EQ(summary, GetParam().summary);
+    EXPECT_EQ(notices_.CountOf(string(GetParam().notice) + ": the recording goes on in a new file"), 1u)
+        << testing::PrintToString(notices_.sentences);
+    EXPECT_GE(Of(Medium::kVideo, before).size(), 24u);
+    const auto pictures = Of(Medium::kVideo, after);
+    ASSERT_EQ(pictures.size(), GetParam().pictures);
+    EXPECT_TRUE(pictures.front().keyFrame);
+    // The priming of MP2 is shorter, and its splice with it.
+    EXPECT_NEAR(static_cast<double>(pictures.back().time), 2 * 90000 - 3600, 3600);
+    const auto sounds = Of(Medium::kAudio, after);
+    ASSERT_FALSE(sounds.empty());
+    EXPECT_LE(std::abs(sounds.front().time * 15 / 8 - pictures.front().time), 1920);
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    All, FormatChangeInAFile,
+    testing::Values(FileChange{"parameter sets of FLV", "ab.flv", Plain("128x96", "25"),
+                               Plain("160x112", "25"), "the parameter sets of the video changed",
+                               "H.264 Constrained Baseline 160x112 25 fps, AAC LC 48 kHz stereo", 25},
+                    FileChange{"audio of FLV", "ab.flv", Plain("128x96", "25"),
+                               Picture("128x96", "25") + Tone(44100) + H264() + "-c:a aac -ar 44100 -ac 2 ",
+                               "the audio is no longer AAC LC 48 kHz stereo",
+                               "H.264 Constrained Baseline 128x96 25 fps, AAC LC 48 kHz stereo", 25},
+                    FileChange{"converted audio of FLV", "ab.flv",
+                               Picture("128x96", "25") + Tone(44100) + H264() + "-c:a aac -ar 44100 -ac 2 ",
+                               Picture("128x96", "25") + Tone(22050) + H264() + "-c:a aac -ar 22050 -ac 1 ",
+                               "the parameters of the audio changed",
+                               "H.264 Constrained Baseline 128x96 25 fps, AAC LC 48 kHz stereo", 25},
+                    FileChange{"size in MP4", "ab.mp4", Plain("128x96", "25"), Plain("160x112", "25"),
+                               "the picture changed from 128x96 to 160x112",
+                               "H.264 Constrained Baseline 160x112 25 fps, AAC LC 48 kHz stereo", 25},
+                    FileChange{"size in MKV", "ab.mkv", Plain("128x96", "25"), Plain("160x112", "25"),
+                               "the picture changed from 128x96 to 160x112",
+                               "H.264 Constrained Baseline 160x112 25 fps, AAC LC 48 kHz stereo", 25},
+                    FileChange{"channels of MP2 in MKV", "ab.mkv",
+                               Picture("128x96", "25") + Tone(48000) + H264() + "-c:a mp2 -ac 2 ",
+                               Picture("128x96", "25") + Tone(48000) + H264() + "-c:a mp2 -ac 1 ",
+                               "the audio changed from 48 kHz stereo to 48 kHz mono",
+                               "H.264 Constrained Baseline 128x96 25 fps, AAC LC 48 kHz stereo", 13}));
+
 /// A medium that goes on under another number in the tables of its programme.
 struct Move {
     const char* name;

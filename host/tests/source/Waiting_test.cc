@@ -1,3 +1,9 @@
+#include <arpa/inet.h>
+#include <netinet/in.h>
+#include <sys/socket.h>
+#include <unistd.h>
+
+#include <algorithm>
 #include <atomic>
 #include <chrono>
 #include <future>
@@ -6,6 +12,7 @@
 #include "SourceTesting.h"
 #include "support/FreePorts.h"
 #include "support/Senders.h"
+#include "support/WaitUntil.h"
 
 namespace receiver {
 namespace {
@@ -113,6 +120,71 @@ INSTANTIATE_TEST_SUITE_P(
                     Address{"HTTP", "http://127.0.0.1:PORT/a.ts", "http://127.0.0.1:PORT/a.ts", true},
                     Address{"RTMP listener", "rtmp://0.0.0.0:PORT/live/key", "rtmp://127.0.0.1:PORT/live/key",
                             false, "flv"}));
+
+/// A listener that somebody disturbs who connects and goes away.
+class DisturbedListener : public SourceTest {
+ protected:
+    using Clock = std::chrono::steady_clock;
+
+    /// A connection to the listener, once it takes one.
+    int Connect() const {
+        sockaddr_in address{};
+        address.sin_family = AF_INET;
+        address.sin_port = htons(ports_.First());
+        address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
+        int connection = -1;
+        EXPECT_TRUE(WaitUntil([&] {
+            connection = socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0);
+            if (connect(connection, reinterpret_cast<const sockaddr*>(&address), sizeof address) == 0) {
+                return true;
+            }
+            close(connection);
+            return false;
+        }));
+        return connection;
+    }
+    /// For how long nobody listens behind a disturbance: the shortest of some, of which a busy machine may
+    /// lengthen any.
+    Clock::duration ClosedTime() const {
+        Clock::duration shortest = Clock::duration::max();
+        int connection = Connect();
+        for (int time = 0; time < 5; ++time) {
+            close(connection);
+            const auto closed = Clock::now();
+            connection = Connect();
+            shortest = std::min(shortest, Clock::now() - closed);
+        }
+        close(connection);
+        return shortest;
+    }
+    void Send(const string& bytes) const {
+        const int connection = Connect();
+        for (std::size_t sent = 0; sent < bytes.size();) {
+            const ssize_t count = send(connection, bytes.data() + sent, bytes.size() - sent, MSG_NOSIGNAL);
+            ASSERT_GT(count, 0);
+            sent += static_cast<std::size_t>(count);
+        }
+        close(connection);
+    }
+
+    static constexpr std::chrono::milliseconds kLongest{600};
+    endtoend::FreePorts ports_;
+};
+
+TEST_F(DisturbedListener, IsBackAtOnceBeforeAndBehindItsSender) {
+    Ffmpeg("-f lavfi -i testsrc2=size=128x96:rate=25:duration=3 " + string(kPlainH264) + "a.ts");
+    SourceOptions options;
+    options.url = "tcp://127.0.0.1:" + std::to_string(ports_.First()) + "?listen=1";
+    auto opened = std::async(std::launch::async, [&] { return OpenSource(options, notices_, nullptr); });
+    EXPECT_LT(ClosedTime(), kLongest);
+    Send(FileBytes(Path("a.ts")));
+    const auto source = opened.get();
+    ASSERT_NE(source, nullptr);
+    EXPECT_EQ(ReadAll(*source, 20).size(), 20u);
+    EXPECT_LT(ClosedTime(), kLongest);
+    Send(FileBytes(Path("a.ts")));
+    EXPECT_EQ(ReadAll(*source, 200).size(), 200u);
+}
 
 class StoppedWaiting : public Waiting {};
 

@@ -63,6 +63,11 @@ TEST(AudioBalance, SoundStaysWithinHalfAFrameOfItsPicturesWhereverARecordingBegi
                 there[at++] = false;
             }
         }
+        // How many pictures there are in front of each.
+        std::vector<std::int64_t> before = {0};
+        for (const bool picture : there) {
+            before.push_back(before.back() + (picture ? 1 : 0));
+        }
         AudioGrid grid;
         for (std::int64_t at = 0; at < kLength; ++at) {
             if (!there[static_cast<std::size_t>(at)]) {
@@ -88,14 +93,6 @@ TEST(AudioBalance, SoundStaysWithinHalfAFrameOfItsPicturesWhereverARecordingBegi
             if (!there[static_cast<std::size_t>(first)]) {
                 continue;
             }
-            // How many pictures a recording holds in front of each time.
-            const auto counted = [&](std::int64_t time) {
-                std::int64_t count = 0;
-                for (std::int64_t at = first; at < kLength && at * kPicture < time; ++at) {
-                    count += there[static_cast<std::size_t>(at)] ? 1 : 0;
-                }
-                return count;
-            };
             AudioBalance balance;
             std::optional<std::int64_t> last;
             bool begun = false;
@@ -118,7 +115,9 @@ TEST(AudioBalance, SoundStaysWithinHalfAFrameOfItsPicturesWhereverARecordingBegi
                         const std::int64_t middle = sound.time + 512;
                         const std::int64_t at = middle / kPicture;
                         if (at < kLength && there[static_cast<std::size_t>(at)] && at >= first) {
-                            const std::int64_t picture = counted(at * kPicture) * kPicture;
+                            const std::int64_t picture = (before[static_cast<std::size_t>(at)] -
+                                                          before[static_cast<std::size_t>(first)]) *
+                                                         kPicture;
                             const std::int64_t distance =
                                 count * 1024 - picture - (sound.time - at * kPicture);
                             ASSERT_LE(std::abs(distance), 512) << "from " << first << " at " << at;

@@ -18,6 +18,10 @@ class AnnexBReader {
     /// Never empty. False at the end of the stream.
     bool Next(Bytes& nal);
 
+    /// All that stands behind the last start code found: it begins with the header byte of the next NAL unit,
+    /// whose end nobody has looked for. Empty at the end of the stream.
+    Bytes Rest() const { return position_ < stream_.size() ? stream_.subspan(position_) : Bytes(); }
+
  private:
     std::size_t FindStartCode(std::size_t from) const;
 

@@ -32,6 +32,23 @@ TEST(AnnexBReader, FindsAStartCodeAtEveryDistance) {
     }
 }
 
+TEST(AnnexBReader, ShowsWhatStandsBehindTheLastStartCode) {
+    const std::vector<unsigned char> stream = {9, 0, 0, 1, 0x67, 0x42, 0, 0, 1, 0x65, 0, 0, 1};
+    const auto rest = [](const AnnexBReader& reader) {
+        return std::vector<unsigned char>(reader.Rest().begin(), reader.Rest().end());
+    };
+    AnnexBReader reader(stream);
+    EXPECT_EQ(rest(reader), (std::vector<unsigned char>{0x67, 0x42, 0, 0, 1, 0x65, 0, 0, 1}));
+    Bytes nal;
+    ASSERT_TRUE(reader.Next(nal));
+    EXPECT_EQ(rest(reader), (std::vector<unsigned char>{0x65, 0, 0, 1}));
+    ASSERT_TRUE(reader.Next(nal));
+    EXPECT_TRUE(reader.Rest().empty());
+    EXPECT_FALSE(reader.Next(nal));
+    EXPECT_TRUE(reader.Rest().empty());
+    EXPECT_TRUE(AnnexBReader({}).Rest().empty());
+}
+
 TEST(AnnexBReader, LeavesOutTrailingZeroBytes) {
     EXPECT_EQ(Split({0, 0, 1, 0x67, 0x42, 0, 0, 0, 0, 0, 0, 1, 0x68, 0, 0, 0}),
               (Units{{0x67, 0x42}, {0x68}}));

@@ -155,21 +155,19 @@ INSTANTIATE_TEST_SUITE_P(Registry, EveryBox, testing::ValuesIn(allRows()),
                          [](const auto& box) { return BoxRows()[box.param].name; });
 GTEST_ALLOW_UNINSTANTIATED_PARAMETERIZED_TEST(EveryBox);
 
-std::string readFile(const std::filesystem::path& path) {
-    std::ifstream stream(path);
-    return {std::istreambuf_iterator<char>(stream), {}};
-}
-
 // Names of the functions that the headers of the box families declare with the given pattern.
 std::set<std::string> declaredNames(const std::string& pattern) {
     static const std::set<std::string> kShared = {"box.h", "stream.h"};  // their helpers are named alike
+    const std::regex expression("MbxStatus " + pattern + "\\(.*");
     std::set<std::string> names;
     for (const auto& entry : std::filesystem::recursive_directory_iterator(BOXLIB_SOURCE_DIR)) {
         if (entry.path().extension() != ".h" || kShared.contains(entry.path().filename())) continue;
-        const std::string text = readFile(entry.path());
-        const std::regex expression("\\nMbxStatus " + pattern + "\\(");
-        for (std::sregex_iterator i(text.begin(), text.end(), expression), end; i != end; ++i) {
-            names.insert((*i)[1]);
+        std::ifstream header(entry.path());
+        for (std::string line; std::getline(header, line);) {
+            std::smatch match;
+            if (line.starts_with("MbxStatus ") && std::regex_match(line, match, expression)) {
+                names.insert(match[1]);
+            }
         }
     }
     return names;

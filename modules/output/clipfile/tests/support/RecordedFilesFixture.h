@@ -6,6 +6,7 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
+#include <chrono>
 #include <cstddef>
 #include <cstdint>
 #include <filesystem>
@@ -13,6 +14,7 @@
 #include <iterator>
 #include <memory>
 #include <string>
+#include <thread>
 #include <vector>
 
 #include "boxlib/support/IsoReader.h"
@@ -44,6 +46,24 @@ class RecordedFilesFixture : public FileOutputFixture {
         chunks.back()->firstVideo = std::make_shared<StreamData>();
         chunks.back()->firstVideo->rtp_timestamp = number;
         output->PushChunk(chunks.back());
+    }
+
+    /// Ends the thread in order, as the base does, once it has next to nothing left to write: it is given up
+    /// after 3.5 s, which a slow machine needs for hundreds of chunks.
+    void Finish() {
+        const auto done = [this] {
+            // Up to 32 wait in a fragment, and the writer keeps the one that it wrote last. One that has
+            // failed keeps what it has not taken.
+            return std::none_of(chunks.begin(),
+                                chunks.end() - std::min<std::ptrdiff_t>(33, std::ssize(chunks)),
+                                [](const auto& chunk) { return chunk.use_count() > 1; }) ||
+                   !Statuses().empty();
+        };
+        const auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(60);
+        while (!done() && std::chrono::steady_clock::now() < deadline) {
+            std::this_thread::sleep_for(std::chrono::milliseconds(1));
+        }
+        FileOutputFixture::Finish();
     }
 
     /// Paths of all files under the output path, sorted, as "20261120/Cam/01_02_03_00.MP4".

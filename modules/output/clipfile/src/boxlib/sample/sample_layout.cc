@@ -73,12 +73,16 @@ MbxStatus MbxFreeStsz(MbxContext* context, MbxStszBox* box) {
 MbxStatus MbxChooseOffsetWidth(const MbxOptions* options, const MbxChunkOffsetList* offsets,
                                uint32_t* width) {
     if (MbxAnyNull(options, offsets, width)) return MBX_ERR_INVALID_ARG;
+    if (options->chunk_offset_mode == MBX_OFFSETS_64) {
+        *width = 8;  // whatever the offsets are
+        return MBX_OK;
+    }
     uint64_t bits = 0;
     for (const MbxBlock* block = offsets->list.first; block != nullptr; block = block->next) {
         const auto* entries = MbxBlockEntries<uint64_t>(block);
         for (uint32_t i = 0; i < block->count; i++) bits |= entries[i];
     }
-    const bool wide = options->chunk_offset_mode == MBX_OFFSETS_64 || bits > UINT32_MAX;
+    const bool wide = bits > UINT32_MAX;
     if (wide && options->chunk_offset_mode == MBX_OFFSETS_32) return MBX_ERR_BAD_STATE;
     *width = wide ? 8 : 4;
     return MBX_OK;

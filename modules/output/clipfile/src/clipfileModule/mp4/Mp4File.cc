@@ -97,6 +97,8 @@ void Mp4File::Reset() {
     m_meta_count = 0;
     m_video_duration = 0;
     m_records.clear();
+    m_chunk_bytes.reset();
+    m_chunk_capacity = 0;
 }
 
 bool Mp4File::Open(const OutputSettings& stream, const unsigned char* timecode, bool dropFrame) {

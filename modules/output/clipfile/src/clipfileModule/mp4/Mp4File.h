@@ -132,6 +132,9 @@ class Mp4File : public Mp4Muxer {
         std::string second;
     };
     std::list<FileRecord> m_records;
+    /// The bytes of a chunk on their way to the file.
+    std::unique_ptr<unsigned char[]> m_chunk_bytes;
+    std::uint64_t m_chunk_capacity = 0;
 
  private:
     using Samples = std::vector<std::shared_ptr<nal_access::SampleData>>;

@@ -98,12 +98,15 @@ MbxStatus Mp4File::writeSample(const ChunkData& chunk) {
             total += data->GetDataSize();
         }
     }
-    std::unique_ptr<unsigned char[]> buffer;
-    if (total != 0) {
-        buffer.reset(new (std::nothrow) unsigned char[total]());
+    // Not cleared, since the samples fill it, and kept: memory of that size given back at each chunk would
+    // make the allocator tidy up each time.
+    if (total > m_chunk_capacity) {
+        m_chunk_bytes.reset(new (std::nothrow) unsigned char[total]);
+        m_chunk_capacity = m_chunk_bytes != nullptr ? total : 0;
     }
+    unsigned char* const buffer = total != 0 ? m_chunk_bytes.get() : nullptr;
     if (buffer != nullptr) {
-        unsigned char* next = buffer.get();
+        unsigned char* next = buffer;
         for (const Samples* const list : lists) {
             for (const auto& data : *list) {
                 if (data->GetDataSize() != 0) {
@@ -113,7 +116,7 @@ MbxStatus Mp4File::writeSample(const ChunkData& chunk) {
             }
         }
     }
-    const MbxStatus status = writeBytes(buffer.get(), total);
+    const MbxStatus status = writeBytes(buffer, total);
     CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "write sample end.");
     return status;
 }
