@@ -199,6 +199,7 @@ Recorder::Progress Running::RecordAll(SourceInterface& source, QxModuleInterface
             changed_ = false;
             description = source.Description();
             settings.frameRate = description.frameRate;
+            settings.reordering = description.reordering;
             recovery_->Describe(description);
             // A run that is shorter than a file has one only.
             if (!options_.seconds || *options_.seconds > static_cast<double>(minutes * 60)) {

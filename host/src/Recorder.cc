@@ -194,12 +194,28 @@ void Recorder::PushFrame(const SourceUnit& unit) {
         settings_.mode == OutputMode::kOn ? PushOnlineMeta(unit, *timecode_) : PushSyncMeta(unit, *timecode_);
     packets_.clear();
     if (pushed) {
-        feed_.PushVideo(unit.time, unit.data, unit.size);
+        PushVideo(unit);
         if (settings_.followDisk) {
             feed_.WaitForDisk(KeptChunks() + kChunksAhead);
         }
     }
-    done_ = finishing_;
+    if (finishing_) {
+        // Pictures that are shown in front of that frame may be decoded behind it.
+        finishedAt_ = finishedAt_.value_or(unit.time);
+        done_ = DecodedAt(unit.time) >= *finishedAt_;
+    }
+}
+
+std::int64_t Recorder::DecodedAt(std::int64_t time) const {
+    return FrameTime(time, -static_cast<std::int64_t>(settings_.reordering));
+}
+
+void Recorder::PushVideo(const SourceUnit& unit) {
+    if (settings_.reordering == 0) {
+        feed_.PushVideo(unit.time, unit.data, unit.size);
+    } else {
+        feed_.PushReordered(DecodedAt(unit.time), unit.time + unit.later, unit.data, unit.size);
+    }
 }
 
 bool Recorder::PushOnlineMeta(const SourceUnit& unit, const Timecode& timecode) {
@@ -337,7 +353,12 @@ void Recorder::PushEndMark() {
     const std::shared_ptr<unsigned char> delimiter(new unsigned char[kDelimiter.size()],
                                                    std::default_delete<unsigned char[]>());
     std::copy(kDelimiter.begin(), kDelimiter.end(), delimiter.get());
-    feed_.PushVideo(FrameTime(lastFrame_, 1), delimiter, kDelimiter.size());
+    const std::int64_t end = FrameTime(lastFrame_, 1);
+    if (settings_.reordering == 0) {
+        feed_.PushVideo(end, delimiter, kDelimiter.size());
+    } else {
+        feed_.PushReordered(end, end, delimiter, kDelimiter.size());
+    }
 }
 
 void Recorder::NoteChange(bool begins, const Timecode& at) {

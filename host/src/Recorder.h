@@ -62,6 +62,8 @@ class Recorder {
     struct Settings {
         OutputMode mode = OutputMode::kSync;
         FrameRate frameRate;
+        /// As in `SourceDescription`.
+        std::uint32_t reordering = 0;
         /// Address of the first frame where the source has none; time of day when not set.
         std::optional<Timecode> timecode;
         bool dropFrame = true;
@@ -153,6 +155,9 @@ class Recorder {
     void NoteChange(bool begins, const Timecode& at);
     /// The address behind that of the last frame.
     Timecode NextAddress() const;
+    void PushVideo(const SourceUnit& unit);
+    /// When a picture is decoded whose turn it is to be shown at `time`.
+    std::int64_t DecodedAt(std::int64_t time) const;
     /// Silence behind the audio of a recording that ends in front of a gap. The module counts the frames of
     /// audio that its pictures need, which may be one more than there are, and looks at the one behind.
     void PushSilentEnd();
@@ -193,6 +198,8 @@ class Recorder {
     bool endedByGap_ = false;
     std::vector<SourceUnit> rest_;
     bool finishing_ = false;
+    /// The first frame that is not recorded any more.
+    std::optional<std::int64_t> finishedAt_;
     bool done_ = false;
     /// In mode on: the module records.
     bool online_ = false;

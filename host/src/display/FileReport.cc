@@ -88,12 +88,14 @@ void ReadFragments(AVFormatContext& context, AVStream& video, RecordedFile& file
     }
     const int count = avformat_index_get_entries_count(&video);
     if (count > 0) {
+        // Reordered pictures are decoded from before 0 on.
+        const std::int64_t first = avformat_index_get_entry(&video, 0)->timestamp;
         const std::int64_t last = avformat_index_get_entry(&video, count - 1)->timestamp;
         // The demuxer does not tell how long the last frame lasts: as long as the one before it.
         const std::int64_t before =
             count > 1 ? avformat_index_get_entry(&video, count - 2)->timestamp : last - duration;
         file.frames = static_cast<std::uint64_t>(count);
-        file.seconds = Seconds(last + last - before, video);
+        file.seconds = Seconds(last + last - before - first, video);
     }
 }
 

@@ -14,12 +14,15 @@ namespace receiver {
 struct CodedPicture {
     std::shared_ptr<unsigned char> data;
     std::size_t size = 0;
+    /// Where it stands among the pictures in the order in which they come: an IDR frame when it is shown.
     /// Ticks of 90000 a second, on the line of the source.
     std::int64_t time = 0;
     /// An IDR frame.
     bool keyFrame = false;
     /// What the picture itself tells of its address.
     std::optional<Timecode> timecode;
+    /// How much later than at `time` it is shown; below 0, earlier. 0 where pictures come as they are shown.
+    std::int64_t later = 0;
 };
 
 /// A coded audio frame: AAC LC, 48 kHz, stereo, 1024 samples, with its ADTS header.

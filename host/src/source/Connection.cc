@@ -39,7 +39,7 @@ Connection::Connection(std::unique_ptr<Input> input, const SourceOptions& option
     AVFormatContext& format = input_->Format();
     paths_ = DecidePaths(format, *format.streams[video_->index], audio_, ahead_.packets, options, before);
     notices_.insert(notices_.end(), paths_.notices.begin(), paths_.notices.end());
-    watch_.emplace(video_->codecpar->codec_id, paths_.description.frameRate, paths_.passes);
+    watch_.emplace(video_->codecpar->codec_id, paths_.description.frameRate, paths_.passes, Reordered());
     clock_.emplace(*video_, audio_, input_->Recorded());
     steps_.emplace(*clock_);
     ReadTimecodeTag();
@@ -269,6 +269,9 @@ bool Connection::Start(const AVPacket& packet, std::optional<std::int64_t> stamp
     }
     clock_->Begin(begin_, [this](const std::string& sentence) { assembler_->AddNotice(sentence); });
     clock_->Anchor(*stamp, delay_.value_or(0));
+    if (Reordered()) {
+        startDelay_ = DelayOf(packet).value_or(paths_.description.reordering * assembler_->Grid().Period());
+    }
     return true;
 }
 
@@ -278,7 +281,9 @@ void Connection::HandleVideo(AVPacket& packet) {
         firstVideoStamp_ = stamp;
     }
     const auto delay = DelayOf(packet);
-    watch_->Look({packet.data, static_cast<std::size_t>(packet.size)}, stamp, delay);
+    watch_->Look({packet.data, static_cast<std::size_t>(packet.size)},
+                 Reordered() && stamp && delay ? std::optional(*stamp - *delay) : stamp, delay,
+                 (packet.flags & AV_PKT_FLAG_KEY) != 0);
     const bool delaysKnown = delay && delay_;
     delay_ = delay && !paths_.passes ? delay : delay_;
     Packets early;
@@ -292,7 +297,21 @@ void Connection::HandleVideo(AVPacket& packet) {
     const auto sound = std::stable_partition(early.begin(), early.end(),
                                              [this](const auto& waiting) { return !IsOf(*waiting, audio_); });
     std::for_each(early.begin(), sound, [this](const auto& waiting) { HandleKlv(*waiting); });
-    if (paths_.passes) {
+    PlacePicture(packet, stamp, delay, delaysKnown);
+    paths_.video->Push(packet, ToPictures());
+    std::for_each(sound, early.end(), [this](const auto& waiting) { HandleAudio(*waiting, true); });
+}
+
+void Connection::PlacePicture(AVPacket& packet, std::optional<std::int64_t> stamp,
+                              std::optional<std::int64_t> delay, bool delaysKnown) {
+    packet.dts = AV_NOPTS_VALUE;
+    if (Reordered()) {
+        // Each in its turn, as if all waited for being shown as long as the first one.
+        const std::int64_t later = delay ? *delay - startDelay_ : 0;
+        const auto turn = stamp ? std::optional(*stamp - later) : std::nullopt;
+        packet.dts = clock_->VideoTime(turn, assembler_->Grid());
+        packet.pts = packet.dts + later;
+    } else if (paths_.passes) {
         packet.pts = clock_->VideoTime(stamp, assembler_->Grid());
     } else {
         // What is decoded in another order than it is shown in still comes in the order of its decoding.
@@ -300,9 +319,6 @@ void Connection::HandleVideo(AVPacket& packet) {
         const auto decoded = stamp ? std::optional(*stamp - later) : std::nullopt;
         packet.pts = clock_->VideoTime(decoded, assembler_->Grid().Period(), !delaysKnown) + later;
     }
-    packet.dts = AV_NOPTS_VALUE;
-    paths_.video->Push(packet, ToPictures());
-    std::for_each(sound, early.end(), [this](const auto& waiting) { HandleAudio(*waiting, true); });
 }
 
 void Connection::HandleAudio(AVPacket& packet, bool waited) {

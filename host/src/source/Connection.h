@@ -92,6 +92,11 @@ class Connection {
     std::int64_t SinceFirst(std::int64_t stamp) const;
     static bool IsOf(const AVPacket& packet, const AVStream* stream);
     StreamClock::Track* KlvTrackOf(const AVPacket& packet);
+    /// The pictures are recorded as they come, which is not the order in which they are shown.
+    bool Reordered() const { return paths_.passes && paths_.description.reordering > 0; }
+    /// Gives the picture its place on the line, stamped and delayed so, where these are known.
+    void PlacePicture(AVPacket& packet, std::optional<std::int64_t> stamp, std::optional<std::int64_t> delay,
+                      bool delaysKnown);
     /// How much later a picture is shown than decoded, where the source itself tells.
     std::optional<std::int64_t> DelayOf(const AVPacket& packet) const;
     PictureSink ToPictures();
@@ -121,6 +126,8 @@ class Connection {
     std::optional<std::int64_t> firstVideoStamp_;
     /// Of the last picture of which it is known. Only where pictures are converted.
     std::optional<std::int64_t> delay_;
+    /// Of the first IDR frame, where pictures come reordered and are recorded so.
+    std::int64_t startDelay_ = 0;
     std::optional<Timecode> tag_;
     std::uint64_t damaged_ = 0;
     std::uint64_t earlyPictures_ = 0;

@@ -21,6 +21,12 @@ constexpr int kStepsBack = 3;
 constexpr int kDelayed = 2;
 constexpr int kReorderDepth = 16;
 
+/// More than there are pictures in front of one that they all need.
+constexpr int kStraight = 2 * kReorderDepth;
+
+constexpr const char* kInOrder = "the video ends to send its pictures reordered (B frames)";
+constexpr const char* kReorderedOtherwise =
+    "the order changed in which the video sends its pictures (B frames)";
 constexpr const char* kReordered = "the video begins to send its pictures reordered (B frames)";
 
 /// First bytes of the parameter sets of HEVC (ITU-T H.265 7.3.1.2, types 32, 33 and 34). In H.264 they would
@@ -46,13 +52,14 @@ AVCodecID CodecOf(std::span<const unsigned char> picture) {
 
 }  // namespace
 
-FormatWatch::FormatWatch(AVCodecID codec, const FrameRate& rate, bool untouched)
+FormatWatch::FormatWatch(AVCodecID codec, const FrameRate& rate, bool untouched, bool reordered)
     : codec_(codec),
       untouched_(untouched),
+      reordered_(reordered),
       period_(std::int64_t{90000} * rate.denominator / std::max<std::int64_t>(1, rate.numerator)) {}
 
 void FormatWatch::Look(std::span<const unsigned char> picture, std::optional<std::int64_t> stamp,
-                       std::optional<std::int64_t> delay) {
+                       std::optional<std::int64_t> delay, bool keyFrame) {
     if (codec_ == AV_CODEC_ID_H264 || codec_ == AV_CODEC_ID_HEVC) {
         const AVCodecID now = CodecOf(picture);
         if (now != AV_CODEC_ID_NONE && now != codec_) {
@@ -63,11 +70,15 @@ void FormatWatch::Look(std::span<const unsigned char> picture, std::optional<std
     if (!untouched_ || !stamp) {
         return;
     }
-    if (delay) {
+    if (delay && reordered_) {
+        LookAtReordering(*delay, keyFrame);
+    } else if (delay) {
         LookAtDelay(*delay);
     }
     if (stamp_) {
-        LookAtOrder(*stamp - *stamp_);
+        if (!reordered_) {
+            LookAtOrder(*stamp - *stamp_);
+        }
         LookAtRate(*stamp - *stamp_);
     }
     stamp_ = stamp;
@@ -82,6 +93,20 @@ void FormatWatch::LookAtDelay(std::int64_t delay) {
     }
     delayed_ = 0;
     delay_ = delay;
+}
+
+void FormatWatch::LookAtReordering(std::int64_t delay, bool keyFrame) {
+    if (keyFrame) {
+        // All pictures would stand elsewhere, beside their sound.
+        if (delay_ && std::abs(delay - *delay_) > period_ / 2) {
+            throw FormatChanged(kReorderedOtherwise);
+        }
+        delay_ = delay;
+    }
+    straight_ = std::abs(delay) <= period_ / 2 ? straight_ + 1 : 0;
+    if (straight_ >= kStraight) {
+        throw FormatChanged(kInOrder);
+    }
 }
 
 void FormatWatch::LookAtOrder(std::int64_t step) {

@@ -20,31 +20,36 @@ class FormatChanged : public std::runtime_error {
 inline constexpr const char* kRateChanged = "the frame rate of the video changed";
 
 /// Watches the video of a connection for what neither its container nor its decoder tells: another codec,
-/// another frame rate, pictures that begin to be sent in another order than they are shown in.
+/// another frame rate, pictures that begin or end to be sent in another order than they are shown in.
 class FormatWatch {
  public:
     /// `rate` is the present one. `untouched`: the pictures are recorded as they come, so that rate and order
-    /// matter.
-    FormatWatch(AVCodecID codec, const FrameRate& rate, bool untouched);
+    /// matter. `reordered`: they do not come in the order in which they are shown.
+    FormatWatch(AVCodecID codec, const FrameRate& rate, bool untouched, bool reordered = false);
 
     /// A picture with its stamp, in ticks of 90000, and with how much later it is shown than decoded, where
-    /// these are known. Throws `FormatChanged`.
+    /// these are known. The stamp tells when it is shown, of reordered pictures when it is decoded.
+    /// `keyFrame`: decoding can begin with it. Throws `FormatChanged`.
     void Look(std::span<const unsigned char> picture, std::optional<std::int64_t> stamp,
-              std::optional<std::int64_t> delay);
+              std::optional<std::int64_t> delay, bool keyFrame = false);
 
  private:
+    void LookAtReordering(std::int64_t delay, bool keyFrame);
     void LookAtDelay(std::int64_t delay);
     void LookAtOrder(std::int64_t step);
     void LookAtRate(std::int64_t step);
 
     const AVCodecID codec_;
     const bool untouched_;
+    const bool reordered_;
     /// Ticks of a picture.
     const std::int64_t period_;
     std::optional<std::int64_t> stamp_;
     /// The last one that was as usual, and how many pictures in a row were not.
     std::optional<std::int64_t> delay_;
     int delayed_ = 0;
+    /// Reordered pictures in a row that were shown when they were decoded.
+    int straight_ = 0;
     /// Pictures since the last one that was stamped in front of another, and how many such came close
     /// together.
     int forward_ = 0;

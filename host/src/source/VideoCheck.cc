@@ -4,6 +4,7 @@
 #include <array>
 #include <cmath>
 #include <cstdio>
+#include <string_view>
 #include <vector>
 
 #include "common/ReceiverError.h"
@@ -16,6 +17,7 @@ namespace {
 struct Stamps {
     std::int64_t shown = 0;
     std::optional<std::int64_t> decoded;
+    bool keyFrame = false;
 };
 
 std::vector<Stamps> StampsOf(const AVStream& stream, const std::deque<libav::Owner<AVPacket>>& packets) {
@@ -24,8 +26,9 @@ std::vector<Stamps> StampsOf(const AVStream& stream, const std::deque<libav::Own
         // What is damaged may have the stamps of another picture.
         const bool whole = (packet->flags & AV_PKT_FLAG_CORRUPT) == 0;
         if (packet->stream_index == stream.index && packet->pts != AV_NOPTS_VALUE && whole) {
-            stamps.push_back(
-                {packet->pts, packet->dts == AV_NOPTS_VALUE ? std::optional<std::int64_t>() : packet->dts});
+            stamps.push_back({packet->pts,
+                              packet->dts == AV_NOPTS_VALUE ? std::optional<std::int64_t>() : packet->dts,
+                              (packet->flags & AV_PKT_FLAG_KEY) != 0});
         }
     }
     return stamps;
@@ -67,6 +70,21 @@ bool Reordered(const AVStream& stream, const std::vector<Stamps>& stamps) {
     }
     // The encoder announces reordering and stamps for it, though it has not come to it yet.
     return delay && *delay > 0 && stream.codecpar->video_delay > 0;
+}
+
+/// RTP and Matroska stamp pictures with the time when they are shown, and nothing else.
+bool TellsDecoding(const AVFormatContext& format) {
+    const std::string_view name = format.iformat->name;
+    return name != "sdp" && name != "rtsp" && name != "rtp" && name != "matroska,webm";
+}
+
+std::optional<std::int64_t> DelayOfStart(const AVStream& stream, const std::vector<Stamps>& stamps) {
+    const auto found = std::find_if(stamps.begin(), stamps.end(), [](const Stamps& stamp) {
+        return stamp.keyFrame && stamp.decoded && *stamp.decoded < stamp.shown;
+    });
+    return found != stamps.end()
+               ? std::optional(av_rescale_q(found->shown - *found->decoded, stream.time_base, {1, 90000}))
+               : std::nullopt;
 }
 
 /// The mean distance between pictures in seconds. There must be two.
@@ -113,6 +131,9 @@ VideoFindings CheckVideo(AVFormatContext& format, AVStream& stream,
     VideoFindings findings;
     const std::vector<Stamps> stamps = StampsOf(stream, packets);
     findings.reordered = Reordered(stream, stamps);
+    if (findings.reordered && TellsDecoding(format)) {
+        findings.delay = DelayOfStart(stream, stamps);
+    }
     AVRational pictureRate{0, 1};
     if (stream.codecpar->codec_id == AV_CODEC_ID_H264) {
         PictureParser parser(*stream.codecpar);
@@ -172,7 +193,7 @@ std::string WhyNotPassed(const AVCodecParameters& parameters, const VideoFinding
     if (findings.fields) {
         return "the video is interlaced with single fields: set the encoder to progressive pictures";
     }
-    if (findings.reordered) {
+    if (findings.reordered && !findings.delay) {
         return "the video has reordered pictures (B frames): set the encoder to no B frames";
     }
     if (!findings.rate) {

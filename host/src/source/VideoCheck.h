@@ -17,6 +17,9 @@ struct VideoFindings {
     AVRational toldRate{0, 1};
     /// Pictures are sent in another order than they are shown in.
     bool reordered = false;
+    /// Of these: how much later than it is decoded a picture is shown that decoding can begin with, in ticks
+    /// of 90000. Nothing where the source does not tell when pictures are decoded.
+    std::optional<std::int64_t> delay;
     /// Pictures are interlaced frames.
     bool interlaced = false;
     /// Packets hold single fields.

@@ -81,7 +81,8 @@ void VideoPass::Push(const AVPacket& packet, const PictureSink& sink) {
     const bool marked = (packet.flags & AV_PKT_FLAG_KEY) != 0;
     const auto units = marked ? NalUnits(bytes) : LeadingNalUnits(bytes);
     CodedPicture picture;
-    picture.time = packet.pts;
+    picture.time = packet.dts != AV_NOPTS_VALUE ? packet.dts : packet.pts;
+    picture.later = packet.pts - picture.time;
     picture.keyFrame = Contains(units, kNalIdr);
     CheckParameterSets(units);
     sets_.Learn(units);

@@ -250,9 +250,34 @@ INSTANTIATE_TEST_SUITE_P(
                     Conversion{"latm", " -c:a aac -ar 48000 -ac 2 -mpegts_flags +latm a.ts",
                                "audio is converted: AAC_LATM LC 48 kHz stereo"}));
 
-TEST_F(FileSource, ReorderedPicturesAreRefused) {
-    Ffmpeg(string(kPicture) + " -pix_fmt yuv420p -c:v libx264 -preset ultrafast -bf 2 a.ts");
-    const auto error = Refusal(Fast("a.ts"));
+/// Files of reordered pictures, by their extension.
+class ReorderedFile : public SourceTest, public testing::WithParamInterface<const char*> {};
+
+TEST_P(ReorderedFile, ComesInTheOrderOfDecodingWithTheTimesAtWhichPicturesAreShown) {
+    const string file = string("a.") + GetParam();
+    Ffmpeg(string(kPicture) + kTone +
+           " -pix_fmt yuv420p -c:v libx264 -preset ultrafast -g 12"
+           " -x264-params bframes=3:b-pyramid=normal:b-adapt=0:scenecut=0:open-gop=0 " +
+           kPlainAac + file);
+    const auto source = OpenSource(Fast(file), notices_, nullptr);
+    EXPECT_EQ(source->Description().reordering, 2u);
+    const auto video = Of(Medium::kVideo, ReadAll(*source));
+    ASSERT_EQ(video.size(), 25u);
+    // A group of 12: I0 P4 B2 b1 b3, P8 B6 b5 b7, P11 b9 b10.
+    constexpr std::int64_t kShown[] = {0, 4, 2, 1, 3, 8, 6, 5, 7, 11, 9, 10};
+    for (std::int64_t i = 0; i < 24; ++i) {
+        const SourceUnit& unit = video[static_cast<std::size_t>(i)];
+        EXPECT_EQ(unit.time, i * 3600);
+        EXPECT_EQ(unit.time + unit.later, (i / 12 * 12 + kShown[i % 12]) * 3600) << i;
+        EXPECT_EQ(unit.keyFrame, i % 12 == 0);
+    }
+}
+
+INSTANTIATE_TEST_SUITE_P(Containers, ReorderedFile, testing::Values("ts", "mp4", "flv"));
+
+TEST_F(FileSource, ReorderedPicturesAreRefusedWhereNothingTellsWhenTheyAreDecoded) {
+    Ffmpeg(string(kPicture) + " -pix_fmt yuv420p -c:v libx264 -preset ultrafast -bf 2 a.mkv");
+    const auto error = Refusal(Fast("a.mkv"));
     EXPECT_EQ(error.Code(), ExitCode::kSourceUnsuitable);
     EXPECT_STREQ(
         error.what(),
@@ -374,11 +399,10 @@ TEST_P(Transcode, MakesPlainH264OfAnything) {
 
 INSTANTIATE_TEST_SUITE_P(
     All, Transcode,
-    testing::Values(
-        VideoConversion{"B frames", " -pix_fmt yuv420p -c:v libx264 -preset ultrafast -bf 2 ", "a.ts"},
-        VideoConversion{"MPEG-2", " -c:v mpeg2video -b:v 2M ", "a.ts"},
-        VideoConversion{"MPEG-4 with B frames in MP4", " -c:v mpeg4 -bf 2 -b:v 2M ", "a.mp4"},
-        VideoConversion{"HEVC",
+    testing::Values(VideoConversion{"MPEG-2", " -c:v mpeg2video -b:v 2M ", "a.ts"},
+                    VideoConversion{"MPEG-4 with B frames in MP4", " -c:v mpeg4 -bf 2 -b:v 2M ", "a.mp4"},
+                    VideoConversion{
+                        "HEVC",
                         " -pix_fmt yuv420p -c:v libx265 -preset ultrafast -x265-params log-level=none ",
                         "a.ts"}));
 

@@ -165,7 +165,7 @@ INSTANTIATE_TEST_SUITE_P(
                     Change{"reordered", Plain("128x96", "25"),
                            Picture("128x96", "25") + Tone(48000) + H264("-bf 2") + kPlainAac,
                            "the video begins to send its pictures reordered (B frames)",
-                           "H.264 128x96 25 fps, AAC LC 48 kHz stereo", 13, true},
+                           "H.264 Main 128x96 25 fps, AAC LC 48 kHz stereo", 13},
                     Change{"HEVC", Plain("128x96", "25"),
                            Picture("128x96", "25") + Tone(48000) +
                                "-pix_fmt yuv420p -c:v libx265 -preset ultrafast -x265-params "

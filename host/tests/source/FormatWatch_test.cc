@@ -33,5 +33,39 @@ TEST(FormatWatch, PicturesThatAreShownLaterBehindTheirDecodingAreReordered) {
               "the video begins to send its pictures reordered (B frames)");
 }
 
+/// Pictures that come reordered, an IDR frame each eighth; 0 to 3 pictures later than decoded.
+std::string ChangeOfReordered(const std::vector<std::int64_t>& delays) {
+    FormatWatch watch(AV_CODEC_ID_H264, *NearestFrameRate(25, 1), true, true);
+    std::int64_t decoded = 0;
+    try {
+        for (std::size_t at = 0; at < delays.size(); ++at, decoded += kPeriod) {
+            watch.Look({}, decoded, delays[at] * kPeriod, at % 8 == 0);
+        }
+    } catch (const FormatChanged& change) {
+        return change.what();
+    }
+    return "";
+}
+
+TEST(FormatWatch, PicturesThatAreKnownToBeReorderedMayStayInOrderForAWhile) {
+    std::vector<std::int64_t> delays;
+    for (int group = 0; group < 8; ++group) {
+        delays.insert(delays.end(), {1, 3, 0, 0, 3, 0, 0, 1});
+    }
+    EXPECT_EQ(ChangeOfReordered(delays), "");
+    // 16 pictures may stand in front of one that they all need.
+    EXPECT_EQ(ChangeOfReordered(std::vector<std::int64_t>(31, 0)), "");
+}
+
+TEST(FormatWatch, PicturesThatAreAllShownWhenTheyAreDecodedAreReorderedNoMore) {
+    EXPECT_EQ(ChangeOfReordered(std::vector<std::int64_t>(32, 0)),
+              "the video ends to send its pictures reordered (B frames)");
+}
+
+TEST(FormatWatch, AnIdrFrameThatWaitsLongerThanThoseBeforeBeginsAnotherOrder) {
+    EXPECT_EQ(ChangeOfReordered({1, 3, 0, 0, 3, 0, 0, 1, 2, 4}),
+              "the order changed in which the video sends its pictures (B frames)");
+}
+
 }  // namespace
 }  // namespace receiver
