@@ -177,6 +177,7 @@ void Recorder::PushFrame(const SourceUnit& unit) {
     } else if (unit.time - lastFrame_ > kLongestStep) {
         // The module does not notice what is missing: it counts units, so its media would drift apart and the
         // timecode of the file would be wrong behind the gap.
+        turns_.clear();
         DropPackets(unit.time - Period(settings_.frameRate));
         EndBeforeGap();
         if (endedByGap_) {
@@ -186,6 +187,7 @@ void Recorder::PushFrame(const SourceUnit& unit) {
     }
     PutHeldAudio();
     lastFrame_ = unit.time;
+    decodedAt_ = DecodingTimeOf(unit.time);
     if (settings_.length && Elapsed() >= *settings_.length) {
         Finish();
     }
@@ -202,19 +204,27 @@ void Recorder::PushFrame(const SourceUnit& unit) {
     if (finishing_) {
         // Pictures that are shown in front of that frame may be decoded behind it.
         finishedAt_ = finishedAt_.value_or(unit.time);
-        done_ = DecodedAt(unit.time) >= *finishedAt_;
+        done_ = decodedAt_ >= *finishedAt_;
     }
 }
 
-std::int64_t Recorder::DecodedAt(std::int64_t time) const {
-    return FrameTime(time, -static_cast<std::int64_t>(settings_.reordering));
+std::int64_t Recorder::DecodingTimeOf(std::int64_t time) {
+    if (turns_.empty()) {
+        for (std::int64_t ahead = settings_.reordering; ahead > 0; --ahead) {
+            turns_.push_back(FrameTime(time, -ahead));
+        }
+    }
+    turns_.push_back(time);
+    const std::int64_t decoded = turns_.front();
+    turns_.pop_front();
+    return decoded;
 }
 
 void Recorder::PushVideo(const SourceUnit& unit) {
     if (settings_.reordering == 0) {
         feed_.PushVideo(unit.time, unit.data, unit.size);
     } else {
-        feed_.PushReordered(DecodedAt(unit.time), unit.time + unit.later, unit.data, unit.size);
+        feed_.PushReordered(decodedAt_, unit.time + unit.later, unit.data, unit.size);
     }
 }
 

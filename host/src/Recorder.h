@@ -2,6 +2,7 @@
 
 #include <chrono>
 #include <cstdint>
+#include <deque>
 #include <functional>
 #include <optional>
 #include <vector>
@@ -156,8 +157,9 @@ class Recorder {
     /// The address behind that of the last frame.
     Timecode NextAddress() const;
     void PushVideo(const SourceUnit& unit);
-    /// When a picture is decoded whose turn it is to be shown at `time`.
-    std::int64_t DecodedAt(std::int64_t time) const;
+    /// When the next picture is decoded, whose turn it is at `time`: as many turns earlier as pictures may be
+    /// decoded ahead, so that none is shown before its decoding, whatever is missing.
+    std::int64_t DecodingTimeOf(std::int64_t time);
     /// Silence behind the audio of a recording that ends in front of a gap. The module counts the frames of
     /// audio that its pictures need, which may be one more than there are, and looks at the one behind.
     void PushSilentEnd();
@@ -190,6 +192,10 @@ class Recorder {
     std::int64_t lastFrame_ = 0;
     /// That went to the module.
     std::optional<SourceUnit> lastAudio_;
+    /// Turns of the last pictures, as many as may be decoded ahead. None behind a gap.
+    std::deque<std::int64_t> turns_;
+    /// When the last frame is decoded.
+    std::int64_t decodedAt_ = 0;
     AudioBalance balance_;
     /// Stands so far behind the last frame that the next one tells whether a gap lies between.
     std::vector<SourceUnit> heldAudio_;

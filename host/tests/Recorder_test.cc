@@ -181,6 +181,24 @@ TEST_F(RecorderTest, ReorderedPicturesAreDecodedAheadOfTheirTurnAndCountByIt) {
     EXPECT_THAT(module_.shown, ElementsAre(0, 4, 2, 1, 3, 8));
 }
 
+TEST_F(RecorderTest, WhereAReorderedPictureIsMissingNoneIsShownBeforeItsDecoding) {
+    Recorder::Settings settings = Sync();
+    settings.reordering = 2;
+    Make(settings);
+    PutLateAudio();
+    // I0 P4 B2 b1 b3, P8 B6 b5 without b1: each has the turn of the next one that is shown.
+    const std::pair<std::int64_t, std::int64_t> pictures[] = {{0, 0}, {2, 4}, {3, 2}, {4, 3},
+                                                              {5, 8}, {6, 6}, {7, 5}};
+    for (const auto& [turn, shown] : pictures) {
+        SourceUnit frame = MakeFrame(turn * 3600, turn == 0, static_cast<std::uint32_t>(turn));
+        frame.later = (shown - turn) * 3600;
+        recorder_->Put(std::move(frame));
+    }
+    EXPECT_THAT(module_.calls, ElementsAre("M0", "v-7200", "M2", "v-3600", "M3", "v0", "M4", "v2", "M5", "v3",
+                                           "M6", "v4", "M7", "v5"));
+    EXPECT_THAT(module_.shown, ElementsAre(0, 4, 2, 3, 8, 6, 5));
+}
+
 TEST_F(RecorderTest, TimeOfDayIsThatAtWhichTheFirstFrameArrived) {
     Recorder::Settings settings = Sync();
     settings.timecode.reset();

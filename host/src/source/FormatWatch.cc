@@ -7,6 +7,7 @@
 #include <vector>
 
 #include "source/AnnexB.h"
+#include "source/CodedUnits.h"
 
 namespace receiver {
 namespace {
@@ -19,12 +20,12 @@ constexpr int kStepsBack = 3;
 /// Pictures in a row, shown by more or less behind their decoding than those before, that are more than a
 /// damaged stamp.
 constexpr int kDelayed = 2;
-constexpr int kReorderDepth = 16;
+constexpr int kReorderDepth = kMostReorderFrames;
 
 /// More than there are pictures in front of one that they all need.
 constexpr int kStraight = 2 * kReorderDepth;
 
-constexpr const char* kInOrder = "the video ends to send its pictures reordered (B frames)";
+constexpr const char* kInOrder = "the video no longer sends its pictures reordered (B frames)";
 constexpr const char* kReorderedOtherwise =
     "the order changed in which the video sends its pictures (B frames)";
 constexpr const char* kReordered = "the video begins to send its pictures reordered (B frames)";
@@ -59,7 +60,7 @@ FormatWatch::FormatWatch(AVCodecID codec, const FrameRate& rate, bool untouched,
       period_(std::int64_t{90000} * rate.denominator / std::max<std::int64_t>(1, rate.numerator)) {}
 
 void FormatWatch::Look(std::span<const unsigned char> picture, std::optional<std::int64_t> stamp,
-                       std::optional<std::int64_t> delay, bool keyFrame) {
+                       std::optional<std::int64_t> delay) {
     if (codec_ == AV_CODEC_ID_H264 || codec_ == AV_CODEC_ID_HEVC) {
         const AVCodecID now = CodecOf(picture);
         if (now != AV_CODEC_ID_NONE && now != codec_) {
@@ -70,9 +71,7 @@ void FormatWatch::Look(std::span<const unsigned char> picture, std::optional<std
     if (!untouched_ || !stamp) {
         return;
     }
-    if (delay && reordered_) {
-        LookAtReordering(*delay, keyFrame);
-    } else if (delay) {
+    if (delay && !reordered_) {
         LookAtDelay(*delay);
     }
     if (stamp_) {
@@ -95,15 +94,19 @@ void FormatWatch::LookAtDelay(std::int64_t delay) {
     delay_ = delay;
 }
 
-void FormatWatch::LookAtReordering(std::int64_t delay, bool keyFrame) {
-    if (keyFrame) {
-        // All pictures would stand elsewhere, beside their sound.
-        if (delay_ && std::abs(delay - *delay_) > period_ / 2) {
+void FormatWatch::LookAtReordering(std::optional<std::int64_t> delay, bool late) {
+    if (late) {
+        // A single one has a damaged stamp.
+        if (sinceLate_ && *sinceLate_ < kReorderDepth) {
             throw FormatChanged(kReorderedOtherwise);
         }
-        delay_ = delay;
+        sinceLate_ = 0;
+    } else if (sinceLate_) {
+        ++*sinceLate_;
     }
-    straight_ = std::abs(delay) <= period_ / 2 ? straight_ + 1 : 0;
+    if (delay) {
+        straight_ = std::abs(*delay) <= period_ / 2 ? straight_ + 1 : 0;
+    }
     if (straight_ >= kStraight) {
         throw FormatChanged(kInOrder);
     }

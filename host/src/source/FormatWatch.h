@@ -28,13 +28,15 @@ class FormatWatch {
     FormatWatch(AVCodecID codec, const FrameRate& rate, bool untouched, bool reordered = false);
 
     /// A picture with its stamp, in ticks of 90000, and with how much later it is shown than decoded, where
-    /// these are known. The stamp tells when it is shown, of reordered pictures when it is decoded.
-    /// `keyFrame`: decoding can begin with it. Throws `FormatChanged`.
+    /// these are known. The stamp tells when it is shown, of reordered pictures when it is its turn. Throws
+    /// `FormatChanged`.
     void Look(std::span<const unsigned char> picture, std::optional<std::int64_t> stamp,
-              std::optional<std::int64_t> delay, bool keyFrame = false);
+              std::optional<std::int64_t> delay);
+    /// A picture of those that come reordered, shown so much later than decoded, where the source tells.
+    /// `late`: more pictures than were thought were decoded in front of it. Throws `FormatChanged`.
+    void LookAtReordering(std::optional<std::int64_t> delay, bool late);
 
  private:
-    void LookAtReordering(std::int64_t delay, bool keyFrame);
     void LookAtDelay(std::int64_t delay);
     void LookAtOrder(std::int64_t step);
     void LookAtRate(std::int64_t step);
@@ -50,6 +52,8 @@ class FormatWatch {
     int delayed_ = 0;
     /// Reordered pictures in a row that were shown when they were decoded.
     int straight_ = 0;
+    /// Since the last one that was late.
+    std::optional<int> sinceLate_;
     /// Pictures since the last one that was stamped in front of another, and how many such came close
     /// together.
     int forward_ = 0;

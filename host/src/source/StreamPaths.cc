@@ -10,7 +10,6 @@
 #include "source/VideoCheck.h"
 #include "source/VideoConverter.h"
 #include "source/VideoPass.h"
-#include "timing/FrameGrid.h"
 
 namespace receiver {
 namespace {
@@ -41,10 +40,6 @@ SourceDescription Describe(const AVFormatContext& format, const AVCodecParameter
     const std::int64_t bitrate =
         parameters.bit_rate != 0 ? parameters.bit_rate : std::max<std::int64_t>(0, format.bit_rate);
     description.bitrate = static_cast<std::uint32_t>(bitrate / 1000);
-    if (findings.rate && findings.delay) {
-        const std::int64_t frames = FrameGrid(*findings.rate).FramesIn(*findings.delay);
-        description.reordering = static_cast<std::uint32_t>(std::max<std::int64_t>(1, frames));
-    }
     return description;
 }
 
@@ -135,6 +130,7 @@ void DecideVideo(AVFormatContext& format, AVStream& stream, const Packets& ahead
                                                 : "the video is interlaced and becomes progressive");
     }
     if (paths.passes) {
+        description.reordering = ReorderDepth(findings, parameters, pass->ReorderFrames());
         paths.video = std::move(pass);
         description.summary = VideoSummary(H264With(parameters), description);
     } else {

@@ -21,6 +21,8 @@ class VideoPass final : public VideoPathInterface {
     void Push(const AVPacket& packet, const PictureSink& sink) override;
     void Finish(const PictureSink& sink) override;
     std::uint64_t Damaged() const override { return damaged_; }
+    /// As `PictureTiming` tells.
+    std::optional<std::uint32_t> ReorderFrames() const { return timing_.ReorderFrames(); }
 
  private:
     /// Throws `FormatChanged`.

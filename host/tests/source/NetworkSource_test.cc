@@ -151,6 +151,28 @@ TEST_F(NetworkSource, RtpBySessionDescriptionComesWhole) {
     EXPECT_EQ(source->Counts().lostFrames, 0u);
 }
 
+TEST_F(NetworkSource, ReorderedPicturesByRtpHaveTheirTurns) {
+    Ffmpeg(string(" -f lavfi -i testsrc2=size=128x96:rate=25:duration=3"
+                  " -f lavfi -i sine=frequency=500:sample_rate=48000:duration=3 -pix_fmt yuv420p -c:v "
+                  "libx264 -preset ultrafast -g 12"
+                  " -x264-params bframes=3:b-pyramid=normal:b-adapt=0:scenecut=0:open-gop=0 ") +
+           kPlainAac + "a.mp4");
+    endtoend::WriteSessionDescription(Path("a.mp4"), ports_, Path("a.sdp"));
+    const auto source = OpenAndSend(Live(Path("a.sdp")), ports_.First(),
+                                    [&] { return endtoend::SendRtp(Path("a.mp4"), ports_); });
+    EXPECT_EQ(source->Description().reordering, 2u);
+    const auto video = Of(Medium::kVideo, ReadPictures(*source, 36));
+    ASSERT_EQ(video.size(), 36u);
+    // A group of 12: I0 P4 B2 b1 b3, P8 B6 b5 b7, P11 b9 b10.
+    constexpr std::int64_t kShown[] = {0, 4, 2, 1, 3, 8, 6, 5, 7, 11, 9, 10};
+    for (std::int64_t i = 0; i < 36; ++i) {
+        const SourceUnit& unit = video[static_cast<std::size_t>(i)];
+        EXPECT_EQ(unit.time, i * 3600) << i;
+        EXPECT_EQ(unit.time + unit.later, (i / 12 * 12 + kShown[i % 12]) * 3600) << i;
+    }
+    EXPECT_EQ(source->Counts().lostFrames, 0u);
+}
+
 TEST_F(NetworkSource, ALostSourceComesBackWithTheTimeThatPassed) {
     MakeMaterial();
     StreamServer server({HttpStream(FileBytes(Path("a.ts")))});
