@@ -194,9 +194,9 @@ MbxStatus MbxSetSignedOffsets(MbxSession* session, uint32_t track, uint32_t sign
 
 // ---- Samples and fragments ----
 
-// Appends one sample to the track's open chunk, which is opened when needed. `randomAccess` asks for a row in
-// the fragment index, which the samples of `moov` never get. MBX_ERR_BAD_STATE for a track or sample entry
-// that does not exist, MBX_ERR_OVERFLOW when the decode time leaves 64 bits.
+// Appends one sample to the track's open chunk, which is opened when needed. `randomAccess`, an MbxIndexRow,
+// asks for a row in the fragment index, which the samples of `moov` never get. MBX_ERR_BAD_STATE for a track
+// or sample entry that does not exist, MBX_ERR_OVERFLOW when the decode time leaves 64 bits.
 MbxStatus MbxAddSample(MbxSession* session, uint32_t track, const MbxSampleInfo* sample,
                        uint32_t randomAccess);
 

@@ -164,6 +164,13 @@ struct MbxOptions {
     uint32_t reserved;           // 0
 };
 
+// What the row of a sample in the fragment index (`tfra`) tells. Any other number counts as 1.
+enum MbxIndexRow : uint32_t {
+    MBX_NO_INDEX_ROW = 0,
+    MBX_INDEX_ROW_OF_DECODING = 1,
+    MBX_INDEX_ROW_OF_PRESENTATION = 2,  // as ISO/IEC 14496-12 8.8.10.3 has it
+};
+
 // Forms of MbxWriteWideMdatHeader. The numbers are not those of MbxBoxSizeMode.
 enum MbxMdatHeaderForm : uint32_t {
     MBX_MDAT_HEADER_32 = 0,

@@ -13,16 +13,16 @@ namespace {
 
 using ::testing::ElementsAre;
 
-struct Picture {
+struct TimedPicture {
     std::uint64_t shown;
     bool isIdr = false;
 };
 
 /// Places all, each with so many of the following ones known, up to the next IDR frame.
-std::vector<std::int32_t> placeAll(PresentationOrder& order, const std::vector<Picture>& pictures,
+std::vector<std::int32_t> placeAll(PresentationOrder& order, const std::vector<TimedPicture>& pictures,
                                    std::size_t known = 100) {
     std::vector<std::uint64_t> times;
-    for (const Picture& picture : pictures) {
+    for (const TimedPicture& picture : pictures) {
         times.push_back(picture.shown);
     }
     std::vector<std::int32_t> later;
@@ -87,7 +87,7 @@ TEST_F(PresentationOrderTest, NoPlaceIsTakenTwiceWhateverTheTimesAre) {
     for (int record = 0; record < 50; ++record) {
         constexpr std::int64_t kDelay = 1000;  // none is shown at once
         order.Begin(kDelay);
-        std::vector<Picture> pictures;
+        std::vector<TimedPicture> pictures;
         for (int i = 0; i < 200; ++i) {
             pictures.push_back({(next() >> 8) % 500, i == 0});
         }
@@ -97,9 +97,52 @@ TEST_F(PresentationOrderTest, NoPlaceIsTakenTwiceWhateverTheTimesAre) {
     }
 }
 
-TEST_F(PresentationOrderTest, APictureThatIsShownBeforeItsDecodingIsShownAtOnce) {
+TEST_F(PresentationOrderTest, APictureWhosePlaceHasGoneByComesAtTheNextFreeOneAndMovesAllThatFollow) {
     order.Begin(0);
-    EXPECT_THAT(placeAll(order, {{0, true}, {20}, {10}}), ElementsAre(0, 1, 0));
+    // I0 P2 b1, P4 b3, and the same behind an IDR frame.
+    EXPECT_THAT(placeAll(order, {{0, true}, {20}, {10}, {40}, {30}, {50, true}, {70}, {60}}),
+                ElementsAre(0, 1, 1, 2, 0, 1, 2, 0));
+    EXPECT_TRUE(order.IsClosed());
+}
+
+TEST_F(PresentationOrderTest, NoPictureIsShownBeforeItsDecodingNorTwoAtATimeWhateverTheTimesAre) {
+    std::uint32_t random = 1;
+    const auto next = [&] { return random = random * 1664525 + 1013904223; };
+    for (int record = 0; record < 50; ++record) {
+        order.Begin(record % 4);
+        std::vector<TimedPicture> pictures;
+        for (int i = 0; i < 200; ++i) {
+            pictures.push_back({(next() >> 8) % 500, i % 37 == 0});
+        }
+        const auto later = placeAll(order, pictures, next() >> 29);
+        EXPECT_GE(*std::min_element(later.begin(), later.end()), 0);
+        const auto places = placesOf(later, 0);
+        EXPECT_EQ(std::set<std::int64_t>(places.begin(), places.end()).size(), places.size());
+    }
+}
+
+TEST_F(PresentationOrderTest, TheDelayIsThatOfThePictureThatWaitsForMostOthers) {
+    EXPECT_EQ(PresentationOrder::FindDelay({}), 0);
+    EXPECT_EQ(PresentationOrder::FindDelay({0, 10, 20}), 0);
+    EXPECT_EQ(PresentationOrder::FindDelay({0, 40, 20, 10, 30}), 2);
+    EXPECT_EQ(PresentationOrder::FindDelay({0, 40, 10, 20, 30}), 1);
+    EXPECT_EQ(PresentationOrder::FindDelay({0, 10, 20, 60, 50, 40, 30}), 3);
+}
+
+TEST_F(PresentationOrderTest, TheOrderIsClosedWhenAllSoFarAreShownBeforeTheOthers) {
+    order.Begin(2);
+    const std::uint64_t times[] = {0, 40, 20, 10, 30, 80};
+    for (std::size_t i = 0; i < 5; ++i) {
+        order.Place(times + i, 6 - i, i == 0);
+        EXPECT_EQ(order.IsClosed(), i == 0 || i == 4) << i;
+    }
+}
+
+TEST_F(PresentationOrderTest, AnIdrFrameForgetsTheTimesBeforeIt) {
+    order.Begin(0);
+    placeAll(order, {{900, true}, {910}, {0, true}, {10}});
+    EXPECT_THAT(order.Latest(), ElementsAre(0u, 10u));
+    EXPECT_EQ(order.CountFrom(10), 1u);
 }
 
 TEST_F(PresentationOrderTest, CountsWhatIsShownAtAnInstantOrBehindIt) {

@@ -4,7 +4,6 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
-#include <cmath>
 #include <cstddef>
 #include <cstdint>
 #include <filesystem>
@@ -16,10 +15,12 @@
 
 #include "boxlib/support/IsoReader.h"
 #include "buffer/StreamBuffer.h"
+#include "support/ChunkPace.h"
 #include "support/CodedMedia.h"
 #include "support/ControllerRecorder.h"
 #include "support/ElementaryStreams.h"
 #include "support/MuxerStream.h"
+#include "support/ShownPictures.h"
 #include "support/StreamUnits.h"
 
 namespace clipfileModule {
@@ -27,8 +28,10 @@ namespace {
 
 using stream_units::FrameRate;
 
-/// 38 chunks: `moov` and one fragment. The module takes up to 48 without a disk.
+/// 38 chunks and more: `moov` and one fragment.
 constexpr std::uint64_t kPictures = 300;
+constexpr std::uint32_t kWidth = 160;
+constexpr std::uint32_t kHeight = 96;
 
 struct Encoding {
     const char* name;
@@ -45,67 +48,146 @@ constexpr Encoding kSixteenPyramid = {"SixteenInAPyramid", "bframes=16:b-pyramid
 constexpr Encoding kInterlaced = {"InterlacedFrames", "bframes=3:b-pyramid=normal:tff=1:interlaced=1"};
 
 struct Plan {
-    const char* type;
     FrameRate rate;
     Encoding encoding;
 };
 
 std::string nameOf(const Plan& plan) {
-    return plan.encoding.name + std::string("At") + std::to_string(plan.rate.key) +
-           (plan.type == std::string("normal") ? "Normal" : "Fragmented");
+    return plan.encoding.name + std::string("At") + std::to_string(plan.rate.key);
 }
 
 std::ostream& operator<<(std::ostream& out, const Plan& plan) {
     return out << nameOf(plan);
 }
 
-/// A picture as a decoder shows it.
-struct Shown {
-    std::int64_t time;  // in pictures
-    std::string digest;
-
-    bool operator==(const Shown&) const = default;
-};
-
-std::ostream& operator<<(std::ostream& out, const Shown& shown) {
-    return out << shown.time << " " << shown.digest;
-}
-
-/// When a picture is shown and decoded, in pictures.
+/// A picture of the source, in decoding order, in pictures.
 struct Times {
     std::int64_t shown;
     std::int64_t decoded;
 };
 
+ProgramResult run(const TempDir& work, const std::string& command) {
+    ProgramResult result = RunProgram(work, command);
+    EXPECT_EQ(result.exitCode, 0) << result.errors;
+    return result;
+}
+
+/// Times and digests of what FFmpeg tells of a file in lines of "stream, dts, pts, duration, size, digest".
+struct Line {
+    std::int64_t dts;
+    std::int64_t pts;
+    std::string digest;
+};
+
+std::vector<Line> linesOf(const std::string& output) {
+    std::vector<Line> lines;
+    std::istringstream in(output);
+    for (std::string text; std::getline(in, text);) {
+        if (text.empty() || text.front() == '#') {
+            continue;
+        }
+        std::replace(text.begin(), text.end(), ',', ' ');
+        std::istringstream fields(text);
+        std::string stream, duration, size;
+        Line line;
+        fields >> stream >> line.dts >> line.pts >> duration >> size >> line.digest;
+        lines.push_back(line);
+    }
+    return lines;
+}
+
+/// What a decoder shows of a file, in its order.
+std::vector<Line> shownOf(const TempDir& work, const std::filesystem::path& path) {
+    return linesOf(run(work, "ffmpeg -v error -threads 1 -i '" + path.string() +
+                                 "' -map 0:v -vsync passthrough -f framemd5 -")
+                       .output);
+}
+
+/// An encoder's stream with its own times.
+struct Source {
+    std::vector<stream_units::Bytes> units;
+    std::vector<Times> times;
+    /// Of each picture, in the order in which they are shown.
+    std::vector<std::string> digests;
+};
+
+Source encode(const FrameRate& rate, const Encoding& encoding) {
+    const TempDir work;
+    const std::string stream = (work.Path() / "source.h264").string();
+    const std::string packets = (work.Path() / "packets.txt").string();
+    run(work, "ffmpeg -v error -f lavfi -i testsrc2=size=" + std::to_string(kWidth) + "x" +
+                  std::to_string(kHeight) + ":rate=" + std::to_string(rate.timescale) + "/" +
+                  std::to_string(rate.duration) + " -frames:v " + std::to_string(kPictures) +
+                  " -map 0:v -c:v libx264 -threads 1 -preset ultrafast -pix_fmt yuv420p -x264-params "
+                  "keyint=50:scenecut=0:b-adapt=0:open-gop=0:aud=1:repeat-headers=1:" +
+                  encoding.options + " -f tee '[f=h264]" + stream + "|[f=framecrc]" + packets + "'");
+    Source source;
+    for (const auto& unit : elementary_streams::ReadAccessUnits(stream)) {
+        source.units.emplace_back(unit->payload, unit->payload + unit->size);
+    }
+    const stream_units::Bytes told = elementary_streams::ReadBytes(packets);
+    for (const Line& line : linesOf(std::string(told.begin(), told.end()))) {
+        source.times.push_back({line.pts, line.dts});
+    }
+    for (const Line& line : shownOf(work, stream)) {
+        source.digests.push_back(line.digest);
+    }
+    return source;
+}
+
 class RecordedOrder : public ::testing::TestWithParam<Plan> {
  protected:
     RecordedOrder() {
         settings.framerate = plan.rate.key;
-        settings.fileType = plan.type;
         settings.filePrefix = "Cam";
         settings.outputPath = directory.ModulePath();
-        settings.width = kCodedWidth;
-        settings.height = kCodedHeight;
+        settings.width = kWidth;
+        settings.height = kHeight;
         settings.maxFileSize = 60;
         settings.recordRules = RecordRules::kExact;
         settings.pictureOrder = PictureOrder::kDecoding;
         clock.rate = plan.rate;
-        encode();
     }
-    ~RecordedOrder() override {
+    void SetUp() override {
+        ASSERT_EQ(source.units.size(), kPictures);
+        ASSERT_EQ(source.times.size(), kPictures);
+        ASSERT_EQ(source.digests.size(), kPictures);
+    }
+
+    std::shared_ptr<StreamData> unit(std::size_t n) const {
+        const auto decoded = static_cast<std::uint64_t>(rtpOf(source.times[n].decoded));
+        auto made = stream_units::MakeUnit(source.units[n], decoded, decoded / 90);
+        made->presentation_timestamp = static_cast<std::uint64_t>(rtpOf(source.times[n].shown));
+        return made;
+    }
+    /// Records the first `count` pictures to a file of a type, with all pictures pushed.
+    void record(const std::string& type, std::size_t count) {
+        std::filesystem::remove_all(directory.Path());
+        std::filesystem::create_directory(directory.Path());
+        settings.fileType = type;
+        ControllerRecorder controller;
+        const auto buffer = std::make_shared<StreamBuffer>(&controller, 0, -1);
+        buffer->Start(settings);
+        if (count < kPictures) {
+            buffer->SetEndTimestamp(rtpOf(source.times[0].shown + static_cast<std::int64_t>(count)));
+        }
+        push(*buffer);
+        EXPECT_TRUE(count == kPictures || controller.WaitForCall("post 5"));
         buffer->Stop();
         controller.Clear();
     }
-
-    /// Pushes the pictures from the `first`th in decoding order on with all that belongs to as many.
-    void push(std::size_t first) {
-        for (std::size_t n = first; n < units.size(); ++n) {
-            buffer->PushMeta(clock.Meta(n, {{}, stream_units::Timecode{1, 2, 3, 4, false}}));
+    /// Pushes all pictures with all that belongs to as many.
+    void push(StreamBuffer& buffer) const {
+        const ChunkPace pace;
+        for (std::size_t n = 0; n < kPictures; ++n) {
+            ASSERT_TRUE(pace.WaitForRoom(n));
+            buffer.PushMeta(clock.Meta(n, {{}, stream_units::Timecode{1, 2, 3, 4, false}}));
             for (std::uint64_t k = clock.AudioBefore(n); k < clock.AudioBefore(n + 1); ++k) {
-                buffer->PushAudio(clock.Audio(k));
+                buffer.PushAudio(clock.Audio(k));
             }
-            buffer->PushVideo(units[n]);
+            buffer.PushVideo(unit(n));
         }
+        ASSERT_TRUE(pace.WaitForWriter());
     }
     std::filesystem::path recording() const {
         for (const auto& entry : std::filesystem::recursive_directory_iterator(directory.Path())) {
@@ -115,157 +197,79 @@ class RecordedOrder : public ::testing::TestWithParam<Plan> {
         }
         throw std::runtime_error("no file");
     }
+    /// The source's pictures begin with the other media, those that wait for others earlier.
     std::int64_t rtpOf(std::int64_t picture) const {
-        return static_cast<std::int64_t>(clock.videoRtp) + picture * 90000 *
+        return static_cast<std::int64_t>(clock.videoRtp) + (picture - source.times[0].shown) * 90000 *
                                                                static_cast<std::int64_t>(plan.rate.duration) /
                                                                static_cast<std::int64_t>(plan.rate.timescale);
     }
-    std::vector<Shown> shownOf(const std::filesystem::path& path) {
-        const ProgramResult decoded = run("ffmpeg -v error -threads 1 -i '" + path.string() +
-                                          "' -map 0:v -vsync passthrough -f framemd5 -");
-        std::vector<Shown> pictures;
-        std::istringstream in(decoded.output);
-        for (std::string line; std::getline(in, line);) {
-            if (line.empty() || line.front() == '#') {
-                continue;
-            }
-            std::istringstream fields(line);
-            std::string stream, dts, pts, duration, size, digest;
-            fields >> stream >> dts >> pts >> duration >> size >> digest;
-            pictures.push_back({std::stoll(pts), digest});
+    /// A decoder shows the first pictures of the source at their times, and behind these none, or such as
+    /// they need: FFmpeg does not obey the end of the edit of a fragmented file.
+    void judgeShown(std::size_t count) const {
+        const TempDir work;
+        const std::vector<Line> file = shownOf(work, recording());
+        ASSERT_GE(file.size(), count);
+        for (std::size_t i = 0; i < count; ++i) {
+            ASSERT_EQ(file[i].pts, static_cast<std::int64_t>(i));
+            ASSERT_EQ(file[i].digest, source.digests[i]) << i;
         }
-        return pictures;
+        if (settings.fileType == "normal") {
+            EXPECT_EQ(file.size(), count);
+        }
     }
-    /// The file shows the first pictures of the source, and nothing else. FFmpeg does not obey the end of an
-    /// edit of a fragmented file, and shows there what the last pictures need, too.
-    void judgeShown(std::size_t count) {
-        const std::vector<Shown> source = shownOf(work.Path() / "source.mp4");
-        const std::vector<Shown> file = shownOf(recording());
-        ASSERT_EQ(source.size(), kPictures);
-        for (std::size_t i = 0; i < count && i < file.size(); ++i) {
-            ASSERT_EQ(file[i], source[i]) << i;
+    /// The same before a reader of the standard, which knows the end of an edit; other media are in step.
+    void judgeTables(std::size_t count) const {
+        const iso::Movie movie = iso::ReadMovie(muxer_stream::ReadFile(recording()));
+        const auto duration = static_cast<std::uint32_t>(plan.rate.duration);
+        const std::vector<std::size_t> shown = ShownSamples(movie, duration);
+        ASSERT_EQ(shown.size(), count);
+        for (std::size_t i = 0; i < count; ++i) {
+            EXPECT_EQ(source.times.at(shown[i]).shown - source.times[0].shown, static_cast<std::int64_t>(i));
         }
-        const bool obeysEnd = plan.type == std::string("normal");
-        EXPECT_EQ(file.size(), obeysEnd ? count : movie().track(1).samples.size());
-    }
-    iso::Movie movie() const { return iso::ReadMovie(muxer_stream::ReadFile(recording())); }
-    /// The tables, before a reader of the standard: places that are filled once, and other media in step.
-    void judgeTables(const iso::Movie& read, std::uint64_t shown) const {
-        const auto& video = read.track(1).samples;
-        ASSERT_EQ(read.track(1).edits.size(), 1U);
-        const iso::Edit& edit = read.track(1).edits[0];
-        EXPECT_EQ(edit.segmentDuration, shown * plan.rate.duration);
-        std::vector<bool> filled(video.size());
-        for (const iso::Sample& sample : video) {
-            const auto time =
-                static_cast<std::int64_t>(sample.decodeTime) + sample.compositionOffset - edit.mediaTime;
-            ASSERT_GE(time, 0);
-            ASSERT_EQ(time % static_cast<std::int64_t>(plan.rate.duration), 0);
-            const auto place = static_cast<std::size_t>(time) / plan.rate.duration;
-            if (place < filled.size()) {
-                EXPECT_FALSE(filled[place]) << "doubled";
-                filled[place] = true;
-            }
-        }
-        EXPECT_TRUE(std::all_of(filled.begin(), filled.begin() + static_cast<std::ptrdiff_t>(shown),
-                                [](bool isFilled) { return isFilled; }));
-        EXPECT_EQ(read.track(4).samples.size(), shown);
-        EXPECT_EQ(read.track(3).samples.at(0).duration, shown * plan.rate.duration);
-        const auto audio = static_cast<double>(read.track(2).samples.size()) * 1024 / 48;
-        const auto pictures = 1000.0 * static_cast<double>(shown * plan.rate.duration) /
-                              static_cast<double>(plan.rate.timescale);
-        EXPECT_LE(std::abs(audio - pictures), 10.7) << "milliseconds";
+        ExpectOthersAsLong(movie, count, duration, plan.rate.timescale, 10.7);
     }
 
     const Plan plan = GetParam();
+    const Source source = encode(plan.rate, plan.encoding);
     const TempDir directory;
-    const TempDir work;
     stream_units::StreamClock clock;
     OutputSettings settings;
-    ControllerRecorder controller;
-    std::shared_ptr<StreamBuffer> buffer = std::make_shared<StreamBuffer>(&controller, 0, -1);
-    std::vector<std::shared_ptr<StreamData>> units;
-    std::vector<Times> times;
-
- private:
-    ProgramResult run(const std::string& command) const {
-        ProgramResult result = RunProgram(work, command);
-        EXPECT_EQ(result.exitCode, 0) << result.errors;
-        return result;
-    }
-    void encode() {
-        const std::string source = "'" + (work.Path() / "source.mp4").string() + "'";
-        const std::string stream = (work.Path() / "source.h264").string();
-        run("ffmpeg -v error -f lavfi -i testsrc2=size=" + std::to_string(kCodedWidth) + "x" +
-            std::to_string(kCodedHeight) + ":rate=" + std::to_string(plan.rate.timescale) + "/" +
-            std::to_string(plan.rate.duration) + " -frames:v " + std::to_string(kPictures) +
-            " -c:v libx264 -threads 1 -preset ultrafast -pix_fmt yuv420p -x264-params keyint=50:scenecut=0:"
-            "b-adapt=0:open-gop=0:aud=1:repeat-headers=1:" +
-            plan.encoding.options + " -video_track_timescale " + std::to_string(plan.rate.timescale) + " " +
-            source);
-        run("ffmpeg -v error -i " + source + " -c copy -bsf:v h264_mp4toannexb -f h264 '" + stream + "'");
-        units = elementary_streams::ReadAccessUnits(stream);
-        std::istringstream in(
-            run("ffprobe -v error -select_streams v -show_entries packet=pts,dts -of csv=p=0 " + source)
-                .output);
-        for (std::string line; std::getline(in, line);) {
-            std::istringstream fields(line);
-            std::int64_t shown = 0;
-            std::int64_t decoded = 0;
-            char comma = 0;
-            fields >> shown >> comma >> decoded;
-            const auto duration = static_cast<std::int64_t>(plan.rate.duration);
-            times.push_back({shown / duration, decoded / duration});
-        }
-        ASSERT_EQ(units.size(), kPictures);
-        ASSERT_EQ(times.size(), kPictures);
-        for (std::size_t n = 0; n < units.size(); ++n) {
-            StreamData& unit = *units[n];
-            unit.rtp_timestamp = static_cast<std::uint64_t>(rtpOf(times[n].decoded));
-            unit.timestamp = unit.rtp_timestamp / 90;
-            unit.presentation_timestamp = static_cast<std::uint64_t>(rtpOf(times[n].shown));
-        }
-    }
 };
 
 TEST_P(RecordedOrder, AWholeStreamIsShownAsItsEncoderMeantIt) {
-    buffer->Start(settings);
-    push(0);
-    buffer->Stop();
-    judgeShown(kPictures);
-    judgeTables(movie(), kPictures);
-    EXPECT_EQ(recording().filename(), "01_02_03_04.MP4");
+    for (const char* const type : {"normal", "fragment"}) {
+        SCOPED_TRACE(type);
+        record(type, kPictures);
+        judgeShown(kPictures);
+        judgeTables(kPictures);
+        EXPECT_EQ(recording().filename(), "01_02_03_04.MP4");
+    }
 }
 
 TEST_P(RecordedOrder, ARecordIsShownUpToItsEndWhateverThePicturesThereNeed) {
-    for (const std::size_t end : {281, 282, 283, 284}) {
-        SCOPED_TRACE(end);
-        std::filesystem::remove_all(directory.Path());
-        std::filesystem::create_directory(directory.Path());
-        buffer = std::make_shared<StreamBuffer>(&controller, 0, -1);
-        buffer->Start(settings);
-        buffer->SetEndTimestamp(rtpOf(static_cast<std::int64_t>(end)));
-        push(0);
-        ASSERT_TRUE(controller.WaitForCall("post 5"));
-        buffer->Stop();
-        controller.Clear();
-        judgeShown(end);
-        judgeTables(movie(), end);
+    for (const char* const type : {"normal", "fragment"}) {
+        for (const std::size_t end : {281, 282, 283, 284}) {
+            SCOPED_TRACE(type + std::to_string(end));
+            record(type, end);
+            judgeTables(end);
+            if (end == 282) {
+                judgeShown(end);
+            }
+        }
     }
 }
 
 std::vector<Plan> plans() {
     std::vector<Plan> all;
-    for (const char* type : {"normal", "fragment"}) {
-        for (const FrameRate& rate : {stream_units::kRate2997, stream_units::kFrameRates[5]}) {
-            all.push_back({type, rate, kPyramid});
-        }
-        for (const Encoding& encoding : {kNone, kOne, kTwo, kThree, kPyramid, kInterlaced}) {
-            all.push_back({type, stream_units::kRate25, encoding});
-        }
-        for (const Encoding& encoding : {kThree, kSixteen, kSixteenPyramid}) {
-            all.push_back({type, stream_units::kFrameRates[6], encoding});
-        }
+    for (const FrameRate& rate : {stream_units::kFrameRates[0], stream_units::kRate2997}) {
+        all.push_back({rate, kPyramid});
+    }
+    for (const Encoding& encoding : {kNone, kOne, kTwo, kThree, kPyramid, kInterlaced}) {
+        all.push_back({stream_units::kRate25, encoding});
+    }
+    all.push_back({stream_units::kFrameRates[5], kPyramid});
+    for (const Encoding& encoding : {kSixteen, kSixteenPyramid}) {
+        all.push_back({stream_units::kFrameRates[6], encoding});
     }
     return all;
 }

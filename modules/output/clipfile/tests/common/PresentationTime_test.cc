@@ -29,8 +29,20 @@ TEST(PresentationTime, TheWordMayWrapAsRtpTimestampsDo) {
     constexpr std::uint64_t kDecoded = 0x7'FFFF'FF00;
     EXPECT_EQ(PresentationRtp(unitAt(kDecoded, 0x100), PictureOrder::kDecoding), 0x8'0000'0100u);
     EXPECT_EQ(PresentationRtp(unitAt(kDecoded, 0x8'0000'0100), PictureOrder::kDecoding), 0x8'0000'0100u);
-    // The other way round, for a picture that says that it is shown before it is decoded.
-    EXPECT_EQ(PresentationRtp(unitAt(0x8'0000'0100, 0xFFFF'FF00), PictureOrder::kDecoding), kDecoded);
+}
+
+TEST(PresentationTime, APictureWhoseTimeCannotBeIsShownWhenItIsDecoded) {
+    constexpr std::uint64_t kDecoded = 0x8'0000'0100;
+    // Never set; before its decoding, over a wrap too; more than 10 s behind.
+    const std::uint64_t impossible[] = {0, 0x8'0000'00FF, 0xFFFF'FF00, kDecoded + 900001};
+    for (const std::uint64_t shown : impossible) {
+        EXPECT_FALSE(HasPresentationTime(unitAt(kDecoded, shown))) << shown;
+        EXPECT_EQ(PresentationRtp(unitAt(kDecoded, shown), PictureOrder::kDecoding), kDecoded) << shown;
+    }
+    for (const std::uint64_t shown : {kDecoded, kDecoded + 900000}) {
+        EXPECT_TRUE(HasPresentationTime(unitAt(kDecoded, shown))) << shown;
+        EXPECT_EQ(PresentationRtp(unitAt(kDecoded, shown), PictureOrder::kDecoding), shown);
+    }
 }
 
 TEST(PresentationTime, MillisecondsAreThoseOfAUnitThatIsStampedSo) {

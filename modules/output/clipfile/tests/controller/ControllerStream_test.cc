@@ -221,6 +221,40 @@ TEST_F(ControllerStreamTest, AUnitWithoutPayloadReachesNoRecording) {
     EXPECT_EQ(log_.CountIf([](const CapturedLine& line) { return line.text.rfind("ST: [", 0) == 0; }), 0U);
 }
 
+TEST_F(ControllerStreamTest, APictureInDecodingOrderThatCannotBeShownWhenItSaysIsToldOnceALife) {
+    for (int life = 0; life < 2; ++life) {
+        host_.texts["-pictureOrder"] = "decoding";
+        Run("on");
+        for (const std::uint64_t rtp : {180000, 183600, 187200}) {
+            const auto unit = stream_units::VideoUnit(1, rtp, rtp / 90);
+            unit->presentation_timestamp = rtp == 180000 ? rtp : 0;
+            controller_.PushVideo(unit);
+        }
+        ASSERT_TRUE(log_.WaitForText(
+            "presentation_timestamp 0 of rtp_timestamp 183600 is not followed. shown when decoded."));
+        controller_.Uninitialize();
+        running_ = false;
+        EXPECT_EQ(log_.CountIf([](const CapturedLine& line) {
+            return line.text.starts_with("presentation_timestamp ");
+        }),
+                  1U);
+        EXPECT_EQ(
+            log_.Find("presentation_timestamp 0 of rtp_timestamp 183600 is not followed. shown when decoded.")
+                ->priority,
+            LOG_PRIORITY_WARNING);
+    }
+}
+
+TEST_F(ControllerStreamTest, InTheOrderOfShowingNoPictureHasToSayWhenItIsShown) {
+    Run("on");
+    const auto unit = stream_units::VideoUnit(1, 180000, 2000);
+    controller_.PushVideo(unit);
+    ASSERT_TRUE(waitUntil([&] { return unit.use_count() == 1; }));
+    EXPECT_EQ(log_.CountIf(
+                  [](const CapturedLine& line) { return line.text.starts_with("presentation_timestamp "); }),
+              0U);
+}
+
 // Record flag.
 
 TEST_F(ControllerStreamTest, AFirstMetadataUnitWithTheFlagOnStartsARecordingAndReachesIt) {

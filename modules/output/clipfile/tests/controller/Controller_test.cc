@@ -254,6 +254,14 @@ TEST_F(ControllerTest, PicturesComeInTheOrderOfShowingUnlessThatOfDecodingIsAnno
     EXPECT_FALSE(log_.Find("unknown picture order \"presentation\", \"presentation\" is used."));
 }
 
+TEST_F(ControllerTest, AHostThatAnswersNothingForThePictureOrderHasNone) {
+    registry_.Set("MP4OutputPath", "a");
+    host_.texts["-pictureOrder"] = "";
+    ASSERT_TRUE(Initialize());
+    EXPECT_EQ(peer_.Settings().pictureOrder, PictureOrder::kPresentation);
+    EXPECT_FALSE(log_.Find("unknown picture order \"\", \"presentation\" is used."));
+}
+
 TEST_F(ControllerTest, AnUnknownPictureOrderIsSaidAndCountsAsThatOfShowing) {
     registry_.Set("MP4OutputPath", "a");
     host_.texts["-pictureOrder"] = "Decoding";

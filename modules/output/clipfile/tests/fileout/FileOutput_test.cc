@@ -368,6 +368,35 @@ TEST_F(ExactFileOutputTest, InDecodingOrderAFileNeverEndsInFrontOfAnythingButAnI
                             "2 Write 6", "2 Write 7", "3 Write 8", "3 Write 9"));
 }
 
+TEST_F(ExactFileOutputTest, InDecodingOrderAFileEndsWithoutAnIdrFrameAfterFourMinutesWhereTheOrderIsClosed) {
+    // As above, without another IDR frame. The five minutes end with chunk 9.
+    settings.pictureOrder = PictureOrder::kDecoding;
+    muxers.SetChunkDuration(25000 * 30);
+    settings.maxFileSize = 1;
+    Start();
+    for (std::uint64_t chunk = 0; chunk < 13; ++chunk) {
+        const auto pushed = MakeChunk(chunk, chunk != 10, 10, chunk == 0);
+        pushed->isOrderClosed = chunk != 9;
+        output->PushChunk(pushed);
+    }
+    Finish();
+    EXPECT_THAT(MuxerCalls("3 Write "), ElementsAre("3 Write 11", "3 Write 12"));
+    EXPECT_EQ(log.Count(LOG_PRIORITY_WARNING, "clipfileModule::FileOutput::outputFile",
+                        "no idr frame comes. the next file begins without one."),
+              1u);
+}
+
+TEST_F(ExactFileOutputTest, InDecodingOrderAnIdrFrameNeedsNoSuchLine) {
+    settings.pictureOrder = PictureOrder::kDecoding;
+    settings.maxFileSize = 0;
+    Start();
+    push(0, true, true);
+    push(1, true, true);
+    Finish();
+    EXPECT_THAT(MuxerCalls("3 Write "), ElementsAre("3 Write 1"));
+    EXPECT_FALSE(log.Contains("no idr frame comes. the next file begins without one."));
+}
+
 TEST_F(FileOutputTest, InDecodingOrderKeptRulesWaitForAnIdrFrameToo) {
     settings.pictureOrder = PictureOrder::kDecoding;
     settings.maxFileSize = 0;

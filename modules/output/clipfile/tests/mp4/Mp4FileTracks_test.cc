@@ -3,6 +3,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "boxlib/support/IsoReader.h"
 #include "mp4/Mp4FragmentMuxer.h"
 #include "mp4/Mp4NormalMuxer.h"
 #include "support/MuxerFixture.h"
@@ -180,6 +181,18 @@ TEST_F(Mp4FileTracksTest, TheLastTimeOf32BitsIsWritten) {
     platform.SetLocalTime({2040, 2, 6, 6, 28, 15});
     EXPECT_TRUE(muxer.Close());
     EXPECT_EQ(Field(file(), "moov/mvhd", 4, 4), 0xFFFFFFFFU);
+}
+
+TEST_F(Mp4FileTracksTest, MoreHiddenPicturesThanAFileHoldsLeaveAnEditOfNothing) {
+    open();
+    const auto chunk = muxer_stream::MakeChunk(muxer_stream::kPlainChunk);
+    chunk->hiddenVideo = 9;
+    ASSERT_TRUE(muxer.Write(chunk));
+    close();
+    const iso::Movie movie = iso::ReadMovie(file());
+    EXPECT_EQ(movie.track(1).edits.at(0).segmentDuration, 0U);
+    EXPECT_EQ(movie.track(1).samples.size(), 8U);
+    EXPECT_EQ(movie.track(3).samples.at(0).duration, 0U);
 }
 
 }  // namespace

@@ -47,12 +47,35 @@ Bytes timecodeOf(const Bytes& bytes) {
 
 class Mp4FragmentMuxerExactTest : public MuxerFixture<Mp4FragmentMuxer> {
  protected:
-    void openExact() {
+    void openExact(PictureOrder order = PictureOrder::kPresentation) {
         initialize();
-        ASSERT_TRUE(muxer.Open(exactSettings(directory), kTimecode, true));
+        OutputSettings settings = exactSettings(directory);
+        settings.pictureOrder = order;
+        ASSERT_TRUE(muxer.Open(settings, kTimecode, true));
     }
     std::string types() const { return Types(Children(file())); }
 };
+
+// ---- Reordered pictures.
+
+TEST_F(Mp4FragmentMuxerExactTest, TheIndexTellsWhenReorderedPicturesAreShown) {
+    openExact(PictureOrder::kDecoding);
+    for (int i = 0; i < 34; ++i) {
+        const auto chunk = MakeChunk({{5, 5}, {6}, {12, 9}, i == 0 ? 0 : -1});
+        chunk->shownLater = {i == 33 ? 3 : 1, 0};
+        ASSERT_TRUE(muxer.Write(chunk));
+    }
+    close();
+    const iso::Movie movie = iso::ReadMovie(file());
+    const auto& index = movie.track(1).index;
+    ASSERT_EQ(index.size(), 2U);
+    // 64 and 66 pictures of 1000 ticks come before, and the first of each chunk waits for one and for three.
+    EXPECT_EQ(index[0].time, 65000U);
+    EXPECT_EQ(index[1].time, 69000U);
+    // The other media are presented as they come.
+    EXPECT_EQ(movie.track(4).index.at(1).time, 66000U);
+    EXPECT_EQ(movie.track(2).index.at(1).time, 33U * 1024);
+}
 
 // ---- The timecode.
 
@@ -151,20 +174,25 @@ class CarriedOnFlush : public ::testing::Test {
  protected:
     CarriedOnFlush() { muxer_stream::StopTheClock(platform); }
 
-    /// Records `chunks` chunks. `operations` gets how many there were in the flush.
+    /// Records `chunks` chunks, in decoding order if that is set. `operations` gets how many there were in
+    /// the flush.
     Bytes record(int chunks, const Failure& failure, std::uint64_t& operations) {
         const TempDir directory;
         FaultyFiles faults;
         Mp4FragmentMuxer muxer;
         EXPECT_TRUE(muxer.Initialize());
-        EXPECT_TRUE(muxer.Open(exactSettings(directory), kTimecode, true));
+        OutputSettings settings = exactSettings(directory);
+        settings.pictureOrder = order;
+        EXPECT_TRUE(muxer.Open(settings, kTimecode, true));
         for (int i = 1; i <= chunks; ++i) {
             const std::uint64_t before = faults.Count(failure.operation);
             const bool fails = i == failure.chunk && failure.nth != 0;
             if (fails) {
                 faults.FailAt(failure.operation, before + failure.nth, failure.andAllAfter);
             }
-            EXPECT_EQ(muxer.Write(MakeChunk({{5}, {6}, {12, 9}, 0}, static_cast<unsigned char>(i))), !fails);
+            const auto chunk = MakeChunk({{5}, {6}, {12, 9}, 0}, static_cast<unsigned char>(i));
+            chunk->shownLater = {1, 1};
+            EXPECT_EQ(muxer.Write(chunk), !fails);
             if (i == failure.chunk) {
                 operations = faults.Count(failure.operation) - before;
                 faults.Reset();
@@ -199,6 +227,7 @@ class CarriedOnFlush : public ::testing::Test {
 
     const LogCapture log{LOG_PRIORITY_ERROR};
     FakePlatform platform;
+    PictureOrder order = PictureOrder::kPresentation;
 
  private:
     void expectSameFile(int chunks, const Failure& failure, const Bytes& whole) {
@@ -209,6 +238,16 @@ class CarriedOnFlush : public ::testing::Test {
 };
 
 TEST_F(CarriedOnFlush, OfTheFirstPartLeavesTheFileAsIfNothingHadFailed) {
+    expectSameFiles(32, 32);
+}
+
+TEST_F(CarriedOnFlush, OfTheFirstPartOfReorderedPicturesLeavesOneEdit) {
+    order = PictureOrder::kDecoding;
+    std::uint64_t operations = 0;
+    const Bytes whole = record(32, {32, FaultyFiles::kWrite, false}, operations);
+    const auto edits = iso::ReadMovie(whole).track(1).edits;
+    ASSERT_EQ(edits.size(), 1U);
+    EXPECT_EQ(edits[0].mediaTime, 1000);
     expectSameFiles(32, 32);
 }
 

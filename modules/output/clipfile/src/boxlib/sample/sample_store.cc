@@ -161,11 +161,11 @@ MbxStatus openChunk(MbxContext* context, const MbxTrack* track, MbxSampleSegment
 }
 
 MbxStatus addIndexEntry(MbxContext* context, const MbxMovie* movie, uint32_t trackIndex, MbxTrack* track,
-                        const MbxSampleSegment* segment) {
+                        const MbxSampleSegment* segment, uint64_t time) {
     MbxFragmentIndexEntry entry = {};
     MBX_TRY(MbxFragmentCount(movie, &entry.fragmentIndex));
     if (entry.fragmentIndex == 0) return MBX_ERR_INTERNAL;
-    entry.time = segment->firstDecodeTime + segment->decodeDuration;
+    entry.time = time;
     entry.trackIndex = trackIndex;
     entry.trunNumber = segment->chunks.chunkCount + 1;
     entry.sampleNumber = segment->chunks.samplesInChunk + 1;
@@ -188,10 +188,16 @@ MbxStatus MbxAddSample(MbxContext* context, MbxSession* session, uint32_t trackI
     if (segment->sizes.count == UINT32_MAX) return MBX_ERR_OVERFLOW;
     MBX_TRY(checkTimes(segment, sample));
 
+    const int64_t presentation =
+        presentationTime(segment->firstDecodeTime + segment->decodeDuration, sample->compositionOffset,
+                         segment->compositionOffsets.signedOffsets);
     MbxChunkState* chunks = &segment->chunks;
     if (chunks->samplesInChunk == 0) MBX_TRY(openChunk(context, track, segment, sample));
     if (startsFragmentIndexEntry != 0 && segment != track->segments.first) {
-        MBX_TRY(addIndexEntry(context, session->movie, trackIndex, track, segment));
+        const uint64_t time = startsFragmentIndexEntry == MBX_INDEX_ROW_OF_PRESENTATION
+                                  ? static_cast<uint64_t>(presentation > 0 ? presentation : 0)
+                                  : segment->firstDecodeTime + segment->decodeDuration;
+        MBX_TRY(addIndexEntry(context, session->movie, trackIndex, track, segment, time));
     }
     MBX_TRY(MbxAddRun(context, &segment->durations, sample->duration));
     const auto offset = static_cast<uint32_t>(sample->compositionOffset);
@@ -211,9 +217,6 @@ MbxStatus MbxAddSample(MbxContext* context, MbxSession* session, uint32_t trackI
     if (track->auxEnabled != 0) {
         MBX_TRY(MbxAddAuxSize(context, &segment->auxSizes, sample->auxSize, sample->auxData));
     }
-    const int64_t presentation =
-        presentationTime(segment->firstDecodeTime + segment->decodeDuration, sample->compositionOffset,
-                         segment->compositionOffsets.signedOffsets);
     if (presentation < segment->earliestPresentation) segment->earliestPresentation = presentation;
     segment->decodeDuration += sample->duration;
     return MBX_OK;

@@ -81,6 +81,7 @@ void StreamBuffer::Start(const OutputSettings& recordSettings) {
         audioBuffer.clear();
         metaBuffer.clear();
         firstPicture.reset();
+        presentationOrder.Begin(0);
         writerMissing = false;
         metaBlock.assign(std::begin(kMetaBlock), std::end(kMetaBlock));
         chunkedVideo = 0;
@@ -312,9 +313,6 @@ void StreamBuffer::SetVideoSequenceHeader(const nal_access::NalUnit& sps, const 
     // Contract: idr-frame-unsorted. The cache is empty here.
     videoBuffer.push_back(unit);
     firstPicture = unit;
-    if (hasTimeline()) {
-        presentationOrder.Begin(framesIn(static_cast<std::int64_t>(shownAt(*unit) - unit->rtp_timestamp)));
-    }
     if (isExact()) {
         startInStep();
     }
@@ -369,7 +367,7 @@ bool StreamBuffer::MakeFileTimecode(const std::shared_ptr<ChunkData>& chunk) {
     if (tcStatus == 2 && duration != 0) {
         const auto distance =
             static_cast<std::int64_t>(shownAt(*chunk->firstVideo) - chunk->firstMeta->rtp_timestamp);
-        if (isExact()) {
+        if (isExact() || inDecodingOrder()) {
             offset = framesIn(distance);
         } else {
             // Contract: timecode-offset-by-3. From 90 kHz to 30 kHz, at every frame rate.
@@ -392,10 +390,6 @@ bool StreamBuffer::MakeFileTimecode(const std::shared_ptr<ChunkData>& chunk) {
                        fileTimecode[0], fileTimecode[1], fileTimecode[2], fileTimecode[3],
                        static_cast<long long>(shownAt(*chunk->firstVideo)));
     return result;
-}
-
-std::uint64_t StreamBuffer::shownAt(const StreamData& unit) const {
-    return PresentationRtp(unit, settings.pictureOrder);
 }
 
 int StreamBuffer::framesIn(std::int64_t distance) const {

@@ -4,6 +4,7 @@
 #include <condition_variable>
 #include <cstddef>
 #include <cstdint>
+#include <limits>
 #include <memory>
 #include <optional>
 #include <string>
@@ -35,7 +36,7 @@ namespace clipfileModule {
 /// may be called from any thread, at any time in that life.
 ///
 /// Sources: StreamBuffer.cc has life and states, StreamBufferChunk.cc the chunk thread, StreamBufferExact.cc
-/// what is different with exact rules.
+/// what is different with exact rules, StreamBufferOrder.cc what pictures in decoding order add.
 ///
 /// Order of the locks: `controlMutex`, `stateMutex`, `bufferMutex`, and last, one at a time,
 /// `analyzerMutex`, the locks of the queues and of `FileOutput`.
@@ -127,8 +128,6 @@ class StreamBuffer final : public QxModuleStreamInterface,
     bool startThreads(const std::vector<std::shared_ptr<StreamQueue>>& started) REQUIRES(controlMutex);
     bool isExact() const { return settings.recordRules == RecordRules::kExact; }
     bool inDecodingOrder() const { return settings.pictureOrder == PictureOrder::kDecoding; }
-    /// When a video unit is shown, in ticks of its RTP clock.
-    std::uint64_t shownAt(const StreamData& unit) const;
     int framesIn(std::int64_t distance) const;
     static unsigned int getTimecodeFrameCount(std::uint32_t framerate);
 
@@ -147,15 +146,40 @@ class StreamBuffer final : public QxModuleStreamInterface,
     static std::size_t countBefore(const UnitList& cache, std::uint64_t end);
     std::uint64_t rescale(std::uint64_t value, std::uint32_t from, std::uint32_t to) EXCLUDES(analyzerMutex);
     void splitVideo(ChunkData& chunk, std::size_t count, std::uint64_t end) REQUIRES(bufferMutex);
-    /// True when every picture is cached that is shown before one of the first `pictures`.
-    bool isOrderKnown(std::size_t pictures) const REQUIRES(bufferMutex);
-    /// Tells the order of the chunk's pictures. `shown`: the times of these and of all behind them.
-    void placePictures(ChunkData& chunk, const std::vector<std::uint64_t>& shown, std::uint64_t end)
-        REQUIRES(bufferMutex);
     void splitAudio(ChunkData& chunk, std::size_t count) REQUIRES(bufferMutex);
     void splitMeta(ChunkData& chunk, std::size_t count, std::uint64_t end) REQUIRES(bufferMutex);
     void setDurations(SampleList& samples, std::uint64_t next, std::uint32_t clock, std::uint32_t timescale)
         REQUIRES(analyzerMutex);
+
+    // Pictures in decoding order.
+    /// When a video unit is shown, in ticks of its RTP clock.
+    std::uint64_t shownAt(const StreamData& unit) const;
+    /// When the cached pictures from `first` to in front of `end` are shown.
+    std::vector<std::uint64_t> timesOf(std::size_t first, std::size_t end) const REQUIRES(bufferMutex);
+    /// The first IDR frame among the cached pictures from `first` on; their number where there is none.
+    std::size_t findIdrFrom(std::size_t first) const REQUIRES(bufferMutex);
+    /// True when every picture is cached that is shown before one of the first `pictures`.
+    bool isOrderKnown(std::size_t pictures) const REQUIRES(bufferMutex);
+    /// Pictures of a chunk that may hold so many. In decoding order it ends in front of an IDR frame, or,
+    /// where none has come for long, where the pictures so far are shown before all that follow, if it can.
+    std::size_t findCut(std::size_t pictures) const REQUIRES(bufferMutex);
+    bool isClosedAt(std::size_t cut) const REQUIRES(bufferMutex);
+    /// The last IDR frame among the cached pictures in front of `end`; 0 where there is none.
+    std::size_t findIdrBefore(std::size_t end) const REQUIRES(bufferMutex);
+    /// When the pictures from the `first` cached one to in front of `end` are shown, and those that went into
+    /// earlier chunks since the same IDR frame.
+    std::vector<std::uint64_t> timesSinceIdr(std::size_t first, std::size_t end) const REQUIRES(bufferMutex);
+    /// By how many pictures the first one is shown later than it is decoded.
+    std::int64_t findDelay() const REQUIRES(bufferMutex);
+    /// Pictures of the record so far and of the cache that a record with that end shows.
+    std::uint64_t countShown(std::uint64_t end) const REQUIRES(bufferMutex);
+    /// Tells the order of the first `count` cached pictures.
+    void placePictures(ChunkData& chunk, std::size_t count, std::uint64_t end) REQUIRES(bufferMutex);
+    /// The end of a record that no command ends: what is cached is shown up to there without a gap, and the
+    /// other media reach as far.
+    std::uint64_t findRestEnd() REQUIRES(bufferMutex);
+    /// When the first picture is shown in front of which one is missing that was to come.
+    std::uint64_t findFirstGap() REQUIRES(bufferMutex);
 
     // A recording without a thread, which only exact rules allow.
     void startWriter() REQUIRES(bufferMutex);
@@ -178,6 +202,9 @@ class StreamBuffer final : public QxModuleStreamInterface,
     void dumpBuffer() const REQUIRES(bufferMutex);
     static void dumpChunk(const ChunkData& chunk);
     static void dump(const SampleList& samples);
+
+    /// A record whose end is not known.
+    static constexpr std::uint64_t kNoEnd = std::numeric_limits<std::uint64_t>::max();
 
     // Constant after construction.
     /// Not owned.

@@ -2,7 +2,6 @@
 
 #include <algorithm>
 #include <iterator>
-#include <limits>
 #include <utility>
 
 #include "buffer/ChunkTimeline.h"
@@ -21,13 +20,6 @@ constexpr std::size_t kVideoLimit = 600;
 constexpr std::size_t kAudioLimit = 900;
 constexpr std::size_t kMetaLimit = 600;
 constexpr std::size_t kFileQueueLimit = 48;
-
-/// Pictures that are looked at for one that is shown earlier. None that a decoder can show is so late: at 60
-/// frames a second they last five seconds.
-constexpr std::size_t kLongestReordering = 300;
-
-/// A record whose end is not known.
-constexpr std::uint64_t kNoEnd = std::numeric_limits<std::uint64_t>::max();
 
 const char* messageOf(PassResult error) {
     switch (error) {
@@ -134,10 +126,14 @@ PassResult StreamBuffer::makePass() {
         // Contract: record-ends-on-chunk. The last one may hold 7 units beyond the stop.
         return kRecordEnded;
     }
-    if (videoBuffer.size() < kMinimumVideoUnits || !isOrderKnown(chunkFrames)) {
+    if (videoBuffer.size() < kMinimumVideoUnits) {
         return kGoOn;
     }
-    const std::optional<ChunkCounts> counts = findChunk(chunkFrames, kNoEnd);
+    // What was cached while the first picture waited to be shown is presented before it.
+    if (inDecodingOrder() && (!startInStep() || !isOrderKnown(chunkFrames))) {
+        return kGoOn;
+    }
+    const std::optional<ChunkCounts> counts = findChunk(findCut(chunkFrames), kNoEnd);
     return counts ? pushChunk(*counts, kNoEnd) : kGoOn;
 }
 
@@ -172,12 +168,7 @@ StreamBuffer::ChunkEnd StreamBuffer::findChunkEnd(std::size_t pictures, std::uin
     std::uint64_t counted = pictures + chunkedVideo;
     if (inDecodingOrder() && end != kNoEnd) {
         // Pictures that others need and that nobody sees have no other media.
-        const std::size_t needed = countNeeded(end);
-        const auto shown =
-            std::count_if(videoBuffer.begin(), videoBuffer.begin() + static_cast<std::ptrdiff_t>(needed),
-                          [&](const auto& unit) { return shownAt(*unit) < end; });
-        counted = std::min(
-            counted, chunkedVideo - presentationOrder.CountFrom(end) + static_cast<std::uint64_t>(shown));
+        counted = std::min(counted, countShown(end));
     }
     const std::uint64_t video = counted * streamInfo.video_sample_duration - (audioFrame >> 1);
     return {video, rescale(video, streamInfo.video_track_timescale, streamInfo.audio_track_timescale)};
@@ -229,7 +220,8 @@ std::optional<StreamBuffer::ChunkCounts> StreamBuffer::findChunk(std::size_t pic
 PassResult StreamBuffer::pushChunk(const ChunkCounts& counts, std::uint64_t end) {
     auto chunk = std::make_shared<ChunkData>();
     chunk->firstVideo = videoBuffer.front();
-    chunk->firstMeta = metaBuffer.front();
+    // Pictures that others need and that nobody sees may be all that is left.
+    chunk->firstMeta = metaBuffer.empty() ? nullptr : metaBuffer.front();
     splitVideo(*chunk, counts.video, end);
     splitAudio(*chunk, counts.audio);
     splitMeta(*chunk, counts.meta, end);
@@ -287,49 +279,17 @@ void StreamBuffer::splitVideo(ChunkData& chunk, std::size_t count, std::uint64_t
     std::uint64_t next = 0;
     const std::uint64_t duration =
         rescale(streamInfo.video_sample_duration, streamInfo.video_track_timescale, videoRtpRate);
-    std::vector<std::uint64_t> shown;
     if (inDecodingOrder()) {
-        std::transform(videoBuffer.begin(), videoBuffer.end(), std::back_inserter(shown),
-                       [this](const auto& unit) { return shownAt(*unit); });
+        placePictures(chunk, count, end);
     }
     if (!takeUnits(videoBuffer, count, duration, units, next)) {
         return;
     }
-    {
-        MutexLock lock(analyzerMutex);
-        analyzer.ConvertVideo(units, chunk.video);
-        // An end is one of showing.
-        setDurations(chunk.video, inDecodingOrder() ? next : std::min(next, end), videoRtpRate,
-                     streamInfo.video_track_timescale);
-    }
-    if (inDecodingOrder()) {
-        placePictures(chunk, shown, end);
-    }
-}
-
-bool StreamBuffer::isOrderKnown(std::size_t pictures) const {
-    if (!inDecodingOrder() || videoBuffer.size() >= kLongestReordering) {
-        return true;
-    }
-    // What follows the newest picture is shown no earlier than that one is decoded.
-    const std::uint64_t decoded = videoBuffer.back()->rtp_timestamp;
-    const auto end =
-        videoBuffer.begin() + static_cast<std::ptrdiff_t>(std::min(pictures, videoBuffer.size()));
-    return std::all_of(videoBuffer.begin(), end, [&](const auto& unit) { return shownAt(*unit) <= decoded; });
-}
-
-void StreamBuffer::placePictures(ChunkData& chunk, const std::vector<std::uint64_t>& shown,
-                                 std::uint64_t end) {
-    const auto isIdr = [](const auto& sample) { return sample->GetSync(); };
-    for (auto sample = chunk.video.begin(); sample != chunk.video.end(); ++sample) {
-        const auto next = std::find_if(sample + 1, chunk.video.end(), isIdr);
-        const auto first = static_cast<std::size_t>(sample - chunk.video.begin());
-        const std::size_t known =
-            next == chunk.video.end() ? shown.size() : static_cast<std::size_t>(next - chunk.video.begin());
-        chunk.shownLater.push_back(
-            presentationOrder.Place(shown.data() + first, known - first, isIdr(*sample)));
-    }
-    chunk.hiddenVideo = end == kNoEnd ? 0 : presentationOrder.CountFrom(end);
+    MutexLock lock(analyzerMutex);
+    analyzer.ConvertVideo(units, chunk.video);
+    // An end is one of showing.
+    setDurations(chunk.video, inDecodingOrder() ? next : std::min(next, end), videoRtpRate,
+                 streamInfo.video_track_timescale);
 }
 
 void StreamBuffer::splitAudio(ChunkData& chunk, std::size_t count) {

@@ -56,9 +56,10 @@ PassResult StreamBuffer::makeExactPass() {
         if (!inStep || !hasTimeline() || (!reachesEnd && pictures < kMinimumVideoUnits)) {
             return kGoOn;
         }
-        const std::size_t cut = std::min<std::size_t>(chunkFrames, pictures);
-        const std::optional<ChunkCounts> counts =
-            reachesEnd || isOrderKnown(cut) ? findChunk(cut, end) : std::nullopt;
+        if (!reachesEnd && !isOrderKnown(chunkFrames)) {
+            return kGoOn;
+        }
+        const std::optional<ChunkCounts> counts = findChunk(findCut(pictures), end);
         if (!counts) {
             return kGoOn;
         }
@@ -71,9 +72,12 @@ PassResult StreamBuffer::makeExactPass() {
 }
 
 void StreamBuffer::cutRest() {
-    const std::uint64_t end = findEnd();
-    while (!writerMissing && !videoBuffer.empty() && hasTimeline() && startInStep()) {
-        std::size_t pictures = std::min<std::size_t>(chunkFrames, countNeeded(end));
+    if (writerMissing || videoBuffer.empty() || !hasTimeline() || !startInStep()) {
+        return;
+    }
+    const std::uint64_t end = findRestEnd();
+    while (!videoBuffer.empty()) {
+        std::size_t pictures = findCut(countNeeded(end));
         std::optional<ChunkCounts> counts;
         for (; pictures > 0 && !counts; --pictures) {
             counts = findCompleteChunk(pictures, end);
@@ -143,7 +147,7 @@ std::optional<StreamBuffer::ChunkCounts> StreamBuffer::findCompleteChunk(std::si
         CountUpTo(chunkEnd.audio, chunkedAudio, streamInfo.audio_sample_duration, audioBuffer.size());
     const int metaCount = CountUpTo(chunkEnd.video, chunkedMeta, streamInfo.video_sample_duration,
                                     countBefore(metaBuffer, end));
-    if (audioCount == -1 || metaCount == -1 || metaBuffer.empty()) {
+    if (audioCount == -1 || metaCount == -1) {
         return std::nullopt;
     }
     return ChunkCounts{pictures, static_cast<std::size_t>(audioCount), static_cast<std::size_t>(metaCount)};

@@ -80,7 +80,8 @@ PictureOrder readPictureOrder(QxModuleHostInterface& host) {
     if (order == kPictureOrderDecoding) {
         return PictureOrder::kDecoding;
     }
-    if (order != kPictureOrderPresentation) {
+    // A host may answer with nothing where it has no such parameter.
+    if (!order.empty() && order != kPictureOrderPresentation) {
         CLIPFILE_LOG(LOG_PRIORITY_WARNING, "unknown picture order \"%s\", \"presentation\" is used.",
                      order.c_str());
     }
@@ -129,6 +130,8 @@ bool Controller::Initialize(QxModuleHostInterface* moduleHost) {
     const OutputSettings now = getSettings();
     isExact = now.recordRules == RecordRules::kExact;
     isSync = isOutputMode(kOutputModeSync);
+    inDecodingOrder = now.pictureOrder == PictureOrder::kDecoding;
+    presentationNoted = false;
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "file output path = %s.", now.outputPath.c_str());
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "fileType   = %s.", now.fileType.c_str());
     CLIPFILE_LOG(LOG_PRIORITY_TRACE, "naluType   = %s.", now.naluType.c_str());
@@ -136,7 +139,7 @@ bool Controller::Initialize(QxModuleHostInterface* moduleHost) {
     if (now.recordRules == RecordRules::kExact) {
         CLIPFILE_LOG(LOG_PRIORITY_TRACE, "recordRules = exact.");
     }
-    if (now.pictureOrder == PictureOrder::kDecoding) {
+    if (inDecodingOrder) {
         CLIPFILE_LOG(LOG_PRIORITY_TRACE, "pictureOrder = decoding.");
     }
     {

@@ -103,6 +103,8 @@ class Controller : public ControllerInterface, public QxModuleStreamInterface {
     std::int32_t readRecFlag(const StreamData& unit) EXCLUDES(analyzerMutex);
     std::shared_ptr<nal_access::SampleData> readTimecode(const std::shared_ptr<StreamData>& unit)
         EXCLUDES(analyzerMutex);
+    /// Tells once a life that a picture does not say when it is shown. By the video queue thread alone.
+    void checkPresentationTime(Medium medium, const StreamData& unit);
     static void pushTo(StreamBuffer& buffer, Medium medium, const std::shared_ptr<StreamData>& unit);
     void pushToBuffers(Medium medium, const std::shared_ptr<StreamData>& unit) EXCLUDES(streamBuffersMutex);
     void StartStream(const std::shared_ptr<StreamData>& unit) EXCLUDES(streamBuffersMutex);
@@ -140,6 +142,7 @@ class Controller : public ControllerInterface, public QxModuleStreamInterface {
     std::shared_ptr<std::thread> eventThread;
     bool isExact = false;
     bool isSync = false;
+    bool inDecodingOrder = false;
 
     // Constant after construction.
     const int queueCapacity = 50;
@@ -183,6 +186,9 @@ class Controller : public ControllerInterface, public QxModuleStreamInterface {
     /// it.
     Mutex analyzerMutex;
     std::shared_ptr<nal_access::StreamAnalyzer> analyzer GUARDED_BY(analyzerMutex);
+
+    /// Used by the video queue thread alone once that runs.
+    bool presentationNoted = false;
 
     /// Last record flag seen, -1 before the first. Used by the metadata queue thread alone once that runs.
     std::int32_t recFlag = -1;

@@ -9,6 +9,7 @@
 #include "buffer/StreamBuffer.h"
 #include "common/Log.h"
 #include "common/LogScope.h"
+#include "common/PresentationTime.h"
 #include "controller/Controller.h"
 
 namespace clipfileModule {
@@ -93,7 +94,18 @@ void Controller::pushTo(StreamBuffer& buffer, Medium medium, const std::shared_p
     }
 }
 
+void Controller::checkPresentationTime(Medium medium, const StreamData& unit) {
+    if (medium == Medium::kVideo && inDecodingOrder && !presentationNoted && !HasPresentationTime(unit)) {
+        presentationNoted = true;
+        CLIPFILE_LOG(LOG_PRIORITY_WARNING,
+                     "presentation_timestamp %llu of rtp_timestamp %llu is not followed. shown when decoded.",
+                     static_cast<unsigned long long>(unit.presentation_timestamp),
+                     static_cast<unsigned long long>(unit.rtp_timestamp));
+    }
+}
+
 void Controller::pushToBuffers(Medium medium, const std::shared_ptr<StreamData>& unit) {
+    checkPresentationTime(medium, *unit);
     MutexLock lock(streamBuffersMutex);
     keepUnit(medium, unit);
     for (const Recording& recording : streamBuffers) {

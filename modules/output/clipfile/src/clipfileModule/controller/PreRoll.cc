@@ -85,9 +85,12 @@ void PreRoll::Clear() {
 std::vector<PreRoll::Entry> PreRoll::From(std::uint64_t timestamp) const {
     std::vector<Entry> entries;
     std::array<std::size_t, 3> next = {};
+    bool hasPicture = false;
     const auto belongs = [&](Medium medium, const StreamData& unit) {
         if (medium == Medium::kVideo) {
-            return PresentationMilliSec(unit, pictureOrder_) >= timestamp;
+            // In decoding order what follows may be shown earlier, and is needed all the same.
+            return (hasPicture && pictureOrder_ == PictureOrder::kDecoding) ||
+                   PresentationMilliSec(unit, pictureOrder_) >= timestamp;
         }
         const std::uint64_t lead = medium == Medium::kAudio ? kAudioLead : 0;
         return unit.timestamp + lead >= timestamp;
@@ -116,6 +119,7 @@ std::vector<PreRoll::Entry> PreRoll::From(std::uint64_t timestamp) const {
             return entries;
         }
         entries.push_back({static_cast<Medium>(*first), tracks_[*first].units[next[*first]++]});
+        hasPicture = hasPicture || entries.back().medium == Medium::kVideo;
     }
 }
 

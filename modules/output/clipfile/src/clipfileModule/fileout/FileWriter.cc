@@ -143,6 +143,10 @@ bool FileWriter::outputFile(std::deque<std::shared_ptr<ChunkData>>& deque) {
                 CLIPFILE_LOG(LOG_PRIORITY_DETAIL, "mp4 file over. no idr frame. %d",
                              static_cast<int>(writtenVideoSamples_));
             } else {
+                if (settings_.pictureOrder == PictureOrder::kDecoding && !startsWithIdrFrame(*chunk)) {
+                    CLIPFILE_LOG(LOG_PRIORITY_WARNING,
+                                 "no idr frame comes. the next file begins without one.");
+                }
                 CLIPFILE_LOG(LOG_PRIORITY_TRACE, "mp4 file over %lld min.",
                              static_cast<long long>(settings_.maxFileSize));
                 CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: FILE ROTATION.");
@@ -186,16 +190,21 @@ bool FileWriter::outputFile(std::deque<std::shared_ptr<ChunkData>>& deque) {
     return false;
 }
 
+bool FileWriter::startsWithIdrFrame(const ChunkData& chunk) {
+    return !chunk.video.empty() && chunk.video.front()->GetSync();
+}
+
 bool FileWriter::waitsForIdrFrame(const ChunkData& chunk, std::uint64_t excess) const {
     // Pictures in front of the first IDR frame could not be decoded in the file that begins here. A stream
     // whose IDR frames never meet the cadence must not make one endless file, though.
-    const bool startsWithIdr = !chunk.video.empty() && chunk.video.front()->GetSync();
-    if (settings_.pictureOrder == PictureOrder::kDecoding) {
-        // Anywhere else pictures of one file would stand in front of its first one, or need the file before.
-        return !startsWithIdr;
+    if (startsWithIdrFrame(chunk)) {
+        return false;
     }
-    return settings_.recordRules == RecordRules::kExact && !startsWithIdr &&
-           excess < muxer_->MinutesToDuration(idrWaitMinutes);
+    if (settings_.pictureOrder == PictureOrder::kDecoding) {
+        // Where the order is not closed, pictures of one file would be shown in the middle of the other.
+        return !lastChunk_->isOrderClosed || excess < muxer_->MinutesToDuration(2 * idrWaitMinutes);
+    }
+    return settings_.recordRules == RecordRules::kExact && excess < muxer_->MinutesToDuration(idrWaitMinutes);
 }
 
 bool FileWriter::endsOutOfStep(const ChunkData& chunk, std::uint64_t excess) const {

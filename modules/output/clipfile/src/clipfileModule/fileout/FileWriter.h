@@ -83,6 +83,7 @@ class FileWriter {
     /// Added in the size log line, in bytes: 200 MiB.
     static constexpr std::uint64_t fileSizeMargin = 209715200;
     /// How far beyond its length a file waits for an IDR frame where audio and video are in step, in minutes.
+    /// With pictures in decoding order it waits as long again for any IDR frame.
     static constexpr std::uint64_t idrWaitMinutes = 2;
 
     // What follows runs on the thread.
@@ -92,8 +93,9 @@ class FileWriter {
     std::deque<std::shared_ptr<ChunkData>> takeChunks(bool wait);
     /// Writes the chunks of `deque`. True on a failure, which has been reported.
     bool outputFile(std::deque<std::shared_ptr<ChunkData>>& deque);
+    static bool startsWithIdrFrame(const ChunkData& chunk);
     /// True when a file that is `excess` ticks past its length must go on with `chunk`, since a new one could
-    /// not be decoded from there.
+    /// not be decoded from there. There is a chunk before it.
     bool waitsForIdrFrame(const ChunkData& chunk, std::uint64_t excess) const;
     /// True when a file that is `excess` ticks past its length may end although audio and video are not quite
     /// in step.

@@ -57,6 +57,9 @@ MbxStatus Mp4File::writeSampleInfo(const InputStreamInfo& info, const ChunkData&
 
 MbxStatus Mp4File::enterSamples(const MuxerRoutine& routine, const SamplePass& pass) {
     std::uint32_t randomAccess = IsFragmentOpen();
+    if (randomAccess != MBX_NO_INDEX_ROW && inDecodingOrder()) {
+        randomAccess = MBX_INDEX_ROW_OF_PRESENTATION;
+    }
     const std::uint32_t track = m_track_ids[pass.track];
     const bool isReordered = pass.shownLater != nullptr && inDecodingOrder();
     for (std::size_t i = 0; i < pass.samples.size(); ++i) {
@@ -75,7 +78,7 @@ MbxStatus Mp4File::enterSamples(const MuxerRoutine& routine, const SamplePass& p
             status != MBX_OK) {
             return status;
         }
-        randomAccess = 0;
+        randomAccess = MBX_NO_INDEX_ROW;
         m_payload += sample.size;
         ++pass.counter;
         const unsigned long long end = pass.counter * pass.duration;

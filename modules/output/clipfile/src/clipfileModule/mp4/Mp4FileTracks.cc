@@ -1,5 +1,6 @@
 // What stands in a file: its profile, its tracks, edits and times.
 
+#include <algorithm>
 #include <cstddef>
 #include <iterator>
 
@@ -243,7 +244,7 @@ MbxStatus Mp4File::createElst() {
 }
 
 std::uint64_t Mp4File::shownDuration() const {
-    return (m_video_count - m_hidden_count) * m_info.video_sample_duration;
+    return (m_video_count - std::min(m_video_count, m_hidden_count)) * m_info.video_sample_duration;
 }
 
 MbxStatus Mp4File::updateTimestamp() {

@@ -112,9 +112,10 @@ MbxStatus Mp4FragmentMuxer::writeMoovAndMdat(MuxerRoutine& routine) {
         MUXER_STEP(routine, MbxSealFirstFragment(session));
         beginFlush();
     }
-    if (hasEdit(kVideoTrack)) {
+    if (hasEdit(kVideoTrack) && !m_flush->hasEdits) {
         MUXER_STEP(routine, createElst());
         MUXER_STEP(routine, setExactEdit(kOpenEdit));
+        m_flush->hasEdits = true;
     }
     MUXER_STEP(routine, updateTimestamp());
 
@@ -173,7 +174,7 @@ MbxStatus Mp4FragmentMuxer::writeMoofAndMdat(MuxerRoutine& routine) {
 }
 
 void Mp4FragmentMuxer::beginFlush() {
-    m_flush = Flush{std::exchange(m_pending, {}), std::exchange(m_payload, 0), 0};
+    m_flush = Flush{std::exchange(m_pending, {}), std::exchange(m_payload, 0), 0, false};
 }
 
 MbxStatus Mp4FragmentMuxer::endFlush(MbxStatus status, std::uint64_t position) {

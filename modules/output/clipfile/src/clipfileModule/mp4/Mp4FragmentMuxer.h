@@ -88,6 +88,7 @@ class Mp4FragmentMuxer : public Mp4File {
         std::list<std::shared_ptr<ChunkData>> chunks;
         std::uint64_t payload;  // bytes of their samples
         std::uint64_t shift;    // what was added to their chunk offsets
+        bool hasEdits;          // the tracks have got theirs, which only `moov` tells
     };
     std::optional<Flush> m_flush;
     const std::uint32_t m_chunks_per_fragment = 32;

@@ -458,6 +458,29 @@ TEST_F(SampleStoreTest, AnIndexEntryHoldsTimeFragmentTrackChunkAndPlaceInIt) {
     EXPECT_EQ(tracks[0].fragmentIndex.first, nullptr);
 }
 
+TEST_F(SampleStoreTest, AnIndexEntryTellsThePresentationTimeToThoseWhoAskForThat) {
+    ASSERT_EQ(MbxAppendSegments(context, &movie), MBX_OK);
+    movie.fragmentCount = 1;
+    MbxSampleInfo info = sample(100, 10);
+    info.compositionOffset = 25;
+    ASSERT_EQ(add(info, 1, MBX_INDEX_ROW_OF_DECODING), MBX_OK);
+    ASSERT_EQ(add(info, 1, MBX_INDEX_ROW_OF_PRESENTATION), MBX_OK);
+    const auto rows = Entries<MbxFragmentIndexEntry>(track->fragmentIndex);
+    ASSERT_EQ(rows.size(), 2U);
+    EXPECT_EQ(rows[0].time, 0U);
+    EXPECT_EQ(rows[1].time, 35U);
+}
+
+TEST_F(SampleStoreTest, AnIndexEntryOfAPresentationBeforeTheBeginningTells0) {
+    ASSERT_EQ(MbxTrackSetSignedOffsets(context, track, 1), MBX_OK);
+    ASSERT_EQ(MbxAppendSegments(context, &movie), MBX_OK);
+    movie.fragmentCount = 1;
+    MbxSampleInfo info = sample(100, 10);
+    info.compositionOffset = -3;
+    ASSERT_EQ(add(info, 1, MBX_INDEX_ROW_OF_PRESENTATION), MBX_OK);
+    EXPECT_EQ(Entries<MbxFragmentIndexEntry>(track->fragmentIndex).at(0).time, 0U);
+}
+
 TEST_F(SampleStoreTest, AnIndexEntryWhoseFragmentNumberDisagreesIsInternal) {
     ASSERT_EQ(MbxAppendSegments(context, &movie), MBX_OK);
     EXPECT_EQ(add(sample(), 1, 1), MBX_ERR_INTERNAL);

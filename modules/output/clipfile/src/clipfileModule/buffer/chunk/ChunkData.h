@@ -29,7 +29,9 @@ struct ChunkData {
     /// Of video in decoding order: by how many pictures each of `video` is shown later than it is decoded.
     /// Empty where both orders are one.
     std::vector<std::int32_t> shownLater;
-    /// Pictures of the record so far, this chunk included, that others need and that lie behind its end.
+    /// Of these: every picture so far is shown before all that follow.
+    bool isOrderClosed = false;
+    /// Of these, this chunk included: pictures that others need and that lie behind the end of the record.
     std::uint64_t hiddenVideo = 0;
 };
 
