@@ -25,9 +25,6 @@ constexpr int kReorderDepth = kMostReorderFrames;
 /// More than there are pictures in front of one that they all need.
 constexpr int kStraight = 2 * kReorderDepth;
 
-constexpr const char* kInOrder = "the video no longer sends its pictures reordered (B frames)";
-constexpr const char* kReorderedOtherwise =
-    "the order changed in which the video sends its pictures (B frames)";
 constexpr const char* kReordered = "the video begins to send its pictures reordered (B frames)";
 
 /// First bytes of the parameter sets of HEVC (ITU-T H.265 7.3.1.2, types 32, 33 and 34). In H.264 they would
@@ -108,7 +105,7 @@ void FormatWatch::LookAtReordering(std::optional<std::int64_t> delay, bool late)
         straight_ = std::abs(*delay) <= period_ / 2 ? straight_ + 1 : 0;
     }
     if (straight_ >= kStraight) {
-        throw FormatChanged(kInOrder);
+        throw FormatChanged(kReorderedNoMore);
     }
 }
 

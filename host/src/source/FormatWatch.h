@@ -18,6 +18,9 @@ class FormatChanged : public std::runtime_error {
 };
 
 inline constexpr const char* kRateChanged = "the frame rate of the video changed";
+inline constexpr const char* kReorderedNoMore = "the video no longer sends its pictures reordered (B frames)";
+inline constexpr const char* kReorderedOtherwise =
+    "the order changed in which the video sends its pictures (B frames)";
 
 /// Watches the video of a connection for what neither its container nor its decoder tells: another codec,
 /// another frame rate, pictures that begin or end to be sent in another order than they are shown in.

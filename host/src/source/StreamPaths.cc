@@ -131,6 +131,7 @@ void DecideVideo(AVFormatContext& format, AVStream& stream, const Packets& ahead
     }
     if (paths.passes) {
         description.reordering = ReorderDepth(findings, parameters, pass->ReorderFrames());
+        pass->SetReordering(description.reordering);
         paths.video = std::move(pass);
         description.summary = VideoSummary(H264With(parameters), description);
     } else {

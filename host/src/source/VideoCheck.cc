@@ -81,13 +81,24 @@ bool TellsDecoding(const AVFormatContext& format) {
     return name != "sdp" && name != "rtsp" && name != "rtp" && name != "matroska,webm";
 }
 
-std::optional<std::int64_t> DelayOfStart(const AVStream& stream, const std::vector<Stamps>& stamps) {
-    const auto found = std::find_if(stamps.begin(), stamps.end(), [](const Stamps& stamp) {
-        return stamp.keyFrame && stamp.decoded && *stamp.decoded < stamp.shown;
-    });
-    return found != stamps.end()
-               ? std::optional(av_rescale_q(found->shown - *found->decoded, stream.time_base, {1, 90000}))
-               : std::nullopt;
+/// How much earlier the n-th picture is decoded than the n-th one is shown, of the middle one: at either end
+/// pictures are missing that are shown beyond it.
+std::optional<std::int64_t> DelayOfTurns(const AVStream& stream, const std::vector<Stamps>& stamps) {
+    std::vector<std::int64_t> shown;
+    std::vector<std::int64_t> decoded;
+    for (const Stamps& picture : stamps) {
+        if (picture.decoded) {
+            shown.push_back(picture.shown);
+            decoded.push_back(*picture.decoded);
+        }
+    }
+    if (shown.empty()) {
+        return std::nullopt;
+    }
+    const auto middle = static_cast<std::ptrdiff_t>(shown.size() / 2);
+    std::nth_element(shown.begin(), shown.begin() + middle, shown.end());
+    std::nth_element(decoded.begin(), decoded.begin() + middle, decoded.end());
+    return av_rescale_q(shown[shown.size() / 2] - decoded[decoded.size() / 2], stream.time_base, kTicks);
 }
 
 /// Of pictures that are reordered.
@@ -172,7 +183,7 @@ VideoFindings CheckVideo(AVFormatContext& format, AVStream& stream,
     findings.unordered = stamps.empty() && pictures.stamped > 0 && stream.codecpar->video_delay > 0;
     if (findings.reordered) {
         findings.decodedAhead = DecodedAhead(stamps);
-        findings.delay = TellsDecoding(format) ? DelayOfStart(stream, stamps) : std::nullopt;
+        findings.delay = TellsDecoding(format) ? DelayOfTurns(stream, stamps) : std::nullopt;
     }
     AVRational pictureRate{0, 1};
     if (stream.codecpar->codec_id == AV_CODEC_ID_H264) {

@@ -22,8 +22,8 @@ struct VideoFindings {
     bool unordered = false;
     /// Of reordered ones: as many as were decoded in front of one that is shown before all of them.
     std::uint32_t decodedAhead = 0;
-    /// Of these: how much later than it is decoded a picture is shown that decoding can begin with, in ticks
-    /// of 90000. Nothing where the source does not tell when pictures are decoded.
+    /// Of these: how much earlier the n-th one is decoded than the n-th one is shown, in ticks of 90000.
+    /// Nothing where the source does not tell when pictures are decoded.
     std::optional<std::int64_t> delay;
     /// Pictures are interlaced frames.
     bool interlaced = false;

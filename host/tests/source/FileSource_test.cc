@@ -275,6 +275,37 @@ TEST_P(ReorderedFile, ComesInTheOrderOfDecodingWithTheTimesAtWhichPicturesAreSho
 
 INSTANTIATE_TEST_SUITE_P(Containers, ReorderedFile, testing::Values("ts", "mp4", "mov", "flv", "mkv", "nut"));
 
+/// Ticks by which the clock of a source of reordered pictures is set.
+class ReorderedClock : public SourceTest, public testing::WithParamInterface<int> {};
+
+TEST_P(ReorderedClock, ThatIsSetMovesNoPictureFromItsTurn) {
+    const auto make = [this](double offset, const string& name) {
+        Ffmpeg(string(kPicture) + kTone +
+               " -pix_fmt yuv420p -c:v libx264 -preset ultrafast -g 12 -x264-params "
+               "bframes=3:b-pyramid=normal:b-adapt=0:scenecut=0:open-gop=0:repeat-headers=1 " +
+               kPlainAac + "-muxdelay 0 -output_ts_offset " + std::to_string(offset) + " " + name);
+    };
+    make(50, "a.ts");
+    make(51 + GetParam(), "b.ts");
+    Shell("cat a.ts b.ts > c.ts");
+    const auto video = Of(Medium::kVideo, ReadFile("c.ts"));
+    ASSERT_GE(video.size(), 49u);
+    std::vector<std::int64_t> turns;
+    std::vector<std::int64_t> shown;
+    for (const SourceUnit& unit : video) {
+        turns.push_back(unit.time / 3600);
+        shown.push_back((unit.time + unit.later) / 3600);
+    }
+    EXPECT_TRUE(std::is_sorted(turns.begin(), turns.end())) << testing::PrintToString(turns);
+    std::sort(shown.begin(), shown.end());
+    EXPECT_EQ(turns, shown);
+    EXPECT_LE(turns.back(), 51);
+    EXPECT_EQ(notices_.CountOf("the source's clock jumped by"), GetParam() == 0 ? 0u : 1u)
+        << testing::PrintToString(notices_.sentences);
+}
+
+INSTANTIATE_TEST_SUITE_P(Seconds, ReorderedClock, testing::Values(0, 20, -20, 3600));
+
 TEST_F(FileSource, ReorderedPicturesAreRefusedWhereNothingTellsWhenTheyAreShown) {
     Ffmpeg(string(kPicture) + " -pix_fmt yuv420p -c:v libx264 -preset ultrafast -bf 2 a.avi");
     const auto error = Refusal(Fast("a.avi"));
