@@ -36,7 +36,6 @@ def run(options):
     """The exit code: 1 when a job takes more than 5 % more than was kept."""
     if machine.missing("valgrind"):
         raise SystemExit("bench: valgrind is not installed (scripts/bootstrap --bench)")
-    import tempfile
     with tempfile.TemporaryDirectory(prefix="bench.", dir=options.work) as options.work:
         found = {name: count(command, options) for name, command in jobs(options).items()}
     if options.keep_instructions:

@@ -2,6 +2,7 @@
 
 import os
 import shutil
+import subprocess
 
 import machine
 import material
@@ -24,9 +25,11 @@ def contestants(options, source, file_minutes):
                          "d.", "!", *GST_QUEUE.split(), "!", "aacparse", "!", "s.audio_0"],
         "cp": ["cp", source, "copy.ts"],
     }
-    if machine.missing("gst-launch-1.0"):
-        machine.tell("splitmuxsink is left out: gst-launch-1.0 is not installed (scripts/bootstrap --bench)")
-        del commands["splitmuxsink"]
+    for element in ("splitmuxsink", "tsdemux"):
+        if machine.missing("gst-inspect-1.0") or subprocess.run(["gst-inspect-1.0", "--exists", element]).returncode:
+            machine.tell(f"splitmuxsink is left out: GStreamer has no {element} here (scripts/bootstrap --bench)")
+            del commands["splitmuxsink"]
+            break
     return commands
 
 

@@ -44,16 +44,18 @@ def record(options, source, makers):
     the sender begins; what comes while one has no reader yet waits in its socket."""
     folder = os.path.join(options.work, "live")
     addresses = [f"udp://127.0.0.1:{port}" for port in free_ports(len(makers))]
-    runs = [machine.Run(maker(options, address), os.path.join(folder, str(i)), os.path.join(options.work, f"live{i}.log"))
-            for i, (maker, address) in enumerate(zip(makers, addresses))]
-    time.sleep(1)
     outputs = "|".join(f"[f=mpegts]{address}?pkt_size=1316" for address in addresses)
-    sender = machine.Run(["ffmpeg", "-v", "error", "-re", "-stream_loop", "-1", "-i", source,
-                          "-t", str(options.seconds + 10), "-map", "0", "-c", "copy", "-f", "tee", outputs],
-                         options.work, os.path.join(options.work, "sender.log"))
+    started = []
     figures = []
     try:
-        for run in runs:
+        for i, (maker, address) in enumerate(zip(makers, addresses)):
+            started.append(machine.Run(maker(options, address), os.path.join(folder, str(i)),
+                                       os.path.join(options.work, f"live{i}.log")))
+        time.sleep(1)
+        started.append(machine.Run(["ffmpeg", "-v", "error", "-re", "-stream_loop", "-1", "-i", source,
+                                    "-t", str(options.seconds + 10), "-map", "0", "-c", "copy", "-f", "tee", outputs],
+                                   options.work, os.path.join(options.work, "sender.log")))
+        for run in started[:-1]:
             figure = run.finish(allowed=(0, LOST, FAILED), limit=options.seconds + 60)
             figure["failed"] = run.process.returncode == FAILED
             with open(run.log, encoding="utf-8", errors="replace") as log:
@@ -61,11 +63,11 @@ def record(options, source, makers):
             figure["percent_of_a_core"] = figure["cpu_seconds"] / options.seconds * 100
             figures.append(figure)
     finally:
-        for run in [*runs, sender]:
+        for run in started:
             if run.process.returncode is None:
                 run.process.kill()
                 run.process.wait()
-        shutil.rmtree(folder)
+        shutil.rmtree(folder, ignore_errors=True)
     return figures
 
 

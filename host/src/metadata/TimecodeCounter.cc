@@ -7,6 +7,15 @@
 #include "source/SourceInterface.h"
 
 namespace receiver {
+namespace {
+
+/// Frames by which exact stamps differ from the rate: the millisecond of some containers at 100 frames a
+/// second.
+constexpr double kExact = 0.1;
+/// Frames that jitter makes late one behind the other.
+constexpr int kJitterInARow = 3;
+
+}  // namespace
 
 Timecode TimecodeOfDay(double secondsOfDay, const FrameRate& rate, bool dropFrame) {
     const double whole = std::floor(secondsOfDay);
@@ -45,17 +54,34 @@ Timecode TimecodeCounter::Next(std::int64_t time, const std::optional<Timecode>&
         anchor_ = Anchor{time, FrameNumberOf(first_, rate_.timecodeFrames), first_.dropFrame};
         return first_;
     }
-    // A frame that comes up to one frame early or late is jitter, and the next number is its own. Anything
-    // more is a gap.
-    const std::int64_t expected = frames_ + 1;
-    const std::int64_t measured = FramesBetween(anchor_->time, time);
-    frames_ = std::abs(measured - expected) <= 1 ? expected : std::max(measured, expected);
+    frames_ = NumberAt(time);
     return TimecodeOf(anchor_->number + frames_, rate_.timecodeFrames, anchor_->dropFrame);
 }
 
-std::int64_t TimecodeCounter::FramesBetween(std::int64_t from, std::int64_t to) const {
-    const std::int64_t ticks = kVideoClock * rate_.denominator;
-    return ((to - from) * rate_.numerator + ticks / 2) / ticks;
+std::int64_t TimecodeCounter::NumberAt(std::int64_t time) {
+    const std::int64_t expected = frames_ + 1;
+    const double late = FramesBetween(anchor_->time, time) - static_cast<double>(expected);
+    const std::int64_t lost = std::llround(std::max(late, 0.0));
+    if (lost == 0) {
+        jitter_ = std::max(jitter_, std::abs(late));
+        lateInARow_ = 0;
+        return expected;
+    }
+    ++lateInARow_;
+    // A lost frame leaves those behind it one late, jitter only some. Where stamps are exact that is seen at
+    // once.
+    const bool exact = jitter_ < kExact && std::abs(late - 1) < kExact;
+    if (lost > 1 || exact || lateInARow_ > kJitterInARow) {
+        lateInARow_ = 0;
+        return expected + lost;
+    }
+    return expected;
+}
+
+double TimecodeCounter::FramesBetween(std::int64_t from, std::int64_t to) const {
+    const auto numerator = static_cast<double>(rate_.numerator);
+    const auto denominator = static_cast<double>(rate_.denominator);
+    return static_cast<double>(to - from) * numerator / (static_cast<double>(kVideoClock) * denominator);
 }
 
 }  // namespace receiver

@@ -35,14 +35,20 @@ class TimecodeCounter {
         bool dropFrame;
     };
 
-    /// Frames from `from` to `to`, to the nearest.
-    std::int64_t FramesBetween(std::int64_t from, std::int64_t to) const;
+    /// Frames from the anchor to the frame at `time`: one more than to the last, and those that are missing
+    /// between.
+    std::int64_t NumberAt(std::int64_t time);
+    double FramesBetween(std::int64_t from, std::int64_t to) const;
 
     const FrameRate rate_;
     const Timecode first_;
     std::optional<Anchor> anchor_;
     /// Frames since the anchor.
     std::int64_t frames_ = 0;
+    /// Largest distance of a frame from where the rate has it, in frames.
+    double jitter_ = 0;
+    /// Frames, up to the last, that came more than half a frame late and may be jitter.
+    int lateInARow_ = 0;
 };
 
 }  // namespace receiver

@@ -6,31 +6,15 @@
 #include <utility>
 
 #include "common/NativePath.h"
+#include "module/ModuleLines.h"
 
 namespace receiver {
 namespace {
-
-/// What stands between `prefix` and `suffix` in a line, with slashes for the backslashes that separate
-/// folders inside the module. Nothing when the line is another one.
-std::optional<std::string> PathBetween(std::string_view text, std::string_view prefix,
-                                       std::string_view suffix) {
-    if (!text.starts_with(prefix) || !text.ends_with(suffix) || text.size() < prefix.size() + suffix.size()) {
-        return std::nullopt;
-    }
-    text.remove_prefix(prefix.size());
-    text.remove_suffix(suffix.size());
-    return NativePath(std::string(text));
-}
-
-constexpr std::string_view kOutputPath = "file output path = ";
 
 /// The line of a refused logon ends with path, user name and password, which may hold anything, commas and
 /// line breaks included. So what is shown of it ends with the path, which is known, or in front of it where
 /// it is another one.
 std::string_view WithoutLogon(std::string_view text, std::string_view outputPath) {
-    if (!text.starts_with("LogonUser call failed.")) {
-        return text;
-    }
     std::size_t end = text.find(", ");
     end = end == std::string_view::npos ? end : text.find(", ", end + 2);
     if (end == std::string_view::npos) {
@@ -45,21 +29,17 @@ std::string_view WithoutLogon(std::string_view text, std::string_view outputPath
 class ModuleLog::Sink final : public LogSinkInterface {
  public:
     void OnLine(const LogLine& line) override {
-        switch (line.priority) {
-            case LOG_PRIORITY_OPERATOR:
-                OnOperatorLine(line.text);
-                break;
-            case LOG_PRIORITY_ERROR:
-                OnError(line.text);
-                break;
-            case LOG_PRIORITY_WARNING:
-                OnWarning(line.text);
-                break;
-            case LOG_PRIORITY_TRACE:
-                OnTrace(line.text, line.function);
-                break;
-            default:
-                break;
+        // Most lines mean nothing: the trace has a few for each unit. They are passed over without the lock.
+        const std::optional<UnderstoodLine> understood = Understand(line);
+        if (!understood && line.priority != LOG_PRIORITY_ERROR) {
+            return;
+        }
+        const std::lock_guard lock(mutex);
+        if (line.priority == LOG_PRIORITY_ERROR) {
+            events.push_back({ModuleEvent::Kind::kError,
+                              std::string(understood ? WithoutLogon(line.text, outputPath_) : line.text)});
+        } else {
+            Follow(*understood);
         }
     }
 
@@ -79,62 +59,64 @@ class ModuleLog::Sink final : public LogSinkInterface {
         std::string file;
     };
 
-    void OnError(std::string_view text) {
-        const std::lock_guard lock(mutex);
-        events.push_back({ModuleEvent::Kind::kError, std::string(WithoutLogon(text, outputPath_))});
-    }
-
-    void OnOperatorLine(std::string_view text) {
+    void Follow(const UnderstoodLine& line) {
         using Kind = ModuleEvent::Kind;
-        const std::lock_guard lock(mutex);
-        if (text.starts_with("OP: REC START.")) {
-            ++openRecordings;
-            events.push_back({Kind::kRecordStarted, {}});
-        } else if (text.starts_with("OP: REC STOP.")) {
-            events.push_back({Kind::kRecordStopped, {}});
-        } else if (text.starts_with("OP: REMOVE STREAM.")) {
-            --openRecordings;
-            events.push_back({Kind::kRecordRemoved, {}});
-        } else if (text.starts_with("OP: REC RESTART.")) {
-            events.push_back({Kind::kRecordRestarted, {}});
+        switch (line.meaning) {
+            case LineMeaning::kOutputPath:
+                outputPath_ = line.rest;
+                break;
+            case LineMeaning::kFolder:
+                writers_[std::this_thread::get_id()].folder = NativePath(std::string(line.rest));
+                break;
+            case LineMeaning::kFile:
+                Open(writers_[std::this_thread::get_id()], NativePath(std::string(line.rest)));
+                break;
+            case LineMeaning::kWriterEnded:
+                EndWriter();
+                break;
+            case LineMeaning::kRecordStarted:
+                ++openRecordings;
+                events.push_back({Kind::kRecordStarted, {}});
+                break;
+            case LineMeaning::kRecordStopped:
+                events.push_back({Kind::kRecordStopped, {}});
+                break;
+            case LineMeaning::kRecordRemoved:
+                --openRecordings;
+                events.push_back({Kind::kRecordRemoved, {}});
+                break;
+            case LineMeaning::kRecordRestarted:
+                events.push_back({Kind::kRecordRestarted, {}});
+                break;
+            case LineMeaning::kStopCarriedOut:
+                ++stops;
+                changed.notify_all();
+                break;
+            case LineMeaning::kVideoDropped:
+                ++losses.video;
+                break;
+            case LineMeaning::kAudioDropped:
+                ++losses.audio;
+                break;
+            case LineMeaning::kMetaDropped:
+                ++losses.meta;
+                break;
+            case LineMeaning::kLogonRefused:
+                break;
         }
     }
 
-    void OnWarning(std::string_view text) {
-        const std::lock_guard lock(mutex);
-        losses.video += text == "queue overflow (video)" ? 1 : 0;
-        losses.audio += text == "queue overflow (audio)" ? 1 : 0;
-        losses.meta += text == "queue overflow (meta)" ? 1 : 0;
+    void Open(Writer& writer, std::string name) {
+        Close(writer);
+        writer.file = writer.folder.empty() ? std::move(name) : writer.folder + "/" + name;
+        events.push_back({ModuleEvent::Kind::kFileOpened, writer.file});
     }
 
-    /// The trace has a few lines for each unit, so most of them are passed over without the lock.
-    void OnTrace(std::string_view text, const char* function) {
-        if (text.starts_with(kOutputPath) && text.ends_with('.')) {
-            const std::lock_guard lock(mutex);
-            outputPath_ = text.substr(kOutputPath.size());
-            // The full stop.
-            outputPath_.pop_back();
-        } else if (std::optional<std::string> folder = PathBetween(text, "output path = \"", "\".")) {
-            const std::lock_guard lock(mutex);
-            writers_[std::this_thread::get_id()].folder = std::move(*folder);
-        } else if (const std::optional<std::string> name = PathBetween(text, "ST: out_filename = \"", "\"")) {
-            const std::lock_guard lock(mutex);
-            Writer& writer = writers_[std::this_thread::get_id()];
-            Close(writer);
-            writer.file = writer.folder.empty() ? *name : writer.folder + "/" + *name;
-            events.push_back({ModuleEvent::Kind::kFileOpened, writer.file});
-        } else if (text == "start. event_id = 6.") {
-            const std::lock_guard lock(mutex);
-            const auto writer = writers_.find(std::this_thread::get_id());
-            if (writer != writers_.end()) {
-                Close(writer->second);
-                writers_.erase(writer);
-            }
-        } else if (text == "end." && function != nullptr &&
-                   std::string_view(function).ends_with("Controller::OnStopStream")) {
-            const std::lock_guard lock(mutex);
-            ++stops;
-            changed.notify_all();
+    void EndWriter() {
+        const auto writer = writers_.find(std::this_thread::get_id());
+        if (writer != writers_.end()) {
+            Close(writer->second);
+            writers_.erase(writer);
         }
     }
 

@@ -21,13 +21,16 @@ using ::testing::SizeIs;
 
 class FormatChangesTest : public ReceiverFixture {
  protected:
-    /// Two parts of one stream, one behind the other.
-    std::filesystem::path Join(const MaterialOptions& first, const MaterialOptions& second) const {
-        const auto whole = folder.Path() / "changing.ts";
+    /// Two parts of one stream, one behind the other, the second without its first `header` bytes.
+    std::filesystem::path Join(const MaterialOptions& first, const MaterialOptions& second,
+                               std::streamoff header = 0) const {
+        const auto whole = folder.Path() / "joined";
         std::ofstream out(whole, std::ios::binary);
         for (const MaterialOptions& options : {first, second}) {
             const auto part = MakeMaterial(folder, options);
-            out << std::ifstream(part, std::ios::binary).rdbuf();
+            std::ifstream in(part, std::ios::binary);
+            in.seekg(out.tellp() == 0 ? 0 : header);
+            out << in.rdbuf();
             std::filesystem::remove(part);
         }
         return whole;
@@ -62,6 +65,57 @@ TEST_F(FormatChangesTest, AnotherSizeAndRateGoOnInAFileOfTheirOwn) {
     EXPECT_GE(DecodeVideo(recordings[0]).checksums.size(), 40U);
     EXPECT_GE(DecodeVideo(recordings[1]).checksums.size(), 90U);
 }
+
+/// In containers that describe their streams at their beginning.
+class ContainerChangesTest : public FormatChangesTest, public ::testing::WithParamInterface<const char*> {
+ protected:
+    /// Two seconds of 320x180, then two of 256x144.
+    std::filesystem::path Make() const {
+        MaterialOptions first;
+        first.seconds = 2;
+        MaterialOptions second = first;
+        second.size = "256x144";
+        second.more = {"-output_ts_offset", "2"};
+        const auto whole = folder.Path() / ("changing." + std::string(GetParam()));
+        if (whole.extension() == ".flv") {
+            first.container = second.container = "flv";
+            const auto joined = Join(first, second, kFlvHeader);
+            std::filesystem::rename(joined, whole);
+            return whole;
+        }
+        // A part begins with the priming of its audio, 1024 samples in front of its pictures.
+        first.more = {"-muxdelay", "0"};
+        second.more = {
+            "-muxdelay", "0", "-output_ts_offset", "2.021333", "-mpegts_flags", "+initial_discontinuity"};
+        const Outcome outcome = RunProgram(
+            {"ffmpeg", "-v", "error", "-i", Join(first, second).string(), "-c", "copy", whole.string()});
+        EXPECT_EQ(outcome.code, 0) << outcome.errors;
+        return whole;
+    }
+
+ private:
+    /// Of each part but the first; the first tag has the size of the one before in front.
+    static constexpr std::streamoff kFlvHeader = 9 + 4;
+};
+
+TEST_P(ContainerChangesTest, GoOnInAFileOfTheirOwnAndMakeTheExitCode8) {
+    const Outcome outcome =
+        RunReceiver({"--input", Make().string(), "--timecode", "10:00:00:00", "--speed", "4"});
+    EXPECT_EQ(outcome.code, 8) << outcome.errors;
+    EXPECT_THAT(outcome.errors, HasSubstr(": the recording goes on in a new file"));
+    const auto recordings = Recordings();
+    ASSERT_THAT(recordings, SizeIs(2)) << outcome.errors;
+    EXPECT_EQ(StreamOf(AskFfprobe(recordings[0]), "avc1").value("width", 0), 320);
+    EXPECT_EQ(StreamOf(AskFfprobe(recordings[1]), "avc1").value("width", 0), 256);
+    for (const auto& recording : recordings) {
+        const Decoded decoded = DecodeVideo(recording);
+        EXPECT_EQ(decoded.messages, "") << recording;
+        EXPECT_GE(decoded.checksums.size(), 40U) << recording;
+    }
+}
+
+INSTANTIATE_TEST_SUITE_P(Containers, ContainerChangesTest, ::testing::Values("mp4", "mkv", "flv"),
+                         [](const auto& container) { return std::string(container.param); });
 
 /// A live stream that goes on in another format.
 struct LiveChange {

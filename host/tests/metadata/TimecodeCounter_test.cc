@@ -42,6 +42,33 @@ TEST(TimecodeCounter, JitterOfLessThanAFrameChangesNoNumber) {
     EXPECT_EQ(ToString(counter.Next(5400, std::nullopt)), "10:00:00:03");
 }
 
+TEST(TimecodeCounter, LeavesTheNumberOfALostFrameOut) {
+    TimecodeCounter counter(Rate("59.94"), {10, 0, 0, 0, false});
+    counter.Next(0, std::nullopt);
+    EXPECT_EQ(ToString(counter.Next(1502, std::nullopt)), "10:00:00:01");
+    EXPECT_EQ(ToString(counter.Next(4505, std::nullopt)), "10:00:00:03");
+    EXPECT_EQ(ToString(counter.Next(6006, std::nullopt)), "10:00:00:04");
+}
+
+TEST(TimecodeCounter, LeavesTheNumberOfALostFrameOutWhereStampsHaveMillisecondsOnly) {
+    TimecodeCounter counter(Rate("59.94"), {10, 0, 0, 0, false});
+    // At 0, 17, 33, 67 and 83 ms: the one at 50 ms is lost.
+    counter.Next(0, std::nullopt);
+    EXPECT_EQ(ToString(counter.Next(1530, std::nullopt)), "10:00:00:01");
+    EXPECT_EQ(ToString(counter.Next(2970, std::nullopt)), "10:00:00:02");
+    EXPECT_EQ(ToString(counter.Next(6030, std::nullopt)), "10:00:00:04");
+    EXPECT_EQ(ToString(counter.Next(7470, std::nullopt)), "10:00:00:05");
+}
+
+TEST(TimecodeCounter, FramesThatStayLateBehindJitterAreBehindALostOne) {
+    TimecodeCounter counter(Rate("50"), {10, 0, 0, 0, false});
+    std::vector<std::string> addresses;
+    for (const std::int64_t time : {0, 2200, 3400, 7400, 9000, 11000, 12600, 14500}) {
+        addresses.push_back(ToString(counter.Next(time, std::nullopt)).substr(9));
+    }
+    EXPECT_EQ(addresses, (std::vector<std::string>{"00", "01", "02", "03", "04", "05", "07", "08"}));
+}
+
 TEST(TimecodeCounter, NeverRepeatsANumberWhenFramesComeTooFast) {
     TimecodeCounter counter(Rate("25"), {10, 0, 0, 0, false});
     std::string last;

@@ -26,8 +26,8 @@ struct MaterialOptions {
     std::vector<std::string> more;
 };
 
-/// Makes the file in `folder` and returns its path. Throws std::runtime_error with ffmpeg's words when that
-/// fails.
+/// Makes the file in `folder`, a copy of what an earlier test of this build has asked for, and returns its
+/// path. Throws std::runtime_error with ffmpeg's words when that fails.
 std::filesystem::path MakeMaterial(const TemporaryFolder& folder, const MaterialOptions& options = {});
 
 }  // namespace endtoend

@@ -9,6 +9,7 @@
 
 #include "support/BufferHarness.h"
 #include "support/ChunkFollower.h"
+#include "support/Sanitized.h"
 #include "support/StreamUnits.h"
 
 namespace clipfileModule {
@@ -16,12 +17,7 @@ namespace {
 
 using stream_units::FrameRate;
 
-#if defined(__SANITIZE_THREAD__) || defined(__SANITIZE_ADDRESS__)
-// The arithmetic is the same under a sanitizer, and each unit costs many times as much.
-constexpr std::uint64_t kSeconds = 300;
-#else
-constexpr std::uint64_t kSeconds = 3600;
-#endif
+constexpr std::uint64_t kSeconds = kSanitized ? 300 : 3600;
 
 /// The period of the audio and video cadence, in frames of each.
 struct Cadence {

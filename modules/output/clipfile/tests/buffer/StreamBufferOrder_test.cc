@@ -360,6 +360,28 @@ TEST_F(StreamBufferOrder, JitterOfAlmostHalfAPictureChangesNothing) {
     EXPECT_EQ(harness.Chunks()[0]->shownLater[0], 2);
 }
 
+TEST_F(StreamBufferOrder, TheDelayOfARecordRestsOnMoreThanTheStampsOfItsFirstPicture) {
+    // In order, so that nothing tells how many pictures wait but the stamps; reordered later.
+    auto pictures = MakePictures(kInOrder, 1000, 48);
+    for (Picture picture : MakePictures(kPyramid, 1000, 41)) {
+        pictures.push_back({picture.shown + 48, false});
+    }
+    auto units = unitsOf(pictures, 2);
+    // Decoded 0.44 pictures too late, shown as much too early: one picture between them, where there are two.
+    units[0]->rtp_timestamp += 1600;
+    units[0]->presentation_timestamp -= 1600;
+    harness.Start();
+    push(units);
+    pushMediaUpTo(96);
+    harness.buffer->Stop();
+    const CutRecord record = cutRecord();
+    ASSERT_EQ(record.places.size(), pictures.size());
+    for (std::size_t i = 0; i < record.places.size(); ++i) {
+        EXPECT_EQ(static_cast<std::uint64_t>(record.places[i]), pictures[i].shown) << i;
+    }
+    EXPECT_EQ(harness.Chunks()[0]->shownLater[0], 2);
+}
+
 TEST_F(StreamBufferOrder, TimesThatStepBackAtAnIdrFrameMoveNoPicturesOfTheOneBefore) {
     const auto pictures = MakePictures(kPyramid, 25, 75);
     auto units = unitsOf(pictures, 5);
@@ -370,6 +392,7 @@ TEST_F(StreamBufferOrder, TimesThatStepBackAtAnIdrFrameMoveNoPicturesOfTheOneBef
     harness.buffer->SetEndTimestamp(static_cast<std::int64_t>(harness.clock.VideoRtp(62)));
     push(units);
     pushMediaUpTo(80);
+    ASSERT_TRUE(harness.controller.WaitForCall("post 5"));
     harness.buffer->Stop();
     const CutRecord record = cutRecord();
     for (std::size_t i = 0; i < record.places.size(); ++i) {
@@ -391,23 +414,33 @@ TEST_F(StreamBufferOrder, PicturesThatStandBehindTheEndInAnEarlierGroupCountAsSh
     harness.buffer->SetEndTimestamp(static_cast<std::int64_t>(harness.clock.VideoRtp(28)));
     push(units);
     pushMediaUpTo(64);
+    ASSERT_TRUE(harness.controller.WaitForCall("post 5"));
     harness.buffer->Stop();
     EXPECT_EQ(cutRecord().places.size() - cutRecord().hidden, 28u);
     EXPECT_EQ(recordedBy(harness).meta, Range(5, 23));
 }
 
 TEST_F(StreamBufferOrder, PicturesWithoutATimeAreShownAsTheyAreDecoded) {
-    auto units = unitsOf(MakePictures(kPyramid, 25, 50), 2);
-    for (const auto& unit : units) {
-        unit->presentation_timestamp = 0;
-    }
-    harness.Start();
-    push(units);
-    pushMediaUpTo(60);
-    harness.buffer->Stop();
-    EXPECT_EQ(cutRecord().places.size(), 50u);
-    for (const auto& chunk : harness.Chunks()) {
-        EXPECT_THAT(chunk->shownLater, Each(0));
+    const auto pictures = MakePictures(kPyramid, 25, 50);
+    for (const std::size_t output : {0, 1}) {
+        auto units = unitsOf(pictures, 2);
+        for (const auto& unit : units) {
+            // Never set, and 12 s later.
+            unit->presentation_timestamp = output == 0 ? 0 : unit->rtp_timestamp + 12 * 90000;
+        }
+        harness.Start();
+        // A record from here on: none of the pictures may lie before it.
+        harness.buffer->SetStartTimestamp(static_cast<std::int64_t>(harness.clock.VideoRtp(0)));
+        metaPushed = 0;
+        harness.nextAudio = 0;
+        push(units);
+        pushMediaUpTo(60);
+        harness.buffer->Stop();
+        EXPECT_EQ(cutRecord(output).places.size(), 50u);
+        EXPECT_EQ(recordedBy(harness, output).meta, Range(0, 50));
+        for (const auto& chunk : harness.Chunks(output)) {
+            EXPECT_THAT(chunk->shownLater, Each(0));
+        }
     }
 }
 

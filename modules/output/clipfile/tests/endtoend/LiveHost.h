@@ -5,15 +5,19 @@
 #include <atomic>
 #include <chrono>
 #include <cstdint>
+#include <map>
+#include <memory>
 #include <stdexcept>
 #include <string>
 #include <thread>
+#include <vector>
 
 #include "LogCapture.h"
 #include "endtoend/LoadedModule.h"
 #include "endtoend/NumberedStream.h"
 #include "support/FakeHost.h"
 #include "support/LogLines.h"
+#include "support/ReorderedStream.h"
 #include "support/TempDir.h"
 
 /// Keeps this thread and all that it starts on one processor, which another thread uses up, while it lives.
@@ -60,18 +64,29 @@ struct Delivery {
     std::uint64_t audioLateMilliSec = 0;
     /// Against real time.
     double speed = 1;
+    /// Pictures come in decoding order, in such groups; in the order in which they are shown where it is
+    /// empty.
+    reordered_stream::Pattern pattern;
 };
 
 /// A live source and the built library, which records as the record flag says, with exact rules. A source
 /// does not wait: what finds the module's queues full is lost.
 class LiveHost {
  public:
-    explicit LiveHost(const Delivery& delivery) : delivery_(delivery), stream(delivery.rate) {
-        host_.texts = {{"-outputPath", directory.Path().string()},
-                       {"-filePrefix", "Cam"},
-                       {"-outputMode", "sync"},
-                       {"-recordRules", "exact"}};
+    /// `texts` are start parameters in the place of what the host would say, or beside it.
+    explicit LiveHost(const Delivery& delivery, const std::map<std::string, std::string>& texts = {})
+        : delivery_(delivery), stream(delivery.rate) {
+        host_.texts = texts;
+        host_.texts.insert({{"-outputPath", directory.Path().string()},
+                            {"-filePrefix", "Cam"},
+                            {"-outputMode", "sync"},
+                            {"-recordRules", "exact"}});
         host_.numbers["-encodedFPS"] = static_cast<int>(delivery.rate.key);
+        if (!delivery.pattern.empty()) {
+            host_.texts["-pictureOrder"] = "decoding";
+            pictures = reordered_stream::MakePictures(delivery.pattern, NumberedStream::kGroupOfPictures,
+                                                      kMostReordered);
+        }
         log.OnLine([this](const CapturedLine& line) {
             takenVideo_ += line.text.starts_with("ST: [V]") ? 1 : 0;
             takenAudio_ += line.text.starts_with("ST: [A]") ? 1 : 0;
@@ -151,15 +166,23 @@ class LiveHost {
             std::chrono::steady_clock::now() + LogCapture::kDeadline;
     };
 
+    std::shared_ptr<StreamData> picture() const {
+        auto unit = stream.Video(frame);
+        if (!pictures.empty()) {
+            unit->presentation_timestamp = stream.clock.VideoRtp(
+                pictures.at(frame).shown + reordered_stream::DelayOf(delivery_.pattern));
+        }
+        return unit;
+    }
     void pushFrame(bool recFlag) {
         if (delivery_.videoFirst) {
-            module_.Stream().PushVideo(stream.Video(frame));
+            module_.Stream().PushVideo(picture());
             pushAudio(frame);
             module_.Stream().PushMeta(stream.Meta(frame, recFlag));
         } else {
             module_.Stream().PushMeta(stream.Meta(frame, recFlag));
             pushAudio(frame);
-            module_.Stream().PushVideo(stream.Video(frame));
+            module_.Stream().PushVideo(picture());
         }
     }
     /// Pushes the sound that is due with a frame, and returns the number of units.
@@ -175,6 +198,9 @@ class LiveHost {
         return nextAudio_ - first;
     }
 
+    /// Far more than are pushed in any time that a test waits.
+    static constexpr std::uint64_t kMostReordered = 100000;
+
     const Delivery delivery_;
     std::atomic<std::uint64_t> takenVideo_ = 0;
     std::atomic<std::uint64_t> takenAudio_ = 0;
@@ -185,6 +211,8 @@ class LiveHost {
     const NumberedStream stream;
     /// The next one to be pushed.
     std::uint64_t frame = 0;
+    /// Where the pictures are shown, if they are reordered.
+    std::vector<reordered_stream::Picture> pictures;
 
  private:
     FakeHost host_;

@@ -11,6 +11,7 @@
 
 #include "shares/ShareRecordingFixture.h"
 #include "support/PrivateMounts.h"
+#include "support/Sanitized.h"
 
 namespace {
 
@@ -23,13 +24,6 @@ using ::testing::Pair;
 
 /// What `FileOutput::Stop` waits at the most.
 constexpr milliseconds kStopWait(3500);
-
-/// Sanitizers cost more time than a writer has left when its operation has reached its limit.
-#if defined(__SANITIZE_THREAD__) || defined(__SANITIZE_ADDRESS__)
-constexpr bool kSanitized = true;
-#else
-constexpr bool kSanitized = false;
-#endif
 
 struct Fault {
     const char* name;
@@ -89,7 +83,8 @@ TEST_P(ShareFault, BehindTheCommandToStopStillEndsInTime) {
     life.End();
     EXPECT_LT(steady_clock::now() - before, kStopWait + milliseconds(1500));  // for a loaded machine
     EXPECT_THAT(host.Statuses().back(), Pair(7, ::testing::_));
-    if (!kSanitized) {
+    // Sanitizers cost more time than a writer has left when its operation has reached its limit.
+    if (!clipfileModule::kSanitized) {
         EXPECT_FALSE(log_.Contains("wait thread timeout..."));
     }
     GetParam().end(server);

@@ -111,9 +111,19 @@ std::uint64_t StreamBuffer::countShown(std::uint64_t end) const {
 }
 
 std::int64_t StreamBuffer::findDelay() const {
-    const StreamData& first = *videoBuffer.front();
-    // As the source stamps it, and no less than the pictures here need, whose stamps may jitter.
-    std::int64_t delay = framesIn(static_cast<std::int64_t>(shownAt(first) - first.rtp_timestamp));
+    // Pictures that are shown before all others wait on average as long as the first one, and their jitter
+    // evens out.
+    std::size_t closed = std::min(findIdrFrom(1), videoBuffer.size() - 1);
+    while (closed > 1 && !isClosedAt(closed)) {
+        --closed;
+    }
+    closed = std::max<std::size_t>(closed, 1);
+    std::int64_t waits = 0;
+    for (std::size_t i = 0; i < closed; ++i) {
+        waits += static_cast<std::int64_t>(shownAt(*videoBuffer[i]) - videoBuffer[i]->rtp_timestamp);
+    }
+    std::int64_t delay = framesIn(waits / static_cast<std::int64_t>(closed));
+    // No less than the pictures here need.
     for (std::size_t begin = 0; begin < videoBuffer.size();) {
         const std::size_t end = findIdrFrom(begin + 1);
         delay = std::max(delay, PresentationOrder::FindDelay(timesOf(begin, end)));
