@@ -196,6 +196,34 @@ TEST_F(NetworkSource, ALostSourceComesBackWithTheTimeThatPassed) {
     EXPECT_EQ(video[first + 1].time - video[first].time, 3600);
 }
 
+TEST_F(NetworkSource, ReorderedPicturesThatAreJoinedInTheMiddleAndLostTakeTheirTurnsAgain) {
+    Ffmpeg(string(kPicture) + kTone +
+           " -pix_fmt yuv420p -c:v libx264 -preset ultrafast -g 12 -x264-params "
+           "bframes=3:b-pyramid=normal:b-adapt=0:scenecut=0:open-gop=0:repeat-headers=1 " +
+           kPlainAac + "whole.ts");
+    // Without what is in front of the fifth picture or so, but for the tables.
+    const string whole = FileBytes(Path("whole.ts"));
+    const std::size_t tables = 188 * 3;
+    const string rest = whole.substr(0, tables) + whole.substr(188 * (whole.size() / 188 / 4));
+    StreamServer server({HttpStream(rest), HttpStream(rest)});
+    const auto source = OpenSource(Live(server.Http()), notices_, nullptr);
+    EXPECT_EQ(source->Description().reordering, 2u);
+    // From the IDR frame at 12 on.
+    const auto video = Of(Medium::kVideo, ReadPictures(*source, 2 * 13));
+    ASSERT_EQ(video.size(), 26u);
+    EXPECT_EQ(source->Counts().reconnections, 1u);
+    EXPECT_EQ(notices_.CountOf("the recording goes on in a new file"), 0u)
+        << testing::PrintToString(notices_.sentences);
+    // I0 P4 B2 b1 b3, P8 B6 b5 b7, P11 b9 b10, and the next IDR frame.
+    constexpr std::int64_t kShown[] = {0, 4, 2, 1, 3, 8, 6, 5, 7, 11, 9, 10, 12};
+    for (std::size_t at = 0; at < video.size(); ++at) {
+        const std::int64_t begin = at < 13 ? video[0].time : video[13].time;
+        EXPECT_EQ(video[at].time - begin, static_cast<std::int64_t>(at % 13) * 3600) << at;
+        EXPECT_EQ(video[at].time + video[at].later - begin, kShown[at % 13] * 3600) << at;
+    }
+    EXPECT_GT(video[13].time - video[12].time, 90000 - 3600);
+}
+
 TEST_F(NetworkSource, AParameterSetThatNoFileCanHoldEndsTheConnectionAlone) {
     MakeMaterial("3");
     Ffmpeg("-i a.ts -c copy a.h264");
