@@ -11,9 +11,9 @@ namespace {
 
 using testing::ElementsAre;
 
-constexpr std::int64_t kPeriod = 3600;
-constexpr int kVideo = 0;
-constexpr int kSound = 1;
+constexpr std::int64_t kPictureTicks = 3600;
+constexpr int kVideoStream = 0;
+constexpr int kSoundStream = 1;
 
 class ReorderBufferTest : public testing::Test {
  protected:
@@ -25,7 +25,7 @@ class ReorderBufferTest : public testing::Test {
     }
     ~ReorderBufferTest() override { avformat_free_context(format_); }
 
-    void Make(std::uint32_t depth) { buffer_.emplace(*video_, depth, kPeriod); }
+    void Make(std::uint32_t depth) { buffer_.emplace(*video_, depth, kPictureTicks); }
     static libav::Owner<AVPacket> PacketAt(std::int64_t pts, int stream) {
         auto packet = libav::NewPacket();
         packet->pts = pts;
@@ -33,19 +33,21 @@ class ReorderBufferTest : public testing::Test {
         return packet;
     }
     /// A picture that is shown as the `place`-th one.
-    void Put(std::int64_t place, bool idr = false) { buffer_->Put(PacketAt(place * kPeriod, kVideo), idr); }
+    void Put(std::int64_t place, bool idr = false) {
+        buffer_->Put(PacketAt(place * kPictureTicks, kVideoStream), idr);
+    }
     void PutIdr(std::int64_t place) { Put(place, true); }
     /// What need not wait: "4@1" is the picture shown as number 4 whose turn is number 1, "a" is sound.
     std::vector<std::string> Taken() {
         std::vector<std::string> taken;
         while (const auto next = buffer_->Take()) {
-            if (next->packet->stream_index != kVideo) {
+            if (next->packet->stream_index != kVideoStream) {
                 taken.emplace_back("a");
             } else if (!next->turn) {
                 taken.emplace_back(next->late ? "late" : "-");
             } else {
-                taken.push_back(std::to_string(*next->shown / kPeriod) + "@" +
-                                std::to_string(*next->turn / kPeriod));
+                taken.push_back(std::to_string(*next->shown / kPictureTicks) + "@" +
+                                std::to_string(*next->turn / kPictureTicks));
             }
         }
         return taken;
@@ -73,7 +75,7 @@ TEST_F(ReorderBufferTest, TurnsAreKnownWhenAsManyPicturesHaveComeAsMayBeDecodedA
 
 TEST_F(ReorderBufferTest, WhatComesBesideThePicturesKeepsItsPlace) {
     PutIdr(0);
-    buffer_->Put(PacketAt(77, kSound), false);
+    buffer_->Put(PacketAt(77, kSoundStream), false);
     Put(2);
     EXPECT_THAT(Taken(), ElementsAre());
     Put(1);
@@ -114,14 +116,14 @@ TEST_F(ReorderBufferTest, AStepThatNoReorderingTakesIsOneOfTheClock) {
 
 TEST_F(ReorderBufferTest, StampsThatWrapGoOn) {
     constexpr std::int64_t kSpan = std::int64_t{1} << 33;
-    buffer_->Put(PacketAt(kSpan - 2 * kPeriod, kVideo), true);
-    for (const std::int64_t stamp : {kPeriod, kSpan - kPeriod, std::int64_t{0}}) {
-        buffer_->Put(PacketAt(stamp, kVideo), false);
+    buffer_->Put(PacketAt(kSpan - 2 * kPictureTicks, kVideoStream), true);
+    for (const std::int64_t stamp : {kPictureTicks, kSpan - kPictureTicks, std::int64_t{0}}) {
+        buffer_->Put(PacketAt(stamp, kVideoStream), false);
     }
     buffer_->End();
     std::vector<std::int64_t> turns;
     while (const auto next = buffer_->Take()) {
-        turns.push_back((*next->turn - kSpan) / kPeriod);
+        turns.push_back((*next->turn - kSpan) / kPictureTicks);
     }
     EXPECT_THAT(turns, ElementsAre(-2, -1, 0, 1));
 }
@@ -141,10 +143,10 @@ TEST_F(ReorderBufferTest, APictureBehindItsTurnIsLate) {
 
 TEST_F(ReorderBufferTest, DamagedPicturesAndSuchWithoutAStampTakeNoTurn) {
     PutIdr(0);
-    auto damaged = PacketAt(99 * kPeriod, kVideo);
+    auto damaged = PacketAt(99 * kPictureTicks, kVideoStream);
     damaged->flags |= AV_PKT_FLAG_CORRUPT;
     buffer_->Put(std::move(damaged), false);
-    buffer_->Put(PacketAt(AV_NOPTS_VALUE, kVideo), false);
+    buffer_->Put(PacketAt(AV_NOPTS_VALUE, kVideoStream), false);
     Put(1);
     buffer_->End();
     EXPECT_THAT(Taken(), ElementsAre("0@0", "-", "-", "1@1"));
@@ -152,7 +154,7 @@ TEST_F(ReorderBufferTest, DamagedPicturesAndSuchWithoutAStampTakeNoTurn) {
 
 TEST_F(ReorderBufferTest, WhatWaitsIsGivenBackAsItCame) {
     PutIdr(0);
-    buffer_->Put(PacketAt(77, kSound), false);
+    buffer_->Put(PacketAt(77, kSoundStream), false);
     std::vector<std::int64_t> stamps;
     for (const auto& packet : buffer_->TakeRest()) {
         stamps.push_back(packet->pts);
