@@ -4,7 +4,9 @@ _clipfile_programs() {
     if [[ $current == -* ]]; then
         mapfile -t COMPREPLY < <(compgen -W "$("$program" --help 2>/dev/null | grep -oE -- '--[a-z][a-z-]+')" -- "$current")
     elif [[ $program == *clipfile && $COMP_CWORD -eq 1 ]]; then
-        mapfile -t COMPREPLY < <(compgen -W "inspect verify recover" -- "$current")
+        mapfile -t COMPREPLY < <(compgen -W "inspect verify recover retention control" -- "$current")
+    elif [[ $program == *clipfile && ${COMP_WORDS[1]} == control && $COMP_CWORD -eq 3 ]]; then
+        mapfile -t COMPREPLY < <(compgen -W "status record.start record.stop record.split files preview events" -- "$current")
     else
         case ${COMP_WORDS[COMP_CWORD - 1]} in
             --file-type) mapfile -t COMPREPLY < <(compgen -W "normal fragment" -- "$current") ;;

@@ -11,6 +11,9 @@
 #include <string_view>
 #include <system_error>
 
+#include "Output.h"
+#include "RetentionCommand.h"
+#include "control/ControlCall.h"
 #include "inspect/BoxTree.h"
 #include "inspect/Inspection.h"
 #include "inspect/JsonReport.h"
@@ -45,27 +48,15 @@ struct Options {
     RecoveryOptions recovery;
     bool unattended = false;
     bool deep = false;
+    ControlCall call;
+    RetentionCommand retention;
 };
-
-/// Writes one JSON value on a line. Names of files need not be UTF-8.
-void PrintJson(std::ostream& out, const Json& json) {
-    out << json.dump(-1, ' ', false, Json::error_handler_t::replace) << '\n';
-}
-
-void TellFault(const std::string& path, const std::string& sentence, const Options& options,
-               std::ostream& out, std::ostream& errors) {
-    if (options.json) {
-        PrintJson(out, {{"file", path}, {"error", sentence}});
-    } else {
-        errors << "clipfile: " << sentence << '\n';
-    }
-}
 
 /// Tells which folders could not be read.
 ExitCode TellFaults(const std::string& folder, const FolderListing& listing, const Options& options,
                     std::ostream& out, std::ostream& errors) {
     for (const std::string& fault : listing.faults) {
-        TellFault(folder, fault, options, out, errors);
+        TellFault(folder, fault, options.json, out, errors);
     }
     return listing.faults.empty() ? ExitCode::kSuccess : ExitCode::kUnreadable;
 }
@@ -93,7 +84,7 @@ ExitCode ForEachFile(const Options& options, std::ostream& out, std::ostream& er
             sentence = path + " cannot be worked on: " + error.what();
         }
         if (!sentence.empty()) {
-            TellFault(path, sentence, options, out, errors);
+            TellFault(path, sentence, options.json, out, errors);
         }
         out.flush();  // an archive takes hours
         result = Worse(result, code);
@@ -358,6 +349,28 @@ CLI::App* AddRecover(CLI::App& app, Options& options) {
     return command;
 }
 
+CLI::App* AddControl(CLI::App& app, Options& options) {
+    CLI::App* const command =
+        app.add_subcommand("control", "Ask a running receiver, and print its answer (JSON).");
+    command->add_option("SOCKET", options.call.socket, "Its control socket")->required();
+    command
+        ->add_option("METHOD", options.call.method,
+                     "status, record.start, record.stop, record.split, files, preview, events")
+        ->required();
+    command->add_option("PARAMS", options.call.params, "An object of JSON, as '{\"width\": 640}'");
+    return command;
+}
+
+/// Asks a receiver, and tells why not.
+ExitCode Control(const ControlCall& call, std::ostream& out, std::ostream& errors) {
+    try {
+        return CallControl(call, out, errors);
+    } catch (const ToolError& error) {
+        errors << "clipfile: " << error.what() << '\n';
+        return error.Code();
+    }
+}
+
 }  // namespace
 
 ExitCode RunProgram(const std::vector<std::string>& arguments, std::ostream& out, std::ostream& errors) {
@@ -367,6 +380,8 @@ ExitCode RunProgram(const std::vector<std::string>& arguments, std::ostream& out
     AddInspect(app, options);
     const CLI::App* const verify = AddVerify(app, options);
     const CLI::App* const recover = AddRecover(app, options);
+    const CLI::App* const retention = options.retention.AddTo(app);
+    const CLI::App* const control = AddControl(app, options);
     std::vector<std::string> reversed(arguments.rbegin(), arguments.rend() - 1);
     try {
         app.parse(reversed);
@@ -380,6 +395,12 @@ ExitCode RunProgram(const std::vector<std::string>& arguments, std::ostream& out
     if (options.unattended) {
         GiveWay();
         EndWithParent();
+    }
+    if (control->parsed()) {
+        return Control(options.call, out, errors);
+    }
+    if (retention->parsed()) {
+        return options.retention.Run(out, errors);
     }
     if (verify->parsed()) {
         return Verify(options, out, errors);

@@ -71,7 +71,7 @@ class ProgramTest : public testing::Test {
 
 TEST_F(ProgramTest, TheManPageHasEachOption) {
     std::string help;
-    for (const char* const command : {"inspect", "verify", "recover"}) {
+    for (const char* const command : {"inspect", "verify", "recover", "retention", "control"}) {
         EXPECT_EQ(run({command, "--help"}), ExitCode::kSuccess);
         help += out_.str();
     }
@@ -97,6 +97,45 @@ TEST_F(ProgramTest, MistakesOfTheCommandLineHaveACodeOfTheirOwn) {
     EXPECT_EQ(run({"inspect", "--size", "x"}), ExitCode::kUsage);
     EXPECT_EQ(run({"--help"}), ExitCode::kSuccess);
     EXPECT_NE(out_.str().find("inspect"), std::string::npos);
+}
+
+TEST_F(ProgramTest, RetentionTellsEachFileAndRemovesIt) {
+    const std::string old = path("01_02_03_04.MP4");
+    recordNormal("01_02_03_04.MP4");
+    std::filesystem::last_write_time(old,
+                                     std::filesystem::file_time_type::clock::now() - std::chrono::hours(30));
+    const std::string folder = folder_.Path().string();
+    EXPECT_EQ(run({"retention", folder, "--older-than", "1d", "--dry-run"}), ExitCode::kSuccess);
+    EXPECT_EQ(out_.str(), old + " would be removed: it is older than the limit.\n");
+    EXPECT_TRUE(std::filesystem::exists(old));
+    EXPECT_EQ(run({"retention", folder, "--older-than", "1d"}), ExitCode::kSuccess);
+    EXPECT_EQ(out_.str(), old + " is removed: it is older than the limit.\n");
+    EXPECT_FALSE(std::filesystem::exists(old));
+}
+
+TEST_F(ProgramTest, RetentionEndsWithACodeWhereSomethingStays) {
+    recordNormal("01_02_03_04.MP4", false);
+    std::filesystem::last_write_time(path("01_02_03_04.MP4"),
+                                     std::filesystem::file_time_type::clock::now() - std::chrono::hours(30));
+    const std::string folder = folder_.Path().string();
+    EXPECT_EQ(run({"retention", folder, "--older-than", "1d", "--json"}), ExitCode::kDefects);
+    const auto step = nlohmann::json::parse(out_.str());
+    EXPECT_EQ(step.at("goes"), false);
+    EXPECT_EQ(step.at("removed"), false);
+    EXPECT_TRUE(std::filesystem::exists(path("01_02_03_04.MP4")));
+    EXPECT_EQ(run({"retention", folder, "--keep-free", "9999999T"}), ExitCode::kDefects);
+    EXPECT_NE(errors_.str().find("less of the disk is free"), std::string::npos);
+    EXPECT_EQ(run({"retention", folder}), ExitCode::kUsage);
+    EXPECT_EQ(run({"retention", folder, "--older-than", "soon"}), ExitCode::kUsage);
+    EXPECT_EQ(run({"retention", path("none"), "--older-than", "1d"}), ExitCode::kUsage);
+}
+
+TEST_F(ProgramTest, ControlAsksAReceiverThatMayNotBeThere) {
+    EXPECT_EQ(run({"control", path("none.sock"), "status"}), ExitCode::kUnreadable);
+    EXPECT_EQ(errors_.str(), "clipfile: no receiver can be reached at " + path("none.sock") +
+                                 ": No such file or directory.\n");
+    EXPECT_EQ(run({"control", path("none.sock"), "preview", "{"}), ExitCode::kUsage);
+    EXPECT_EQ(run({"control", path("none.sock")}), ExitCode::kUsage);
 }
 
 class HostileInputTest : public ProgramTest, public testing::WithParamInterface<const char*> {};

@@ -14,6 +14,7 @@
 #include "CrashRecovery.h"
 #include "GroupWatch.h"
 #include "ModuleReport.h"
+#include "Observers.h"
 #include "Recorder.h"
 #include "RunSettings.h"
 #include "Shortfalls.h"
@@ -40,6 +41,7 @@ constexpr std::chrono::milliseconds kDisplayInterval{250};
 /// The run ends with the frame behind the last one; when the stream has dried up, nobody waits for it.
 constexpr std::chrono::seconds kFinishPatience{2};
 
+constexpr const char* kOver = "the run is over";
 constexpr const char* kNoCommands = "in mode on everything is recorded; --mode sync takes record commands";
 
 std::string WithFullStop(std::string sentence) {
@@ -55,8 +57,16 @@ void GiveToGroup() {
 /// A run with its module and its display.
 class Running final : public SourceListenerInterface {
  public:
-    Running(const Options& options, Signals& signals, DisplayInterface& display, int keyboard)
-        : options_(options), signals_(signals), display_(display), keyboard_(keyboard) {}
+    Running(const Options& options, Signals& signals, Observers& observers, CommandQueue& commands,
+            int keyboard)
+        : options_(options),
+          signals_(signals),
+          observers_(observers),
+          display_(observers.Display()),
+          commands_(commands),
+          keyboard_(keyboard) {}
+    /// What waits to be carried out is answered by this object.
+    ~Running() { commands_.Close(kOver); }
     Running(const Running&) = delete;
     Running& operator=(const Running&) = delete;
 
@@ -88,11 +98,14 @@ class Running final : public SourceListenerInterface {
     void TellLateStops(const Recorder& recorder);
     void Show(const SourceInterface& source, const Recorder& recorder);
     std::uint64_t Lost(const SourceInterface& source, const Recorder::Progress& progress) const;
+    Losses LossesOf(const SourceInterface& source, const Recorder::Progress& progress) const;
     Summary Summarise(const SourceInterface& source, const Recorder::Progress& past);
 
     const Options& options_;
     Signals& signals_;
+    Observers& observers_;
     DisplayInterface& display_;
+    CommandQueue& commands_;
     Keyboard keyboard_;
     Service service_;
     std::unique_ptr<OutputFolder> folder_;
@@ -103,7 +116,6 @@ class Running final : public SourceListenerInterface {
     std::vector<std::unique_ptr<Host>> hosts_;
     Host* host_ = nullptr;
     RecordPlan plan_{options_.record};
-    CommandQueue commands_;
     /// The operator ends the run.
     bool quit_ = false;
     /// He did so while the source went on.
@@ -129,7 +141,8 @@ void Running::PrepareOutput(const OutputPlace& place) {
         GiveToGroup();
     }
     folder_ = OpenOutputFolder(place);
-    if (folder_->Prepare()) {
+    const bool folderIsNew = folder_->Prepare();
+    if (folderIsNew) {
         display_.Notice("made the output folder " + place.folder);
     }
     ExpectDatedFolders(*folder_, place.prefix, std::time(nullptr));
@@ -140,7 +153,7 @@ void Running::PrepareOutput(const OutputPlace& place) {
         display_.Notice(*warning);
     }
     watch_.emplace(OpenOutputFolder(place), place.prefix);
-    recovery_.emplace(options_, place, display_, keyboard_.IsThere());
+    recovery_.emplace(options_, place, folderIsNew, display_, keyboard_.IsThere());
 }
 
 ExitCode Running::Record(const SourceOpener& open) {
@@ -171,10 +184,11 @@ ExitCode Running::Record(const SourceOpener& open) {
     display_.Notice("source: " + source->Description().summary);
     const Recorder::Progress progress = RecordAll(*source, library.Module(), place);
     service_.Stopping();
-    commands_.Close("the run is over");
+    commands_.Close(kOver);
     plan_.Finish();
     TellMissed();
     recovery_->End(report_);
+    observers_.Settle();
     Summary summary = Summarise(*source, progress);
     if (failure_) {
         summary.exitCode = failure_->Code();
@@ -201,6 +215,7 @@ Recorder::Progress Running::RecordAll(SourceInterface& source, QxModuleInterface
             settings.frameRate = description.frameRate;
             settings.reordering = description.reordering;
             recovery_->Describe(description);
+            observers_.Describe(description);
             // A run that is shorter than a file has one only.
             if (!options_.seconds || *options_.seconds > static_cast<double>(minutes * 60)) {
                 groups_.emplace(settings.frameRate, minutes, options_.source.pictureGroup,
@@ -277,6 +292,7 @@ void Running::Loop(SourceInterface& source, Recorder& recorder) {
         if (result == SourceInterface::Result::kUnit) {
             rates_.Count(unit);
             recovery_->LookAt(unit);
+            observers_.LookAt(unit);
             if (const auto notice = groups_ ? groups_->Look(unit) : std::nullopt) {
                 display_.Notice(*notice);
             }
@@ -297,6 +313,7 @@ void Running::Loop(SourceInterface& source, Recorder& recorder) {
         TellMissed();
         report_.Tell(log_->TakeEvents());
         recovery_->Follow(report_);
+        observers_.Follow();
         if (recorder.Finishing()) {
             finishSince_ = finishSince_.value_or(Clock::now());
             if (recorder.Done() || Clock::now() - *finishSince_ > kFinishPatience) {
@@ -436,7 +453,17 @@ void Running::Show(const SourceInterface& source, const Recorder& recorder) {
     snapshot.status = host_->Status();
     snapshot.file = report_.OpenFile();
     snapshot.freeBytes = watch_->FreeBytes();
-    snapshot.lost = Lost(source, recorder.Past());
+    snapshot.syncTime = recovery_->SyncLatency();
+    const Recorder::Progress progress = recorder.Past();
+    snapshot.lost = Lost(source, progress);
+    snapshot.losses = LossesOf(source, progress);
+    const SourceCounts counts = source.Counts();
+    snapshot.source = {counts.reconnections, counts.changes, counts.silentFrames, counts.earlyPictures,
+                       counts.away};
+    snapshot.heldPictures = recorder.HeldPictures();
+    const HookCounts hooked = observers_.Hooked();
+    snapshot.hooksTold = hooked.delivered;
+    snapshot.hooksFailed = hooked.failed;
     display_.Show(snapshot);
     service_.Alive(!snapshot.recording     ? "not recording"
                    : snapshot.file.empty() ? "recording, no file yet"
@@ -448,6 +475,13 @@ std::uint64_t Running::Lost(const SourceInterface& source, const Recorder::Progr
     const std::uint64_t reported = log_->Losses().Total();
     return reported - std::min(reported, progress.droppedMarks) + progress.droppedPackets +
            counts.lostFrames + counts.damagedPackets;
+}
+
+Losses Running::LossesOf(const SourceInterface& source, const Recorder::Progress& progress) const {
+    const SourceCounts counts = source.Counts();
+    const QueueLosses queues = log_->Losses();
+    return {counts.lostFrames, counts.damagedPackets, queues.video,
+            queues.audio,      queues.meta,           progress.droppedPackets};
 }
 
 Summary Running::Summarise(const SourceInterface& source, const Recorder::Progress& past) {
@@ -478,8 +512,9 @@ Summary Running::Summarise(const SourceInterface& source, const Recorder::Progre
     summary.lost = Lost(source, past);
     if (host_->Failed()) {
         summary.exitCode = ExitCode::kRecordingFailed;
-    } else if (summary.lost != 0 || report_.Faults() != 0 || lateStops_ != 0 || missed_ ||
-               !shortfalls.empty() || counts.reconnections != 0 || counts.changes != 0) {
+    } else if (summary.lost != 0 || report_.Faults() != 0 || recovery_->SyncFaults() != 0 ||
+               lateStops_ != 0 || missed_ || !shortfalls.empty() || counts.reconnections != 0 ||
+               counts.changes != 0) {
         summary.exitCode = ExitCode::kLost;
     }
     return summary;
@@ -490,14 +525,19 @@ Summary Running::Summarise(const SourceInterface& source, const Recorder::Progre
 ExitCode RunReceiver(const Options& options, const SourceOpener& open, Signals& signals,
                      DisplayInterface& display, int keyboard) {
     ExitCode code = ExitCode::kInternal;
+    const auto commands = std::make_shared<CommandQueue>();
+    Observers observers(display);
     try {
-        code = Running(options, signals, display, keyboard).Record(open);
+        observers.Start(options, commands);
+        code = Running(options, signals, observers, *commands, keyboard).Record(open);
     } catch (const ReceiverError& error) {
         code = error.Code();
-        display.Failure(code, WithFullStop(error.what()));
+        observers.Display().Failure(code, WithFullStop(error.what()));
     } catch (const std::exception& error) {
-        display.Failure(code, WithFullStop(error.what()));
+        observers.Display().Failure(code, WithFullStop(SentenceOf(error)));
     }
+    commands->Close(kOver);
+    observers.End();
     return code;
 }
 

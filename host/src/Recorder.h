@@ -128,6 +128,8 @@ class Recorder {
     /// Frames that belong to recordings.
     std::uint64_t Recorded() const { return recorded_; }
     Progress Past() const;
+    /// Pictures that the module holds: those not cut into chunks, and one of each chunk that waits.
+    std::size_t HeldPictures() const { return feed_.Frames().UncutUnits() + feed_.Frames().WaitingChunks(); }
     /// Stream time of the last frame since the first one, in ticks of 90000 a second.
     std::int64_t Elapsed() const;
 

@@ -10,6 +10,7 @@
 #include <memory>
 #include <optional>
 #include <string>
+#include <system_error>
 #include <thread>
 
 #include "Receiver.h"
@@ -85,7 +86,7 @@ bool AsksForJson(int argc, char** argv) {
     });
 }
 
-int RefuseOptions(const receiver::ReceiverError& error, bool json) {
+int Refuse(const receiver::ReceiverError& error, bool json) {
     if (json) {
         receiver::JsonDisplay(std::cout).Failure(error.Code(), error.what());
     } else {
@@ -101,10 +102,14 @@ bool LogsToStandardError() {
 
 /// The end of the process writes what is left of the log, on standard error perhaps, which nobody may read.
 void EndSoon(int code) {
-    std::thread([code] {
-        std::this_thread::sleep_for(kReaderPatience);
-        _exit(code);
-    }).detach();
+    try {
+        std::thread([code] {
+            std::this_thread::sleep_for(kReaderPatience);
+            _exit(code);
+        }).detach();
+    } catch (const std::system_error&) {
+        // Without a thread the end takes as long as it takes.
+    }
 }
 
 /// The end of a process destroys what its threads use. Where one of them hangs, the process ends without
@@ -122,6 +127,20 @@ void EndAtOnce(int code) {
     _exit(code);
 }
 
+int Run(const receiver::Options& options) {
+    receiver::Signals signals(receiver::Keyboard::RestoreTerminal);
+    Outlet outlet(options.json);
+    const auto code = static_cast<int>(
+        receiver::RunReceiver(options, receiver::OpenSource, signals, outlet.Display(), STDIN_FILENO));
+    if (!outlet.Close() || LogsToStandardError()) {
+        EndSoon(code);
+    }
+    if (receiver::ShareThreadsLeft()) {
+        EndAtOnce(code);
+    }
+    return code;
+}
+
 }  // namespace
 
 int main(int argc, char** argv) {
@@ -134,18 +153,12 @@ int main(int argc, char** argv) {
             return static_cast<int>(receiver::ExitCode::kSuccess);
         }
     } catch (const receiver::ReceiverError& error) {
-        return RefuseOptions(error, AsksForJson(argc, argv));
+        return Refuse(error, AsksForJson(argc, argv));
     }
     receiver::HideCredentials(argc, argv);
-    receiver::Signals signals(receiver::Keyboard::RestoreTerminal);
-    Outlet outlet(options->json);
-    const auto code = static_cast<int>(
-        receiver::RunReceiver(*options, receiver::OpenSource, signals, outlet.Display(), STDIN_FILENO));
-    if (!outlet.Close() || LogsToStandardError()) {
-        EndSoon(code);
+    try {
+        return Run(*options);
+    } catch (const std::exception& error) {
+        return Refuse({receiver::ExitCode::kInternal, receiver::SentenceOf(error)}, options->json);
     }
-    if (receiver::ShareThreadsLeft()) {
-        EndAtOnce(code);
-    }
-    return code;
 }

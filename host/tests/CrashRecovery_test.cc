@@ -4,6 +4,7 @@
 #include <gtest/gtest.h>
 
 #include <chrono>
+#include <fstream>
 #include <thread>
 
 #include "fakes/FakeDisplay.h"
@@ -43,7 +44,7 @@ class CrashRecoveryTest : public ::testing::Test {
 };
 
 TEST_F(CrashRecoveryTest, TheJournalHasTheFilesThatTheModuleHasOpenedAndNotClosed) {
-    CrashRecovery recovery(options_, place_, display_, false);
+    CrashRecovery recovery(options_, place_, false, display_, false);
     recovery.Describe(FakeSource(1).Description());
     recovery.LookAt(MakeFrame(0, true, 1));
     report_.Tell({{ModuleEvent::Kind::kFileOpened, File("a.MP4")},
@@ -61,7 +62,7 @@ TEST_F(CrashRecoveryTest, TheJournalHasTheFilesThatTheModuleHasOpenedAndNotClose
 
 TEST_F(CrashRecoveryTest, AFolderWithoutAJournalIsToldAndTheRunGoesOn) {
     place_.folder = File("gone");
-    CrashRecovery recovery(options_, place_, display_, false);
+    CrashRecovery recovery(options_, place_, false, display_, false);
     report_.Tell({{ModuleEvent::Kind::kFileOpened, File("gone/a.MP4")}});
     ASSERT_TRUE(FollowUntil(recovery, [&] { return !display_.notices.empty(); }));
     recovery.End(report_);
@@ -71,7 +72,7 @@ TEST_F(CrashRecoveryTest, AFolderWithoutAJournalIsToldAndTheRunGoesOn) {
 TEST_F(CrashRecoveryTest, OnAShareThereIsNoJournalAndThatIsTold) {
     place_.folder = "//server/share/folder";
     place_.onShare = true;
-    CrashRecovery recovery(options_, place_, display_, true);
+    CrashRecovery recovery(options_, place_, false, display_, true);
     recovery.LookAt(MakeFrame(0, true, 1));
     report_.Tell({{ModuleEvent::Kind::kFileOpened, "//server/share/folder/a.MP4"}});
     recovery.Follow(report_);
@@ -81,8 +82,50 @@ TEST_F(CrashRecoveryTest, OnAShareThereIsNoJournalAndThatIsTold) {
                                               "there have to be recovered by hand, with clipfile recover"));
     display_.notices.clear();
     options_.recover = RecoverMode::kNo;
-    const CrashRecovery silent(options_, place_, display_, true);
+    const CrashRecovery silent(options_, place_, false, display_, true);
     EXPECT_THAT(display_.notices, IsEmpty());
+}
+
+TEST_F(CrashRecoveryTest, WhatIsRecordedIsMadeDurableAsOftenAsAskedFor) {
+    options_.durable = 0.001;
+    std::ofstream(File("a.MP4")) << "text";
+    CrashRecovery recovery(options_, place_, false, display_, false);
+    EXPECT_FALSE(recovery.SyncLatency());
+    report_.Tell({{ModuleEvent::Kind::kFileOpened, File("a.MP4")}});
+    EXPECT_TRUE(FollowUntil(recovery, [&] { return recovery.SyncLatency().has_value(); }));
+    EXPECT_EQ(recovery.SyncFaults(), 0U);
+    EXPECT_THAT(display_.notices, IsEmpty());
+}
+
+TEST_F(CrashRecoveryTest, TheEndOfARunMakesItsFilesDurable) {
+    std::ofstream(File("a.MP4")) << "text";
+    CrashRecovery recovery(options_, place_, false, display_, false);
+    report_.Tell(
+        {{ModuleEvent::Kind::kFileOpened, File("a.MP4")}, {ModuleEvent::Kind::kFileClosed, File("a.MP4")}});
+    recovery.End(report_);
+    EXPECT_TRUE(recovery.SyncLatency());
+}
+
+TEST_F(CrashRecoveryTest, WithADurabilityOfZeroNothingIsAskedOfTheDisk) {
+    options_.durable = 0;
+    std::ofstream(File("a.MP4")) << "text";
+    CrashRecovery recovery(options_, place_, false, display_, false);
+    report_.Tell({{ModuleEvent::Kind::kFileOpened, File("a.MP4")}});
+    recovery.Follow(report_);
+    recovery.End(report_);
+    EXPECT_FALSE(recovery.SyncLatency());
+}
+
+TEST_F(CrashRecoveryTest, OnAShareDurabilityIsItsServersAndThatIsTold) {
+    place_.folder = "//server/share/folder";
+    place_.onShare = true;
+    options_.recover = RecoverMode::kNo;
+    options_.durable = 2;
+    CrashRecovery recovery(options_, place_, false, display_, false);
+    recovery.End(report_);
+    EXPECT_THAT(display_.notices,
+                ElementsAre("--durable has no effect on a share: its server makes durable what it is given"));
+    EXPECT_FALSE(recovery.SyncLatency());
 }
 
 }  // namespace

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <exception>
 #include <stdexcept>
 #include <string>
 
@@ -40,5 +41,8 @@ class ReceiverError : public std::runtime_error {
  private:
     ExitCode code_;
 };
+
+/// The sentence for a failure that is none of the receiver's own.
+std::string SentenceOf(const std::exception& error);
 
 }  // namespace receiver

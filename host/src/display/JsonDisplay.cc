@@ -15,21 +15,6 @@ using nlohmann::ordered_json;
 
 constexpr std::chrono::seconds kInterval{1};
 
-/// "2026-11-21T20:15:07.042Z"
-std::string IsoTime(std::chrono::system_clock::time_point moment) {
-    const auto milliseconds = std::chrono::floor<std::chrono::milliseconds>(moment.time_since_epoch());
-    const auto seconds = std::chrono::floor<std::chrono::seconds>(milliseconds);
-    const std::time_t time = seconds.count();
-    std::tm parts{};
-    gmtime_r(&time, &parts);
-    std::array<char, 32> date{};
-    std::strftime(date.data(), date.size(), "%FT%T", &parts);
-    std::array<char, 48> text{};
-    std::snprintf(text.data(), text.size(), "%s.%03dZ", date.data(),
-                  static_cast<int>((milliseconds - seconds).count()));
-    return text.data();
-}
-
 ordered_json Event(const char* name, std::chrono::system_clock::time_point moment) {
     return {{"event", name}, {"time", IsoTime(moment)}};
 }
@@ -44,6 +29,20 @@ ordered_json TextOrNull(const std::string& text) {
 }
 
 }  // namespace
+
+std::string IsoTime(std::chrono::system_clock::time_point moment) {
+    const auto milliseconds = std::chrono::floor<std::chrono::milliseconds>(moment.time_since_epoch());
+    const auto seconds = std::chrono::floor<std::chrono::seconds>(milliseconds);
+    const std::time_t time = seconds.count();
+    std::tm parts{};
+    gmtime_r(&time, &parts);
+    std::array<char, 32> date{};
+    std::strftime(date.data(), date.size(), "%FT%T", &parts);
+    std::array<char, 48> text{};
+    std::snprintf(text.data(), text.size(), "%s.%03dZ", date.data(),
+                  static_cast<int>((milliseconds - seconds).count()));
+    return text.data();
+}
 
 void JsonDisplay::Write(const char* event, const ordered_json& members) {
     ordered_json object = Event(event, clock_());
@@ -100,6 +99,8 @@ void JsonDisplay::Show(const Snapshot& snapshot) {
     object["cause"] = snapshot.status.cause;
     object["file"] = TextOrNull(snapshot.file);
     object["free_bytes"] = snapshot.freeBytes ? ordered_json(*snapshot.freeBytes) : ordered_json(nullptr);
+    object["sync_milliseconds"] =
+        snapshot.syncTime ? ordered_json(snapshot.syncTime->count()) : ordered_json(nullptr);
     object["lost"] = snapshot.lost;
     Write("progress", object);
 }

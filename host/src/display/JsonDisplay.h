@@ -42,6 +42,9 @@ class JsonDisplay final : public DisplayInterface {
     bool recording_ = false;
 };
 
+/// A moment as events tell it: "2026-11-21T20:15:07.042Z".
+std::string IsoTime(std::chrono::system_clock::time_point moment);
+
 /// The event in the place of `count` events that nobody has read.
 std::string JsonRemark(std::uint64_t count);
 

@@ -121,7 +121,7 @@ void OutputQueue::Run(State& state) {
 
 int MessageStream::Buffer::sync() {
     if (std::string text = std::move(*this).str(); !text.empty()) {
-        queue_.Write(descriptor_, std::move(text));
+        sink_(std::move(text));
     }
     str({});
     return 0;

@@ -9,6 +9,7 @@
 #include <sstream>
 #include <string>
 #include <thread>
+#include <utility>
 
 namespace receiver {
 
@@ -51,23 +52,27 @@ class OutputQueue {
     std::thread thread_;
 };
 
-/// A stream whose text becomes a message with each flush. One thread at a time; the queue must outlive it.
+/// A stream whose text becomes a message with each flush. One thread at a time.
 class MessageStream final : public std::ostream {
  public:
-    MessageStream(OutputQueue& queue, int descriptor) : std::ostream(&buffer_), buffer_(queue, descriptor) {}
+    using Sink = std::function<void(std::string message)>;
+
+    explicit MessageStream(Sink sink) : std::ostream(&buffer_), buffer_(std::move(sink)) {}
+    /// Messages go to `descriptor`. The queue must outlive the stream.
+    MessageStream(OutputQueue& queue, int descriptor)
+        : MessageStream(
+              [&queue, descriptor](std::string message) { queue.Write(descriptor, std::move(message)); }) {}
 
  private:
     class Buffer final : public std::stringbuf {
      public:
-        Buffer(OutputQueue& queue, int descriptor)
-            : std::stringbuf(std::ios::out), queue_(queue), descriptor_(descriptor) {}
+        explicit Buffer(Sink sink) : std::stringbuf(std::ios::out), sink_(std::move(sink)) {}
 
      protected:
         int sync() override;
 
      private:
-        OutputQueue& queue_;
-        const int descriptor_;
+        const Sink sink_;
     };
 
     Buffer buffer_;

@@ -50,6 +50,9 @@ std::string StatusLine(const Snapshot& snapshot, std::size_t width) {
     if (snapshot.freeBytes) {
         line += " | " + FormatBytes(*snapshot.freeBytes) + " free";
     }
+    if (snapshot.syncTime) {
+        line += " | sync " + std::to_string(snapshot.syncTime->count()) + " ms";
+    }
     if (line.size() > width) {
         line.resize(width);
     }

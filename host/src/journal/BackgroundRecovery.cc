@@ -7,7 +7,7 @@
 #include <system_error>
 #include <utility>
 
-#include "journal/ChildProgram.h"
+#include "common/ChildProgram.h"
 #include "journal/JournalFile.h"
 #include "journal/UnfinishedFiles.h"
 
@@ -118,7 +118,7 @@ void BackgroundRecovery::State::Recover(UnfinishedFiles& files) {
 
 void BackgroundRecovery::State::Recover(UnfinishedFiles& files, const fs::path& path) {
     const ChildResult result =
-        child.Run({program.string(), "recover", "--unattended", fs::absolute(path).string()});
+        child.Run({{program.string(), "recover", "--unattended", fs::absolute(path).string()}});
     if (Ending() && result.code < 0) {
         Tell(path.string() + " is not recovered yet: the next receiver goes on with it");
         return;

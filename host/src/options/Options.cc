@@ -1,8 +1,11 @@
 #include "options/Options.h"
 
+#include <unistd.h>
+
 #include <CLI/CLI.hpp>
 #include <charconv>
 #include <cstring>
+#include <filesystem>
 #include <limits>
 #include <sstream>
 
@@ -109,6 +112,27 @@ CLI::Validator NumberFrom(double low, double high) {
                 reason << text << " is no number from " << low << " to " << std::fixed << std::setprecision(0)
                        << high;
                 return reason.str();
+            },
+            ""};
+}
+
+/// The path of a program: found now, and not when the first file is closed.
+CLI::Validator Program() {
+    return {[](std::string& text) {
+                std::error_code ignored;
+                const bool runs =
+                    std::filesystem::is_regular_file(text, ignored) && access(text.c_str(), X_OK) == 0;
+                return text.empty() || runs ? std::string()
+                                            : text + " is no program that could be run: write its path";
+            },
+            ""};
+}
+
+CLI::Validator WebAddress() {
+    return {[](std::string& text) {
+                return text.empty() || text.starts_with("http://") || text.starts_with("https://")
+                           ? std::string()
+                           : WithoutCredentials(text) + " does not begin with http:// or https://";
             },
             ""};
 }
@@ -237,6 +261,13 @@ void AddFileOptions(CLI::App& app, Options& options, Texts& texts) {
         ->type_name("no|ask|yes")
         ->capture_default_str()
         ->group(group);
+    app.add_option(
+           "--durable", options.durable,
+           "Seconds after which what was recorded must survive a power cut, 0 for as the system likes; "
+           "not on a share; 2 when not given")
+        ->check(NumberFrom(0, 3600.0))
+        ->type_name("SECONDS")
+        ->group(group);
     app.add_option("--user", options.user, "User name for a network share: NAME, DOMAIN\\NAME or NAME@DOMAIN")
         ->type_name("NAME")
         ->group(group);
@@ -308,6 +339,19 @@ void AddProgramOptions(CLI::App& app, Options& options, Texts& texts) {
         ->type_name("0-13")
         ->group(group);
     app.add_flag("--json", options.json, "Say everything as JSON on standard output, one object a line")
+        ->group(group);
+    app.add_option("--control", options.control,
+                   "Unix socket for status, commands, events and previews (JSON-RPC, docs/control.md)")
+        ->type_name("PATH")
+        ->group(group);
+    app.add_option("--hook", options.hook,
+                   "Program to run when a file is closed, a recording begins or ends, or something fails")
+        ->check(Program())
+        ->type_name("PROGRAM")
+        ->group(group);
+    app.add_option("--hook-url", options.hookUrl, "Address to post the same events to, as JSON")
+        ->check(WebAddress())
+        ->type_name("URL")
         ->group(group);
     app.set_version_flag("--version", RECEIVER_VERSION, "Print the version and exit")->group(group);
     app.set_help_flag("-h,--help", "Print this and exit")->group(group);

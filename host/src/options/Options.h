@@ -35,6 +35,8 @@ struct Options {
     OutputMode mode = OutputMode::kSync;
     std::optional<unsigned int> maxMinutes;
     RecoverMode recover = RecoverMode::kYes;
+    /// Seconds after which what was recorded is made durable; 0 for never. 2 when not set.
+    std::optional<double> durable;
 
     /// Empty: from the start. Only in mode "sync".
     std::vector<RecordRange> record;
@@ -49,6 +51,11 @@ struct Options {
     std::optional<std::string> log;
     std::optional<unsigned int> logPriority;
     bool json = false;
+    /// Name of the control socket.
+    std::optional<std::string> control;
+    /// Program that is run for each event, and address to which it is posted.
+    std::optional<std::string> hook;
+    std::optional<std::string> hookUrl;
 };
 
 /// Reads a command line. Throws `ReceiverError` with `kUsage` and a sentence that names the option when

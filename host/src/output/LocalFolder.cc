@@ -6,6 +6,7 @@
 #include <filesystem>
 
 #include "common/ReceiverError.h"
+#include "output/Links.h"
 #include "output/OutputFolder.h"
 
 namespace receiver {
@@ -75,10 +76,20 @@ std::string LocalFolder::Obstacle(const std::string& date, const std::string& pr
         if (!S_ISDIR(status.st_mode)) {
             return UnusableSentence(path, "is no folder");
         }
+        if (LeadsOutOf(folder_, path)) {
+            return "the folder '" + path +
+                   "' is a link, or behind one, that leads out of the output folder; put a folder in its "
+                   "place, or "
+                   "name another output folder.";
+        }
         if (access(path.c_str(), W_OK | X_OK) != 0) {
             return UnusableSentence(path, std::string("cannot be written: ") + std::strerror(errno));
         }
         return {};
+    }
+    struct stat status = {};
+    if (stat(folder_.c_str(), &status) == 0 && !S_ISDIR(status.st_mode)) {
+        return UnusableSentence(folder_, "is no folder");
     }
     return {};
 }

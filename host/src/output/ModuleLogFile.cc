@@ -10,6 +10,7 @@
 #include <string>
 
 #include "common/ReceiverError.h"
+#include "output/Links.h"
 
 namespace receiver {
 namespace {
@@ -51,7 +52,16 @@ std::optional<std::string> SetUpLog(const Options& options, const OutputPlace& p
     if (options.log) {
         setenv(kVariable, *options.log == "-" ? "" : options.log->c_str(), 1);
     } else if (ValueOf(kVariable).empty()) {
-        setenv(kVariable, (DefaultFolder(place) + "receiver.log").c_str(), 1);
+        const std::string file = DefaultFolder(place) + "receiver.log";
+        // Whoever may write to the folder could have put it there.
+        if (!place.onShare && LeadsOutOf(place.folder, file)) {
+            throw ReceiverError(
+                ExitCode::kOutput,
+                "the log '" + file +
+                    "' is a link that leads out of the output folder; remove it, or name the log "
+                    "with --log.");
+        }
+        setenv(kVariable, file.c_str(), 1);
     }
     if (options.logPriority) {
         setenv("QX_LOG_PRIORITY", std::to_string(*options.logPriority).c_str(), 1);

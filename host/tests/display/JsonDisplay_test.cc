@@ -63,7 +63,7 @@ TEST_F(JsonDisplayTest, ProgressHoldsTheWholeSnapshot) {
         R"({"event":"progress","time":"2026-11-21T20:15:07.042Z","timecode":"10:20:30;12","seconds":12.5,"recording":true,)"
         R"("waiting_for_idr":false,"frames_per_second":59.94,"video_kilobits":8123.4,"audio_kilobits":192.2,)"
         R"("klv_packets":7,"status":4,"cause":0,"file":"/srv/rec/20261121/CAM1/10_20_18_00.MP4",)"
-        R"("free_bytes":123456789012,"lost":0})"
+        R"("free_bytes":123456789012,"sync_milliseconds":12,"lost":0})"
         "\n");
 }
 
@@ -73,6 +73,7 @@ TEST_F(JsonDisplayTest, WhatIsNotKnownIsNull) {
     EXPECT_TRUE(object["timecode"].is_null());
     EXPECT_TRUE(object["file"].is_null());
     EXPECT_TRUE(object["free_bytes"].is_null());
+    EXPECT_TRUE(object["sync_milliseconds"].is_null());
 }
 
 TEST_F(JsonDisplayTest, ProgressComesAtOnceWhenARecordingBeginsOrEnds) {

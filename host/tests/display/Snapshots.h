@@ -17,6 +17,7 @@ inline Snapshot RecordingSnapshot() {
     snapshot.status = {4, 0};
     snapshot.file = "/srv/rec/20261121/CAM1/10_20_18_00.MP4";
     snapshot.freeBytes = 123456789012;
+    snapshot.syncTime = std::chrono::milliseconds(12);
     return snapshot;
 }
 

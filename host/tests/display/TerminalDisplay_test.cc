@@ -18,7 +18,7 @@ using ::testing::StartsWith;
 TEST(StatusLine, TellsEverythingAtOnce) {
     EXPECT_EQ(StatusLine(RecordingSnapshot(), 200),
               "REC  10:20:30;12 | buffering | CAM1/10_20_18_00.MP4 | 59.94 fps 8.1 Mb/s + 192 kb/s | KLV 7 | "
-              "123.5 GB free");
+              "123.5 GB free | sync 12 ms");
 }
 
 TEST(StatusLine, LossesStandOutAndWaitingIsSaid) {

@@ -115,6 +115,26 @@ TEST_F(LocalFolderTest, ADatedFolderThatIsNotThereIsNoObstacle) {
     EXPECT_EQ(ObstacleForSomebodyElse(""), "");
 }
 
+TEST_F(LocalFolderTest, AFileInThePlaceOfTheOutputFolderIsAnObstacle) {
+    const std::string file = folder_ + "/file";
+    std::ofstream(file) << "text";
+    EXPECT_THAT(OpenLocalFolder(file)->Obstacle("20261121", "CAM1"),
+                StartsWith("the folder '" + file + "' is no folder"));
+}
+
+TEST_F(LocalFolderTest, ADatedFolderThatIsALinkToAnotherPlaceIsAnObstacle) {
+    std::filesystem::create_directory(folder_ + "/rec");
+    std::filesystem::create_directory(folder_ + "/other");
+    std::filesystem::create_symlink(folder_ + "/other", folder_ + "/rec/20261121");
+    for (const char* const prefix : {"CAM1", ""}) {
+        EXPECT_THAT(OpenLocalFolder(folder_ + "/rec")->Obstacle("20261121", prefix),
+                    HasSubstr("leads out of the output folder"));
+    }
+    std::filesystem::create_directory(folder_ + "/other/CAM1");
+    EXPECT_THAT(OpenLocalFolder(folder_ + "/rec")->Obstacle("20261121", "CAM1"),
+                HasSubstr("leads out of the output folder"));
+}
+
 TEST_F(LocalFolderTest, ADatedFolderOfAnothersUmaskIsAnObstacle) {
     const std::string dated = Make("20261121", 0700);
     EXPECT_THAT(ObstacleForSomebodyElse("CAM1"),

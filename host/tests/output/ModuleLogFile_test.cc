@@ -41,6 +41,19 @@ TEST_F(ModuleLogFileTest, StandsInALocalOutputFolder) {
     EXPECT_EQ(LogOf(local_), folder_ + "/receiver.log");
 }
 
+TEST_F(ModuleLogFileTest, IsNotWrittenThroughALinkThatSomebodyHasPutIntoTheOutputFolder) {
+    std::filesystem::create_symlink("/etc/passwd", folder_ + "/receiver.log");
+    try {
+        SetUpLog(options_, local_);
+        ADD_FAILURE() << "the link was followed";
+    } catch (const ReceiverError& error) {
+        EXPECT_EQ(error.Code(), ExitCode::kOutput);
+        EXPECT_THAT(error.what(), HasSubstr("is a link that leads out of the output folder"));
+    }
+    options_.log = folder_ + "/receiver.log";
+    EXPECT_EQ(LogOf(local_), folder_ + "/receiver.log");
+}
+
 TEST_F(ModuleLogFileTest, OfAShareStandsWhereTheServiceHasItsLogsOrTheReceiverWasStarted) {
     EXPECT_EQ(LogOf(share_), "receiver.log");
     unsetenv("QX_LOG");

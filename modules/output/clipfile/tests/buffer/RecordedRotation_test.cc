@@ -58,9 +58,9 @@ const Plan kPlans[] = {
      reordered_stream::kPyramid,
      60,
      1,
-     3 * 3840 + 100,
+     3840 + 100,
      0,
-     {3840, 3840, 3840, 100}},
+     {3840, 100}},
     // 64 s at 29.97: where it meets that of 640.
     {"EachMinuteAt2997",
      stream_units::kRate2997,

@@ -340,6 +340,16 @@ TEST_F(ControllerExactTest, InOnModeARecordingStartsBehindWhatWentBy) {
     EXPECT_EQ(Recordings(), (Ranges{{2022 * 90, -1}}));
 }
 
+TEST_F(ControllerExactTest, AClockBeyondTheRangeOfItsTicksWrapsAsWhereItIsCompared) {
+    Run("exact", "on");
+    constexpr std::uint64_t kFarAhead = std::uint64_t{1} << 63;
+    controller_.PushAudio(stream_units::AudioUnit(1, 50000, kFarAhead));
+    WaitUntilHanded(kAudio, kFarAhead);
+    controller_.BufferingStart();
+    // 2^63 times 90 is a multiple of 2^64: one audio frame is left.
+    EXPECT_EQ(Recordings(), (Ranges{{22 * 90, -1}}));
+}
+
 TEST_F(ControllerExactTest, InOnModeARecordingInFrontOfTheStreamStartsAtItsBeginning) {
     Run("exact", "on");
     controller_.BufferingStart();

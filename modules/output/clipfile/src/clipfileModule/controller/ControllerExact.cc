@@ -86,8 +86,9 @@ void Controller::startBehindStream(Recording& recording) {
     }
     // Of what has gone by or was flushed each medium lacks something else. Behind it all nothing lacks, also
     // not the audio frame that begins in front of a picture.
-    const auto start = static_cast<std::int64_t>(*newest + kAudioFrame);
-    recording.buffer->SetStartTimestamp(start * kTicksPerMilliSec);
+    // Clocks may stand anywhere, and wrap here as they do where they are compared.
+    const std::uint64_t start = (*newest + kAudioFrame) * std::uint64_t{kTicksPerMilliSec};
+    recording.buffer->SetStartTimestamp(static_cast<std::int64_t>(start));
     recording.startsBehind = true;
 }
 

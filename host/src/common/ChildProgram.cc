@@ -1,9 +1,10 @@
-#include "journal/ChildProgram.h"
+#include "common/ChildProgram.h"
 
 #include <fcntl.h>
 #include <poll.h>
 #include <signal.h>
 #include <spawn.h>
+#include <sys/mman.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -20,9 +21,14 @@ constexpr std::size_t kMaxText = 16'000;
 /// How often `End` is looked for, in milliseconds.
 constexpr int kLook = 50;
 
-/// Our environment without what is for the module's log.
-std::vector<char*> Environment() {
+using Clock = std::chrono::steady_clock;
+
+/// What is added, and our environment without what is for the module's log.
+std::vector<char*> Environment(const std::vector<std::string>& added) {
     std::vector<char*> variables;
+    for (const std::string& variable : added) {
+        variables.push_back(const_cast<char*>(variable.c_str()));
+    }
     for (char** variable = environ; *variable != nullptr; ++variable) {
         if (!std::string_view(*variable).starts_with("QX_LOG")) {
             variables.push_back(*variable);
@@ -32,11 +38,22 @@ std::vector<char*> Environment() {
     return variables;
 }
 
-/// Attributes and file actions of a child: no signal blocked or ignored, nothing to read, all that it says to
-/// one descriptor.
+/// A descriptor to read `text` from; -1 where there is none. A pipe would have to be filled while the program
+/// runs, and might break.
+int InputOf(const std::string& text) {
+    const int file = memfd_create("input", MFD_CLOEXEC);
+    if (file >= 0 && (write(file, text.data(), text.size()) != static_cast<ssize_t>(text.size()) ||
+                      lseek(file, 0, SEEK_SET) != 0)) {
+        close(file);
+        return -1;
+    }
+    return file;
+}
+
+/// Attributes and file actions of a child: no signal blocked or ignored, all that it says to one descriptor.
 class Setup {
  public:
-    explicit Setup(int output) {
+    Setup(int input, int output) {
         posix_spawnattr_init(&attributes_);
         posix_spawn_file_actions_init(&actions_);
         sigset_t none;
@@ -48,7 +65,7 @@ class Setup {
         posix_spawnattr_setpgroup(&attributes_, 0);
         posix_spawnattr_setflags(&attributes_,
                                  POSIX_SPAWN_SETSIGMASK | POSIX_SPAWN_SETSIGDEF | POSIX_SPAWN_SETPGROUP);
-        posix_spawn_file_actions_addopen(&actions_, STDIN_FILENO, "/dev/null", O_RDONLY, 0);
+        posix_spawn_file_actions_adddup2(&actions_, input, STDIN_FILENO);
         posix_spawn_file_actions_adddup2(&actions_, output, STDOUT_FILENO);
         posix_spawn_file_actions_adddup2(&actions_, output, STDERR_FILENO);
         // A file that the module has open would stay locked by it.
@@ -61,14 +78,14 @@ class Setup {
     Setup(const Setup&) = delete;
     Setup& operator=(const Setup&) = delete;
 
-    int Spawn(pid_t& process, const std::vector<std::string>& command) const {
+    int Spawn(pid_t& process, const ChildTask& task) const {
         std::vector<char*> arguments;
-        for (const std::string& argument : command) {
+        for (const std::string& argument : task.command) {
             arguments.push_back(const_cast<char*>(argument.c_str()));
         }
         arguments.push_back(nullptr);
-        return posix_spawn(&process, command.front().c_str(), &actions_, &attributes_, arguments.data(),
-                           Environment().data());
+        return posix_spawn(&process, task.command.front().c_str(), &actions_, &attributes_, arguments.data(),
+                           Environment(task.environment).data());
     }
 
  private:
@@ -76,10 +93,10 @@ class Setup {
     posix_spawn_file_actions_t actions_;
 };
 
-/// Reads to the end, or until `ending`. False then.
-bool ReadAll(int descriptor, const std::atomic<bool>& ending, std::string& text) {
+/// Reads to the end, or until `ending` or the deadline. False then.
+bool ReadAll(int descriptor, const std::atomic<bool>& ending, Clock::time_point deadline, std::string& text) {
     std::array<char, 1024> buffer;
-    while (!ending) {
+    while (!ending && Clock::now() < deadline) {
         pollfd input = {descriptor, POLLIN, 0};
         if (poll(&input, 1, kLook) <= 0) {
             continue;
@@ -97,24 +114,29 @@ bool ReadAll(int descriptor, const std::atomic<bool>& ending, std::string& text)
 
 }  // namespace
 
-ChildResult ChildProgram::Run(const std::vector<std::string>& command) {
+ChildResult ChildProgram::Run(const ChildTask& task) {
     ChildResult result;
     std::array<int, 2> ends = {-1, -1};
-    if (ending_ || pipe2(ends.data(), O_CLOEXEC) != 0) {
-        result.text = std::strerror(errno);
+    const int input = InputOf(task.input);
+    if (ending_ || input < 0 || pipe2(ends.data(), O_CLOEXEC) != 0) {
+        result.text = ending_ ? "it was ended" : std::strerror(errno);
+        close(input);
         return result;
     }
     pid_t process = -1;
-    const int error = Setup(ends[1]).Spawn(process, command);
+    const int error = Setup(input, ends[1]).Spawn(process, task);
+    close(input);
     close(ends[1]);
     if (error == 0) {
-        if (!ReadAll(ends[0], ending_, result.text)) {
-            kill(process, SIGKILL);
+        const auto deadline = task.limit ? Clock::now() + *task.limit : Clock::time_point::max();
+        if (!ReadAll(ends[0], ending_, deadline, result.text)) {
+            result.timedOut = !ending_;
+            kill(-process, SIGKILL);
         }
         int status = 0;
         while (waitpid(process, &status, 0) < 0 && errno == EINTR) {
         }
-        result.code = !ending_ && WIFEXITED(status) ? WEXITSTATUS(status) : -1;
+        result.code = !ending_ && !result.timedOut && WIFEXITED(status) ? WEXITSTATUS(status) : -1;
     } else {
         result.text = std::strerror(error);
     }

@@ -1,4 +1,4 @@
-#include "journal/ChildProgram.h"
+#include "common/ChildProgram.h"
 
 #include <fcntl.h>
 #include <gtest/gtest.h>
@@ -12,19 +12,19 @@ namespace receiver {
 namespace {
 
 TEST(ChildProgram, GivesWhatItSaysAndItsCode) {
-    const ChildResult result = ChildProgram().Run({"/bin/sh", "-c", "echo one; echo two >&2; exit 3"});
+    const ChildResult result = ChildProgram().Run({{"/bin/sh", "-c", "echo one; echo two >&2; exit 3"}});
     EXPECT_EQ(result.code, 3);
     EXPECT_EQ(result.text, "one\ntwo\n");
 }
 
 TEST(ChildProgram, ThatIsMissingIsNotStarted) {
-    const ChildResult result = ChildProgram().Run({"/nowhere/clipfile", "recover"});
+    const ChildResult result = ChildProgram().Run({{"/nowhere/clipfile", "recover"}});
     EXPECT_EQ(result.code, -1);
     EXPECT_EQ(result.text, "No such file or directory");
 }
 
 TEST(ChildProgram, ThatIsKilledHasNoCode) {
-    EXPECT_EQ(ChildProgram().Run({"/bin/sh", "-c", "kill -9 $$"}).code, -1);
+    EXPECT_EQ(ChildProgram().Run({{"/bin/sh", "-c", "kill -9 $$"}}).code, -1);
 }
 
 TEST(ChildProgram, TakesOverNeitherBlockedSignalsNorTheLog) {
@@ -34,7 +34,7 @@ TEST(ChildProgram, TakesOverNeitherBlockedSignalsNorTheLog) {
     ASSERT_EQ(pthread_sigmask(SIG_BLOCK, &blocked, &before), 0);
     setenv("QX_LOG", "/dev/full", 1);
     const ChildResult result =
-        ChildProgram().Run({"/bin/sh", "-c", "grep SigBlk /proc/self/status; echo \"log=$QX_LOG\"; cat"});
+        ChildProgram().Run({{"/bin/sh", "-c", "grep SigBlk /proc/self/status; echo \"log=$QX_LOG\"; cat"}});
     ASSERT_EQ(pthread_sigmask(SIG_SETMASK, &before, nullptr), 0);
     EXPECT_EQ(result.text, "SigBlk:\t0000000000000000\nlog=\n");
 }
@@ -44,19 +44,35 @@ TEST(ChildProgram, TakesOverNoOpenFiles) {
     const int held = open("/dev/null", O_RDONLY);
     ASSERT_GE(held, 3);
     const ChildResult result = ChildProgram().Run(
-        {"/bin/sh", "-c", "[ -e /proc/$$/fd/" + std::to_string(held) + " ] && echo open || echo closed"});
+        {{"/bin/sh", "-c", "[ -e /proc/$$/fd/" + std::to_string(held) + " ] && echo open || echo closed"}});
     close(held);
     EXPECT_EQ(result.text, "closed\n");
+}
+
+TEST(ChildProgram, ReadsItsInputAndSeesWhatIsAddedToTheEnvironment) {
+    const std::string input(200'000, 'x');
+    const ChildResult result = ChildProgram().Run({.command = {"/bin/sh", "-c", "echo \"$GREETING\"; wc -c"},
+                                                   .environment = {"GREETING=hello; exit 1"},
+                                                   .input = input});
+    EXPECT_EQ(result.text, "hello; exit 1\n200000\n");
+}
+
+TEST(ChildProgram, ThatTakesTooLongIsKilledWithItsChildren) {
+    // The child of the shell holds the output open.
+    const ChildResult result = ChildProgram().Run(
+        {.command = {"/bin/sh", "-c", "sleep 1000; true"}, .limit = std::chrono::milliseconds(200)});
+    EXPECT_TRUE(result.timedOut);
+    EXPECT_EQ(result.code, -1);
 }
 
 TEST(ChildProgram, IsKilledWithItsRun) {
     ChildProgram program;
     std::thread end([&] { program.End(); });
     const auto began = std::chrono::steady_clock::now();
-    EXPECT_EQ(program.Run({"/bin/sh", "-c", "exec sleep 1000"}).code, -1);
+    EXPECT_EQ(program.Run({{"/bin/sh", "-c", "exec sleep 1000"}}).code, -1);
     EXPECT_LT(std::chrono::steady_clock::now() - began, std::chrono::seconds(500));
     end.join();
-    EXPECT_EQ(program.Run({"/bin/true"}).code, -1);
+    EXPECT_EQ(program.Run({{"/bin/true"}}).code, -1);
 }
 
 }  // namespace

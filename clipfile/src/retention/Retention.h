@@ -1,0 +1,62 @@
+#pragma once
+
+#include <chrono>
+#include <cstdint>
+#include <filesystem>
+#include <functional>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <vector>
+
+namespace clipfile {
+
+/// Which recordings of a folder may go. Without a limit none may.
+struct RetentionOptions {
+    std::filesystem::path folder;
+    /// Those that were closed longer ago.
+    std::optional<std::chrono::seconds> olderThan;
+    /// The oldest ones, until so many bytes of the disk are free.
+    std::optional<std::uint64_t> keepFree;
+    /// Nothing is removed, only told.
+    bool dryRun = false;
+};
+
+/// What the rules are measured by.
+struct RetentionSystem {
+    /// Bytes that are free where a folder is.
+    std::function<std::uint64_t(const std::filesystem::path& folder)> freeBytes;
+    std::function<std::filesystem::file_time_type()> now;
+};
+/// That of this machine. `freeBytes` throws `ToolError`.
+RetentionSystem ThisSystem();
+
+/// What has become of a file.
+struct RetentionStep {
+    std::string path;
+    std::uint64_t bytes = 0;
+    bool removed = false;
+    /// Why it goes, or why it stays though it should go, in words.
+    std::string reason;
+};
+
+/// What is left at the end.
+struct RetentionResult {
+    /// A sentence for each folder that could not be read.
+    std::vector<std::string> faults;
+    /// As much of the disk is free as was asked for.
+    bool isRoom = true;
+};
+
+/// Removes recordings below a folder, the oldest first by the time of their last change, and tells each step.
+/// A file goes only when it is closed, its structure keeps all rules, and no recorder or recovery holds it;
+/// links never go. Throws `ToolError` where the disk cannot be asked.
+RetentionResult Retain(const RetentionOptions& options, const RetentionSystem& system,
+                       const std::function<void(const RetentionStep&)>& tell);
+
+/// "30d", "12h". Nothing for any other text.
+std::optional<std::chrono::seconds> ParseAge(std::string_view text);
+/// "200G", "1T", "500M": powers of 1000. Nothing for any other text.
+std::optional<std::uint64_t> ParseBytes(std::string_view text);
+
+}  // namespace clipfile

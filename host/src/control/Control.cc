@@ -1,0 +1,92 @@
+#include "control/Control.h"
+
+#include <sched.h>
+#include <sys/resource.h>
+
+#include <atomic>
+#include <chrono>
+#include <utility>
+
+#include "control/ControlServer.h"
+#include "control/ControlService.h"
+#include "control/ControlSocket.h"
+#include "control/EventQueue.h"
+#include "control/Preview.h"
+#include "control/RunState.h"
+#include "control/WakeUp.h"
+
+namespace receiver {
+namespace {
+
+/// How long the end of a run waits for clients to read what is left.
+constexpr std::chrono::milliseconds kReaderPatience{1000};
+/// Above that of the process: recording comes first.
+constexpr int kNicer = 10;
+
+/// Of this thread alone. Where the process has a real-time priority, it does not.
+void LowerPriority() {
+    const sched_param none{};
+    sched_setscheduler(0, SCHED_OTHER, &none);
+    setpriority(PRIO_PROCESS, 0, getpriority(PRIO_PROCESS, 0) + kNicer);
+}
+
+}  // namespace
+
+struct Control::State {
+    State(const std::string& path, std::shared_ptr<CommandQueue> commands, FileSizer sizer)
+        : socket(path), service(std::move(commands), run, events, preview, std::move(sizer), Waker()) {}
+
+    std::function<void()> Waker() const {
+        return [shared = wakeUp] { shared->Signal(); };
+    }
+
+    /// Commands that nobody has carried out own it too.
+    const std::shared_ptr<WakeUp> wakeUp = std::make_shared<WakeUp>();
+    ControlSocket socket;
+    std::atomic<bool> ending{false};
+    Preview preview;
+    // The events wake the thread, and what the run tells of itself comes before them.
+    RunState run{[] {}};
+    EventQueue events{Waker()};
+    // The thread's own:
+    ControlService service;
+    ControlServer server{socket, *wakeUp, service};
+};
+
+Control::Control(const std::string& path, std::shared_ptr<CommandQueue> commands, FileSizer sizer)
+    : state_(std::make_shared<State>(path, std::move(commands), std::move(sizer))),
+      thread_([state = state_] { Run(*state); }) {}
+
+Control::~Control() {
+    End();
+}
+
+std::vector<DisplayInterface*> Control::Displays() {
+    return {&state_->run, &state_->events.Display()};
+}
+
+void Control::Describe(const SourceDescription& source) {
+    state_->run.Describe(source);
+}
+
+void Control::LookAt(const SourceUnit& unit) {
+    state_->preview.LookAt(unit);
+}
+
+void Control::End(std::chrono::milliseconds patience) {
+    state_->socket.Remove();
+    state_->ending = true;
+    state_->wakeUp->Signal();
+    thread_.End(patience);
+}
+
+void Control::Run(State& state) {
+    LowerPriority();
+    while (!state.ending) {
+        state.server.Serve();
+    }
+    state.service.Finish(state.server);
+    state.server.Finish(kReaderPatience);
+}
+
+}  // namespace receiver

@@ -1,0 +1,53 @@
+#pragma once
+
+#include <cstddef>
+#include <optional>
+#include <string>
+
+namespace receiver {
+
+/// One connection: lines in, lines out, and never a wait. One thread.
+class ControlClient {
+ public:
+    /// Bytes of a line without its end.
+    static constexpr std::size_t kLongestLine = 65536;
+
+    /// Owns the descriptor, which does not block.
+    explicit ControlClient(int descriptor) : descriptor_(descriptor) {}
+    ~ControlClient();
+    ControlClient(const ControlClient&) = delete;
+    ControlClient& operator=(const ControlClient&) = delete;
+
+    int Descriptor() const { return descriptor_; }
+
+    /// Reads a piece of what is there.
+    void Read();
+    /// The next whole line without its end.
+    std::optional<std::string> TakeLine();
+    bool HasLine() const { return input_.find('\n') != std::string::npos; }
+    /// More has come than a line can have.
+    bool LineTooLong() const { return !HasLine() && input_.size() > kLongestLine; }
+    /// The client sends no more; it may still read.
+    bool InputEnded() const { return inputEnded_; }
+
+    /// Queues a line.
+    void Send(const std::string& line) { output_ += line; }
+    /// Writes as much of what waits as the client takes.
+    void Write();
+    /// Bytes that wait for the client.
+    std::size_t Waiting() const { return output_.size() - written_; }
+
+    /// The connection is gone.
+    bool Broken() const { return broken_; }
+
+ private:
+    const int descriptor_;
+    std::string input_;
+    std::string output_;
+    /// Bytes of `output_` that are written.
+    std::size_t written_ = 0;
+    bool inputEnded_ = false;
+    bool broken_ = false;
+};
+
+}  // namespace receiver
