@@ -1,5 +1,7 @@
 #include "retention/Retention.h"
 
+#include <sys/stat.h>
+
 #include <algorithm>
 #include <array>
 #include <charconv>
@@ -23,20 +25,24 @@ namespace fs = std::filesystem;
 struct File {
     fs::path path;
     std::uint64_t bytes = 0;
+    /// What of the disk is free when it has gone: nothing where it has another name.
+    std::uint64_t freed = 0;
+    dev_t device = 0;
     fs::file_time_type changed;
 };
 
 /// The recordings below a folder, from the oldest on. What has gone meanwhile, and links, are left out.
 std::vector<File> OldestFirst(const std::vector<std::string>& paths) {
+    constexpr std::uint64_t kBlock = 512;  // of st_blocks, everywhere
     std::vector<File> files;
     for (const std::string& path : paths) {
+        struct stat status {};
         std::error_code error;
-        const bool regular = fs::symlink_status(path, error).type() == fs::file_type::regular;
-        File file{path, 0, {}};
-        file.bytes = error ? 0 : fs::file_size(path, error);
-        file.changed = error ? fs::file_time_type() : fs::last_write_time(path, error);
-        if (regular && !error) {
-            files.push_back(file);
+        const fs::file_time_type changed = fs::last_write_time(path, error);
+        if (!error && lstat(path.c_str(), &status) == 0 && S_ISREG(status.st_mode)) {
+            const auto blocks = static_cast<std::uint64_t>(status.st_blocks);
+            files.push_back({path, static_cast<std::uint64_t>(status.st_size),
+                             status.st_nlink == 1 ? blocks * kBlock : 0, status.st_dev, changed});
         }
     }
     std::sort(files.begin(), files.end(), [](const File& one, const File& other) {
@@ -108,6 +114,9 @@ RetentionSystem ThisSystem() {
 RetentionResult Retain(const RetentionOptions& options, const RetentionSystem& system,
                        const std::function<void(const RetentionStep&)>& tell) {
     const FolderListing listing = FilesIn(options.folder);
+    struct stat folder {};
+    stat(options.folder.c_str(), &folder);
+    // Counted, not asked for again: a disk that frees late, or that others fill, would cost all recordings.
     std::uint64_t free = options.keepFree ? system.freeBytes(options.folder) : 0;
     const auto isFull = [&] { return options.keepFree && free < *options.keepFree; };
     for (const File& file : OldestFirst(listing.files)) {
@@ -115,11 +124,14 @@ RetentionResult Retain(const RetentionOptions& options, const RetentionSystem& s
         if (!isOld && !isFull()) {
             break;
         }
+        if (!isOld && (file.freed == 0 || file.device != folder.st_dev)) {
+            continue;
+        }
         const std::string why = isOld ? "it is older than the limit" : Gigabytes(free) + " are free";
         const std::string obstacle = Remove(file.path, options.dryRun);
         tell({file.path.string(), file.bytes, obstacle.empty(), obstacle.empty() ? why : obstacle});
-        if (obstacle.empty() && options.keepFree) {
-            free = options.dryRun ? free + file.bytes : system.freeBytes(options.folder);
+        if (obstacle.empty() && file.device == folder.st_dev) {
+            free += file.freed;
         }
     }
     return {listing.faults, !isFull()};

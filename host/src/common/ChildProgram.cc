@@ -93,23 +93,48 @@ class Setup {
     posix_spawn_file_actions_t actions_;
 };
 
-/// Reads to the end, or until `ending` or the deadline. False then.
-bool ReadAll(int descriptor, const std::atomic<bool>& ending, Clock::time_point deadline, std::string& text) {
+/// Reads what is there, without a wait. False at the end.
+bool Read(int descriptor, std::string& text) {
     std::array<char, 1024> buffer;
-    while (!ending && Clock::now() < deadline) {
-        pollfd input = {descriptor, POLLIN, 0};
-        if (poll(&input, 1, kLook) <= 0) {
-            continue;
-        }
+    for (;;) {
         const ssize_t count = read(descriptor, buffer.data(), buffer.size());
-        if (count == 0 || (count < 0 && errno != EINTR)) {
-            return true;
+        if (count <= 0) {
+            return count < 0 && (errno == EAGAIN || errno == EINTR);
         }
-        if (count > 0 && text.size() < kMaxText) {
+        if (text.size() < kMaxText) {
             text.append(buffer.data(), static_cast<std::size_t>(count));
         }
     }
-    return false;
+}
+
+/// Collects the process if it has ended.
+bool HasEnded(pid_t process, int& status) {
+    return waitpid(process, &status, WNOHANG) == process;
+}
+
+/// Follows a process until it has ended, whoever holds its output, and gives what it has left. It is killed
+/// when it is to end or the deadline comes.
+int Follow(pid_t process, int output, const std::atomic<bool>& ending, Clock::time_point deadline,
+           std::string& text) {
+    int status = 0;
+    bool open = true;
+    while (!HasEnded(process, status)) {
+        if (ending || Clock::now() >= deadline) {
+            kill(-process, SIGKILL);
+            while (waitpid(process, &status, 0) < 0 && errno == EINTR) {
+            }
+            break;
+        }
+        // A closed output tells nothing more: then it is the pause alone.
+        pollfd input = {open ? output : -1, POLLIN, 0};
+        if (poll(&input, 1, kLook) > 0) {
+            open = Read(output, text);
+        }
+    }
+    if (open) {
+        Read(output, text);
+    }
+    return status;
 }
 
 }  // namespace
@@ -129,14 +154,10 @@ ChildResult ChildProgram::Run(const ChildTask& task) {
     close(ends[1]);
     if (error == 0) {
         const auto deadline = task.limit ? Clock::now() + *task.limit : Clock::time_point::max();
-        if (!ReadAll(ends[0], ending_, deadline, result.text)) {
-            result.timedOut = !ending_;
-            kill(-process, SIGKILL);
-        }
-        int status = 0;
-        while (waitpid(process, &status, 0) < 0 && errno == EINTR) {
-        }
-        result.code = !ending_ && !result.timedOut && WIFEXITED(status) ? WEXITSTATUS(status) : -1;
+        fcntl(ends[0], F_SETFL, O_NONBLOCK);
+        const int status = Follow(process, ends[0], ending_, deadline, result.text);
+        result.timedOut = !ending_ && WIFSIGNALED(status) && Clock::now() >= deadline;
+        result.code = !ending_ && WIFEXITED(status) ? WEXITSTATUS(status) : -1;
     } else {
         result.text = std::strerror(error);
     }

@@ -36,7 +36,7 @@ struct ChildResult {
 /// the terminal do not reach it. Who is killed is killed with its group.
 class ChildProgram {
  public:
-    /// Runs a program to its end: until it has ended and nobody holds its output open.
+    /// Runs a program to its end. What it leaves behind in the background goes on, and is not heard.
     ChildResult Run(const ChildTask& task);
     /// Kills the program that runs, and every later one at once. From any thread.
     void End();

@@ -20,7 +20,20 @@ void ControlClient::Read() {
     } else if (count == 0) {
         inputEnded_ = true;
     } else if (errno != EAGAIN && errno != EINTR) {
-        broken_ = true;
+        inputEnded_ = true;
+        Abandon();
+    }
+}
+
+void ControlClient::Abandon() {
+    abandoned_ = true;
+    output_.clear();
+    written_ = 0;
+}
+
+void ControlClient::Send(const std::string& line) {
+    if (!abandoned_) {
+        output_ += line;
     }
 }
 
@@ -41,7 +54,9 @@ void ControlClient::Write() {
             continue;
         }
         if (count < 0) {
-            broken_ = errno != EAGAIN;
+            if (errno != EAGAIN) {
+                Abandon();
+            }
             return;
         }
         written_ += static_cast<std::size_t>(count);

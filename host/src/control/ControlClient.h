@@ -31,14 +31,16 @@ class ControlClient {
     bool InputEnded() const { return inputEnded_; }
 
     /// Queues a line.
-    void Send(const std::string& line) { output_ += line; }
+    void Send(const std::string& line);
     /// Writes as much of what waits as the client takes.
     void Write();
     /// Bytes that wait for the client.
     std::size_t Waiting() const { return output_.size() - written_; }
 
-    /// The connection is gone.
-    bool Broken() const { return broken_; }
+    /// Nobody is at the other end any more: what waits is for nobody. What was sent can still be read.
+    void Abandon();
+    /// Nobody is there, and all that was sent has been taken.
+    bool Gone() const { return abandoned_ && inputEnded_ && !HasLine(); }
 
  private:
     const int descriptor_;
@@ -47,7 +49,7 @@ class ControlClient {
     /// Bytes of `output_` that are written.
     std::size_t written_ = 0;
     bool inputEnded_ = false;
-    bool broken_ = false;
+    bool abandoned_ = false;
 };
 
 }  // namespace receiver

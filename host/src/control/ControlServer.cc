@@ -39,8 +39,7 @@ void ControlServer::Serve() {
         if ((happened & POLLIN) != 0) {
             connection.client.Read();
         } else if ((happened & (POLLHUP | POLLERR)) != 0) {
-            // Nobody is at the other end any more.
-            connection.leaves = Clock::time_point::min();
+            connection.client.Abandon();
         }
         TakeInput(ids[i], connection);
         connection.client.Write();
@@ -161,7 +160,8 @@ void ControlServer::RemoveGone() {
         const Connection& connection = at->second;
         const bool over =
             connection.leaves && (connection.client.Waiting() == 0 || now >= *connection.leaves);
-        if (over || connection.client.Broken()) {
+        // What a client has sent before it went is carried out.
+        if (over || connection.client.Gone()) {
             handler_.OnGone(at->first);
             clients_.erase(at);
         }

@@ -1,5 +1,7 @@
 #include "control/JsonRpc.h"
 
+#include <utility>
+
 namespace receiver {
 namespace {
 
@@ -21,7 +23,9 @@ RpcRequest Refused(RpcRequest request, RpcCode code, const char* sentence) {
 
 RpcRequest ParseRpcRequest(std::string_view line) {
     RpcRequest request;
-    const Json message = Json::parse(line, nullptr, false);
+    // Its objects are maps: the members of an ordered one are looked for one by one. Values are moved out of
+    // it, since a copy takes a stack as deep as they are nested.
+    nlohmann::json message = nlohmann::json::parse(line, nullptr, false);
     if (message.is_discarded()) {
         return Refused(request, RpcCode::kParse, "the line is no JSON");
     }
@@ -36,7 +40,7 @@ RpcRequest ParseRpcRequest(std::string_view line) {
         if (!id->is_string() && !id->is_number() && !id->is_null()) {
             return Refused(request, RpcCode::kInvalidRequest, "id is a text, a number or null");
         }
-        request.id = *id;
+        request.id = Json(*id);
     }
     const auto version = message.find("jsonrpc");
     if (version == message.end() || *version != "2.0") {
@@ -51,7 +55,7 @@ RpcRequest ParseRpcRequest(std::string_view line) {
         if (!params->is_structured()) {
             return Refused(request, RpcCode::kInvalidRequest, "params is an object");
         }
-        request.params = *params;
+        request.params = std::move(*params);
     }
     return request;
 }

@@ -42,8 +42,8 @@ struct RpcRequest {
     /// A text, a number or null. Nothing for a notification, which is not answered.
     std::optional<nlohmann::ordered_json> id;
     std::string method;
-    /// An object or an array; null without one.
-    nlohmann::ordered_json params;
+    /// An object or an array; null without one. Nested as deep as a line is long: moved, and never copied.
+    nlohmann::json params;
     /// Why it is none. `id` is then what could be read of it, else null.
     std::optional<RpcError> error;
 };

@@ -6,6 +6,8 @@
 #include <mutex>
 #include <utility>
 
+#include "common/LowPriority.h"
+
 namespace receiver {
 namespace {
 
@@ -75,8 +77,9 @@ HookCounts HookQueue::Counts() const {
 
 bool HookQueue::Wait(std::chrono::milliseconds patience) {
     std::unique_lock lock(state_->mutex);
-    return state_->changed.wait_for(lock, patience,
-                                    [this] { return state_->waiting.empty() && !state_->delivering; });
+    return state_->changed.wait_for(lock, patience, [this] {
+        return state_->ending || (state_->waiting.empty() && !state_->delivering);
+    });
 }
 
 void HookQueue::End() {
@@ -93,6 +96,7 @@ void HookQueue::End() {
 }
 
 void HookQueue::Run(State& state) {
+    LowerPriority();
     std::unique_lock lock(state.mutex);
     for (;;) {
         state.changed.wait(lock, [&state] { return state.ending || !state.waiting.empty(); });

@@ -65,6 +65,29 @@ TEST(ChildProgram, ThatTakesTooLongIsKilledWithItsChildren) {
     EXPECT_EQ(result.code, -1);
 }
 
+TEST(ChildProgram, ThatHasClosedItsOutputIsKilledAtItsLimitToo) {
+    const ChildResult result =
+        ChildProgram().Run({.command = {"/bin/sh", "-c", "exec >/dev/null 2>&1; sleep 1000"},
+                            .limit = std::chrono::milliseconds(200)});
+    EXPECT_TRUE(result.timedOut);
+    EXPECT_EQ(result.code, -1);
+}
+
+TEST(ChildProgram, ThatHasClosedItsOutputIsKilledWithItsRunToo) {
+    ChildProgram program;
+    std::thread end([&] { program.End(); });
+    EXPECT_EQ(program.Run({{"/bin/sh", "-c", "exec >/dev/null 2>&1; sleep 1000"}}).code, -1);
+    end.join();
+}
+
+TEST(ChildProgram, IsNotWaitedForBehindItsEndForWhatItLeavesBehind) {
+    // The one in the background holds the output.
+    const ChildResult result = ChildProgram().Run(
+        {.command = {"/bin/sh", "-c", "sleep 20 & echo done"}, .limit = std::chrono::seconds(500)});
+    EXPECT_EQ(result.code, 0);
+    EXPECT_EQ(result.text, "done\n");
+}
+
 TEST(ChildProgram, IsKilledWithItsRun) {
     ChildProgram program;
     std::thread end([&] { program.End(); });

@@ -130,6 +130,28 @@ TEST_F(ControlServerTest, HalfALineIsForgottenWithItsClient) {
     EXPECT_EQ(handler_.lines, 0);
 }
 
+TEST_F(ControlServerTest, AllLinesOfAClientThatHasGoneAreTaken) {
+    for (int round = 1; round <= 20; ++round) {
+        {
+            const LineClient client(Path());
+            client.Send("later\nbig\na\nb\n");
+        }
+        EXPECT_TRUE(WaitUntil([&] { return handler_.gone == round; }));
+        EXPECT_EQ(handler_.lines, 4 * round);
+    }
+    {
+        // More than is read at once.
+        const LineClient client(Path());
+        std::string lines;
+        for (int i = 0; i < 10000; ++i) {
+            lines += "a\n";
+        }
+        client.Send(lines);
+    }
+    EXPECT_TRUE(WaitUntil([&] { return handler_.gone == 21; }));
+    EXPECT_EQ(handler_.lines, 80 + 10000);
+}
+
 TEST_F(ControlServerTest, AClientThatSendsNoMoreStillGetsItsAnswers) {
     LineClient client(Path());
     client.Send("a\nlater\n");

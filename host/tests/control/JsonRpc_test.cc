@@ -18,7 +18,7 @@ TEST(JsonRpcTest, ReadsARequest) {
     EXPECT_FALSE(request.error);
     EXPECT_EQ(request.id, Json(7));
     EXPECT_EQ(request.method, "preview");
-    EXPECT_EQ(request.params, Json({{"width", 640}}));
+    EXPECT_EQ(request.params, nlohmann::json({{"width", 640}}));
 }
 
 TEST(JsonRpcTest, ANotificationHasNoIdAndOneOfNullIsARequest) {
@@ -58,6 +58,14 @@ TEST(JsonRpcTest, DeepNestingIsReadWithoutADeepStack) {
     EXPECT_EQ(CodeOf(deep), RpcCode::kParse);
     EXPECT_EQ(CodeOf(R"({"jsonrpc":"2.0","id":)" + deep + std::string(60000, ']') + "}"),
               RpcCode::kInvalidRequest);
+}
+
+TEST(JsonRpcTest, ParamsMayBeNestedAsDeepAsALineIsLong) {
+    constexpr std::size_t kDepth = 32700;
+    const RpcRequest request = ParseRpcRequest(R"({"jsonrpc":"2.0","id":1,"method":"x","params":)" +
+                                               std::string(kDepth, '[') + std::string(kDepth, ']') + "}");
+    EXPECT_FALSE(request.error);
+    EXPECT_TRUE(request.params.is_array());
 }
 
 TEST(JsonRpcTest, AnswersErrorsAndNotificationsAreLines) {
