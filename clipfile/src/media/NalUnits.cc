@@ -37,8 +37,11 @@ std::optional<NalHead> ReadNalHead(Bytes bytes) {
     switch (head.type) {
         case 1:
         case 2:
-            // first_mb_in_slice is 0 when its Exp-Golomb code begins with a one.
+            // first_mb_in_slice is 0 when its Exp-Golomb code begins with a one; 1 and 6 are the codes 010
+            // and 00111.
             head.startsPicture = bytes.size() > 1 && (bytes[1] & 0x80) != 0;
+            head.startsBPicture =
+                head.startsPicture && ((bytes[1] & 0x70) == 0x20 || (bytes[1] & 0x7C) == 0x1C);
             return head;
         case 5:
             head.startsPicture = bytes.size() > 1 && (bytes[1] & 0x80) != 0;
@@ -69,6 +72,15 @@ bool IsWholePicture(Bytes sample) {
     bool isGood = true;
     const bool isFilled = ForEachUnit(sample, [&](Bytes unit) { isGood = isGood && ReadNalHead(unit); });
     return isFilled && isGood;
+}
+
+bool HasBPicture(Bytes sample) {
+    bool hasB = false;
+    ForEachUnit(sample, [&](Bytes unit) {
+        const std::optional<NalHead> head = ReadNalHead(unit);
+        hasB = hasB || (head && head->startsBPicture);
+    });
+    return hasB;
 }
 
 std::vector<unsigned char> ToByteStream(Bytes sample) {

@@ -19,6 +19,8 @@ struct NalHead {
     bool IsIdr() const { return type == 5; }
     /// A slice that begins with the picture's first macroblock.
     bool startsPicture = false;
+    /// Such a one of slice_type 1 or 6: a B slice (7.4.3).
+    bool startsBPicture = false;
     /// Stands in front of the slices of a picture, never between them (7.4.1.2.3).
     bool IsInFront() const { return (type >= 6 && type <= 9) || (type >= 14 && type <= 18); }
 };
@@ -31,6 +33,9 @@ std::optional<NalHead> ReadNalHead(Bytes bytes);
 
 /// Whether the bytes are NAL units behind their lengths, from the first to the last.
 bool IsWholePicture(Bytes sample);
+
+/// Whether a picture of the sample begins with a B slice.
+bool HasBPicture(Bytes sample);
 
 /// The sample as a byte stream with start codes (ISO/IEC 14496-10 Annex B).
 std::vector<unsigned char> ToByteStream(Bytes sample);

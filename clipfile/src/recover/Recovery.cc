@@ -45,12 +45,47 @@ fs::path TargetOf(const fs::path& path, const RecoveryOptions& options) {
                         (path.stem().string() + ".recovered" + path.extension().string()));
 }
 
+/// Only the tables of a closed file tell the order in which pictures are shown that need later ones.
+void RefuseReordered(const InputFile& file, bool reordered) {
+    if (reordered) {
+        throw CannotRecover(file.Path(),
+                            "its pictures are reordered (B frames), and nothing tells in which order "
+                            "they are shown");
+    }
+}
+
+/// The chunks of a file without tables, as long as they have no B pictures.
+class ChunksInOrder final : public ChunkSource {
+ public:
+    ChunksInOrder(const InputFile& file, std::unique_ptr<ChunkSource> chunks)
+        : file_(file), chunks_(std::move(chunks)) {}
+
+    Chunk Next() override {
+        Chunk chunk = chunks_->Next();
+        RefuseReordered(file_,
+                        chunk != nullptr && std::any_of(chunk->video.begin(), chunk->video.end(), HasB));
+        return chunk;
+    }
+    std::uint64_t Position() const override { return chunks_->Position(); }
+
+ private:
+    static bool HasB(const std::shared_ptr<nal_access::SampleData>& picture) {
+        return HasBPicture(Bytes(picture->GetData(), static_cast<std::size_t>(picture->GetDataSize())));
+    }
+
+    const InputFile& file_;
+    const std::unique_ptr<ChunkSource> chunks_;
+};
+
 std::unique_ptr<ChunkSource> MakeSource(const InputFile& file, const Recording& recording,
                                         const SampleClock& clock) {
     if (recording.movie) {
+        const Track* const video = recording.movie->Find(FourCc("vide"));
+        RefuseReordered(file, video != nullptr && video->tables.hasComposition);
         return std::make_unique<TableChunks>(file, recording, clock);
     }
-    return std::make_unique<DataChunks>(file, recording.dataBegin, recording.dataEnd, clock);
+    return std::make_unique<ChunksInOrder>(
+        file, std::make_unique<DataChunks>(file, recording.dataBegin, recording.dataEnd, clock));
 }
 
 MetadataUnit UnitOf(const Chunk& chunk) {
@@ -119,19 +154,6 @@ std::pair<ParameterSets, std::string> FindSets(const InputFile& file, const Reco
     throw CannotRecover(file.Path(), "the parameter sets of " + tried +
                                          " fit none of its pictures; name a closed recording of the same "
                                          "stream with --like");
-}
-
-/// Only the tables of a closed file tell the order in which its pictures are shown.
-bool AreReordered(const Recording& recording, const ParameterSets& sets, const Chunk& first) {
-    const Track* const video = recording.movie ? recording.movie->Find(FourCc("vide")) : nullptr;
-    if (video != nullptr) {
-        return video->tables.hasComposition;
-    }
-    const auto picture = std::find_if(first->video.begin(), first->video.end(),
-                                      [](const auto& sample) { return sample->GetSync(); });
-    return picture != first->video.end() &&
-           AllowReordering(sets,
-                           Bytes((*picture)->GetData(), static_cast<std::size_t>((*picture)->GetDataSize())));
 }
 
 /// The sets that a file has itself.
@@ -280,12 +302,6 @@ RecoveryResult RecoverFile(const fs::path& path, const RecoveryOptions& options)
         sets = std::move(found);
         result.parameterSets = name;
     }
-    if (AreReordered(recording, *sets, first)) {
-        throw CannotRecover(path,
-                            "its pictures are reordered (B frames), and nothing tells in which order "
-                            "they are shown");
-    }
-
     if (!options.searched.empty()) {
         MakeFolders(target);
     }

@@ -72,6 +72,17 @@ TEST_F(RecoveryTest, ReorderedPicturesAreLeftAsTheyAre) {
     EXPECT_FALSE(std::filesystem::exists(recovered()));
 }
 
+TEST_F(RecoveryTest, ANormalFileWithBPicturesIsLeftAsItIs) {
+    const test_stream::Stream stream = MakeCodedStream(4);
+    unsigned char* const picture = stream.chunks[3]->video[5]->GetData();
+    ASSERT_EQ(picture[4] & 0x1F, 1);
+    // first_mb_in_slice 0, slice_type 1.
+    picture[5] = static_cast<unsigned char>(0xA0 | (picture[5] & 0x0F));
+    recordUnfinished(stream);
+    EXPECT_NE(failure().find("its pictures are reordered (B frames)"), std::string::npos) << failure();
+    EXPECT_FALSE(std::filesystem::exists(recovered()));
+}
+
 TEST_F(RecoveryTest, TheJournalOfTheReceiverHasTheParameterSets) {
     const test_stream::Stream stream = MakeCodedStream(4);
     recordUnfinished(stream);

@@ -66,7 +66,7 @@ struct Delivery {
     double speed = 1;
     /// Pictures come in decoding order, in such groups; in the order in which they are shown where it is
     /// empty.
-    reordered_stream::Pattern pattern;
+    reordered_stream::Pattern pattern = {};
 };
 
 /// A live source and the built library, which records as the record flag says, with exact rules. A source
