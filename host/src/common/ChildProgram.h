@@ -36,7 +36,8 @@ struct ChildResult {
 /// the terminal do not reach it. Who is killed is killed with its group.
 class ChildProgram {
  public:
-    /// Runs a program to its end: until it has ended and nobody holds its output open.
+    /// Runs a program to its end, whether or not it holds its output open, or somebody behind it does: what
+    /// it has started and left goes on, and is heard no more.
     ChildResult Run(const ChildTask& task);
     /// Kills the program that runs, and every later one at once. From any thread.
     void End();

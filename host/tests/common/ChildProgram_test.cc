@@ -65,6 +65,43 @@ TEST(ChildProgram, ThatTakesTooLongIsKilledWithItsChildren) {
     EXPECT_EQ(result.code, -1);
 }
 
+TEST(ChildProgram, ThatClosesItsOutputIsKilledAllTheSame) {
+    // As one does that writes a log of its own.
+    const ChildTask task{.command = {"/bin/sh", "-c", "exec >/dev/null 2>&1; sleep 30"},
+                         .limit = std::chrono::milliseconds(200)};
+    const auto began = std::chrono::steady_clock::now();
+    const ChildResult result = ChildProgram().Run(task);
+    EXPECT_LT(std::chrono::steady_clock::now() - began, std::chrono::seconds(25));
+    EXPECT_TRUE(result.timedOut);
+    EXPECT_EQ(result.code, -1);
+}
+
+TEST(ChildProgram, ThatClosesItsOutputIsKilledWithItsRun) {
+    ChildProgram program;
+    std::thread end([&] { program.End(); });
+    const auto began = std::chrono::steady_clock::now();
+    EXPECT_EQ(program.Run({{"/bin/sh", "-c", "exec >/dev/null 2>&1; sleep 30"}}).code, -1);
+    EXPECT_LT(std::chrono::steady_clock::now() - began, std::chrono::seconds(25));
+    end.join();
+}
+
+TEST(ChildProgram, IsNotWaitedForBeyondItsEnd) {
+    // The sleep holds the output open.
+    const ChildTask task{.command = {"/bin/sh", "-c", "sleep 30 & echo left; exit 4"},
+                         .limit = std::chrono::seconds(20)};
+    const ChildResult result = ChildProgram().Run(task);
+    EXPECT_FALSE(result.timedOut);
+    EXPECT_EQ(result.code, 4);
+    EXPECT_EQ(result.text, "left\n");
+}
+
+TEST(ChildProgram, SaysWhatItSaysUpToABound) {
+    const ChildResult result = ChildProgram().Run({{"/bin/sh", "-c", "head -c 1000000 /dev/zero; exit 0"}});
+    EXPECT_EQ(result.code, 0);
+    EXPECT_GE(result.text.size(), 16'000u);
+    EXPECT_LT(result.text.size(), 18'000u);
+}
+
 TEST(ChildProgram, IsKilledWithItsRun) {
     ChildProgram program;
     std::thread end([&] { program.End(); });
