@@ -15,13 +15,13 @@ double Rounded(double decibels) {
     return std::round(decibels * 10) / 10;
 }
 
-void RefuseParams(const Json& params) {
+void RefuseParams(const nlohmann::json& params) {
     if (!params.empty()) {
         throw RpcError(RpcCode::kInvalidParams, "the method takes no params");
     }
 }
 
-int WidthOf(const Json& params) {
+int WidthOf(const nlohmann::json& params) {
     int width = ControlService::kDefaultWidth;
     if (params.is_array() && !params.empty()) {
         throw RpcError(RpcCode::kInvalidParams, "params is an object with the member width");
@@ -102,7 +102,7 @@ std::optional<Json> ControlService::Call(ClientId client, const RpcRequest& requ
                                       : FilesReport(state_.Files(), state_.Look().snapshot.timecode, sizer_);
 }
 
-Json ControlService::MakePreview(const Json& params) {
+Json ControlService::MakePreview(const nlohmann::json& params) {
     const int width = WidthOf(params);
     const Preview::Material material = preview_.Take();
     if (material.picture == nullptr) {

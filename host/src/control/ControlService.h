@@ -47,7 +47,7 @@ class ControlService final : public LineHandlerInterface {
 
     /// What is known at once; nothing where it is told later.
     std::optional<Json> Call(ClientId client, const RpcRequest& request);
-    Json MakePreview(const Json& params);
+    Json MakePreview(const nlohmann::json& params);
     void SendOutcomes(LineSenderInterface& sender, bool all);
     void TellEvents(LineSenderInterface& sender);
 
