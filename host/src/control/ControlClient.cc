@@ -19,8 +19,9 @@ void ControlClient::Read() {
         input_.append(piece.data(), static_cast<std::size_t>(count));
     } else if (count == 0) {
         inputEnded_ = true;
-    } else if (errno != EAGAIN && errno != EINTR) {
-        broken_ = true;
+    } else if (broken_ || (errno != EAGAIN && errno != EINTR)) {
+        inputEnded_ = true;
+        Break();
     }
 }
 
@@ -34,6 +35,18 @@ std::optional<std::string> ControlClient::TakeLine() {
     return line;
 }
 
+void ControlClient::Send(const std::string& line) {
+    if (!broken_) {
+        output_ += line;
+    }
+}
+
+void ControlClient::Break() {
+    broken_ = true;
+    output_.clear();
+    written_ = 0;
+}
+
 void ControlClient::Write() {
     while (Waiting() > 0) {
         const ssize_t count = send(descriptor_, output_.data() + written_, Waiting(), MSG_NOSIGNAL);
@@ -41,7 +54,9 @@ void ControlClient::Write() {
             continue;
         }
         if (count < 0) {
-            broken_ = errno != EAGAIN;
+            if (errno != EAGAIN) {
+                Break();
+            }
             return;
         }
         written_ += static_cast<std::size_t>(count);

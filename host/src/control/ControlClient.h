@@ -20,7 +20,7 @@ class ControlClient {
 
     int Descriptor() const { return descriptor_; }
 
-    /// Reads a piece of what is there.
+    /// Reads a piece of what is there, or sees that nothing more comes.
     void Read();
     /// The next whole line without its end.
     std::optional<std::string> TakeLine();
@@ -31,14 +31,15 @@ class ControlClient {
     bool InputEnded() const { return inputEnded_; }
 
     /// Queues a line.
-    void Send(const std::string& line) { output_ += line; }
+    void Send(const std::string& line);
     /// Writes as much of what waits as the client takes.
     void Write();
     /// Bytes that wait for the client.
     std::size_t Waiting() const { return output_.size() - written_; }
 
-    /// The connection is gone.
+    /// Nobody is at the other end: nothing is sent any more. What has come is still there to be read.
     bool Broken() const { return broken_; }
+    void Break();
 
  private:
     const int descriptor_;

@@ -36,11 +36,12 @@ void ControlServer::Serve() {
     for (std::size_t i = 0; i < ids.size(); ++i) {
         Connection& connection = clients_.at(ids[i]);
         const int happened = polled[i + 2].revents;
-        if ((happened & POLLIN) != 0) {
+        if ((happened & (POLLHUP | POLLERR)) != 0) {
+            // Nobody reads answers any more; what was asked before is carried out.
+            connection.client.Break();
+        }
+        if (happened != 0 && Reads(connection)) {
             connection.client.Read();
-        } else if ((happened & (POLLHUP | POLLERR)) != 0) {
-            // Nobody is at the other end any more.
-            connection.leaves = Clock::time_point::min();
         }
         TakeInput(ids[i], connection);
         connection.client.Write();
@@ -82,7 +83,7 @@ void ControlServer::Send(ClientId client, const std::string& line) {
 
 bool ControlServer::Tell(ClientId client, const std::string& line, const std::string& last) {
     const auto found = clients_.find(client);
-    if (found == clients_.end() || found->second.leaves) {
+    if (found == clients_.end() || found->second.leaves || found->second.client.Broken()) {
         return false;
     }
     if (found->second.client.Waiting() > kMostWaiting) {
@@ -159,9 +160,9 @@ void ControlServer::RemoveGone() {
     for (auto next = clients_.begin(); next != clients_.end();) {
         const auto at = next++;
         const Connection& connection = at->second;
-        const bool over =
-            connection.leaves && (connection.client.Waiting() == 0 || now >= *connection.leaves);
-        if (over || connection.client.Broken()) {
+        const ControlClient& client = connection.client;
+        const bool over = connection.leaves && (client.Waiting() == 0 || now >= *connection.leaves);
+        if (over || (client.Broken() && client.InputEnded() && !client.HasLine())) {
             handler_.OnGone(at->first);
             clients_.erase(at);
         }

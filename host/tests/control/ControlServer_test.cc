@@ -146,6 +146,30 @@ TEST_F(ControlServerTest, AClientThatSendsNoMoreStillGetsItsAnswers) {
     EXPECT_TRUE(client.Closed());
 }
 
+TEST_F(ControlServerTest, AllThatAClientHasSentBeforeItLeavesIsCarriedOut) {
+    constexpr int kLines = 5000;
+    {
+        LineClient client(Path());
+        std::string lines;
+        for (int i = 0; i < kLines; ++i) {
+            // More in all than is read at once.
+            lines += "later\n";
+        }
+        client.Send(lines);
+    }
+    EXPECT_TRUE(WaitUntil([this] { return handler_.gone == 1; }));
+    EXPECT_EQ(handler_.lines, kLines);
+}
+
+TEST_F(ControlServerTest, WhoLeavesItsAnswersUnreadIsServedToItsLastLine) {
+    {
+        LineClient client(Path());
+        client.Send("big\nbig\nbig\nbig\nx\ny\n");
+    }
+    EXPECT_TRUE(WaitUntil([this] { return handler_.gone == 1; }));
+    EXPECT_EQ(handler_.lines, 6);
+}
+
 TEST_F(ControlServerTest, ALineWithoutAnEndIsRefusedAndCostsNoMemory) {
     LineClient client(Path());
     const std::string piece(1 << 16, 'x');
