@@ -75,11 +75,12 @@ HookCounts HookQueue::Counts() const {
 
 bool HookQueue::Wait(std::chrono::milliseconds patience) {
     std::unique_lock lock(state_->mutex);
-    return state_->changed.wait_for(lock, patience,
-                                    [this] { return state_->waiting.empty() && !state_->delivering; });
+    return state_->changed.wait_for(lock, patience, [this] {
+        return state_->ending || (state_->waiting.empty() && !state_->delivering);
+    });
 }
 
-void HookQueue::End() {
+void HookQueue::GiveUp() {
     {
         const std::lock_guard lock(state_->mutex);
         state_->ending = true;
@@ -89,6 +90,10 @@ void HookQueue::End() {
         state_->changed.notify_all();
     }
     state_->target->End();
+}
+
+void HookQueue::End() {
+    GiveUp();
     thread_.End(kEndPatience);
 }
 

@@ -35,9 +35,11 @@ class HookQueue {
     /// What there is to tell the operator since the last call: a sentence for each delivery that failed.
     std::vector<std::string> TakeSentences();
     HookCounts Counts() const;
-    /// Waits until all is delivered. False after `patience`.
+    /// Waits until all is delivered or given up. False after `patience`.
     bool Wait(std::chrono::milliseconds patience);
-    /// Gives up what is not delivered, and what is posted from now on. A second time does nothing.
+    /// Gives up what is not delivered, and what is posted from now on.
+    void GiveUp();
+    /// The same, and waits for the target, for a bounded time. A second time does nothing.
     void End();
 
  private:
