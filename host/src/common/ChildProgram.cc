@@ -14,6 +14,8 @@
 #include <cstring>
 #include <string_view>
 
+#include "common/NormalPriority.h"
+
 namespace receiver {
 namespace {
 
@@ -145,6 +147,7 @@ ChildResult ChildProgram::Run(const ChildTask& task) {
     close(input);
     close(ends[1]);
     if (error == 0) {
+        SpareNoMore(process);
         const auto deadline = task.limit ? Clock::now() + *task.limit : Clock::time_point::max();
         std::optional<int> status = Follow(process, ends[0], ending_, deadline, result.text);
         if (!status) {
