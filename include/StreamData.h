@@ -20,7 +20,7 @@ struct StreamData {
     std::uint64_t timestamp = 0;
     /// Video with "-pictureOrder" at "decoding": when the picture is shown, in 90000 ticks a second of the
     /// same clock as `rtp_timestamp`, and not before it. The low 32 bits count, so it may wrap as RTP
-    /// timestamps do. A picture whose time lies before its decoding or more than 10 seconds behind counts as
+    /// timestamps do. A picture whose time lies before its decoding or more than 3 seconds behind counts as
     /// shown when it is decoded. Not read otherwise.
     std::uint64_t presentation_timestamp = 0;
     std::uint64_t reserved1 = 0;

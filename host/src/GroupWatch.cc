@@ -28,8 +28,8 @@ std::int64_t CadenceOf(const FrameRate& rate) {
     return pictures;
 }
 
-GroupWatch::GroupWatch(const FrameRate& rate, std::int64_t minutes, std::uint32_t expected)
-    : rate_(rate), minutes_(minutes), expected_(expected), cadence_(CadenceOf(rate)) {}
+GroupWatch::GroupWatch(const FrameRate& rate, std::int64_t minutes, std::uint32_t expected, bool reordered)
+    : rate_(rate), minutes_(minutes), expected_(expected), cadence_(CadenceOf(rate)), reordered_(reordered) {}
 
 std::optional<std::string> GroupWatch::Look(const SourceUnit& unit) {
     if (done_ || unit.medium != Medium::kVideo) {
@@ -101,10 +101,11 @@ std::optional<std::string> GroupWatch::Judge(std::int64_t group) const {
     }
     const std::int64_t meeting = std::lcm(cadence_, group);
     return "an IDR frame comes every " + std::to_string(group) + " pictures, " + InStep() +
-           ", and the two meet every " + Seconds(meeting) + " only: the file behind one of " +
-           std::to_string(minutes_) +
-           " minutes begins with a picture that cannot be shown by itself; set the encoder to groups of " +
-           std::to_string(BetterThan(group)) + " pictures";
+           ", and the two meet every " + Seconds(meeting) + " only: " +
+           (reordered_ ? Files() + " get two minutes more"
+                       : "the file behind one of " + std::to_string(minutes_) +
+                             " minutes begins with a picture that cannot be shown by itself") +
+           "; set the encoder to groups of " + std::to_string(BetterThan(group)) + " pictures";
 }
 
 std::optional<std::string> GroupWatch::JudgeIrregular() const {
@@ -116,8 +117,14 @@ std::optional<std::string> GroupWatch::JudgeIrregular() const {
     }
     return "IDR frames come at distances that vary from " + std::to_string(*shortest) + " to " +
            std::to_string(*longest) + " pictures, and " + InStep() +
-           ": a file that follows on another may begin with a picture that cannot be shown by itself; set "
-           "the encoder to groups of one length";
+           (reordered_ ? ": " + Files() + " may get two minutes more"
+                       : ": a file that follows on another may begin with a picture that cannot be shown by "
+                         "itself") +
+           "; set the encoder to groups of one length";
+}
+
+std::string GroupWatch::Files() const {
+    return "files of " + std::to_string(minutes_) + " minutes";
 }
 
 std::string GroupWatch::InStep() const {

@@ -213,11 +213,13 @@ Recorder::Progress Running::RecordAll(SourceInterface& source, QxModuleInterface
             changed_ = false;
             description = source.Description();
             settings.frameRate = description.frameRate;
+            settings.reordering = description.reordering;
             recovery_->Describe(description);
             observers_.Describe(description);
             // A run that is shorter than a file has one only.
             if (!options_.seconds || *options_.seconds > static_cast<double>(minutes * 60)) {
-                groups_.emplace(settings.frameRate, minutes, options_.source.pictureGroup);
+                groups_.emplace(settings.frameRate, minutes, options_.source.pictureGroup,
+                                settings.reordering > 0);
             }
         }
         // The module learns rate and size when it starts.

@@ -177,6 +177,7 @@ void Recorder::PushFrame(const SourceUnit& unit) {
     } else if (unit.time - lastFrame_ > kLongestStep) {
         // The module does not notice what is missing: it counts units, so its media would drift apart and the
         // timecode of the file would be wrong behind the gap.
+        turns_.clear();
         DropPackets(unit.time - Period(settings_.frameRate));
         EndBeforeGap();
         if (endedByGap_) {
@@ -186,6 +187,7 @@ void Recorder::PushFrame(const SourceUnit& unit) {
     }
     PutHeldAudio();
     lastFrame_ = unit.time;
+    decodedAt_ = DecodingTimeOf(unit.time);
     if (settings_.length && Elapsed() >= *settings_.length) {
         Finish();
     }
@@ -194,12 +196,36 @@ void Recorder::PushFrame(const SourceUnit& unit) {
         settings_.mode == OutputMode::kOn ? PushOnlineMeta(unit, *timecode_) : PushSyncMeta(unit, *timecode_);
     packets_.clear();
     if (pushed) {
-        feed_.PushVideo(unit.time, unit.data, unit.size);
+        PushVideo(unit);
         if (settings_.followDisk) {
             feed_.WaitForDisk(KeptChunks() + kChunksAhead);
         }
     }
-    done_ = finishing_;
+    if (finishing_) {
+        // Pictures that are shown in front of that frame may be decoded behind it.
+        finishedAt_ = finishedAt_.value_or(unit.time);
+        done_ = decodedAt_ >= *finishedAt_;
+    }
+}
+
+std::int64_t Recorder::DecodingTimeOf(std::int64_t time) {
+    if (turns_.empty()) {
+        for (std::int64_t ahead = settings_.reordering; ahead > 0; --ahead) {
+            turns_.push_back(FrameTime(time, -ahead));
+        }
+    }
+    turns_.push_back(time);
+    const std::int64_t decoded = turns_.front();
+    turns_.pop_front();
+    return decoded;
+}
+
+void Recorder::PushVideo(const SourceUnit& unit) {
+    if (settings_.reordering == 0) {
+        feed_.PushVideo(unit.time, unit.data, unit.size);
+    } else {
+        feed_.PushReordered(decodedAt_, unit.time + unit.later, unit.data, unit.size);
+    }
 }
 
 bool Recorder::PushOnlineMeta(const SourceUnit& unit, const Timecode& timecode) {
@@ -337,7 +363,12 @@ void Recorder::PushEndMark() {
     const std::shared_ptr<unsigned char> delimiter(new unsigned char[kDelimiter.size()],
                                                    std::default_delete<unsigned char[]>());
     std::copy(kDelimiter.begin(), kDelimiter.end(), delimiter.get());
-    feed_.PushVideo(FrameTime(lastFrame_, 1), delimiter, kDelimiter.size());
+    const std::int64_t end = FrameTime(lastFrame_, 1);
+    if (settings_.reordering == 0) {
+        feed_.PushVideo(end, delimiter, kDelimiter.size());
+    } else {
+        feed_.PushReordered(end, end, delimiter, kDelimiter.size());
+    }
 }
 
 void Recorder::NoteChange(bool begins, const Timecode& at) {

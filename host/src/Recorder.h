@@ -2,6 +2,7 @@
 
 #include <chrono>
 #include <cstdint>
+#include <deque>
 #include <functional>
 #include <optional>
 #include <vector>
@@ -62,6 +63,8 @@ class Recorder {
     struct Settings {
         OutputMode mode = OutputMode::kSync;
         FrameRate frameRate;
+        /// As in `SourceDescription`.
+        std::uint32_t reordering = 0;
         /// Address of the first frame where the source has none; time of day when not set.
         std::optional<Timecode> timecode;
         bool dropFrame = true;
@@ -155,6 +158,10 @@ class Recorder {
     void NoteChange(bool begins, const Timecode& at);
     /// The address behind that of the last frame.
     Timecode NextAddress() const;
+    void PushVideo(const SourceUnit& unit);
+    /// When the next picture is decoded, whose turn it is at `time`: as many turns earlier as pictures may be
+    /// decoded ahead, so that none is shown before its decoding, whatever is missing.
+    std::int64_t DecodingTimeOf(std::int64_t time);
     /// Silence behind the audio of a recording that ends in front of a gap. The module counts the frames of
     /// audio that its pictures need, which may be one more than there are, and looks at the one behind.
     void PushSilentEnd();
@@ -187,6 +194,10 @@ class Recorder {
     std::int64_t lastFrame_ = 0;
     /// That went to the module.
     std::optional<SourceUnit> lastAudio_;
+    /// Turns of the last pictures, as many as may be decoded ahead. None behind a gap.
+    std::deque<std::int64_t> turns_;
+    /// When the last frame is decoded.
+    std::int64_t decodedAt_ = 0;
     AudioBalance balance_;
     /// Stands so far behind the last frame that the next one tells whether a gap lies between.
     std::vector<SourceUnit> heldAudio_;
@@ -195,6 +206,8 @@ class Recorder {
     bool endedByGap_ = false;
     std::vector<SourceUnit> rest_;
     bool finishing_ = false;
+    /// The first frame that is not recorded any more.
+    std::optional<std::int64_t> finishedAt_;
     bool done_ = false;
     /// In mode on: the module records.
     bool online_ = false;

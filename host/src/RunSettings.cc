@@ -43,6 +43,9 @@ StartParameters ParametersOf(const Options& options, const OutputPlace& place,
             parameters.texts[key] = *value;
         }
     };
+    if (description.reordering > 0) {
+        parameters.texts["-pictureOrder"] = "decoding";
+    }
     add("-filePrefix", options.prefix);
     add("-userName", options.user);
     add("-password", options.password);

@@ -61,6 +61,18 @@ TEST(GroupWatch, GroupsThatDoNotMeetItInTimeAreToldOnce) {
                    "picture that cannot be shown by itself; set the encoder to groups of 24 pictures"}));
 }
 
+TEST(GroupWatch, FilesOfReorderedPicturesGoOnToAnIdrFrame) {
+    EXPECT_EQ(Told({Rate("23.98"), 60, 0, true}, Rate("23.98"), Every(25)),
+              (Sentences{"an IDR frame comes every 25 pictures, picture and sound are in step every 512, and "
+                         "the two meet every 533.9 s only: files of 60 minutes get two minutes more; set the "
+                         "encoder to groups of 24 pictures"}));
+    EXPECT_EQ(
+        Told({Rate("29.97"), 60, 0, true}, Rate("29.97"), {0, 20, 45, 60, 90, 115, 135, 165, 180, 200}),
+        (Sentences{"IDR frames come at distances that vary from 15 to 30 pictures, and picture and sound "
+                   "are in step every 640: files of 60 minutes may get two minutes more; set the encoder "
+                   "to groups of one length"}));
+}
+
 TEST(GroupWatch, ALengthThatAMeetingFollowsIsNotTold) {
     // 7 meetings of 533.87 s are 3737.1 s, 17 s behind 62 minutes.
     EXPECT_EQ(Told({Rate("23.98"), 62, 0}, Rate("23.98"), Every(25)), Sentences());

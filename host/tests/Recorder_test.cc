@@ -50,6 +50,9 @@ class ScriptedModule final : public QxModuleInterface,
         if (unit->payload != nullptr && kept_.size() < keeps) {
             kept_.push_back(unit);
         }
+        if (unit->presentation_timestamp != 0) {
+            shown.push_back((unit->presentation_timestamp - kOrigin) / 3600);
+        }
     }
     void PushAudio(const std::shared_ptr<StreamData>& unit) override { Write("a", *unit, 1024); }
     void PushMeta(const std::shared_ptr<StreamData>& unit) override {
@@ -79,6 +82,8 @@ class ScriptedModule final : public QxModuleInterface,
     void NotifyOnlineStatus() override { calls.push_back("online"); }
     void NotifyOfflineStatus() override { calls.push_back("offline"); }
 
+    /// Which frames of reordered ones are shown.
+    std::vector<std::uint64_t> shown;
     /// Carries out no stop.
     bool deaf = false;
     /// Frames that it does not let go of.
@@ -155,6 +160,44 @@ class RecorderTest : public ::testing::Test {
     CommandQueue commands_;
     std::optional<Recorder> recorder_;
 };
+
+TEST_F(RecorderTest, ReorderedPicturesAreDecodedAheadOfTheirTurnAndCountByIt) {
+    Recorder::Settings settings = Sync();
+    settings.reordering = 2;
+    settings.length = 3 * 3600;
+    Make(settings);
+    PutLateAudio();
+    // I0 P4 B2 b1 b3, and P8 B6 b5 b7.
+    const std::int64_t later[] = {0, 3, 0, -2, -1, 3, 0, -2, -1};
+    for (std::int64_t n = 0; n < 9; ++n) {
+        SourceUnit frame = MakeFrame(n * 3600, n == 0, static_cast<std::uint32_t>(n));
+        frame.later = later[n] * 3600;
+        recorder_->Put(std::move(frame));
+        // The end is in front of the third picture. What is shown there is decoded up to two later.
+        EXPECT_EQ(recorder_->Done(), n >= 5) << n;
+    }
+    EXPECT_THAT(module_.calls,
+                ElementsAre("M0", "v-7200", "M1", "v-3600", "M2", "v0", "m3", "v1", "m4", "v2", "m5", "v3"));
+    EXPECT_THAT(module_.shown, ElementsAre(0, 4, 2, 1, 3, 8));
+}
+
+TEST_F(RecorderTest, WhereAReorderedPictureIsMissingNoneIsShownBeforeItsDecoding) {
+    Recorder::Settings settings = Sync();
+    settings.reordering = 2;
+    Make(settings);
+    PutLateAudio();
+    // I0 P4 B2 b1 b3, P8 B6 b5 without b1: each has the turn of the next one that is shown.
+    const std::pair<std::int64_t, std::int64_t> pictures[] = {{0, 0}, {2, 4}, {3, 2}, {4, 3},
+                                                              {5, 8}, {6, 6}, {7, 5}};
+    for (const auto& [turn, shown] : pictures) {
+        SourceUnit frame = MakeFrame(turn * 3600, turn == 0, static_cast<std::uint32_t>(turn));
+        frame.later = (shown - turn) * 3600;
+        recorder_->Put(std::move(frame));
+    }
+    EXPECT_THAT(module_.calls, ElementsAre("M0", "v-7200", "M2", "v-3600", "M3", "v0", "M4", "v2", "M5", "v3",
+                                           "M6", "v4", "M7", "v5"));
+    EXPECT_THAT(module_.shown, ElementsAre(0, 4, 2, 3, 8, 6, 5));
+}
 
 TEST_F(RecorderTest, TimeOfDayIsThatAtWhichTheFirstFrameArrived) {
     Recorder::Settings settings = Sync();

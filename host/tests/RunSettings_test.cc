@@ -60,6 +60,15 @@ TEST(ParametersOf, TellTheModuleWhatTheOperatorAndTheSourceSay) {
                                      Pair("-encodedFPS", 59940), Pair("-encodedBPS", 8000)));
 }
 
+TEST(ParametersOf, ReorderedPicturesAreAnnounced) {
+    SourceDescription source;
+    source.frameRate = Rate("25");
+    source.reordering = 1;
+    EXPECT_EQ(ParametersOf({}, {}, source).texts.at("-pictureOrder"), "decoding");
+    source.reordering = 0;
+    EXPECT_EQ(ParametersOf({}, {}, source).texts.count("-pictureOrder"), 0u);
+}
+
 TEST(ParametersOf, WhatNobodySaysIsLeftToTheModule) {
     Options options;
     options.mode = OutputMode::kOn;

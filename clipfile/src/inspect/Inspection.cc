@@ -34,12 +34,27 @@ bool IsThere(const InputFile& file, const Sample& sample) {
     return sample.offset <= file.Size() && sample.size <= file.Size() - sample.offset;
 }
 
+/// As many samples as last until the end of the edit, where that hides any: reordered ones that others need.
+/// With kept rules the edits of a fragmented file, which all tracks have, end with `moov`.
+std::uint64_t ShownByEdit(const Movie& movie, const TrackSummary& summary) {
+    const Track* const audio = movie.Find(FourCc("soun"));
+    const bool endsWithMoov = movie.isFragmented && audio != nullptr && audio->edit;
+    if (!summary.track.tables.hasComposition || !summary.track.edit || !summary.first || endsWithMoov ||
+        summary.first->duration == 0 || movie.timescale == 0) {
+        return summary.samples;
+    }
+    return summary.track.edit->segmentDuration * summary.track.timescale / movie.timescale /
+           summary.first->duration;
+}
+
 TrackSummary Summarize(const InputFile& file, const Recording& recording, std::size_t place,
                        std::string& fault) {
     TrackSummary summary;
     summary.track = recording.movie->tracks[place];
     if (summary.track.edit && summary.track.timescale != 0) {
-        summary.start = -static_cast<double>(summary.track.edit->mediaTime) / summary.track.timescale;
+        // The first sample of a recording is the one that is shown first.
+        const std::int64_t first = summary.track.tables.firstOffset;
+        summary.start = static_cast<double>(first - summary.track.edit->mediaTime) / summary.track.timescale;
     }
     try {
         RecordingSamples samples(file, recording, place);
@@ -54,6 +69,7 @@ TrackSummary Summarize(const InputFile& file, const Recording& recording, std::s
     } catch (const FormatError& error) {
         fault = error.what();
     }
+    summary.shown = std::min(summary.samples, ShownByEdit(*recording.movie, summary));
     return summary;
 }
 
@@ -115,7 +131,7 @@ void ReadTimecodes(const InputFile& file, Inspection& inspection) {
     }
     const TrackSummary* const video = inspection.Find(FourCc("vide"));
     if (video != nullptr && video->samples != 0) {
-        inspection.end = TimecodeOf(first + static_cast<std::int64_t>(video->samples) - 1, entry.frameCount,
+        inspection.end = TimecodeOf(first + static_cast<std::int64_t>(video->shown) - 1, entry.frameCount,
                                     inspection.start->dropFrame);
     }
 }
@@ -123,7 +139,8 @@ void ReadTimecodes(const InputFile& file, Inspection& inspection) {
 }  // namespace
 
 double TrackSummary::Seconds() const {
-    return track.timescale == 0 ? 0 : static_cast<double>(duration) / track.timescale;
+    const std::uint64_t hidden = first ? (samples - shown) * first->duration : 0;
+    return track.timescale == 0 ? 0 : static_cast<double>(duration - hidden) / track.timescale;
 }
 
 const TrackSummary* Inspection::Find(std::uint32_t handler) const {

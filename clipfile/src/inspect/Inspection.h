@@ -14,6 +14,8 @@ namespace clipfile {
 struct TrackSummary {
     Track track;
     std::uint64_t samples = 0;
+    /// Of these, the ones that are shown: others may need pictures behind the end of a record.
+    std::uint64_t shown = 0;
     std::uint64_t bytes = 0;
     std::uint64_t syncSamples = 0;
     /// Chunks of `moov` and runs of fragments.
@@ -31,6 +33,7 @@ struct TrackSummary {
     /// The tables name samples that are not in the file; they are not counted.
     bool lacksSamples = false;
 
+    /// Of what is shown.
     double Seconds() const;
 };
 

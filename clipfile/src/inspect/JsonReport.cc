@@ -23,6 +23,9 @@ Json ToJson(const TrackSummary& summary) {
         {"duration", summary.duration},
         {"seconds", summary.Seconds()},
     };
+    if (summary.shown < summary.samples) {
+        json["shown"] = summary.shown;
+    }
     if (track.handler == FourCc("vide")) {
         json["width"] = track.width;
         json["height"] = track.height;

@@ -83,6 +83,9 @@ std::string VideoText(const TrackSummary& video, const Inspection& inspection) {
     if (inspection.recording.profile.video) {
         text += ", " + RateText(*inspection.recording.profile.video) + " frames/s";
     }
+    if (video.shown < video.samples) {
+        text += Format(", %llu pictures shown", static_cast<unsigned long long>(video.shown));
+    }
     return text + Format(", %llu pictures in %llu chunks, %llu of them IDR, at most %llu apart",
                          static_cast<unsigned long long>(video.samples),
                          static_cast<unsigned long long>(video.chunks),

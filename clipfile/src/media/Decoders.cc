@@ -67,6 +67,11 @@ std::size_t AudioFrameFinder::FindEnd(Bytes bytes) {
     return enough;
 }
 
+bool AllowReordering(const ParameterSets& sets, Bytes picture) {
+    const Context context = DecoderWith(sets, picture);
+    return context != nullptr && context->has_b_frames > 0;
+}
+
 bool DecodesWith(const ParameterSets& sets, Bytes picture, int width, int height) {
     const Frame frame = DecodePicture(sets, picture);
     return frame != nullptr && frame->decode_error_flags == 0 &&

@@ -30,6 +30,10 @@ class AudioFrameFinder {
     std::unique_ptr<Decoder> decoder_;
 };
 
+/// Whether the sets of an IDR picture, in the form of a sample, allow pictures to be decoded in another order
+/// than they are shown in (`max_num_reorder_frames`, ITU-T H.264 E.2.1).
+bool AllowReordering(const ParameterSets& sets, Bytes picture);
+
 /// Whether a picture, an IDR picture in the form of a sample, decodes with these sets to the given size.
 bool DecodesWith(const ParameterSets& sets, Bytes picture, int width, int height);
 

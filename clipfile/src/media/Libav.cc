@@ -47,23 +47,30 @@ void Fill(AVPacket& packet, Bytes bytes) {
     std::copy(bytes.begin(), bytes.end(), packet.data);
 }
 
-Frame DecodePicture(const ParameterSets& sets, Bytes picture) {
+Context DecoderWith(const ParameterSets& sets, Bytes picture) {
     static constexpr unsigned char kStartCode[] = {0, 0, 0, 1};
     std::vector<unsigned char> extradata;
     for (const auto* const set : {&sets.sps, &sets.pps}) {
         extradata.insert(extradata.end(), std::begin(kStartCode), std::end(kStartCode));
         extradata.insert(extradata.end(), set->begin(), set->end());
     }
-    const Context context = OpenDecoder(AV_CODEC_ID_H264, extradata);
+    Context context = OpenDecoder(AV_CODEC_ID_H264, extradata);
     const Packet packet(av_packet_alloc());
-    Frame frame(av_frame_alloc());
     if (context == nullptr) {
         return nullptr;
     }
     Fill(*packet, ToByteStream(picture));
     if (avcodec_send_packet(context.get(), packet.get()) < 0 ||
-        avcodec_send_packet(context.get(), nullptr) < 0 ||
-        avcodec_receive_frame(context.get(), frame.get()) < 0) {
+        avcodec_send_packet(context.get(), nullptr) < 0) {
+        return nullptr;
+    }
+    return context;
+}
+
+Frame DecodePicture(const ParameterSets& sets, Bytes picture) {
+    const Context context = DecoderWith(sets, picture);
+    Frame frame(av_frame_alloc());
+    if (context == nullptr || avcodec_receive_frame(context.get(), frame.get()) < 0) {
         return nullptr;
     }
     return frame;

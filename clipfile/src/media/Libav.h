@@ -32,6 +32,9 @@ Context OpenDecoder(AVCodecID id, Bytes extradata);
 /// Makes a packet one of these bytes. Throws `std::bad_alloc`.
 void Fill(AVPacket& packet, Bytes bytes);
 
+/// A decoder with these sets that was given a picture, an IDR picture in the form of a sample, and nothing
+/// behind it. Null when it took none.
+Context DecoderWith(const ParameterSets& sets, Bytes picture);
 /// A picture, an IDR picture in the form of a sample, decoded with these sets. Null when it cannot be; it may
 /// have faults all the same, which its flags tell.
 Frame DecodePicture(const ParameterSets& sets, Bytes picture);

@@ -59,6 +59,8 @@ SampleTables ReadSampleTables(const InputFile& file, const Box& stbl) {
     }
     if (const auto composition = FindChild(file, stbl, FourCc("ctts"))) {
         tables.hasComposition = HasOffsets(file, *composition);
+        TableReader rows(file, CountedTable(file, *composition, 8));
+        tables.firstOffset = rows.RowCount() > 0 ? ReadU32(rows.Row(0) + 4) : 0;
     }
     return tables;
 }

@@ -30,13 +30,14 @@ class SampleSource {
 
 /// The tables of a track in `moov` (ISO/IEC 14496-12 8.6, 8.7).
 struct SampleTables {
-    Table times;                  // stts
-    Table sizes;                  // stsz, no rows where all samples have `constantSize`
-    Table chunks;                 // stsc
-    Table chunkOffsets;           // stco or co64
-    Table syncSamples;            // stss
-    bool hasSyncSamples = false;  // without it all are sync samples
-    bool hasComposition = false;  // ctts, with an offset that is not 0
+    Table times;                    // stts
+    Table sizes;                    // stsz, no rows where all samples have `constantSize`
+    Table chunks;                   // stsc
+    Table chunkOffsets;             // stco or co64
+    Table syncSamples;              // stss
+    bool hasSyncSamples = false;    // without it all are sync samples
+    bool hasComposition = false;    // ctts, with an offset that is not 0
+    std::uint32_t firstOffset = 0;  // how much later than decoded the first sample is shown
     std::uint32_t constantSize = 0;
     std::uint64_t sampleCount = 0;
 };

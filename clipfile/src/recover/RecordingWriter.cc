@@ -69,10 +69,10 @@ Timecode FileTimecode(const std::filesystem::path& path, const MetadataUnit& fir
     return timecode;
 }
 
-/// Exact rules leave edit lists out of fragmented files; normal files are alike.
+/// Exact rules leave edit lists out of fragmented files, but for reordered video; normal files are alike.
 clipfileModule::RecordRules RulesOf(const Recording& recording) {
-    const bool hasEdit = recording.movie && recording.movie->Find(FourCc("vide")) != nullptr &&
-                         recording.movie->Find(FourCc("vide"))->edit.has_value();
+    const bool hasEdit = recording.movie && recording.movie->Find(FourCc("soun")) != nullptr &&
+                         recording.movie->Find(FourCc("soun"))->edit.has_value();
     return hasEdit ? clipfileModule::RecordRules::kKept : clipfileModule::RecordRules::kExact;
 }
 

@@ -121,6 +121,19 @@ std::pair<ParameterSets, std::string> FindSets(const InputFile& file, const Reco
                                          "stream with --like");
 }
 
+/// Only the tables of a closed file tell the order in which its pictures are shown.
+bool AreReordered(const Recording& recording, const ParameterSets& sets, const Chunk& first) {
+    const Track* const video = recording.movie ? recording.movie->Find(FourCc("vide")) : nullptr;
+    if (video != nullptr) {
+        return video->tables.hasComposition;
+    }
+    const auto picture = std::find_if(first->video.begin(), first->video.end(),
+                                      [](const auto& sample) { return sample->GetSync(); });
+    return picture != first->video.end() &&
+           AllowReordering(sets,
+                           Bytes((*picture)->GetData(), static_cast<std::size_t>((*picture)->GetDataSize())));
+}
+
 /// The sets that a file has itself.
 std::optional<ParameterSets> OwnSets(const Recording& recording) {
     const Track* const video = recording.movie ? recording.movie->Find(FourCc("vide")) : nullptr;
@@ -266,6 +279,11 @@ RecoveryResult RecoverFile(const fs::path& path, const RecoveryOptions& options)
         auto [found, name] = FindSets(file, recording, *MakeSource(file, recording, clock), options);
         sets = std::move(found);
         result.parameterSets = name;
+    }
+    if (AreReordered(recording, *sets, first)) {
+        throw CannotRecover(path,
+                            "its pictures are reordered (B frames), and nothing tells in which order "
+                            "they are shown");
     }
 
     if (!options.searched.empty()) {

@@ -16,7 +16,8 @@ struct RetentionOptions {
     std::filesystem::path folder;
     /// Those that were closed longer ago.
     std::optional<std::chrono::seconds> olderThan;
-    /// The oldest ones, until so many bytes of the disk are free.
+    /// The oldest ones, until so many bytes of the disk are free, by what was free before and what has gone
+    /// since. Those on another disk, and those with another name (a hard link), free nothing and stay.
     std::optional<std::uint64_t> keepFree;
     /// Nothing is removed, only told.
     bool dryRun = false;

@@ -73,7 +73,7 @@ std::optional<Piece> PieceOf(Verification& file) {
     const std::int64_t first = FrameNumberOf(*inspection.start, rate);
     return Piece{&file,
                  first,
-                 first + static_cast<std::int64_t>(video->samples),
+                 first + static_cast<std::int64_t>(video->shown),
                  rate,
                  WithoutDay(file.path.parent_path()).second,
                  inspection.recording.movie->creationTime};

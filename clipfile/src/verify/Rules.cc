@@ -101,8 +101,8 @@ void CheckCounts(const Inspection& inspection, Defects& defects) {
     if (video.samples == 0) {
         defects.Add("It has no picture.");
     }
-    if (meta.samples != video.samples) {
-        defects.Add(Format("It has %llu pictures and %llu units of metadata.", Wide(video.samples),
+    if (meta.samples != video.shown) {
+        defects.Add(Format("It has %llu pictures and %llu units of metadata.", Wide(video.shown),
                            Wide(meta.samples)));
     }
     const double behind = audio.Seconds() - video.Seconds();

@@ -3,6 +3,8 @@
 #include <gtest/gtest.h>
 
 #include "support/CodedMedia.h"
+#include "support/ElementaryStreams.h"
+#include "support/TempDir.h"
 #include "support/TestStream.h"
 
 namespace clipfile {
@@ -55,6 +57,28 @@ TEST(DecodesWith, OnlyTheSetsOfThePicture) {
                              kCodedHeight));
     EXPECT_FALSE(DecodesWith(own, Bytes(picture).first(picture.size() / 2), kCodedWidth, kCodedHeight));
     EXPECT_FALSE(DecodesWith({}, picture, kCodedWidth, kCodedHeight));
+}
+
+TEST(AllowReordering, WhereTheSetsSaySo) {
+    const TempDir work;
+    for (const bool reordered : {false, true}) {
+        const std::string file = (work.Path() / "coded.h264").string();
+        const ProgramResult coded = RunProgram(
+            work,
+            "ffmpeg -v error -y -f lavfi -i testsrc2=size=128x96:rate=25 -frames:v 12 -pix_fmt yuv420p "
+            "-c:v libx264 -preset ultrafast -x264-params aud=1:b-adapt=0:bframes=" +
+                std::string(reordered ? "2" : "0") + " -f h264 '" + file + "'");
+        ASSERT_EQ(coded.exitCode, 0) << coded.errors;
+        auto units = elementary_streams::ReadAccessUnits(file);
+        nal_access::NalUnit sps;
+        nal_access::NalUnit pps;
+        nal_access::StreamAnalyzer analyzer;
+        ASSERT_TRUE(analyzer.IsAccessUnitStart(units.at(0), sps, pps));
+        std::vector<std::shared_ptr<nal_access::SampleData>> samples;
+        analyzer.ConvertVideo(units, samples);
+        EXPECT_EQ(AllowReordering({BytesOf(sps), BytesOf(pps)}, BytesOf(samples.front())), reordered);
+    }
+    EXPECT_FALSE(AllowReordering({}, Data(20)));
 }
 
 }  // namespace

@@ -57,6 +57,21 @@ TEST_F(RecoveryTest, ANormalFileBecomesWhatClosingWouldHaveMade) {
     EXPECT_EQ(ReadAll(original()), before);
 }
 
+TEST_F(RecoveryTest, ReorderedPicturesAreLeftAsTheyAre) {
+    test_stream::Stream stream = MakePlainStream(33);
+    stream.settings.pictureOrder = clipfileModule::PictureOrder::kDecoding;
+    for (const auto& chunk : stream.chunks) {
+        chunk->shownLater = {2, 5, 2, 0, 1, 4, 2, 0};
+    }
+    Record(original(), {"fragment", kExact, false}, stream);
+    EXPECT_NE(
+        failure().find("its pictures are reordered (B frames), and nothing tells in which order they are "
+                       "shown"),
+        std::string::npos)
+        << failure();
+    EXPECT_FALSE(std::filesystem::exists(recovered()));
+}
+
 TEST_F(RecoveryTest, TheJournalOfTheReceiverHasTheParameterSets) {
     const test_stream::Stream stream = MakeCodedStream(4);
     recordUnfinished(stream);

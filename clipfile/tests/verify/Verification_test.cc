@@ -2,6 +2,7 @@
 
 #include <gtest/gtest.h>
 
+#include "inspect/Inspection.h"
 #include "reader/BigEndian.h"
 #include "reader/TimecodeCount.h"
 #include "support/BoxFinder.h"
@@ -58,6 +59,29 @@ TEST_F(VerificationTest, NothingIsWrongWithItsSamples) {
 TEST_P(VerificationTest, NothingIsWrongByTheRulesThatAreKept) {
     test_stream::Record(path(), {GetParam(), clipfileModule::RecordRules::kKept, true}, MakePlainStream(40));
     EXPECT_EQ(defects(), Sentences());
+}
+
+TEST_P(VerificationTest, NothingIsWrongWithReorderedPicturesOfWhichTheLastAreNotShown) {
+    for (const std::size_t chunks : {2U, 34U}) {
+        test_stream::Stream stream = MakePlainStream(chunks);
+        stream.settings.pictureOrder = clipfileModule::PictureOrder::kDecoding;
+        for (const auto& chunk : stream.chunks) {
+            // I0 P4 B2 b1 b3 P7 B6 b5, each at least when it is decoded.
+            chunk->shownLater = {2, 5, 2, 0, 1, 4, 2, 0};
+        }
+        // P7 and B6 lie behind the end. Two pictures last 3.1 audio frames.
+        clipfileModule::ChunkData& last = *stream.chunks.back();
+        last.hiddenVideo = 2;
+        last.meta.resize(last.meta.size() - 2);
+        last.audio.resize(last.audio.size() - 3);
+        record(kName, stream, GetParam());
+        EXPECT_EQ(defects(), Sentences()) << chunks;
+        const Inspection inspection = Inspect(InputFile(path()));
+        EXPECT_EQ(inspection.tracks[0].samples, 8 * chunks);
+        EXPECT_EQ(inspection.tracks[0].shown, 8 * chunks - 2);
+        EXPECT_EQ(inspection.tracks[0].start, 0);
+        EXPECT_NEAR(inspection.tracks[0].Seconds(), static_cast<double>(8 * chunks - 2) * 1.001 / 30, 1e-9);
+    }
 }
 
 TEST_F(VerificationTest, AnUnfinishedFileIsTold) {

@@ -1,12 +1,10 @@
 #include "control/Control.h"
 
-#include <sched.h>
-#include <sys/resource.h>
-
 #include <atomic>
 #include <chrono>
 #include <utility>
 
+#include "common/LowPriority.h"
 #include "control/ControlServer.h"
 #include "control/ControlService.h"
 #include "control/ControlSocket.h"
@@ -20,15 +18,6 @@ namespace {
 
 /// How long the end of a run waits for clients to read what is left.
 constexpr std::chrono::milliseconds kReaderPatience{1000};
-/// Above that of the process: recording comes first.
-constexpr int kNicer = 10;
-
-/// Of this thread alone. Where the process has a real-time priority, it does not.
-void LowerPriority() {
-    const sched_param none{};
-    sched_setscheduler(0, SCHED_OTHER, &none);
-    setpriority(PRIO_PROCESS, 0, getpriority(PRIO_PROCESS, 0) + kNicer);
-}
 
 }  // namespace
 

@@ -62,7 +62,7 @@ int HeightFor(const AVFrame& frame, int width) {
     const AVRational aspect = frame.sample_aspect_ratio;
     const double shape = aspect.num > 0 && aspect.den > 0 ? av_q2d(aspect) : 1.0;
     const double height = static_cast<double>(width) * frame.height / (frame.width * shape);
-    return std::clamp(static_cast<int>(std::lround(height / 2)) * 2, 2, 4 * width);
+    return static_cast<int>(std::lround(std::clamp(height, 2.0, 4.0 * width) / 2)) * 2;
 }
 
 libav::Owner<AVFrame> Scale(const AVFrame& frame, int width) {

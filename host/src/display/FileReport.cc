@@ -48,6 +48,18 @@ double Seconds(std::int64_t ticks, const AVStream& stream) {
     return static_cast<double>(ticks) * av_q2d(stream.time_base);
 }
 
+const AVStream* FindMetadata(const AVFormatContext& context) {
+    return FindStream(context,
+                      [](const AVCodecParameters& codec) { return codec.codec_tag == kMetadataTag; });
+}
+
+/// Of a file's pictures those that are shown: the last ones may only be there because shown ones need them.
+/// Each that is shown has a unit of metadata.
+std::uint64_t Shown(std::int64_t pictures, std::int64_t units) {
+    return static_cast<std::uint64_t>(
+        std::max<std::int64_t>(0, units > 0 ? std::min(pictures, units) : pictures));
+}
+
 /// The address in a metadata sample; empty when it has none.
 std::string TimecodeOfMetadata(const AVPacket& packet) {
     const auto unit = std::make_shared<StreamData>();
@@ -67,8 +79,7 @@ std::string TimecodeOfMetadata(const AVPacket& packet) {
 /// address from its metadata, since its timecode track holds no value. Only the first samples are read, and
 /// of the rest what the fragments say of them: files are large, and may lie behind a network.
 void ReadFragments(AVFormatContext& context, AVStream& video, RecordedFile& file) {
-    const AVStream* const metadata =
-        FindStream(context, [](const AVCodecParameters& codec) { return codec.codec_tag == kMetadataTag; });
+    const AVStream* const metadata = FindMetadata(context);
     const auto isOfInterest = [&](const AVStream* stream) { return stream == &video || stream == metadata; };
     for (unsigned int i = 0; i < context.nb_streams; ++i) {
         context.streams[i]->discard = isOfInterest(context.streams[i]) ? AVDISCARD_DEFAULT : AVDISCARD_ALL;
@@ -88,12 +99,15 @@ void ReadFragments(AVFormatContext& context, AVStream& video, RecordedFile& file
     }
     const int count = avformat_index_get_entries_count(&video);
     if (count > 0) {
+        // Reordered pictures are decoded from before 0 on.
+        const std::int64_t first = avformat_index_get_entry(&video, 0)->timestamp;
         const std::int64_t last = avformat_index_get_entry(&video, count - 1)->timestamp;
         // The demuxer does not tell how long the last frame lasts: as long as the one before it.
         const std::int64_t before =
             count > 1 ? avformat_index_get_entry(&video, count - 2)->timestamp : last - duration;
-        file.frames = static_cast<std::uint64_t>(count);
-        file.seconds = Seconds(last + last - before, video);
+        file.frames = Shown(count, metadata != nullptr ? avformat_index_get_entries_count(metadata) : 0);
+        file.seconds =
+            Seconds(last + last - before - first, video) * static_cast<double>(file.frames) / count;
     }
 }
 
@@ -169,7 +183,8 @@ void ReadOpened(AVFormatContext* opened, const std::string& name, RecordedFile& 
     if (context->duration > 0 && video->duration > 0) {
         // The sound may end half an audio frame behind the pictures.
         file.seconds = Seconds(video->duration, *video);
-        file.frames = static_cast<std::uint64_t>(std::max<std::int64_t>(video->nb_frames, 0));
+        const AVStream* const metadata = FindMetadata(*context);
+        file.frames = Shown(video->nb_frames, metadata != nullptr ? metadata->nb_frames : 0);
     } else {
         ReadFragments(*context, *video, file);
     }

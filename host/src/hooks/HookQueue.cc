@@ -6,6 +6,8 @@
 #include <mutex>
 #include <utility>
 
+#include "common/LowPriority.h"
+
 namespace receiver {
 namespace {
 
@@ -98,6 +100,7 @@ void HookQueue::End() {
 }
 
 void HookQueue::Run(State& state) {
+    LowerPriority();
     std::unique_lock lock(state.mutex);
     for (;;) {
         state.changed.wait(lock, [&state] { return state.ending || !state.waiting.empty(); });

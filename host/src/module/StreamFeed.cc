@@ -47,6 +47,13 @@ void StreamFeed::PushVideo(std::int64_t time, const std::shared_ptr<unsigned cha
     Push(video_, MakeUnit(time, kVideoClock, data, size, frames_.Enter()));
 }
 
+void StreamFeed::PushReordered(std::int64_t time, std::int64_t shown,
+                               const std::shared_ptr<unsigned char>& data, std::size_t size) {
+    const std::shared_ptr<StreamData> unit = MakeUnit(time, kVideoClock, data, size, frames_.Enter());
+    unit->presentation_timestamp = unit->rtp_timestamp + static_cast<std::uint64_t>(shown - time);
+    Push(video_, unit);
+}
+
 void StreamFeed::PushAudio(std::int64_t time, const std::shared_ptr<unsigned char>& data, std::size_t size) {
     Push(audio_, MakeUnit(time, kAudioClock, data, size, {}));
 }

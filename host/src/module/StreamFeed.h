@@ -41,6 +41,10 @@ class StreamFeed {
 
     /// Times in ticks of 90000 a second, for audio of 48000.
     void PushVideo(std::int64_t time, const std::shared_ptr<unsigned char>& data, std::size_t size);
+    /// A picture that is decoded at `time` and shown at `shown`, for a module that takes pictures in decoding
+    /// order.
+    void PushReordered(std::int64_t time, std::int64_t shown, const std::shared_ptr<unsigned char>& data,
+                       std::size_t size);
     void PushAudio(std::int64_t time, const std::shared_ptr<unsigned char>& data, std::size_t size);
     void PushMeta(std::int64_t time, const std::vector<unsigned char>& bytes);
 

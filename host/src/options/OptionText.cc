@@ -27,7 +27,7 @@ const char* const kHelpFooter =
     "  1  another failure; the sentence tells\n"
     "  2  an option is wrong\n"
     "  3  the source cannot be opened: no such address or file, no answer, refused credentials\n"
-    "  4  the source cannot be recorded as it is: no video, another codec, reordered pictures\n"
+    "  4  the source cannot be recorded as it is: no video, another codec or frame rate\n"
     "  5  the module cannot be loaded or refuses to start\n"
     "  6  nothing can be written to the output folder\n"
     "  7  the module failed while it recorded\n"

@@ -205,7 +205,7 @@ void AddSourceOptions(CLI::App& app, Options& options, Texts& texts) {
                  "End when the source is not there or is lost instead of waiting for it")
         ->group(group);
     app.add_flag("--transcode", options.source.transcode,
-                 "Convert video that cannot be recorded as it is: reordered pictures, another codec or rate")
+                 "Convert video that cannot be recorded as it is: another codec or rate")
         ->group(group);
     app.add_option("--fps", texts.frameRate, "Frame rate: 23.98, 24, 25, 29.97, 30, 50, 59.94 or 60")
         ->type_name("RATE")

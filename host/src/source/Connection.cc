@@ -39,8 +39,13 @@ Connection::Connection(std::unique_ptr<Input> input, const SourceOptions& option
     AVFormatContext& format = input_->Format();
     paths_ = DecidePaths(format, *format.streams[video_->index], audio_, ahead_.packets, options, before);
     notices_.insert(notices_.end(), paths_.notices.begin(), paths_.notices.end());
-    watch_.emplace(video_->codecpar->codec_id, paths_.description.frameRate, paths_.passes);
-    clock_.emplace(*video_, audio_, input_->Recorded());
+    watch_.emplace(video_->codecpar->codec_id, paths_.description.frameRate, paths_.passes, Reordered());
+    clock_.emplace(*video_, audio_, input_->Recorded(), Reordered());
+    if (Reordered()) {
+        const FrameRate& rate = paths_.description.frameRate;
+        const AVRational period{static_cast<int>(rate.denominator), static_cast<int>(rate.numerator)};
+        reorder_.emplace(*video_, paths_.description.reordering, av_rescale_q(1, period, video_->time_base));
+    }
     steps_.emplace(*clock_);
     ReadTimecodeTag();
     paths_.description.summary += klv_.empty() ? "" : ", KLV";
@@ -120,7 +125,7 @@ void Connection::Begin(UnitAssembler& assembler, std::int64_t begin) {
     }
 }
 
-bool Connection::NextPacket() {
+bool Connection::ReadPacket() {
     if (!ahead_.packets.empty()) {
         packet_ = std::move(ahead_.packets.front());
         ahead_.packets.pop_front();
@@ -128,6 +133,34 @@ bool Connection::NextPacket() {
     }
     av_packet_unref(packet_.get());
     return input_->Read(*packet_);
+}
+
+bool Connection::NextPacket() {
+    if (!reorder_) {
+        return ReadPacket();
+    }
+    next_ = reorder_->Take();
+    while (!next_ && ReadPacket()) {
+        const bool idr = IsOf(*packet_, video_) && (packet_->flags & AV_PKT_FLAG_KEY) != 0 &&
+                         paths_.video->IsStart(*packet_);
+        reorder_->Put(std::exchange(packet_, libav::NewPacket()), idr);
+        next_ = reorder_->Take();
+    }
+    if (!next_) {
+        return NextWaiting();
+    }
+    packet_ = std::move(next_->packet);
+    return true;
+}
+
+bool Connection::NextWaiting() {
+    reorder_->End();
+    next_ = reorder_->Take();
+    if (!next_) {
+        return false;
+    }
+    packet_ = std::move(next_->packet);
+    return true;
 }
 
 bool Connection::Pump() {
@@ -138,6 +171,26 @@ bool Connection::Pump() {
         av_packet_unref(untouched_.get());
         libav::Check(av_packet_ref(untouched_.get(), packet_.get()), "hold a packet");
     }
+    try {
+        Accept();
+    } catch (const FormatChanged&) {
+        if (reorder_) {
+            Packets rest = reorder_->TakeRest();
+            std::move(ahead_.packets.begin(), ahead_.packets.end(), std::back_inserter(rest));
+            ahead_.packets = std::move(rest);
+        }
+        throw;
+    }
+    return true;
+}
+
+void Connection::Accept() {
+    if (reorder_ && IsOf(*packet_, video_) && (packet_->flags & AV_PKT_FLAG_CORRUPT) == 0) {
+        position_ = packet_->pos;
+        watch_->LookAtReordering(DelayOf(*packet_), next_->late);
+        packet_->pts = next_->shown.value_or(AV_NOPTS_VALUE);
+        packet_->dts = next_->turn.value_or(AV_NOPTS_VALUE);
+    }
     if ((packet_->flags & AV_PKT_FLAG_CORRUPT) != 0) {
         steps_->Mark(assembler_->LastPicture());
     }
@@ -147,25 +200,25 @@ bool Connection::Pump() {
                                             audio_->codecpar->codec_id, audio_->time_base)) {
             Handle(*packet);
         }
-        return true;
+        return;
     }
     if ((packet_->flags & AV_PKT_FLAG_CORRUPT) != 0) {
         ++damaged_;
-        return true;
+        return;
     }
     if (IsOf(*packet_, video_)) {
         input_->Alive();
         HandleExpired();
     }
     Handle(*packet_);
-    return true;
 }
 
 void Connection::HandleExpired() {
-    if (packet_->pts == AV_NOPTS_VALUE) {
+    const std::int64_t stamp = Reordered() ? packet_->dts : packet_->pts;
+    if (stamp == AV_NOPTS_VALUE) {
         return;
     }
-    for (const auto& sound : runs_.Expire(packet_->pts, video_->time_base)) {
+    for (const auto& sound : runs_.Expire(stamp, video_->time_base)) {
         Handle(*sound);
     }
 }
@@ -292,17 +345,26 @@ void Connection::HandleVideo(AVPacket& packet) {
     const auto sound = std::stable_partition(early.begin(), early.end(),
                                              [this](const auto& waiting) { return !IsOf(*waiting, audio_); });
     std::for_each(early.begin(), sound, [this](const auto& waiting) { HandleKlv(*waiting); });
-    if (paths_.passes) {
+    PlacePicture(packet, stamp, delaysKnown);
+    paths_.video->Push(packet, ToPictures());
+    std::for_each(sound, early.end(), [this](const auto& waiting) { HandleAudio(*waiting, true); });
+}
+
+void Connection::PlacePicture(AVPacket& packet, std::optional<std::int64_t> stamp, bool delaysKnown) {
+    const bool hasTurn = Reordered() && packet.dts != AV_NOPTS_VALUE;
+    const std::int64_t later = hasTurn ? av_rescale_q(packet.pts - packet.dts, video_->time_base, kTicks) : 0;
+    packet.dts = AV_NOPTS_VALUE;
+    if (Reordered()) {
+        packet.dts = clock_->VideoTime(stamp, assembler_->Grid());
+        packet.pts = packet.dts + later;
+    } else if (paths_.passes) {
         packet.pts = clock_->VideoTime(stamp, assembler_->Grid());
     } else {
         // What is decoded in another order than it is shown in still comes in the order of its decoding.
-        const std::int64_t later = delay_.value_or(0);
-        const auto decoded = stamp ? std::optional(*stamp - later) : std::nullopt;
-        packet.pts = clock_->VideoTime(decoded, assembler_->Grid().Period(), !delaysKnown) + later;
+        const std::int64_t behind = delay_.value_or(0);
+        const auto decoded = stamp ? std::optional(*stamp - behind) : std::nullopt;
+        packet.pts = clock_->VideoTime(decoded, assembler_->Grid().Period(), !delaysKnown) + behind;
     }
-    packet.dts = AV_NOPTS_VALUE;
-    paths_.video->Push(packet, ToPictures());
-    std::for_each(sound, early.end(), [this](const auto& waiting) { HandleAudio(*waiting, true); });
 }
 
 void Connection::HandleAudio(AVPacket& packet, bool waited) {
@@ -332,6 +394,9 @@ void Connection::HandleKlv(const AVPacket& packet) {
 
 void Connection::Finish() {
     try {
+        while (reorder_ && NextWaiting()) {
+            Accept();
+        }
         for (const auto& packet : runs_.Finish()) {
             Handle(*packet);
         }

@@ -13,6 +13,7 @@
 #include "source/Input.h"
 #include "source/KlvPackets.h"
 #include "source/LookAhead.h"
+#include "source/ReorderBuffer.h"
 #include "source/StepHold.h"
 #include "source/StreamClock.h"
 #include "source/StreamPaths.h"
@@ -72,7 +73,13 @@ class Connection {
     void ReadTimecodeTag();
     /// Throws `FormatChanged` when it is of audio that was not there before, or of what ours has become.
     void CheckOther(const AVPacket& packet);
+    /// The next packet as it is read.
+    bool ReadPacket();
+    /// The next one whose turn is known where pictures come reordered. Both false when there is none.
     bool NextPacket();
+    /// Of those that wait for their turn, when nothing is read any more.
+    bool NextWaiting();
+    void Accept();
     void Handle(AVPacket& packet);
     void Process(AVPacket& packet);
     /// Which of the two media it is of, where steps of the clock can be told from losses: in a live stream
@@ -92,6 +99,10 @@ class Connection {
     std::int64_t SinceFirst(std::int64_t stamp) const;
     static bool IsOf(const AVPacket& packet, const AVStream* stream);
     StreamClock::Track* KlvTrackOf(const AVPacket& packet);
+    /// The pictures are recorded as they come, which is not the order in which they are shown.
+    bool Reordered() const { return paths_.passes && paths_.description.reordering > 0; }
+    /// Gives the picture its place on the line, stamped so, where this is known.
+    void PlacePicture(AVPacket& packet, std::optional<std::int64_t> stamp, bool delaysKnown);
     /// How much later a picture is shown than decoded, where the source itself tells.
     std::optional<std::int64_t> DelayOf(const AVPacket& packet) const;
     PictureSink ToPictures();
@@ -110,6 +121,9 @@ class Connection {
     std::optional<StreamClock> clock_;
     KlvPackets klvPackets_;
     std::optional<StepHold> steps_;
+    /// Where pictures come reordered and are recorded so, and what it gave last.
+    std::optional<ReorderBuffer> reorder_;
+    std::optional<ReorderBuffer::Next> next_;
     /// Of the audio of a transport stream.
     AudioRuns runs_;
     libav::Owner<AVPacket> packet_;

@@ -4,6 +4,7 @@
 #include <optional>
 #include <vector>
 
+#include "source/CodedUnits.h"
 #include "timing/Saturating.h"
 
 namespace receiver {
@@ -14,7 +15,7 @@ constexpr std::size_t kWitnesses = 4;
 /// What senders put into one unit of sound at the most, in ticks: as much may be missing between two packets.
 constexpr std::int64_t kSoundUnit = 45000;
 /// So many pictures back it may be one that is sent before those that are shown before it.
-constexpr std::int64_t kLongestReorder = 16;
+constexpr std::int64_t kLongestReorder = kMostReorderFrames;
 
 /// The pictures at the beginning, as many as tell where the first one should stand, or none.
 std::vector<AVPacket*> Witnesses(const Packets& packets, const AVStream& video) {

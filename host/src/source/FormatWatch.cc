@@ -7,6 +7,7 @@
 #include <vector>
 
 #include "source/AnnexB.h"
+#include "source/CodedUnits.h"
 
 namespace receiver {
 namespace {
@@ -19,7 +20,10 @@ constexpr int kStepsBack = 3;
 /// Pictures in a row, shown by more or less behind their decoding than those before, that are more than a
 /// damaged stamp.
 constexpr int kDelayed = 2;
-constexpr int kReorderDepth = 16;
+constexpr int kReorderDepth = kMostReorderFrames;
+
+/// More than there are pictures in front of one that they all need.
+constexpr int kStraight = 2 * kReorderDepth;
 
 constexpr const char* kReordered = "the video begins to send its pictures reordered (B frames)";
 
@@ -46,9 +50,10 @@ AVCodecID CodecOf(std::span<const unsigned char> picture) {
 
 }  // namespace
 
-FormatWatch::FormatWatch(AVCodecID codec, const FrameRate& rate, bool untouched)
+FormatWatch::FormatWatch(AVCodecID codec, const FrameRate& rate, bool untouched, bool reordered)
     : codec_(codec),
       untouched_(untouched),
+      reordered_(reordered),
       period_(std::int64_t{90000} * rate.denominator / std::max<std::int64_t>(1, rate.numerator)) {}
 
 void FormatWatch::Look(std::span<const unsigned char> picture, std::optional<std::int64_t> stamp,
@@ -63,11 +68,13 @@ void FormatWatch::Look(std::span<const unsigned char> picture, std::optional<std
     if (!untouched_ || !stamp) {
         return;
     }
-    if (delay) {
+    if (delay && !reordered_) {
         LookAtDelay(*delay);
     }
     if (stamp_) {
-        LookAtOrder(*stamp - *stamp_);
+        if (!reordered_) {
+            LookAtOrder(*stamp - *stamp_);
+        }
         LookAtRate(*stamp - *stamp_);
     }
     stamp_ = stamp;
@@ -82,6 +89,24 @@ void FormatWatch::LookAtDelay(std::int64_t delay) {
     }
     delayed_ = 0;
     delay_ = delay;
+}
+
+void FormatWatch::LookAtReordering(std::optional<std::int64_t> delay, bool late) {
+    if (late) {
+        // A single one has a damaged stamp.
+        if (sinceLate_ && *sinceLate_ < kReorderDepth) {
+            throw FormatChanged(kReorderedOtherwise);
+        }
+        sinceLate_ = 0;
+    } else if (sinceLate_) {
+        ++*sinceLate_;
+    }
+    if (delay) {
+        straight_ = std::abs(*delay) <= period_ / 2 ? straight_ + 1 : 0;
+    }
+    if (straight_ >= kStraight) {
+        throw FormatChanged(kReorderedNoMore);
+    }
 }
 
 void FormatWatch::LookAtOrder(std::int64_t step) {

@@ -212,7 +212,7 @@ void InputProducer::GoOn(std::unique_ptr<Connection> connection, std::int64_t pa
     connection_ = std::move(connection);
     const SourceDescription& now = connection_->Description();
     const bool other = now.width != description_.width || now.height != description_.height ||
-                       now.frameRate != description_.frameRate;
+                       now.frameRate != description_.frameRate || now.reordering != description_.reordering;
     if (other && !changed) {
         assembler_.AddNotice("the source came back as " + now.summary + " and was " + description_.summary +
                              ": the recording goes on in a new file");

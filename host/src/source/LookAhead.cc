@@ -69,13 +69,21 @@ bool Reported(const Packets& packets, const AVStream& video, const AVStream& aud
     return reported(video) && reported(audio);
 }
 
+/// The usual distance of pictures in the time base of the video.
+std::int64_t StepOf(const Packets& packets, const AVStream& video) {
+    return std::llround(PictureSpacing(video, packets) / av_q2d(video.time_base));
+}
+
 void MendRtp(const Packets& packets, const AVStream& video, const AVStream* audio) {
     for (const auto& packet : packets) {
         // The libraries infer these, wrongly.
         packet->dts = AV_NOPTS_VALUE;
     }
-    if (const double spacing = PictureSpacing(video, packets); spacing > 0) {
-        MendStamps(video, std::llround(spacing / av_q2d(video.time_base)), packets);
+    const std::int64_t step = StepOf(packets, video);
+    if (ComeReordered(video, step, packets)) {
+        MendFirstReordered(video, step, packets);
+    } else if (step > 0) {
+        MendStamps(video, step, packets);
     }
     if (audio != nullptr) {
         MendStamps(*audio, av_rescale_q(AudioDuration(*audio, 0), kTicks, audio->time_base), packets);
@@ -101,23 +109,34 @@ Beginning LookAhead(Input& input, const AVStream& video, const AVStream* audio) 
         return input.Rtp() && audio != nullptr && !Reported(packets, video, *audio) &&
                Clock::now() - begun < kReportPatience;
     };
-    while ((pictures < kPictures || waits()) && packets.size() < kLongest) {
-        libav::Owner<AVPacket> packet = libav::NewPacket();
-        const auto before = Clock::now();
-        if (!input.Read(*packet)) {
-            break;
+    const auto readOn = [&] {
+        while ((pictures < kPictures || waits()) && packets.size() < kLongest) {
+            libav::Owner<AVPacket> packet = libav::NewPacket();
+            const auto before = Clock::now();
+            if (!input.Read(*packet)) {
+                break;
+            }
+            if (IsOf(*packet, video)) {
+                ++pictures;
+                input.Alive();
+                arrival.Enter(*packet, video.time_base, Clock::now() - before);
+            }
+            packets.push_back(std::move(packet));
         }
-        if (IsOf(*packet, video)) {
-            ++pictures;
-            input.Alive();
-            arrival.Enter(*packet, video.time_base, Clock::now() - before);
-        }
-        packets.push_back(std::move(packet));
-    }
+    };
+    readOn();
+    beginning.arrived = arrival.Arrived(input.Opened(), input.Rtp());
     if (input.Rtp()) {
+        const std::int64_t step = StepOf(packets, video);
+        if (const std::size_t dropped = DropBeforeLeap(video, step, packets); dropped > 0) {
+            const std::int64_t passed = static_cast<std::int64_t>(dropped) * step;
+            beginning.arrived +=
+                std::chrono::microseconds(av_rescale_q(passed, video.time_base, {1, 1000000}));
+            pictures -= dropped;
+            readOn();
+        }
         MendRtp(packets, video, audio);
     }
-    beginning.arrived = arrival.Arrived(input.Opened(), input.Rtp());
     return beginning;
 }
 

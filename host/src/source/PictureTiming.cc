@@ -169,6 +169,20 @@ void GoToDecoderModels(Bits& bits) {
     }
 }
 
+/// From the restrictions of the stream, with which the usability information ends.
+std::optional<std::uint32_t> ReorderFramesAt(Bits& bits) {
+    if (!bits.Flag()) {  // bitstream_restriction_flag
+        return std::nullopt;
+    }
+    bits.Flag();         // motion_vectors_over_pic_boundaries_flag
+    bits.Exponential();  // max_bytes_per_pic_denom
+    bits.Exponential();  // max_bits_per_mb_denom
+    bits.Exponential();  // log2_max_mv_length_horizontal
+    bits.Exponential();  // log2_max_mv_length_vertical
+    const std::uint32_t frames = bits.Exponential();
+    return bits.Whole() ? std::optional(frames) : std::nullopt;
+}
+
 }  // namespace
 
 std::optional<PictureTiming::Layout> PictureTiming::LayoutOf(std::span<const unsigned char> parameterSet) {
@@ -201,6 +215,7 @@ std::optional<PictureTiming::Layout> PictureTiming::LayoutOf(std::span<const uns
         bits.Flag();  // low_delay_hrd_flag
     }
     layout.pictureStructure = bits.Flag();
+    layout.reorderFrames = ReorderFramesAt(bits);
     return bits.Whole() ? std::optional(layout) : std::nullopt;
 }
 

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
 #include <deque>
 
@@ -15,5 +16,20 @@ bool IsTied(const AVPacket& packet);
 /// of `stream` among `packets` that stand before a leap in line with those behind it. `step` is the usual
 /// distance, in the stream's time base. Whole steps that are missing stay.
 void MendStamps(const AVStream& stream, std::int64_t step, const std::deque<libav::Owner<AVPacket>>& packets);
+
+/// Pictures of `video` among `packets` come in another order than they are shown in. `step` is their usual
+/// distance.
+bool ComeReordered(const AVStream& video, std::int64_t step,
+                   const std::deque<libav::Owner<AVPacket>>& packets);
+
+/// Of pictures that come so nobody knows where those in front of a leap belong: takes away all packets up to
+/// it. Returns how many pictures these were.
+std::size_t DropBeforeLeap(const AVStream& video, std::int64_t step,
+                           std::deque<libav::Owner<AVPacket>>& packets);
+
+/// The libraries lose the stamp of the first picture. Where that is one that decoding can begin with it is
+/// shown in front of all that follow.
+void MendFirstReordered(const AVStream& video, std::int64_t step,
+                        const std::deque<libav::Owner<AVPacket>>& packets);
 
 }  // namespace receiver

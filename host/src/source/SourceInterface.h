@@ -47,6 +47,9 @@ struct SourceUnit {
     /// Audio: how long pictures are missing between the frame before and this one, in samples. As many whole
     /// frames of audio are left out; how to make up for the rest depends on where a recording began.
     std::int64_t passed = 0;
+    /// Video: how much later than at `time` the picture is shown, below 0 earlier, in ticks of 90000.
+    /// Pictures come in the order of their decoding, and the n-th of them has the time of the n-th one shown.
+    std::int64_t later = 0;
 };
 
 /// What a source is.
@@ -58,6 +61,9 @@ struct SourceDescription {
     std::uint32_t bitrate = 0;
     /// One line for the operator: "H.264 High 1280x720 25 fps, AAC LC 48 kHz stereo, KLV".
     std::string summary;
+    /// Pictures that may be decoded in front of one that is shown before all of them. 0 where pictures are
+    /// decoded in the order in which they are shown.
+    std::uint32_t reordering = 0;
 };
 
 /// What a source met so far.

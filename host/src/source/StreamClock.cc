@@ -32,8 +32,9 @@ bool Near(std::int64_t a, std::int64_t b) {
 
 }  // namespace
 
-StreamClock::StreamClock(const AVStream& video, const AVStream* audio, bool recorded)
+StreamClock::StreamClock(const AVStream& video, const AVStream* audio, bool recorded, bool reordered)
     : recorded_(recorded), video_{&video} {
+    video_.reordered = reordered;
     if (audio != nullptr) {
         audio_ = Track{audio};
     }
@@ -53,7 +54,7 @@ void StreamClock::Anchor(std::int64_t stamp, std::int64_t delay) {
 }
 
 std::optional<std::int64_t> StreamClock::StampOf(Track& track, const AVPacket& packet) {
-    const std::int64_t raw = packet.pts != AV_NOPTS_VALUE ? packet.pts : packet.dts;
+    const std::int64_t raw = packet.pts != AV_NOPTS_VALUE && !track.reordered ? packet.pts : packet.dts;
     if (raw == AV_NOPTS_VALUE) {
         return std::nullopt;
     }

@@ -29,10 +29,14 @@ class StreamClock {
         std::deque<std::int64_t> recent = {};
         /// The last unit had a stamp that came before.
         bool stands = false;
+        /// It is the decoding times that count.
+        bool reordered = false;
     };
 
     /// `audio` may be null. `recorded`: what is read waits for us, so that its clock alone tells the time.
-    StreamClock(const AVStream& video, const AVStream* audio, bool recorded);
+    /// `reordered`: pictures come in another order than they are shown in, and count by their turns, which
+    /// stand in the place of decoding times.
+    StreamClock(const AVStream& video, const AVStream* audio, bool recorded, bool reordered = false);
 
     /// The first IDR frame will stand at `begin`. `tell` hears of jumps.
     void Begin(std::int64_t begin, NoticeSink tell);

@@ -130,6 +130,8 @@ void DecideVideo(AVFormatContext& format, AVStream& stream, const Packets& ahead
                                                 : "the video is interlaced and becomes progressive");
     }
     if (paths.passes) {
+        description.reordering = ReorderDepth(findings, parameters, pass->ReorderFrames());
+        pass->SetReordering(description.reordering);
         paths.video = std::move(pass);
         description.summary = VideoSummary(H264With(parameters), description);
     } else {

@@ -108,6 +108,9 @@ void UnitAssembler::AddPicture(const CodedPicture& picture) {
     MakeSilence(place.time);
     batch_.emplace_back(SourceUnit{Medium::kVideo, place.time, picture.data, picture.size, picture.keyFrame,
                                    TimecodeOfFrame(place.index, picture), ArrivalOf(place.time)});
+    // A picture is shown in the place of another one.
+    std::get<SourceUnit>(batch_.back()).later =
+        grid_.TimeOf(place.index + grid_.FramesIn(picture.later)) - place.time;
     Report();
 }
 

@@ -4,11 +4,15 @@
 #include <array>
 #include <cmath>
 #include <cstdio>
+#include <iterator>
+#include <string_view>
 #include <vector>
 
 #include "common/ReceiverError.h"
+#include "source/CodedUnits.h"
 #include "source/Input.h"
 #include "source/PictureParser.h"
+#include "timing/FrameGrid.h"
 
 namespace receiver {
 namespace {
@@ -16,6 +20,7 @@ namespace {
 struct Stamps {
     std::int64_t shown = 0;
     std::optional<std::int64_t> decoded;
+    bool keyFrame = false;
 };
 
 std::vector<Stamps> StampsOf(const AVStream& stream, const std::deque<libav::Owner<AVPacket>>& packets) {
@@ -24,8 +29,9 @@ std::vector<Stamps> StampsOf(const AVStream& stream, const std::deque<libav::Own
         // What is damaged may have the stamps of another picture.
         const bool whole = (packet->flags & AV_PKT_FLAG_CORRUPT) == 0;
         if (packet->stream_index == stream.index && packet->pts != AV_NOPTS_VALUE && whole) {
-            stamps.push_back(
-                {packet->pts, packet->dts == AV_NOPTS_VALUE ? std::optional<std::int64_t>() : packet->dts});
+            stamps.push_back({packet->pts,
+                              packet->dts == AV_NOPTS_VALUE ? std::optional<std::int64_t>() : packet->dts,
+                              (packet->flags & AV_PKT_FLAG_KEY) != 0});
         }
     }
     return stamps;
@@ -67,6 +73,66 @@ bool Reordered(const AVStream& stream, const std::vector<Stamps>& stamps) {
     }
     // The encoder announces reordering and stamps for it, though it has not come to it yet.
     return delay && *delay > 0 && stream.codecpar->video_delay > 0;
+}
+
+/// RTP and Matroska stamp pictures with the time when they are shown, and nothing else.
+bool TellsDecoding(const AVFormatContext& format) {
+    const std::string_view name = format.iformat->name;
+    return name != "sdp" && name != "rtsp" && name != "rtp" && name != "matroska,webm";
+}
+
+/// How much earlier the n-th picture is decoded than the n-th one is shown, of the middle one: at either end
+/// pictures are missing that are shown beyond it.
+std::optional<std::int64_t> DelayOfTurns(const AVStream& stream, const std::vector<Stamps>& stamps) {
+    std::vector<std::int64_t> shown;
+    std::vector<std::int64_t> decoded;
+    for (const Stamps& picture : stamps) {
+        if (picture.decoded) {
+            shown.push_back(picture.shown);
+            decoded.push_back(*picture.decoded);
+        }
+    }
+    if (shown.empty()) {
+        return std::nullopt;
+    }
+    const auto middle = static_cast<std::ptrdiff_t>(shown.size() / 2);
+    std::nth_element(shown.begin(), shown.begin() + middle, shown.end());
+    std::nth_element(decoded.begin(), decoded.begin() + middle, decoded.end());
+    return av_rescale_q(shown[shown.size() / 2] - decoded[decoded.size() / 2], stream.time_base, kTicks);
+}
+
+/// Of pictures that are reordered.
+std::uint32_t DecodedAhead(const std::vector<Stamps>& stamps) {
+    std::ptrdiff_t most = 0;
+    for (auto picture = stamps.begin(); picture != stamps.end(); ++picture) {
+        // Behind an IDR picture nothing is shown in front of it.
+        const auto group = std::find_if(std::make_reverse_iterator(picture), stamps.rend(),
+                                        [](const Stamps& before) { return before.keyFrame; });
+        const auto begin = group == stamps.rend() ? stamps.begin() : std::prev(group.base());
+        most = std::max(most, std::count_if(begin, picture, [&picture](const Stamps& before) {
+                            return before.shown > picture->shown;
+                        }));
+    }
+    return static_cast<std::uint32_t>(most);
+}
+
+/// Frames that a decoder has room for (ITU-T H.264 A.3.1, MaxDpbMbs in table A-1).
+std::uint32_t DecoderFrames(const AVCodecParameters& parameters) {
+    struct Level {
+        int idc;
+        int macroblocks;
+    };
+    static constexpr Level kLevels[] = {{10, 396},   {11, 900},   {12, 2376},   {20, 2376},   {21, 4752},
+                                        {22, 8100},  {30, 8100},  {31, 18000},  {32, 20480},  {40, 32768},
+                                        {41, 32768}, {42, 34816}, {50, 110400}, {51, 184320}, {52, 184320}};
+    const int size = (parameters.width + 15) / 16 * ((parameters.height + 15) / 16);
+    const auto* const level =
+        std::find_if(std::begin(kLevels), std::end(kLevels),
+                     [&parameters](const Level& entry) { return entry.idc == parameters.level; });
+    if (level == std::end(kLevels) || size <= 0) {
+        return kMostReorderFrames;
+    }
+    return std::clamp(static_cast<std::uint32_t>(level->macroblocks / size), 1U, kMostReorderFrames);
 }
 
 /// The mean distance between pictures in seconds. There must be two.
@@ -113,6 +179,12 @@ VideoFindings CheckVideo(AVFormatContext& format, AVStream& stream,
     VideoFindings findings;
     const std::vector<Stamps> stamps = StampsOf(stream, packets);
     findings.reordered = Reordered(stream, stamps);
+    // As in AVI, which stamps pictures with the time when they are decoded and nothing else.
+    findings.unordered = stamps.empty() && pictures.stamped > 0 && stream.codecpar->video_delay > 0;
+    if (findings.reordered) {
+        findings.decodedAhead = DecodedAhead(stamps);
+        findings.delay = TellsDecoding(format) ? DelayOfTurns(stream, stamps) : std::nullopt;
+    }
     AVRational pictureRate{0, 1};
     if (stream.codecpar->codec_id == AV_CODEC_ID_H264) {
         PictureParser parser(*stream.codecpar);
@@ -160,6 +232,19 @@ VideoFindings CheckVideo(AVFormatContext& format, AVStream& stream,
     return findings;
 }
 
+std::uint32_t ReorderDepth(const VideoFindings& findings, const AVCodecParameters& parameters,
+                           std::optional<std::uint32_t> told) {
+    if (!findings.reordered) {
+        return 0;
+    }
+    std::uint32_t depth = told ? *told : DecoderFrames(parameters);
+    if (findings.delay && findings.rate) {
+        depth = static_cast<std::uint32_t>(
+            std::max<std::int64_t>(0, FrameGrid(*findings.rate).FramesIn(*findings.delay)));
+    }
+    return std::clamp(std::max(depth, findings.decodedAhead), 1U, kMostReorderFrames);
+}
+
 std::string WhyNotPassed(const AVCodecParameters& parameters, const VideoFindings& findings) {
     if (parameters.codec_id != AV_CODEC_ID_H264) {
         return std::string("the video is ") + avcodec_get_name(parameters.codec_id) +
@@ -172,8 +257,10 @@ std::string WhyNotPassed(const AVCodecParameters& parameters, const VideoFinding
     if (findings.fields) {
         return "the video is interlaced with single fields: set the encoder to progressive pictures";
     }
-    if (findings.reordered) {
-        return "the video has reordered pictures (B frames): set the encoder to no B frames";
+    if (findings.unordered) {
+        return "the video has reordered pictures (B frames), and the source does not tell when they are "
+               "shown: "
+               "set the encoder to no B frames";
     }
     if (!findings.rate) {
         std::array<char, 32> rate{};

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstdint>
 #include <deque>
 #include <optional>
 #include <string>
@@ -17,6 +18,13 @@ struct VideoFindings {
     AVRational toldRate{0, 1};
     /// Pictures are sent in another order than they are shown in.
     bool reordered = false;
+    /// They are, and the source does not tell in which.
+    bool unordered = false;
+    /// Of reordered ones: as many as were decoded in front of one that is shown before all of them.
+    std::uint32_t decodedAhead = 0;
+    /// Of these: how much earlier the n-th one is decoded than the n-th one is shown, in ticks of 90000.
+    /// Nothing where the source does not tell when pictures are decoded.
+    std::optional<std::int64_t> delay;
     /// Pictures are interlaced frames.
     bool interlaced = false;
     /// Packets hold single fields.
@@ -32,6 +40,12 @@ VideoFindings CheckVideo(AVFormatContext& format, AVStream& stream,
 
 /// The middle one of the distances between pictures in seconds, 0 when there are none.
 double PictureSpacing(const AVStream& stream, const std::deque<libav::Owner<AVPacket>>& packets);
+
+/// As many pictures may be decoded in front of one that is shown before all of them; 0 where they come as
+/// they are shown. By the source's decoding times; without these by what its parameter sets tell (`told`),
+/// and where they don't by what a decoder has room for (ITU-T H.264 E.2.1).
+std::uint32_t ReorderDepth(const VideoFindings& findings, const AVCodecParameters& parameters,
+                           std::optional<std::uint32_t> told);
 
 /// Why such video cannot be recorded untouched, as the beginning of a sentence: "the video is hevc, not
 /// H.264". Empty when it can.

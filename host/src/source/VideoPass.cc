@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cstring>
+#include <utility>
 
 #include "common/ReceiverError.h"
 #include "source/FormatWatch.h"
@@ -35,6 +36,7 @@ VideoPass::VideoPass(const AVCodecParameters& parameters)
     CheckParameterSets(units);
     sets_.Learn(units);
     timing_.Look(units);
+    reorderFrames_ = timing_.ReorderFrames();
     parser_ = std::make_unique<PictureParser>(filter_.Stream());
     timecodes_ = std::make_unique<TimecodeReader>(filter_.Stream());
 }
@@ -56,6 +58,20 @@ void VideoPass::CheckFormat(const AVPacket& stream) {
         throw FormatChanged(kRateChanged);
     }
     rate_ = rate;
+}
+
+void VideoPass::CheckReordering() {
+    const auto told = timing_.ReorderFrames();
+    const auto before = std::exchange(reorderFrames_, told);
+    if (depth_ == 0 || !told || !before || *told == *before) {
+        return;
+    }
+    if (*told == 0) {
+        throw FormatChanged(kReorderedNoMore);
+    }
+    if (*told > depth_) {
+        throw FormatChanged(kReorderedOtherwise);
+    }
 }
 
 void VideoPass::CheckParameters(const AVPacket& packet) const {
@@ -81,13 +97,15 @@ void VideoPass::Push(const AVPacket& packet, const PictureSink& sink) {
     const bool marked = (packet.flags & AV_PKT_FLAG_KEY) != 0;
     const auto units = marked ? NalUnits(bytes) : LeadingNalUnits(bytes);
     CodedPicture picture;
-    picture.time = packet.pts;
+    picture.time = packet.dts != AV_NOPTS_VALUE ? packet.dts : packet.pts;
+    picture.later = packet.pts - picture.time;
     picture.keyFrame = Contains(units, kNalIdr);
     CheckParameterSets(units);
     sets_.Learn(units);
     timing_.Look(units);
     if (picture.keyFrame) {
         CheckFormat(stream);
+        CheckReordering();
     }
     if (const auto completed = sets_.Complete(bytes, units)) {
         picture.size = completed->size();

@@ -21,10 +21,17 @@ class VideoPass final : public VideoPathInterface {
     void Push(const AVPacket& packet, const PictureSink& sink) override;
     void Finish(const PictureSink& sink) override;
     std::uint64_t Damaged() const override { return damaged_; }
+    /// Pictures come reordered, over as many as `ReorderDepth` tells: parameter sets that tell another order
+    /// are told from now on.
+    void SetReordering(std::uint32_t depth) { depth_ = depth; }
+    /// As `PictureTiming` tells.
+    std::optional<std::uint32_t> ReorderFrames() const { return timing_.ReorderFrames(); }
 
  private:
     /// Throws `FormatChanged`.
     void CheckFormat(const AVPacket& stream);
+    /// Throws `FormatChanged`.
+    void CheckReordering();
     /// Parameter sets out of band that are not those of the beginning. Throws `FormatChanged`.
     void CheckParameters(const AVPacket& packet) const;
 
@@ -37,6 +44,9 @@ class VideoPass final : public VideoPathInterface {
     std::uint32_t height_ = 0;
     /// As the first IDR frame tells; 0/1 when it does not.
     std::optional<AVRational> rate_;
+    std::uint32_t depth_ = 0;
+    /// As the last parameter sets told.
+    std::optional<std::uint32_t> reorderFrames_;
     std::uint64_t damaged_ = 0;
 };
 

@@ -8,7 +8,8 @@
 namespace receiver {
 
 /// From the packets of a connection's video to coded pictures. Packets carry times of the source's line, in
-/// ticks of 90000.
+/// ticks of 90000: when they are shown, and where pictures come in another order, as decoding time, where
+/// they stand in that.
 class VideoPathInterface {
  public:
     virtual ~VideoPathInterface() = default;

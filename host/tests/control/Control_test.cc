@@ -11,6 +11,7 @@
 #include "fakes/FakeSource.h"
 #include "support/LineClient.h"
 #include "support/TemporaryFolder.h"
+#include "support/WaitUntil.h"
 
 namespace receiver {
 namespace {
@@ -72,7 +73,6 @@ TEST_F(ControlTest, ADiskThatHangsHoldsUpNeitherTheRunNorItsEnd) {
         std::condition_variable changed;
         bool reached = false;
         bool open = false;
-        bool left = false;
     };
     const auto gate = std::make_shared<Gate>();
     const FileSizer hangs = [gate](const std::string&) -> std::optional<std::uint64_t> {
@@ -80,8 +80,6 @@ TEST_F(ControlTest, ADiskThatHangsHoldsUpNeitherTheRunNorItsEnd) {
         gate->reached = true;
         gate->changed.notify_all();
         gate->changed.wait(lock, [&] { return gate->open; });
-        gate->left = true;
-        gate->changed.notify_all();
         return std::nullopt;
     };
     {
@@ -99,10 +97,13 @@ TEST_F(ControlTest, ADiskThatHangsHoldsUpNeitherTheRunNorItsEnd) {
         control.End(std::chrono::milliseconds(1));
         EXPECT_FALSE(std::filesystem::exists(Path()));
     }
-    std::unique_lock lock(gate->mutex);
-    gate->open = true;
-    gate->changed.notify_all();
-    gate->changed.wait(lock, [&] { return gate->left; });
+    {
+        const std::lock_guard lock(gate->mutex);
+        gate->open = true;
+        gate->changed.notify_all();
+    }
+    // The thread gives up all that it has when it ends: `gate` and `hangs` are what is left.
+    EXPECT_TRUE(WaitUntil([&] { return gate.use_count() == 2; }));
 }
 
 }  // namespace

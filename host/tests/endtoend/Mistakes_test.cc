@@ -188,8 +188,9 @@ TEST_F(MistakesTest, ACodecThatIsNotH264) {
     ExpectRefused({"--input", file.string()}, kSourceUnsuitable, "--transcode");
 }
 
-TEST_F(MistakesTest, ReorderedPictures) {
+TEST_F(MistakesTest, ReorderedPicturesOfWhichNothingTellsWhenTheyAreShown) {
     MaterialOptions options;
+    options.container = "avi";
     options.seconds = 2;
     options.more = {"-preset", "medium", "-bf", "2", "-x264-params", "b-adapt=0"};
     ExpectRefused({"--input", MakeMaterial(folder, options).string()}, kSourceUnsuitable, "--transcode");

@@ -48,6 +48,10 @@ class Table {
         const std::string code = outcome.code ? std::to_string(*outcome.code) : "hangs";
         const std::lock_guard lock(mutex_);
         ++runs_;
+        if (!outcome.hit && wrong.empty()) {
+            ++unmet_;
+            return;
+        }
         Row& row = rows_[{CallOf(fault), status, code, state}];
         row.effects.insert(EffectOf(fault));
         row.first = row.runs == 0 ? fault.number : std::min(row.first, fault.number);
@@ -61,7 +65,8 @@ class Table {
     }
     void Print(FileType type, std::size_t pictures, std::size_t step) const {
         std::cout << "### Files of type " << NameOf(type) << "\n\n"
-                  << runs_ << " runs of " << pictures << " pictures each, " << wrong_ << " of them wrong."
+                  << runs_ << " runs of " << pictures << " pictures each, " << wrong_ << " of them wrong. "
+                  << unmet_ << " made fewer calls than the one without a fault, and are not in the table."
                   << (step == 1 ? "" : " One of " + std::to_string(step) + " calls was tried.") << "\n\n"
                   << "| Call | Which | What happens to it | Runs | Status, cause | Exit code | Last file |\n"
                   << "|---|---|---|---|---|---|---|\n";
@@ -80,6 +85,8 @@ class Table {
     std::mutex mutex_;
     std::map<Key, Row> rows_;
     std::size_t runs_ = 0;
+    /// Made fewer such calls than the run without a fault.
+    std::size_t unmet_ = 0;
     std::size_t wrong_ = 0;
 };
 

@@ -250,13 +250,69 @@ INSTANTIATE_TEST_SUITE_P(
                     Conversion{"latm", " -c:a aac -ar 48000 -ac 2 -mpegts_flags +latm a.ts",
                                "audio is converted: AAC_LATM LC 48 kHz stereo"}));
 
-TEST_F(FileSource, ReorderedPicturesAreRefused) {
-    Ffmpeg(string(kPicture) + " -pix_fmt yuv420p -c:v libx264 -preset ultrafast -bf 2 a.ts");
-    const auto error = Refusal(Fast("a.ts"));
+/// Files of reordered pictures, by their extension.
+class ReorderedFile : public SourceTest, public testing::WithParamInterface<const char*> {};
+
+TEST_P(ReorderedFile, ComesInTheOrderOfDecodingWithTheTimesAtWhichPicturesAreShown) {
+    const string file = string("a.") + GetParam();
+    Ffmpeg(string(kPicture) + kTone +
+           " -pix_fmt yuv420p -c:v libx264 -preset ultrafast -g 12"
+           " -x264-params bframes=3:b-pyramid=normal:b-adapt=0:scenecut=0:open-gop=0 " +
+           kPlainAac + file);
+    const auto source = OpenSource(Fast(file), notices_, nullptr);
+    EXPECT_EQ(source->Description().reordering, 2u);
+    const auto video = Of(Medium::kVideo, ReadAll(*source));
+    ASSERT_EQ(video.size(), 25u);
+    // A group of 12: I0 P4 B2 b1 b3, P8 B6 b5 b7, P11 b9 b10.
+    constexpr std::int64_t kShown[] = {0, 4, 2, 1, 3, 8, 6, 5, 7, 11, 9, 10};
+    for (std::int64_t i = 0; i < 24; ++i) {
+        const SourceUnit& unit = video[static_cast<std::size_t>(i)];
+        EXPECT_EQ(unit.time, i * 3600);
+        EXPECT_EQ(unit.time + unit.later, (i / 12 * 12 + kShown[i % 12]) * 3600) << i;
+        EXPECT_EQ(unit.keyFrame, i % 12 == 0);
+    }
+}
+
+INSTANTIATE_TEST_SUITE_P(Containers, ReorderedFile, testing::Values("ts", "mp4", "mov", "flv", "mkv", "nut"));
+
+/// Ticks by which the clock of a source of reordered pictures is set.
+class ReorderedClock : public SourceTest, public testing::WithParamInterface<int> {};
+
+TEST_P(ReorderedClock, ThatIsSetMovesNoPictureFromItsTurn) {
+    const auto make = [this](double offset, const string& name) {
+        Ffmpeg(string(kPicture) + kTone +
+               " -pix_fmt yuv420p -c:v libx264 -preset ultrafast -g 12 -x264-params "
+               "bframes=3:b-pyramid=normal:b-adapt=0:scenecut=0:open-gop=0:repeat-headers=1 " +
+               kPlainAac + "-muxdelay 0 -output_ts_offset " + std::to_string(offset) + " " + name);
+    };
+    make(50, "a.ts");
+    make(51 + GetParam(), "b.ts");
+    Shell("cat a.ts b.ts > c.ts");
+    const auto video = Of(Medium::kVideo, ReadFile("c.ts"));
+    ASSERT_GE(video.size(), 49u);
+    std::vector<std::int64_t> turns;
+    std::vector<std::int64_t> shown;
+    for (const SourceUnit& unit : video) {
+        turns.push_back(unit.time / 3600);
+        shown.push_back((unit.time + unit.later) / 3600);
+    }
+    EXPECT_TRUE(std::is_sorted(turns.begin(), turns.end())) << testing::PrintToString(turns);
+    std::sort(shown.begin(), shown.end());
+    EXPECT_EQ(turns, shown);
+    EXPECT_LE(turns.back(), 51);
+    EXPECT_EQ(notices_.CountOf("the source's clock jumped by"), GetParam() == 0 ? 0u : 1u)
+        << testing::PrintToString(notices_.sentences);
+}
+
+INSTANTIATE_TEST_SUITE_P(Seconds, ReorderedClock, testing::Values(0, 20, -20, 3600));
+
+TEST_F(FileSource, ReorderedPicturesAreRefusedWhereNothingTellsWhenTheyAreShown) {
+    Ffmpeg(string(kPicture) + " -pix_fmt yuv420p -c:v libx264 -preset ultrafast -bf 2 a.avi");
+    const auto error = Refusal(Fast("a.avi"));
     EXPECT_EQ(error.Code(), ExitCode::kSourceUnsuitable);
-    EXPECT_STREQ(
-        error.what(),
-        "the video has reordered pictures (B frames): set the encoder to no B frames, or use --transcode");
+    EXPECT_STREQ(error.what(),
+                 "the video has reordered pictures (B frames), and the source does not tell when they are "
+                 "shown: set the encoder to no B frames, or use --transcode");
 }
 
 TEST_F(FileSource, OtherCodecsAreRefused) {
@@ -374,11 +430,10 @@ TEST_P(Transcode, MakesPlainH264OfAnything) {
 
 INSTANTIATE_TEST_SUITE_P(
     All, Transcode,
-    testing::Values(
-        VideoConversion{"B frames", " -pix_fmt yuv420p -c:v libx264 -preset ultrafast -bf 2 ", "a.ts"},
-        VideoConversion{"MPEG-2", " -c:v mpeg2video -b:v 2M ", "a.ts"},
-        VideoConversion{"MPEG-4 with B frames in MP4", " -c:v mpeg4 -bf 2 -b:v 2M ", "a.mp4"},
-        VideoConversion{"HEVC",
+    testing::Values(VideoConversion{"MPEG-2", " -c:v mpeg2video -b:v 2M ", "a.ts"},
+                    VideoConversion{"MPEG-4 with B frames in MP4", " -c:v mpeg4 -bf 2 -b:v 2M ", "a.mp4"},
+                    VideoConversion{
+                        "HEVC",
                         " -pix_fmt yuv420p -c:v libx265 -preset ultrafast -x265-params log-level=none ",
                         "a.ts"}));
 

@@ -54,7 +54,7 @@ std::vector<SentMedia::Arrival> SentMedia::Find(Medium medium, const std::vector
     for (const SourceUnit& unit : Of(medium, units)) {
         const auto found = items_.find(EssenceOf(medium, unit.data.get(), unit.size));
         if (found != items_.end() && found->second.medium == medium) {
-            const std::int64_t time = medium == Medium::kAudio ? unit.time * 15 / 8 : unit.time;
+            const std::int64_t time = medium == Medium::kAudio ? unit.time * 15 / 8 : unit.time + unit.later;
             arrivals.push_back({found->second.number, time - found->second.time});
         }
     }

@@ -42,19 +42,19 @@ Pieces TakeBursts(const Pieces& pieces, std::size_t step, std::mt19937& random) 
 
 class TransportLosses : public SourceTest {
  protected:
-    /// Thirty seconds. `more`: arguments of ffmpeg.
-    void Make(const std::string& more) const {
+    /// Thirty seconds. `more`: arguments of ffmpeg, `encoder`: of x264.
+    void Make(const std::string& more, const std::string& encoder = "bframes=0") const {
         Ffmpeg(
             "-f lavfi -i testsrc2=size=96x64:rate=25:duration=30 -f lavfi -i "
             "anoisesrc=sample_rate=48000:seed=7:amplitude=0.2:duration=30" +
-            std::string(kPlainH264) + "-x264-params repeat-headers=1 " + more + " whole.ts");
+            std::string(kPlainH264) + "-x264-params repeat-headers=1:" + encoder + " " + more + " whole.ts");
     }
     /// Takes some fifteen bursts out for each seed, and expects that each frame of audio that came stands as
     /// the pictures do, and that at least `sounds` of them came.
-    void ExpectInStepBehindLosses(std::size_t sounds) {
+    void ExpectInStepBehindLosses(std::size_t sounds, unsigned seeds = kSeeds) {
         const SentMedia sent(Path("whole.ts"));
         const Pieces pieces = endtoend::ReadPieces(Path("whole.ts"));
-        for (unsigned seed = 1; seed <= kSeeds; ++seed) {
+        for (unsigned seed = 1; seed <= seeds; ++seed) {
             SCOPED_TRACE(seed);
             std::mt19937 random(seed);
             endtoend::WritePieces(TakeBursts(pieces, seed % 2 == 0 ? kDatagram : 1, random),
@@ -74,12 +74,26 @@ class TransportLosses : public SourceTest {
                 EXPECT_NEAR(static_cast<double>(picture.offset), static_cast<double>(pictures.front().offset),
                             90);
             }
+            ExpectTurnsOfWhatIsShown(units);
             EXPECT_GT(source->Counts().lostFrames, 0u);
         }
         EXPECT_GT(notices_.CountOf("the source has gaps: "), 0u);
     }
 
  private:
+    /// Each picture is shown in the turn of another one, or of itself, and each turn has one.
+    static void ExpectTurnsOfWhatIsShown(const std::vector<SourceUnit>& units) {
+        std::vector<std::int64_t> turns;
+        std::vector<std::int64_t> shown;
+        for (const SourceUnit& unit : Of(Medium::kVideo, units)) {
+            turns.push_back(unit.time);
+            shown.push_back(unit.time + unit.later);
+        }
+        EXPECT_TRUE(std::is_sorted(turns.begin(), turns.end()));
+        std::sort(shown.begin(), shown.end());
+        EXPECT_EQ(turns, shown);
+    }
+
     static constexpr unsigned kSeeds = 24;
 };
 
@@ -93,6 +107,12 @@ TEST_F(TransportLosses, LeaveAacInStep) {
 TEST_F(TransportLosses, LeaveAacInStepThatComesFrameByFrame) {
     Make("-c:a aac -ar 48000 -ac 2 -b:a 96k -pes_payload_size 0");
     ExpectInStepBehindLosses(1100);
+}
+
+TEST_F(TransportLosses, LeaveReorderedPicturesInTheirTurnsAndInStep) {
+    Make("-c:a aac -ar 48000 -ac 2 -b:a 96k -pes_payload_size 0",
+         "bframes=3:b-adapt=0:b-pyramid=normal:open-gop=0:keyint=24");
+    ExpectInStepBehindLosses(1000, 8);
 }
 
 /// Sound that is converted is not left to the stamps of its frames alone: what is missing is told all the

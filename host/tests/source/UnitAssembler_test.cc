@@ -63,6 +63,24 @@ TEST_F(UnitAssemblerTest, AudioWaitsForThePictureOfItsTime) {
     EXPECT_EQ(Made(), "a2048 v7200");
 }
 
+TEST_F(UnitAssemblerTest, AReorderedPictureIsShownInThePlaceOfAnotherOne) {
+    assembler_.Begin(false);
+    // Stamps in milliseconds, which are 90 ticks.
+    const std::pair<std::int64_t, std::int64_t> pictures[] = {
+        {0, 0}, {3600, 10760}, {7190, 20}, {10800, -7240}};
+    std::vector<std::int64_t> shown;
+    for (const auto& [time, later] : pictures) {
+        assembler_.AddPicture({Data(), 4, time, time == 0, {}, later});
+    }
+    for (const auto& item : assembler_.Take()) {
+        const auto* const unit = std::get_if<SourceUnit>(&item);
+        if (unit != nullptr && unit->medium == Medium::kVideo) {
+            shown.push_back(unit->time + unit->later);
+        }
+    }
+    EXPECT_EQ(shown, (std::vector<std::int64_t>{0, 4 * 3600, 2 * 3600, 3600}));
+}
+
 TEST_F(UnitAssemblerTest, WithoutAudioSilenceKeepsStepWithThePictures) {
     assembler_.Begin(false);
     Picture(0);

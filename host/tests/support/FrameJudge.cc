@@ -133,6 +133,8 @@ FrameJudge::Verdict FrameJudge::Judge(const std::filesystem::path& recording) {
             ++verdict.unknownPictures;
         }
     }
+    // They come in the order of decoding.
+    std::sort(shown.begin(), shown.end(), [](const Shown& a, const Shown& b) { return a.time < b.time; });
     const bool comparable = run.found > 0;
     verdict.missingPictures = run.Missing();
     run = {};

@@ -54,7 +54,7 @@ fs::path MakeMaterial(const TemporaryFolder& folder, const MaterialOptions& opti
         "-f",           "lavfi",
         "-i",           "testsrc2=size=" + options.size + ":rate=" + options.rate,
         "-f",           "lavfi",
-        "-i",           "sine=frequency=440:sample_rate=48000",
+        "-i",           options.sound,
         "-t",           std::to_string(options.seconds),
         "-c:v",         "libx264",
         "-preset",      "ultrafast",

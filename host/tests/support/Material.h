@@ -13,6 +13,8 @@ struct MaterialOptions {
     /// As ffmpeg writes it: "25", "30000/1001".
     std::string rate = "25";
     std::string size = "320x180";
+    /// A source of sound, as ffmpeg writes it.
+    std::string sound = "sine=frequency=440:sample_rate=48000";
     double seconds = 4;
     /// Pictures from one IDR frame to the next.
     int pictureGroup = 10;

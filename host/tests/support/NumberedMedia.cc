@@ -141,6 +141,8 @@ void WriteNumbered(const NumberedPart& part, const std::filesystem::path& target
 NumberedRecording ReadNumbered(const std::filesystem::path& recording) {
     const CodedMedia media = ReadCodedMedia(recording);
     NumberedRecording found{readNumbers(recording), media.videoTimes, {}};
+    // They are read in the order of decoding.
+    std::sort(found.times.begin(), found.times.end());
     const std::vector<double> samples = readSamples(recording);
     if (media.audioTimes.empty()) {
         return found;

@@ -13,6 +13,7 @@
 #include <string>
 #include <thread>
 #include <tuple>
+#include <utility>
 #include <vector>
 
 #include "support/BufferHarness.h"
@@ -400,6 +401,65 @@ TEST_F(StreamBufferOrder, TimesThatStepBackAtAnIdrFrameMoveNoPicturesOfTheOneBef
     }
     // The end is the instant at which the 60th picture is shown.
     EXPECT_EQ(record.places.size() - record.hidden, 60u);
+}
+
+TEST_F(StreamBufferOrder, PicturesBehindAClockThatStepsBackAreShownInTheirOrder) {
+    const auto pictures = MakePictures(kPyramid, 25, 240);
+    // Some of those in front of the step stay in the cache, behind all that come.
+    constexpr std::uint64_t kStep = 40;
+    constexpr std::uint64_t kSeconds = 60;
+    const auto stepClock = [this](std::uint64_t seconds) {
+        harness.clock.videoRtp += seconds * 90000;
+        harness.clock.audioRtp += seconds * 48000;
+    };
+    harness.Start();
+    stepClock(kSeconds);
+    for (std::uint64_t n = 0; n < pictures.size(); ++n) {
+        if (n == kStep) {
+            stepClock(-kSeconds);
+        }
+        pushMediaUpTo(n + 1);
+        harness.buffer->PushVideo(reordered_stream::MakeUnit(harness.clock, n, pictures[n], 2));
+        if (n % 8 == 7) {
+            // Nothing that follows is there yet when a chunk is cut.
+            (void)harness.recorder.WaitForChunks(n / 8, 0, std::chrono::milliseconds(20));
+        }
+    }
+    harness.buffer->Stop();
+    const CutRecord record = cutRecord();
+    const std::vector<std::uint64_t> decoded = recordedBy(harness).video;
+    std::vector<std::pair<std::int64_t, std::uint64_t>> shown;
+    for (std::size_t i = 0; i < decoded.size(); ++i) {
+        // From the second group behind the step on, up to where those of the end stand.
+        if (decoded[i] >= 75 && decoded[i] < 225) {
+            shown.emplace_back(record.places[i], pictures[decoded[i]].shown);
+        }
+    }
+    EXPECT_GE(shown.size(), 100u);
+    std::sort(shown.begin(), shown.end());
+    EXPECT_TRUE(std::is_sorted(shown.begin(), shown.end(),
+                               [](const auto& one, const auto& other) { return one.second < other.second; }));
+}
+
+TEST_F(StreamBufferOrder, TheFirstPictureOfAFileIsTheFirstOneShownWhereNoIdrFrameStandsInFront) {
+    const auto pictures = MakePictures(kTwoB, 1000, 40);
+    harness.Start();
+    push(unitsOf(pictures, 1));
+    pushMediaUpTo(44);
+    harness.buffer->Stop();
+    const auto& chunk = harness.Chunks().at(2);
+    // The 16th picture is decoded first and shown behind the 17th and 18th.
+    ASSERT_EQ(pictures[16].shown, 18u);
+    ASSERT_EQ(pictures[17].shown, 16u);
+    EXPECT_EQ(chunk->firstVideo->rtp_timestamp, harness.clock.VideoRtp(16));
+    EXPECT_EQ(chunk->firstShown, harness.clock.VideoRtp(17));
+    const LogCapture log;
+    harness.buffer->MakeFileTimecode(chunk);
+    EXPECT_EQ(log.CountIf([this](const CapturedLine& line) {
+        return line.text.starts_with("OP: FILE FIRST.") &&
+               line.text.ends_with("RTPTS = " + std::to_string(harness.clock.VideoRtp(17)) + ".");
+    }),
+              1u);
 }
 
 TEST_F(StreamBufferOrder, PicturesThatStandBehindTheEndInAnEarlierGroupCountAsShown) {

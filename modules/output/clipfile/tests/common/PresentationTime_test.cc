@@ -33,13 +33,13 @@ TEST(PresentationTime, TheWordMayWrapAsRtpTimestampsDo) {
 
 TEST(PresentationTime, APictureWhoseTimeCannotBeIsShownWhenItIsDecoded) {
     constexpr std::uint64_t kDecoded = 0x8'0000'0100;
-    // Never set; before its decoding, over a wrap too; more than 10 s behind.
-    const std::uint64_t impossible[] = {0, 0x8'0000'00FF, 0xFFFF'FF00, kDecoded + 900001};
+    // Never set; before its decoding, over a wrap too; more than 3 s behind.
+    const std::uint64_t impossible[] = {0, 0x8'0000'00FF, 0xFFFF'FF00, kDecoded + 270001};
     for (const std::uint64_t shown : impossible) {
         EXPECT_FALSE(HasPresentationTime(unitAt(kDecoded, shown))) << shown;
         EXPECT_EQ(PresentationRtp(unitAt(kDecoded, shown), PictureOrder::kDecoding), kDecoded) << shown;
     }
-    for (const std::uint64_t shown : {kDecoded, kDecoded + 900000}) {
+    for (const std::uint64_t shown : {kDecoded, kDecoded + 270000}) {
         EXPECT_TRUE(HasPresentationTime(unitAt(kDecoded, shown))) << shown;
         EXPECT_EQ(PresentationRtp(unitAt(kDecoded, shown), PictureOrder::kDecoding), shown);
     }

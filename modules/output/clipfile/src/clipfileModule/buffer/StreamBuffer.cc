@@ -284,6 +284,7 @@ void StreamBuffer::addToCache(const std::shared_ptr<StreamData>& unit, UnitList 
         UnitList& units = this->*cache;
         // Contract: sorted-insertion. The cache is in order; a late unit goes behind those of its own time.
         units.insert(std::upper_bound(units.begin(), units.end(), unit, byRtpTimestamp), unit);
+        newestVideo = &units == &videoBuffer ? unit->rtp_timestamp : newestVideo;
         due = isPassDue();
     }
     if (due) {
@@ -312,6 +313,7 @@ void StreamBuffer::SetVideoSequenceHeader(const nal_access::NalUnit& sps, const 
     startWriter();
     // Contract: idr-frame-unsorted. The cache is empty here.
     videoBuffer.push_back(unit);
+    newestVideo = unit->rtp_timestamp;
     firstPicture = unit;
     if (isExact()) {
         startInStep();
@@ -362,11 +364,11 @@ void StreamBuffer::setError(int code) {
 
 bool StreamBuffer::MakeFileTimecode(const std::shared_ptr<ChunkData>& chunk) {
     MutexLock lock(analyzerMutex);
+    const std::uint64_t shown = inDecodingOrder() ? chunk->firstShown : chunk->firstVideo->rtp_timestamp;
     int offset = 0;
     const std::int64_t duration = streamInfo.video_sample_duration;
     if (tcStatus == 2 && duration != 0) {
-        const auto distance =
-            static_cast<std::int64_t>(shownAt(*chunk->firstVideo) - chunk->firstMeta->rtp_timestamp);
+        const auto distance = static_cast<std::int64_t>(shown - chunk->firstMeta->rtp_timestamp);
         if (isExact() || inDecodingOrder()) {
             offset = framesIn(distance);
         } else {
@@ -388,7 +390,7 @@ bool StreamBuffer::MakeFileTimecode(const std::shared_ptr<ChunkData>& chunk) {
     // Contract: file-first-without-timecode. Logged with zeros then.
     CLIPFILE_LOG_PLAIN(LOG_PRIORITY_OPERATOR, "OP: FILE FIRST. %02d:%02d:%02d:%02d. RTPTS = %lld.",
                        fileTimecode[0], fileTimecode[1], fileTimecode[2], fileTimecode[3],
-                       static_cast<long long>(shownAt(*chunk->firstVideo)));
+                       static_cast<long long>(shown));
     return result;
 }
 

@@ -160,6 +160,9 @@ class StreamBuffer final : public QxModuleStreamInterface,
     std::size_t findIdrFrom(std::size_t first) const REQUIRES(bufferMutex);
     /// True when every picture is cached that is shown before one of the first `pictures`.
     bool isOrderKnown(std::size_t pictures) const REQUIRES(bufferMutex);
+    /// When the first of the cached pictures is shown: in decoding order, where no IDR frame stands in front,
+    /// that need not be the first one. There must be one.
+    std::uint64_t firstShownAt() const REQUIRES(bufferMutex);
     /// Pictures of a chunk that may hold so many. In decoding order it ends in front of an IDR frame, or,
     /// where none has come for long, where the pictures so far are shown before all that follow, if it can.
     std::size_t findCut(std::size_t pictures) const REQUIRES(bufferMutex);
@@ -237,6 +240,8 @@ class StreamBuffer final : public QxModuleStreamInterface,
     UnitList videoBuffer GUARDED_BY(bufferMutex);
     UnitList audioBuffer GUARDED_BY(bufferMutex);
     UnitList metaBuffer GUARDED_BY(bufferMutex);
+    /// When the picture that was cached last is decoded. A clock that steps back leaves others at the back.
+    std::uint64_t newestVideo GUARDED_BY(bufferMutex) = 0;
     /// The IDR frame that the record begins with.
     std::shared_ptr<StreamData> firstPicture GUARDED_BY(bufferMutex);
     PresentationOrder presentationOrder GUARDED_BY(bufferMutex);

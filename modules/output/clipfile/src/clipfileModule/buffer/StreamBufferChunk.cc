@@ -220,6 +220,7 @@ std::optional<StreamBuffer::ChunkCounts> StreamBuffer::findChunk(std::size_t pic
 PassResult StreamBuffer::pushChunk(const ChunkCounts& counts, std::uint64_t end) {
     auto chunk = std::make_shared<ChunkData>();
     chunk->firstVideo = videoBuffer.front();
+    chunk->firstShown = inDecodingOrder() ? firstShownAt() : 0;
     // Pictures that others need and that nobody sees may be all that is left.
     chunk->firstMeta = metaBuffer.empty() ? nullptr : metaBuffer.front();
     splitVideo(*chunk, counts.video, end);

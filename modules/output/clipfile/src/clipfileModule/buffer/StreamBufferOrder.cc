@@ -44,13 +44,23 @@ bool StreamBuffer::isOrderKnown(std::size_t pictures) const {
     }
     // What follows the newest picture is shown no earlier than that one is decoded, and what follows an IDR
     // frame no earlier than that is shown.
-    const std::uint64_t decoded = videoBuffer.back()->rtp_timestamp;
+    const std::uint64_t decoded = std::min(newestVideo, videoBuffer.back()->rtp_timestamp);
     for (std::size_t i = 0; i < std::min(pictures, videoBuffer.size()); ++i) {
-        if (shownAt(*videoBuffer[i]) > decoded && findIdrFrom(i + 1) == videoBuffer.size()) {
+        const std::size_t idr = findIdrFrom(i + 1);
+        const bool isIdrDecoded = idr < videoBuffer.size() && videoBuffer[idr]->rtp_timestamp <= decoded;
+        if (shownAt(*videoBuffer[i]) > decoded && !isIdrDecoded) {
             return false;
         }
     }
     return true;
+}
+
+std::uint64_t StreamBuffer::firstShownAt() const {
+    if (IsIdrPicture(*videoBuffer.front())) {
+        return shownAt(*videoBuffer.front());
+    }
+    const std::vector<std::uint64_t> times = timesOf(0, findIdrFrom(1));
+    return *std::min_element(times.begin(), times.end());
 }
 
 std::size_t StreamBuffer::findCut(std::size_t pictures) const {

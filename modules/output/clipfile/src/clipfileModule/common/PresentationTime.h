@@ -8,9 +8,9 @@
 
 namespace clipfileModule {
 
-/// How much later than it is decoded a picture may be shown, in ticks of 90 kHz: 10 s. The 16 pictures that a
-/// decoder keeps (ITU-T H.264 A.3.1) last less at any rate.
-inline constexpr std::int32_t kLongestPresentationDelay = 900000;
+/// How much later than it is decoded a picture may be shown, in ticks of 90 kHz: 3 s. The 16 pictures that a
+/// decoder keeps (ITU-T H.264 A.3.1) last less at any rate, and what waits for longer would fill the caches.
+inline constexpr std::int32_t kLongestPresentationDelay = 270000;
 
 /// By how much later than it is decoded a video unit in decoding order is shown, as it says itself.
 inline std::int32_t StampedDelay(const StreamData& unit) {

@@ -26,6 +26,9 @@ struct ChunkData {
     /// First units of the chunk, before conversion. The timecode of a file is read from `firstMeta`.
     std::shared_ptr<StreamData> firstVideo;
     std::shared_ptr<StreamData> firstMeta;
+    /// Of video in decoding order: when the first of these pictures is shown that is shown, on the clock of
+    /// `rtp_timestamp`.
+    std::uint64_t firstShown = 0;
     /// Of video in decoding order: by how many pictures each of `video` is shown later than it is decoded.
     /// Empty where both orders are one.
     std::vector<std::int32_t> shownLater;
