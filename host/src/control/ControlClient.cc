@@ -16,6 +16,7 @@ void ControlClient::Read() {
     std::array<char, 16384> piece;
     const ssize_t count = recv(descriptor_, piece.data(), piece.size(), 0);
     if (count > 0) {
+        lastProgress_ = input_.empty() ? Clock::now() : lastProgress_;
         input_.append(piece.data(), static_cast<std::size_t>(count));
     } else if (count == 0) {
         inputEnded_ = true;
@@ -32,11 +33,13 @@ std::optional<std::string> ControlClient::TakeLine() {
     }
     std::string line = input_.substr(0, end);
     input_.erase(0, end + 1);
+    lastProgress_ = Clock::now();
     return line;
 }
 
 void ControlClient::Send(const std::string& line) {
     if (!broken_) {
+        lastProgress_ = Waiting() == 0 ? Clock::now() : lastProgress_;
         output_ += line;
     }
 }
@@ -60,6 +63,7 @@ void ControlClient::Write() {
             return;
         }
         written_ += static_cast<std::size_t>(count);
+        lastProgress_ = Clock::now();
     }
     output_.clear();
     written_ = 0;

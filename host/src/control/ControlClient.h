@@ -1,5 +1,6 @@
 #pragma once
 
+#include <chrono>
 #include <cstddef>
 #include <optional>
 #include <string>
@@ -9,6 +10,8 @@ namespace receiver {
 /// One connection: lines in, lines out, and never a wait. One thread.
 class ControlClient {
  public:
+    using Clock = std::chrono::steady_clock;
+
     /// Bytes of a line without its end.
     static constexpr std::size_t kLongestLine = 65536;
 
@@ -37,6 +40,11 @@ class ControlClient {
     /// Bytes that wait for the client.
     std::size_t Waiting() const { return output_.size() - written_; }
 
+    /// It has begun a line and not ended it, or has not read what was sent to it.
+    bool Stalls() const { return Waiting() > 0 || (!input_.empty() && !HasLine()); }
+    /// When it last went on: began or ended a line, was sent the first of what waits, or read some of it.
+    Clock::time_point LastProgress() const { return lastProgress_; }
+
     /// Nobody is at the other end: nothing is sent any more. What has come is still there to be read.
     bool Broken() const { return broken_; }
     void Break();
@@ -47,6 +55,7 @@ class ControlClient {
     std::string output_;
     /// Bytes of `output_` that are written.
     std::size_t written_ = 0;
+    Clock::time_point lastProgress_ = Clock::now();
     bool inputEnded_ = false;
     bool broken_ = false;
 };

@@ -5,6 +5,7 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <utility>
 #include <vector>
 
 #include "control/JsonRpc.h"
@@ -127,6 +128,7 @@ void ControlServer::Accept() {
         }
         return;
     }
+    MakePlace();
     if (clients_.size() >= kMostClients) {
         ControlClient refused(descriptor);
         refused.Send(RpcErrorAnswer(nullptr, {RpcCode::kTooManyClients, "too many clients are connected"}));
@@ -134,6 +136,21 @@ void ControlServer::Accept() {
         return;
     }
     clients_.try_emplace(next_++, descriptor);
+}
+
+void ControlServer::MakePlace() {
+    if (clients_.size() < kMostClients) {
+        return;
+    }
+    const auto key = [this](const auto& client) {
+        return std::pair(handler_.Owes(client.first), client.second.client.LastProgress());
+    };
+    const auto idle = std::ranges::min_element(clients_, {}, key);
+    const auto [waits, progress] = key(*idle);
+    if (!waits && Clock::now() - progress >= patience_) {
+        handler_.OnGone(idle->first);
+        clients_.erase(idle);
+    }
 }
 
 void ControlServer::TakeInput(ClientId id, Connection& connection) {
@@ -161,8 +178,9 @@ void ControlServer::RemoveGone() {
         const auto at = next++;
         const Connection& connection = at->second;
         const ControlClient& client = connection.client;
+        const bool stalls = client.Stalls() && now - client.LastProgress() >= patience_;
         const bool over = connection.leaves && (client.Waiting() == 0 || now >= *connection.leaves);
-        if (over || (client.Broken() && client.InputEnded() && !client.HasLine())) {
+        if (stalls || over || (client.Broken() && client.InputEnded() && !client.HasLine())) {
             handler_.OnGone(at->first);
             clients_.erase(at);
         }
