@@ -55,6 +55,10 @@ ExitCode RetentionCommand::Run(std::ostream& out, std::ostream& errors) const {
             TellFault(folder, fault, json_, out, errors);
             code = ExitCode::kUnreadable;
         }
+        if (!result.standstill.empty()) {
+            TellFault(folder, result.standstill, json_, out, errors);
+            code = Worse(code, ExitCode::kDefects);
+        }
         if (!result.isRoom) {
             TellFault(folder, "less of the disk is free than is to be kept free.", json_, out, errors);
             code = Worse(code, ExitCode::kDefects);

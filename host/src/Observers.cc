@@ -28,6 +28,11 @@ void Observers::LookAt(const SourceUnit& unit) {
 }
 
 void Observers::Follow() {
+    if (control_) {
+        if (const std::optional<std::string> fault = control_->TakeFault()) {
+            group_.Notice(*fault);
+        }
+    }
     if (hooks_) {
         for (const std::string& sentence : hooks_->TakeSentences()) {
             group_.Notice(sentence);

@@ -27,7 +27,7 @@ class Observers {
     void Describe(const SourceDescription& source);
     /// A unit of the source goes by.
     void LookAt(const SourceUnit& unit);
-    /// Tells the operator what has become of hooks.
+    /// Tells the operator what has become of hooks and of the control socket.
     void Follow();
     HookCounts Hooked() const { return hooks_ ? hooks_->Counts() : HookCounts(); }
     /// The last file is closed: waits for hooks, for a bounded time, while their failures can still be told.

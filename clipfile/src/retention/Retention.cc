@@ -1,6 +1,8 @@
 #include "retention/Retention.h"
 
+#include <fcntl.h>
 #include <sys/stat.h>
+#include <unistd.h>
 
 #include <algorithm>
 #include <array>
@@ -25,24 +27,31 @@ namespace fs = std::filesystem;
 struct File {
     fs::path path;
     std::uint64_t bytes = 0;
-    /// What of the disk is free when it has gone: nothing where it has another name.
-    std::uint64_t freed = 0;
-    dev_t device = 0;
+    /// What the disk gets back without it.
+    std::uint64_t room = 0;
     fs::file_time_type changed;
 };
 
+/// Bytes that a file holds on the disk, as far as they go with its name.
+std::uint64_t RoomOf(const fs::path& path) {
+    // stat(2): blocks of 512 bytes, whatever the disk has.
+    constexpr std::uint64_t kBlock = 512;
+    struct stat status {};
+    const bool frees = lstat(path.c_str(), &status) == 0 && status.st_nlink == 1;
+    return frees ? static_cast<std::uint64_t>(status.st_blocks) * kBlock : 0;
+}
+
 /// The recordings below a folder, from the oldest on. What has gone meanwhile, and links, are left out.
 std::vector<File> OldestFirst(const std::vector<std::string>& paths) {
-    constexpr std::uint64_t kBlock = 512;  // of st_blocks, everywhere
     std::vector<File> files;
     for (const std::string& path : paths) {
-        struct stat status {};
         std::error_code error;
-        const fs::file_time_type changed = fs::last_write_time(path, error);
-        if (!error && lstat(path.c_str(), &status) == 0 && S_ISREG(status.st_mode)) {
-            const auto blocks = static_cast<std::uint64_t>(status.st_blocks);
-            files.push_back({path, static_cast<std::uint64_t>(status.st_size),
-                             status.st_nlink == 1 ? blocks * kBlock : 0, status.st_dev, changed});
+        const bool regular = fs::symlink_status(path, error).type() == fs::file_type::regular;
+        File file{path, 0, RoomOf(path), {}};
+        file.bytes = error ? 0 : fs::file_size(path, error);
+        file.changed = error ? fs::file_time_type() : fs::last_write_time(path, error);
+        if (regular && !error) {
+            files.push_back(file);
         }
     }
     std::sort(files.begin(), files.end(), [](const File& one, const File& other) {
@@ -80,6 +89,55 @@ std::string Gigabytes(std::uint64_t bytes) {
     return text.data();
 }
 
+/// The room on the disk of a folder, by what was free at first and what removed files held: what the disk
+/// says may be late, and others may fill it meanwhile.
+class Room {
+ public:
+    Room(const RetentionOptions& options, const RetentionSystem& system)
+        : options_(options), system_(system), free_(options.keepFree ? Look() : 0), seen_(free_) {}
+
+    /// Files have to go for it.
+    bool Lacks() const { return options_.keepFree && free_ < *options_.keepFree && standstill_.empty(); }
+    std::uint64_t Free() const { return free_; }
+    bool Holds(const fs::path& path) const {
+        return system_.fileSystem(path) == system_.fileSystem(options_.folder);
+    }
+    const std::string& Standstill() const { return standstill_; }
+
+    /// A file of this disk is gone, or would be.
+    void Count(const File& file) {
+        free_ += file.room;
+        if (options_.dryRun || file.room == 0) {
+            return;
+        }
+        const std::uint64_t before = std::exchange(seen_, Look());
+        if (seen_ <= before) {
+            system_.settle(options_.folder);
+            seen_ = Look();
+        }
+        if (seen_ <= before) {
+            standstill_ =
+                "removing " + file.path.string() +
+                " freed nothing: a snapshot or a program may hold it, or the disk fills as quickly. "
+                "Nothing more is removed for room.";
+        }
+    }
+    /// At the end.
+    bool Suffices() const {
+        return !options_.keepFree || (options_.dryRun ? free_ : Look()) >= *options_.keepFree;
+    }
+
+ private:
+    std::uint64_t Look() const { return system_.freeBytes(options_.folder); }
+
+    const RetentionOptions& options_;
+    const RetentionSystem& system_;
+    std::uint64_t free_;
+    /// What the disk said last.
+    std::uint64_t seen_;
+    std::string standstill_;
+};
+
 /// A number with one of some units behind it.
 template <typename Number>
 std::optional<Number> ParseWithUnit(std::string_view text,
@@ -108,33 +166,43 @@ RetentionSystem ThisSystem() {
         }
         return space.available;
     };
-    return {freeBytes, fs::file_time_type::clock::now};
+    const auto settle = [](const fs::path& folder) {
+        // Where it can't, the room does not show, and nothing more goes.
+        if (const int descriptor = open(folder.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC);
+            descriptor >= 0) {
+            syncfs(descriptor);
+            close(descriptor);
+        }
+    };
+    const auto fileSystem = [](const fs::path& path) -> std::uint64_t {
+        struct stat status {};
+        return stat(path.c_str(), &status) == 0 ? status.st_dev : 0;
+    };
+    return {freeBytes, settle, fileSystem, fs::file_time_type::clock::now};
 }
 
 RetentionResult Retain(const RetentionOptions& options, const RetentionSystem& system,
                        const std::function<void(const RetentionStep&)>& tell) {
     const FolderListing listing = FilesIn(options.folder);
-    struct stat folder {};
-    stat(options.folder.c_str(), &folder);
-    // Counted, not asked for again: a disk that frees late, or that others fill, would cost all recordings.
-    std::uint64_t free = options.keepFree ? system.freeBytes(options.folder) : 0;
-    const auto isFull = [&] { return options.keepFree && free < *options.keepFree; };
+    Room room(options, system);
     for (const File& file : OldestFirst(listing.files)) {
         const bool isOld = options.olderThan && system.now() - file.changed > *options.olderThan;
-        if (!isOld && !isFull()) {
+        if (!isOld && !room.Lacks()) {
             break;
         }
-        if (!isOld && (file.freed == 0 || file.device != folder.st_dev)) {
+        const bool isHere = options.keepFree && room.Holds(file.path);
+        if (!isOld && !isHere) {
             continue;
         }
-        const std::string why = isOld ? "it is older than the limit" : Gigabytes(free) + " are free";
-        const std::string obstacle = Remove(file.path, options.dryRun);
+        const std::string why = isOld ? "it is older than the limit" : Gigabytes(room.Free()) + " are free";
+        const std::string obstacle =
+            !isOld && file.room == 0 ? "without it no more would be free" : Remove(file.path, options.dryRun);
         tell({file.path.string(), file.bytes, obstacle.empty(), obstacle.empty() ? why : obstacle});
-        if (obstacle.empty() && file.device == folder.st_dev) {
-            free += file.freed;
+        if (obstacle.empty() && isHere) {
+            room.Count(file);
         }
     }
-    return {listing.faults, !isFull()};
+    return {listing.faults, room.Suffices(), room.Standstill()};
 }
 
 std::optional<std::chrono::seconds> ParseAge(std::string_view text) {

@@ -27,6 +27,10 @@ struct RetentionOptions {
 struct RetentionSystem {
     /// Bytes that are free where a folder is.
     std::function<std::uint64_t(const std::filesystem::path& folder)> freeBytes;
+    /// Has the disk of a folder do what it puts off, as freeing what was removed.
+    std::function<void(const std::filesystem::path& folder)> settle;
+    /// A number of the file system on which a file or a folder lies.
+    std::function<std::uint64_t(const std::filesystem::path& path)> fileSystem;
     std::function<std::filesystem::file_time_type()> now;
 };
 /// That of this machine. `freeBytes` throws `ToolError`.
@@ -47,11 +51,15 @@ struct RetentionResult {
     std::vector<std::string> faults;
     /// As much of the disk is free as was asked for.
     bool isRoom = true;
+    /// Why nothing more was removed for room though there is too little, or empty.
+    std::string standstill;
 };
 
 /// Removes recordings below a folder, the oldest first by the time of their last change, and tells each step.
 /// A file goes only when it is closed, its structure keeps all rules, and no recorder or recovery holds it;
-/// links never go. Throws `ToolError` where the disk cannot be asked.
+/// links never go. For room no more go than have to by their own sizes, none that frees nothing or lies on
+/// another file system than the folder, and none behind one that freed nothing. Throws `ToolError` where the
+/// disk cannot be asked.
 RetentionResult Retain(const RetentionOptions& options, const RetentionSystem& system,
                        const std::function<void(const RetentionStep&)>& tell);
 

@@ -40,24 +40,47 @@ class RetentionTest : public testing::Test {
         removed_.clear();
         kept_.clear();
         reasons_.clear();
-        // However much goes: as on a disk that frees late.
-        const RetentionSystem system{[this](const fs::path&) { return free_; }, [this] { return now_; }};
+        const RetentionSystem system{
+            .freeBytes = [this](const fs::path&) { return free_ + (freesAtOnce_ ? Freed() : settled_); },
+            .settle = [this](const fs::path&) { settled_ = freesLate_ ? Freed() : 0; },
+            .fileSystem = [this](const fs::path& path) { return path == elsewhere_ ? 2 : 1; },
+            .now = [this] { return now_; }};
         return Retain(options_, system, [this](const RetentionStep& step) {
             (step.removed ? removed_ : kept_).push_back(step.path);
             reasons_.push_back(step.reason);
         });
     }
-    /// Bytes of the disk that a file takes.
-    static std::uint64_t Taken(const fs::path& path) {
-        struct stat status {};
-        EXPECT_EQ(stat(path.c_str(), &status), 0);
-        return static_cast<std::uint64_t>(status.st_blocks) * 512;
+    /// Recordings, the oldest last, and what each of them holds on the disk.
+    void RecordThree() {
+        made_ = {Record("a", hours(1)), Record("b", hours(2)), Record("c", hours(3))};
+        for (const fs::path& path : made_) {
+            struct stat status {};
+            ASSERT_EQ(stat(path.c_str(), &status), 0);
+            held_.push_back(static_cast<std::uint64_t>(status.st_blocks) * 512);
+            ASSERT_GT(held_.back(), 0u);
+        }
+    }
+    /// What those held that are gone.
+    std::uint64_t Freed() const {
+        std::uint64_t freed = 0;
+        for (std::size_t i = 0; i < made_.size(); ++i) {
+            freed += fs::exists(made_[i]) ? 0 : held_[i];
+        }
+        return freed;
     }
 
     TempDir folder_;
     RetentionOptions options_;
     const fs::file_time_type now_ = fs::file_time_type::clock::now();
+    // The disk:
     std::uint64_t free_ = 0;
+    bool freesAtOnce_ = true;
+    bool freesLate_ = false;
+    std::uint64_t settled_ = 0;
+    fs::path elsewhere_;
+
+    std::vector<fs::path> made_;
+    std::vector<std::uint64_t> held_;
     std::vector<std::string> removed_;
     std::vector<std::string> kept_;
     std::vector<std::string> reasons_;
@@ -82,34 +105,82 @@ TEST_F(RetentionTest, WhatIsOlderGoesFromTheOldestOn) {
     EXPECT_TRUE(fs::exists(young));
 }
 
-TEST_F(RetentionTest, TheOldestGoUntilThereIsRoomAndNoMore) {
-    const fs::path young = Record("a", hours(1));
-    const fs::path oldest = Record("b", hours(3));
-    const fs::path older = Record("c", hours(2));
-    free_ = 1000;
-    options_.keepFree = free_ + Taken(oldest) + 1;
-    for (const bool dryRun : {true, false}) {
-        options_.dryRun = dryRun;
-        EXPECT_TRUE(Run().isRoom);
-        EXPECT_THAT(removed_, ElementsAre(oldest.string(), older.string()));
-        EXPECT_EQ(fs::exists(oldest), dryRun);
-        EXPECT_EQ(fs::exists(older), dryRun);
-    }
-    EXPECT_TRUE(fs::exists(young));
-    options_.keepFree = 1'000'000'000'000;
+TEST_F(RetentionTest, TheOldestGoUntilThereIsRoom) {
+    RecordThree();
+    options_.keepFree = held_[2] + 1;
+    EXPECT_TRUE(Run().isRoom);
+    EXPECT_THAT(removed_, ElementsAre(made_[2].string(), made_[1].string()));
+    EXPECT_TRUE(fs::exists(made_[0]));
+    options_.keepFree = 1'000'000'000;
     EXPECT_FALSE(Run().isRoom);
-    EXPECT_THAT(removed_, ElementsAre(young.string()));
+    EXPECT_THAT(removed_, ElementsAre(made_[0].string()));
 }
 
-TEST_F(RetentionTest, AFileThatHasAnotherNameDoesNotGoForRoom) {
-    const fs::path linked = Record("a", hours(2));
-    fs::create_hard_link(linked, folder_.Path() / "ingest");
-    const fs::path other = Record("b", hours(1));
-    free_ = 1000;
-    options_.keepFree = free_ + 1;
+TEST_F(RetentionTest, ADryRunTellsTheSameAndRemovesNothing) {
+    RecordThree();
+    options_.dryRun = true;
+    options_.keepFree = held_[2] + 1;
     EXPECT_TRUE(Run().isRoom);
-    EXPECT_THAT(removed_, ElementsAre(other.string()));
-    EXPECT_TRUE(fs::exists(linked));
+    EXPECT_THAT(removed_, ElementsAre(made_[2].string(), made_[1].string()));
+    EXPECT_TRUE(fs::exists(made_[2]));
+    EXPECT_TRUE(fs::exists(made_[1]));
+}
+
+TEST_F(RetentionTest, BehindAFileThatFreesNothingNoneGoes) {
+    // As with snapshots.
+    freesAtOnce_ = false;
+    RecordThree();
+    options_.keepFree = 1'000'000'000;
+    const RetentionResult result = Run();
+    EXPECT_THAT(removed_, ElementsAre(made_[2].string()));
+    EXPECT_FALSE(result.isRoom);
+    EXPECT_THAT(result.standstill, HasSubstr("removing " + made_[2].string() + " freed nothing"));
+}
+
+TEST_F(RetentionTest, ADiskThatFreesLateIsWaitedFor) {
+    freesAtOnce_ = false;
+    freesLate_ = true;
+    RecordThree();
+    options_.keepFree = held_[2] + 1;
+    const RetentionResult result = Run();
+    EXPECT_THAT(removed_, ElementsAre(made_[2].string(), made_[1].string()));
+    EXPECT_TRUE(result.isRoom);
+    EXPECT_THAT(result.standstill, IsEmpty());
+}
+
+TEST_F(RetentionTest, NoMoreGoThanHaveToByTheirSizesThoughOthersFillTheDisk) {
+    RecordThree();
+    options_.keepFree = held_[2] + 1;
+    RetentionSystem system{.freeBytes = [this](const fs::path&) { return Freed() / 2; },
+                           .settle = [](const fs::path&) {},
+                           .fileSystem = [](const fs::path&) { return 1; },
+                           .now = [this] { return now_; }};
+    EXPECT_FALSE(Retain(options_, system, [](const RetentionStep&) {}).isRoom);
+    EXPECT_TRUE(fs::exists(made_[0]));
+    EXPECT_FALSE(fs::exists(made_[1]));
+}
+
+TEST_F(RetentionTest, WhatHasAnotherNameDoesNotGoForRoom) {
+    RecordThree();
+    fs::create_hard_link(made_[2], folder_.Path() / "ingest");
+    options_.keepFree = 1;
+    EXPECT_TRUE(Run().isRoom);
+    EXPECT_THAT(kept_, ElementsAre(made_[2].string()));
+    EXPECT_THAT(reasons_.front(), HasSubstr("without it no more would be free"));
+    EXPECT_THAT(removed_, ElementsAre(made_[1].string()));
+    // It may go for its age.
+    options_.olderThan = hours(2);
+    Run();
+    EXPECT_THAT(removed_, ElementsAre(made_[2].string()));
+}
+
+TEST_F(RetentionTest, WhatLiesOnAnotherDiskDoesNotGoForRoom) {
+    RecordThree();
+    elsewhere_ = made_[2];
+    options_.keepFree = 1;
+    EXPECT_TRUE(Run().isRoom);
+    EXPECT_THAT(removed_, ElementsAre(made_[1].string()));
+    EXPECT_THAT(kept_, IsEmpty());
 }
 
 TEST_F(RetentionTest, WhatIsNotClosedStaysAndIsTold) {

@@ -5,6 +5,7 @@
 #include <signal.h>
 #include <spawn.h>
 #include <sys/mman.h>
+#include <sys/syscall.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -12,6 +13,8 @@
 #include <cerrno>
 #include <cstring>
 #include <string_view>
+
+#include "common/NormalPriority.h"
 
 namespace receiver {
 namespace {
@@ -93,48 +96,37 @@ class Setup {
     posix_spawn_file_actions_t actions_;
 };
 
-/// Reads what is there, without a wait. False at the end.
-bool Read(int descriptor, std::string& text) {
+/// Reads a piece of what a program says. False when there is none: none yet, or none any more.
+bool Read(int output, std::string& text) {
     std::array<char, 1024> buffer;
-    for (;;) {
-        const ssize_t count = read(descriptor, buffer.data(), buffer.size());
-        if (count <= 0) {
-            return count < 0 && (errno == EAGAIN || errno == EINTR);
-        }
-        if (text.size() < kMaxText) {
-            text.append(buffer.data(), static_cast<std::size_t>(count));
-        }
+    const ssize_t count = read(output, buffer.data(), buffer.size());
+    if (count > 0 && text.size() < kMaxText) {
+        text.append(buffer.data(), static_cast<std::size_t>(count));
     }
+    return count > 0;
 }
 
-/// Collects the process if it has ended.
-bool HasEnded(pid_t process, int& status) {
-    return waitpid(process, &status, WNOHANG) == process;
-}
-
-/// Follows a process until it has ended, whoever holds its output, and gives what it has left. It is killed
-/// when it is to end or the deadline comes.
-int Follow(pid_t process, int output, const std::atomic<bool>& ending, Clock::time_point deadline,
-           std::string& text) {
+/// Reads what a program says until it ends, or until `ending` or the deadline: nothing then, else its status.
+std::optional<int> Follow(pid_t process, int output, const std::atomic<bool>& ending,
+                          Clock::time_point deadline, std::string& text) {
+    // Without one the end is seen at the next look.
+    const int end = static_cast<int>(syscall(SYS_pidfd_open, process, 0));
+    std::array<pollfd, 2> polled{{{output, POLLIN, 0}, {end, POLLIN, 0}}};
     int status = 0;
-    bool open = true;
-    while (!HasEnded(process, status)) {
-        if (ending || Clock::now() >= deadline) {
-            kill(-process, SIGKILL);
-            while (waitpid(process, &status, 0) < 0 && errno == EINTR) {
-            }
-            break;
+    pid_t ended = 0;
+    while (ended == 0 && !ending && Clock::now() < deadline) {
+        const bool happened = poll(polled.data(), polled.size(), kLook) > 0;
+        if (happened && polled[0].revents != 0 && !Read(output, text)) {
+            // It may have closed its output long before it ends.
+            polled[0].fd = -1;
         }
-        // A closed output tells nothing more: then it is the pause alone.
-        pollfd input = {open ? output : -1, POLLIN, 0};
-        if (poll(&input, 1, kLook) > 0) {
-            open = Read(output, text);
-        }
+        ended = waitpid(process, &status, WNOHANG);
     }
-    if (open) {
-        Read(output, text);
+    close(end);
+    // What it has said at last. Others may hold its output, and say more and more.
+    while (ended != 0 && text.size() < kMaxText && Read(output, text)) {
     }
-    return status;
+    return ended == 0 ? std::nullopt : std::optional(status);
 }
 
 }  // namespace
@@ -148,16 +140,24 @@ ChildResult ChildProgram::Run(const ChildTask& task) {
         close(input);
         return result;
     }
+    // Its other end is the child's, and blocks.
+    fcntl(ends[0], F_SETFL, O_NONBLOCK);
     pid_t process = -1;
     const int error = Setup(input, ends[1]).Spawn(process, task);
     close(input);
     close(ends[1]);
     if (error == 0) {
+        SpareNoMore(process);
         const auto deadline = task.limit ? Clock::now() + *task.limit : Clock::time_point::max();
-        fcntl(ends[0], F_SETFL, O_NONBLOCK);
-        const int status = Follow(process, ends[0], ending_, deadline, result.text);
-        result.timedOut = !ending_ && WIFSIGNALED(status) && Clock::now() >= deadline;
-        result.code = !ending_ && WIFEXITED(status) ? WEXITSTATUS(status) : -1;
+        std::optional<int> status = Follow(process, ends[0], ending_, deadline, result.text);
+        if (!status) {
+            result.timedOut = !ending_;
+            kill(-process, SIGKILL);
+            while (waitpid(process, &status.emplace(0), 0) < 0 && errno == EINTR) {
+            }
+        } else if (WIFEXITED(*status)) {
+            result.code = WEXITSTATUS(*status);
+        }
     } else {
         result.text = std::strerror(error);
     }

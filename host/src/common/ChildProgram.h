@@ -33,10 +33,12 @@ struct ChildResult {
 };
 
 /// Another program that runs beside this one, without a shell, in a process group of its own, so that keys of
-/// the terminal do not reach it. Who is killed is killed with its group.
+/// the terminal do not reach it. Who is killed is killed with its group. The system does not spare it for
+/// being ours when memory runs out; all other priority is that of the thread that runs it.
 class ChildProgram {
  public:
-    /// Runs a program to its end. What it leaves behind in the background goes on, and is not heard.
+    /// Runs a program to its end, whether or not it holds its output open, or somebody behind it does: what
+    /// it has started and left goes on, and is heard no more.
     ChildResult Run(const ChildTask& task);
     /// Kills the program that runs, and every later one at once. From any thread.
     void End();

@@ -2,6 +2,8 @@
 
 #include <atomic>
 #include <chrono>
+#include <exception>
+#include <mutex>
 #include <utility>
 
 #include "common/LowPriority.h"
@@ -28,6 +30,18 @@ struct Control::State {
     std::function<void()> Waker() const {
         return [shared = wakeUp] { shared->Signal(); };
     }
+
+    /// Without it the run goes on.
+    void Fail(const std::string& reason) {
+        server.Close();
+        socket.Refuse();
+        const std::lock_guard lock(mutex);
+        fault = "the control socket serves nobody any more: " + reason;
+    }
+
+    std::mutex mutex;
+    // Guarded by mutex:
+    std::optional<std::string> fault;
 
     /// Commands that nobody has carried out own it too.
     const std::shared_ptr<WakeUp> wakeUp = std::make_shared<WakeUp>();
@@ -69,7 +83,22 @@ void Control::End(std::chrono::milliseconds patience) {
     thread_.End(patience);
 }
 
+std::optional<std::string> Control::TakeFault() {
+    const std::lock_guard lock(state_->mutex);
+    return std::exchange(state_->fault, std::nullopt);
+}
+
 void Control::Run(State& state) {
+    try {
+        Serve(state);
+    } catch (const std::exception& error) {
+        state.Fail(error.what());
+    } catch (...) {
+        state.Fail("an error without words");
+    }
+}
+
+void Control::Serve(State& state) {
     LowerPriority();
     while (!state.ending) {
         state.server.Serve();

@@ -2,6 +2,7 @@
 
 #include <chrono>
 #include <memory>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -35,6 +36,8 @@ class Control {
     void Describe(const SourceDescription& source);
     /// A unit of the source goes by.
     void LookAt(const SourceUnit& unit);
+    /// What there is to tell the operator since the last call: why nobody is served any more.
+    std::optional<std::string> TakeFault();
     /// The run is over and the command queue closed: clients are told what is left to be told, those that
     /// read it soon, and the socket is removed. A thread that a disk keeps for longer than `patience` is left
     /// to itself. A second time does nothing.
@@ -43,6 +46,7 @@ class Control {
  private:
     struct State;
     static void Run(State& state);
+    static void Serve(State& state);
 
     /// The thread owns it too: a disk may keep that.
     const std::shared_ptr<State> state_;

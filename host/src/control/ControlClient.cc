@@ -16,24 +16,13 @@ void ControlClient::Read() {
     std::array<char, 16384> piece;
     const ssize_t count = recv(descriptor_, piece.data(), piece.size(), 0);
     if (count > 0) {
+        lastProgress_ = input_.empty() ? Clock::now() : lastProgress_;
         input_.append(piece.data(), static_cast<std::size_t>(count));
     } else if (count == 0) {
         inputEnded_ = true;
-    } else if (errno != EAGAIN && errno != EINTR) {
+    } else if (broken_ || (errno != EAGAIN && errno != EINTR)) {
         inputEnded_ = true;
-        Abandon();
-    }
-}
-
-void ControlClient::Abandon() {
-    abandoned_ = true;
-    output_.clear();
-    written_ = 0;
-}
-
-void ControlClient::Send(const std::string& line) {
-    if (!abandoned_) {
-        output_ += line;
+        Break();
     }
 }
 
@@ -44,7 +33,21 @@ std::optional<std::string> ControlClient::TakeLine() {
     }
     std::string line = input_.substr(0, end);
     input_.erase(0, end + 1);
+    lastProgress_ = Clock::now();
     return line;
+}
+
+void ControlClient::Send(const std::string& line) {
+    if (!broken_) {
+        lastProgress_ = Waiting() == 0 ? Clock::now() : lastProgress_;
+        output_ += line;
+    }
+}
+
+void ControlClient::Break() {
+    broken_ = true;
+    output_.clear();
+    written_ = 0;
 }
 
 void ControlClient::Write() {
@@ -55,11 +58,12 @@ void ControlClient::Write() {
         }
         if (count < 0) {
             if (errno != EAGAIN) {
-                Abandon();
+                Break();
             }
             return;
         }
         written_ += static_cast<std::size_t>(count);
+        lastProgress_ = Clock::now();
     }
     output_.clear();
     written_ = 0;

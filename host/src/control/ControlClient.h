@@ -1,5 +1,6 @@
 #pragma once
 
+#include <chrono>
 #include <cstddef>
 #include <optional>
 #include <string>
@@ -9,6 +10,8 @@ namespace receiver {
 /// One connection: lines in, lines out, and never a wait. One thread.
 class ControlClient {
  public:
+    using Clock = std::chrono::steady_clock;
+
     /// Bytes of a line without its end.
     static constexpr std::size_t kLongestLine = 65536;
 
@@ -20,7 +23,7 @@ class ControlClient {
 
     int Descriptor() const { return descriptor_; }
 
-    /// Reads a piece of what is there.
+    /// Reads a piece of what is there, or sees that nothing more comes.
     void Read();
     /// The next whole line without its end.
     std::optional<std::string> TakeLine();
@@ -37,10 +40,14 @@ class ControlClient {
     /// Bytes that wait for the client.
     std::size_t Waiting() const { return output_.size() - written_; }
 
-    /// Nobody is at the other end any more: what waits is for nobody. What was sent can still be read.
-    void Abandon();
-    /// Nobody is there, and all that was sent has been taken.
-    bool Gone() const { return abandoned_ && inputEnded_ && !HasLine(); }
+    /// It has begun a line and not ended it, or has not read what was sent to it.
+    bool Stalls() const { return Waiting() > 0 || (!input_.empty() && !HasLine()); }
+    /// When it last went on: began or ended a line, was sent the first of what waits, or read some of it.
+    Clock::time_point LastProgress() const { return lastProgress_; }
+
+    /// Nobody is at the other end: nothing is sent any more. What has come is still there to be read.
+    bool Broken() const { return broken_; }
+    void Break();
 
  private:
     const int descriptor_;
@@ -48,8 +55,9 @@ class ControlClient {
     std::string output_;
     /// Bytes of `output_` that are written.
     std::size_t written_ = 0;
+    Clock::time_point lastProgress_ = Clock::now();
     bool inputEnded_ = false;
-    bool abandoned_ = false;
+    bool broken_ = false;
 };
 
 }  // namespace receiver

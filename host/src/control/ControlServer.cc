@@ -5,6 +5,7 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <utility>
 #include <vector>
 
 #include "control/JsonRpc.h"
@@ -36,10 +37,12 @@ void ControlServer::Serve() {
     for (std::size_t i = 0; i < ids.size(); ++i) {
         Connection& connection = clients_.at(ids[i]);
         const int happened = polled[i + 2].revents;
-        if ((happened & POLLIN) != 0) {
+        if ((happened & (POLLHUP | POLLERR)) != 0) {
+            // Nobody reads answers any more; what was asked before is carried out.
+            connection.client.Break();
+        }
+        if (happened != 0 && Reads(connection)) {
             connection.client.Read();
-        } else if ((happened & (POLLHUP | POLLERR)) != 0) {
-            connection.client.Abandon();
         }
         TakeInput(ids[i], connection);
         connection.client.Write();
@@ -81,7 +84,7 @@ void ControlServer::Send(ClientId client, const std::string& line) {
 
 bool ControlServer::Tell(ClientId client, const std::string& line, const std::string& last) {
     const auto found = clients_.find(client);
-    if (found == clients_.end() || found->second.leaves) {
+    if (found == clients_.end() || found->second.leaves || found->second.client.Broken()) {
         return false;
     }
     if (found->second.client.Waiting() > kMostWaiting) {
@@ -125,6 +128,7 @@ void ControlServer::Accept() {
         }
         return;
     }
+    MakePlace();
     if (clients_.size() >= kMostClients) {
         ControlClient refused(descriptor);
         refused.Send(RpcErrorAnswer(nullptr, {RpcCode::kTooManyClients, "too many clients are connected"}));
@@ -132,6 +136,21 @@ void ControlServer::Accept() {
         return;
     }
     clients_.try_emplace(next_++, descriptor);
+}
+
+void ControlServer::MakePlace() {
+    if (clients_.size() < kMostClients) {
+        return;
+    }
+    const auto key = [this](const auto& client) {
+        return std::pair(handler_.Owes(client.first), client.second.client.LastProgress());
+    };
+    const auto idle = std::ranges::min_element(clients_, {}, key);
+    const auto [waits, progress] = key(*idle);
+    if (!waits && Clock::now() - progress >= patience_) {
+        handler_.OnGone(idle->first);
+        clients_.erase(idle);
+    }
 }
 
 void ControlServer::TakeInput(ClientId id, Connection& connection) {
@@ -158,10 +177,10 @@ void ControlServer::RemoveGone() {
     for (auto next = clients_.begin(); next != clients_.end();) {
         const auto at = next++;
         const Connection& connection = at->second;
-        const bool over =
-            connection.leaves && (connection.client.Waiting() == 0 || now >= *connection.leaves);
-        // What a client has sent before it went is carried out.
-        if (over || connection.client.Gone()) {
+        const ControlClient& client = connection.client;
+        const bool stalls = client.Stalls() && now - client.LastProgress() >= patience_;
+        const bool over = connection.leaves && (client.Waiting() == 0 || now >= *connection.leaves);
+        if (stalls || over || (client.Broken() && client.InputEnded() && !client.HasLine())) {
             handler_.OnGone(at->first);
             clients_.erase(at);
         }

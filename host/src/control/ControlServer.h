@@ -55,14 +55,21 @@ class ControlServer final : public LineSenderInterface {
     /// So long a client that is to go may take to read its last lines.
     static constexpr std::chrono::milliseconds kFarewell{5000};
 
+    /// So long a client may leave a line without its end, or what is sent to it unread. Who neither waits for
+    /// something nor has asked for so long makes place for a new client where there is no other.
+    static constexpr std::chrono::milliseconds kPatience{60000};
+
     /// The references must outlive the server.
-    ControlServer(ControlSocket& socket, const WakeUp& wakeUp, LineHandlerInterface& handler)
-        : socket_(socket), wakeUp_(wakeUp), handler_(handler) {}
+    ControlServer(ControlSocket& socket, const WakeUp& wakeUp, LineHandlerInterface& handler,
+                  std::chrono::milliseconds patience = kPatience)
+        : socket_(socket), wakeUp_(wakeUp), handler_(handler), patience_(patience) {}
 
     /// One round: waits until there is something to do, and does it.
     void Serve();
     /// Sends what waits for clients that read it within `patience`.
     void Finish(std::chrono::milliseconds patience);
+    /// Drops all clients at once.
+    void Close() { clients_.clear(); }
 
     std::size_t Clients() const { return clients_.size(); }
 
@@ -85,12 +92,14 @@ class ControlServer final : public LineSenderInterface {
     void EndBehindLast(Connection& connection);
     int TimeoutUntil(std::optional<Clock::time_point> wanted) const;
     void Accept();
+    void MakePlace();
     void TakeInput(ClientId id, Connection& connection);
     void RemoveGone();
 
     ControlSocket& socket_;
     const WakeUp& wakeUp_;
     LineHandlerInterface& handler_;
+    const std::chrono::milliseconds patience_;
     std::map<ClientId, Connection> clients_;
     ClientId next_ = 1;
     /// Nobody is accepted before: no descriptor was left.

@@ -137,6 +137,14 @@ int ControlSocket::Accept() const {
     return accept4(descriptor_, nullptr, nullptr, SOCK_CLOEXEC | SOCK_NONBLOCK);
 }
 
+void ControlSocket::Refuse() const {
+    shutdown(descriptor_, SHUT_RDWR);
+    // Those who wait would wait for ever.
+    for (int client = Accept(); client >= 0; client = Accept()) {
+        close(client);
+    }
+}
+
 void ControlSocket::Remove() {
     struct stat found {};
     if (!removed_ && lstat(path_.c_str(), &found) == 0 && found.st_dev == device_ && found.st_ino == node_) {

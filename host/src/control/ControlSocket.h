@@ -19,6 +19,8 @@ class ControlSocket {
     int Descriptor() const { return descriptor_; }
     /// The next client, ready for use without waiting; -1 when nobody is there.
     int Accept() const;
+    /// Refuses all clients that come from now on.
+    void Refuse() const;
     /// Takes the name away, unless it belongs to somebody else by now. A second time does nothing.
     void Remove();
 

@@ -23,8 +23,8 @@ RpcRequest Refused(RpcRequest request, RpcCode code, const char* sentence) {
 
 RpcRequest ParseRpcRequest(std::string_view line) {
     RpcRequest request;
-    // Its objects are maps: the members of an ordered one are looked for one by one. Values are moved out of
-    // it, since a copy takes a stack as deep as they are nested.
+    // Members in an order of our own: those of an `ordered_json` are looked for one by one, and a line has
+    // room for thousands.
     nlohmann::json message = nlohmann::json::parse(line, nullptr, false);
     if (message.is_discarded()) {
         return Refused(request, RpcCode::kParse, "the line is no JSON");
@@ -40,7 +40,7 @@ RpcRequest ParseRpcRequest(std::string_view line) {
         if (!id->is_string() && !id->is_number() && !id->is_null()) {
             return Refused(request, RpcCode::kInvalidRequest, "id is a text, a number or null");
         }
-        request.id = Json(*id);
+        request.id = *id;
     }
     const auto version = message.find("jsonrpc");
     if (version == message.end() || *version != "2.0") {

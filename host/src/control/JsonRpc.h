@@ -42,7 +42,8 @@ struct RpcRequest {
     /// A text, a number or null. Nothing for a notification, which is not answered.
     std::optional<nlohmann::ordered_json> id;
     std::string method;
-    /// An object or an array; null without one. Nested as deep as a line is long: moved, and never copied.
+    /// An object or an array; null without one. A client decides how deep it is nested: it is moved, and
+    /// never copied, compared or written, which takes a call for each level.
     nlohmann::json params;
     /// Why it is none. `id` is then what could be read of it, else null.
     std::optional<RpcError> error;

@@ -82,7 +82,7 @@ bool HookQueue::Wait(std::chrono::milliseconds patience) {
     });
 }
 
-void HookQueue::End() {
+void HookQueue::GiveUp() {
     {
         const std::lock_guard lock(state_->mutex);
         state_->ending = true;
@@ -92,6 +92,10 @@ void HookQueue::End() {
         state_->changed.notify_all();
     }
     state_->target->End();
+}
+
+void HookQueue::End() {
+    GiveUp();
     thread_.End(kEndPatience);
 }
 

@@ -37,7 +37,9 @@ class HookQueue {
     HookCounts Counts() const;
     /// Waits until all is delivered or given up. False after `patience`.
     bool Wait(std::chrono::milliseconds patience);
-    /// Gives up what is not delivered, and what is posted from now on. A second time does nothing.
+    /// Gives up what is not delivered, and what is posted from now on.
+    void GiveUp();
+    /// The same, and waits for the target, for a bounded time. A second time does nothing.
     void End();
 
  private:

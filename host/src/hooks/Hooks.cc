@@ -47,12 +47,20 @@ HookCounts Hooks::Counts() const {
 
 void Hooks::Settle() {
     const auto deadline = std::chrono::steady_clock::now() + kEndPatience;
+    std::vector<HookQueue*> late;
     for (const auto& queue : queues_) {
         const auto left = std::chrono::duration_cast<std::chrono::milliseconds>(
             deadline - std::chrono::steady_clock::now());
         if (!queue->Wait(std::max(std::chrono::milliseconds(0), left))) {
-            queue->End();
+            late.push_back(queue.get());
         }
+    }
+    // All of them are told before one is waited for.
+    for (HookQueue* const queue : late) {
+        queue->GiveUp();
+    }
+    for (HookQueue* const queue : late) {
+        queue->End();
     }
 }
 

@@ -1,8 +1,12 @@
 #include "hooks/ProgramHook.h"
 
+#include "common/NormalPriority.h"
+
 namespace receiver {
 
 std::optional<std::string> ProgramHook::Deliver(const HookEvent& event) {
+    // Recording comes before what a hook does with the disk.
+    TakeNormalPriority();
     const ChildResult result = child_.Run(
         {.command = {program_}, .environment = event.environment, .input = event.json, .limit = limit_});
     if (result.code == 0) {

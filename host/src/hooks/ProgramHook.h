@@ -10,7 +10,7 @@ namespace receiver {
 
 /// Runs a program for each event, without a shell and without arguments: the facts are in its environment,
 /// and the event as JSON on its standard input. It is killed, with all that it has started in its process
-/// group, when it takes longer than its limit.
+/// group, when it takes longer than its limit. Neither it nor the thread that delivers goes before others.
 class ProgramHook final : public HookTargetInterface {
  public:
     static constexpr std::chrono::seconds kLimit{30};

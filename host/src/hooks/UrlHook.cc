@@ -92,7 +92,7 @@ UrlHook::Attempt UrlHook::Post(const std::string& json) {
     Set(curl, CURLOPT_POSTFIELDS, json.c_str());
     Set(curl, CURLOPT_WRITEFUNCTION, &Ignore);
     Set(curl, CURLOPT_TIMEOUT_MS, static_cast<long>(limit_.count()));
-    // Nobody waits for a name server that does not answer.
+    // A name that is still looked up at the end is left to itself.
     Set(curl, CURLOPT_QUICK_EXIT, 1L);
     // Signals are for the thread that takes them.
     Set(curl, CURLOPT_NOSIGNAL, 1L);

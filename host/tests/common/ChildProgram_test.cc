@@ -88,6 +88,19 @@ TEST(ChildProgram, IsNotWaitedForBehindItsEndForWhatItLeavesBehind) {
     EXPECT_EQ(result.text, "done\n");
 }
 
+TEST(ChildProgram, ThatNeverStopsTalkingIsKilledAtItsLimitToo) {
+    const ChildResult result =
+        ChildProgram().Run({.command = {"/usr/bin/yes"}, .limit = std::chrono::milliseconds(200)});
+    EXPECT_TRUE(result.timedOut);
+    EXPECT_GE(result.text.size(), 16'000u);
+    EXPECT_LT(result.text.size(), 18'000u);
+}
+
+TEST(ChildProgram, MayTalkMoreThanIsKept) {
+    const ChildResult result = ChildProgram().Run({{"/bin/sh", "-c", "head -c 1000000 /dev/zero; exit 5"}});
+    EXPECT_EQ(result.code, 5);
+}
+
 TEST(ChildProgram, IsKilledWithItsRun) {
     ChildProgram program;
     std::thread end([&] { program.End(); });

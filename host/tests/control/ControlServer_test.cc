@@ -69,6 +69,8 @@ class EchoHandler final : public LineHandlerInterface {
 
 class ControlServerTest : public ::testing::Test {
  protected:
+    explicit ControlServerTest(std::chrono::milliseconds patience = ControlServer::kPatience)
+        : server_(socket_, wakeUp_, handler_, patience) {}
     ~ControlServerTest() override { End(std::chrono::milliseconds(0)); }
 
     void End(std::chrono::milliseconds patience) {
@@ -91,7 +93,7 @@ class ControlServerTest : public ::testing::Test {
     WakeUp wakeUp_;
     ControlSocket socket_{Path()};
     EchoHandler handler_;
-    ControlServer server_{socket_, wakeUp_, handler_};
+    ControlServer server_;
     std::atomic<bool> ending_{false};
     std::chrono::milliseconds patience_{0};
     std::thread thread_{[this] {
@@ -305,6 +307,48 @@ TEST_F(ControlServerTest, TheEndDoesNotWaitForWhoDoesNot) {
     EXPECT_TRUE(WaitUntil([this] { return handler_.lines >= 1; }));
     End(std::chrono::milliseconds(1));
     EXPECT_EQ(server_.Clients(), 0u);
+}
+
+class ImpatientControlServerTest : public ControlServerTest {
+ protected:
+    ImpatientControlServerTest() : ControlServerTest(std::chrono::milliseconds(50)) {}
+};
+
+TEST_F(ImpatientControlServerTest, WhoLeavesALineWithoutItsEndIsClosed) {
+    LineClient client(Path());
+    client.Send("whole\n");
+    EXPECT_EQ(client.Line(), "<whole>");
+    client.Send("half");
+    EXPECT_EQ(client.Line(), std::nullopt);
+    EXPECT_TRUE(client.Closed());
+    EXPECT_EQ(handler_.lines, 1);
+}
+
+TEST_F(ImpatientControlServerTest, WhoNeverReadsIsClosed) {
+    LineClient client(Path());
+    client.Send("big\nbig\nbig\nbig\n");
+    EXPECT_TRUE(WaitUntil([this] { return handler_.gone == 1; }));
+}
+
+TEST_F(ImpatientControlServerTest, WhoIsIdleMakesPlaceForWhoComesButNotWhoWaits) {
+    LineClient waiting(Path());
+    waiting.Send("later\n");
+    std::list<LineClient> idle;
+    for (std::size_t i = 1; i < ControlServer::kMostClients; ++i) {
+        idle.emplace_back(Path());
+        idle.back().Send("in\n");
+        EXPECT_EQ(idle.back().Line(), "<in>");
+    }
+    // Until the oldest of them has been idle for long enough.
+    EXPECT_TRUE(WaitUntil([this] {
+        LineClient next(Path());
+        next.Send("next\n");
+        return next.Line() == "<next>";
+    }));
+    EXPECT_EQ(idle.front().Line(), std::nullopt);
+    handler_.settle = true;
+    wakeUp_.Signal();
+    EXPECT_EQ(waiting.Line(), "owed");
 }
 
 }  // namespace

@@ -106,5 +106,28 @@ TEST_F(ControlTest, ADiskThatHangsHoldsUpNeitherTheRunNorItsEnd) {
     EXPECT_TRUE(WaitUntil([&] { return gate.use_count() == 2; }));
 }
 
+TEST_F(ControlTest, AFaultIsToldAndEndsAllConnections) {
+    struct NoException {};
+    const FileSizer fails = [](const std::string&) -> std::optional<std::uint64_t> { throw NoException(); };
+    Control control(Path(), commands_, fails);
+    control.Describe({});
+    control.Displays().front()->FileOpened("/srv/10_00_00_00.MP4");
+    LineClient client(Path());
+    LineClient other(Path());
+    client.Send("{\"jsonrpc\":\"2.0\",\"id\":1,\"method\":\"files\"}\n");
+    EXPECT_EQ(client.Line(), std::nullopt);
+    EXPECT_EQ(other.Line(), std::nullopt);
+    EXPECT_TRUE(other.Closed());
+    std::optional<std::string> fault;
+    EXPECT_TRUE(WaitUntil([&] {
+        fault = control.TakeFault();
+        return fault.has_value();
+    }));
+    EXPECT_EQ(fault, "the control socket serves nobody any more: an error without words");
+    EXPECT_EQ(control.TakeFault(), std::nullopt);
+    EXPECT_THROW(LineClient{Path()}, std::system_error);
+    control.End();
+}
+
 }  // namespace
 }  // namespace receiver

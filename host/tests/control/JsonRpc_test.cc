@@ -1,6 +1,9 @@
 #include "control/JsonRpc.h"
 
 #include <gtest/gtest.h>
+#include <pthread.h>
+
+#include <functional>
 
 namespace receiver {
 namespace {
@@ -10,6 +13,21 @@ using Json = nlohmann::ordered_json;
 RpcCode CodeOf(std::string_view line) {
     const RpcRequest request = ParseRpcRequest(line);
     return request.error ? request.error->Code() : RpcCode{};
+}
+
+/// On a thread whose stack has a megabyte.
+void RunOnASmallStack(std::function<void()> work) {
+    pthread_attr_t attributes;
+    ASSERT_EQ(pthread_attr_init(&attributes), 0);
+    ASSERT_EQ(pthread_attr_setstacksize(&attributes, 1 << 20), 0);
+    const auto run = [](void* argument) -> void* {
+        (*static_cast<std::function<void()>*>(argument))();
+        return nullptr;
+    };
+    pthread_t thread{};
+    ASSERT_EQ(pthread_create(&thread, &attributes, run, &work), 0);
+    pthread_join(thread, nullptr);
+    pthread_attr_destroy(&attributes);
 }
 
 TEST(JsonRpcTest, ReadsARequest) {
@@ -54,18 +72,17 @@ TEST(JsonRpcTest, AnErrorCarriesTheIdWhereThatCanBeRead) {
 }
 
 TEST(JsonRpcTest, DeepNestingIsReadWithoutADeepStack) {
-    const std::string deep(60000, '[');
-    EXPECT_EQ(CodeOf(deep), RpcCode::kParse);
-    EXPECT_EQ(CodeOf(R"({"jsonrpc":"2.0","id":)" + deep + std::string(60000, ']') + "}"),
-              RpcCode::kInvalidRequest);
-}
-
-TEST(JsonRpcTest, ParamsMayBeNestedAsDeepAsALineIsLong) {
-    constexpr std::size_t kDepth = 32700;
-    const RpcRequest request = ParseRpcRequest(R"({"jsonrpc":"2.0","id":1,"method":"x","params":)" +
-                                               std::string(kDepth, '[') + std::string(kDepth, ']') + "}");
-    EXPECT_FALSE(request.error);
-    EXPECT_TRUE(request.params.is_array());
+    // As deep as the longest line of a client can be.
+    const std::string open(32700, '[');
+    const std::string nested = open + std::string(32700, ']');
+    RunOnASmallStack([&] {
+        EXPECT_EQ(CodeOf(open), RpcCode::kParse);
+        EXPECT_EQ(CodeOf(R"({"jsonrpc":"2.0","id":)" + nested + "}"), RpcCode::kInvalidRequest);
+        const RpcRequest request =
+            ParseRpcRequest(R"({"jsonrpc":"2.0","id":1,"method":"x","params":)" + nested + "}");
+        EXPECT_FALSE(request.error);
+        EXPECT_TRUE(request.params.is_array());
+    });
 }
 
 TEST(JsonRpcTest, AnswersErrorsAndNotificationsAreLines) {

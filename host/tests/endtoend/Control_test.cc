@@ -230,6 +230,10 @@ TEST_F(ControlSocketRunTest, HostileClientsHarmNobody) {
     }
     garbage.Send(bytes + "\n");
     EXPECT_EQ(Reply(garbage)["error"]["code"], -32700);
+    LineClient deep(Path());
+    deep.Send(R"({"jsonrpc":"2.0","id":1,"method":"status","params":)" + std::string(32000, '[') +
+              std::string(32000, ']') + "}\n");
+    EXPECT_EQ(Reply(deep)["error"]["code"], -32602);
     LineClient sleeper(Path());
     sleeper.Send(Request("events"));
     for (int i = 0; i < 10; ++i) {

@@ -34,11 +34,15 @@ class FakeTarget final : public HookTargetInterface {
     }
     void End() override {
         const std::lock_guard lock(mutex_);
-        ended_ = true;
+        ended_ = !ignoresEnd_;
         changed_.notify_all();
     }
     std::string Name() const override { return "hook x"; }
 
+    void IgnoreEnd() {
+        const std::lock_guard lock(mutex_);
+        ignoresEnd_ = true;
+    }
     void Hang(bool hangs) {
         const std::lock_guard lock(mutex_);
         hangs_ = hangs;
@@ -59,6 +63,7 @@ class FakeTarget final : public HookTargetInterface {
     std::vector<std::string> told_;
     bool hangs_ = false;
     bool ended_ = false;
+    bool ignoresEnd_ = false;
 };
 
 class HookQueueTest : public ::testing::Test {
@@ -115,6 +120,17 @@ TEST_F(HookQueueTest, TheEndGivesUpWhatIsNotDelivered) {
     queue_.Post(Event("late"));
     EXPECT_EQ(queue_.Counts().failed, 3u);
     EXPECT_TRUE(queue_.Wait(kNow));
+}
+
+TEST_F(HookQueueTest, NobodyWaitsTwiceForATargetThatHearsNoEnd) {
+    target_->IgnoreEnd();
+    target_->Hang(true);
+    queue_.Post(Event("hangs"));
+    target_->WaitUntilTold(1);
+    queue_.GiveUp();
+    EXPECT_TRUE(queue_.Wait(kDeadline));
+    EXPECT_EQ(queue_.Counts().delivered + queue_.Counts().failed, 0u);
+    target_->Hang(false);
 }
 
 }  // namespace

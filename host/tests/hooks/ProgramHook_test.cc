@@ -1,6 +1,9 @@
 #include "hooks/ProgramHook.h"
 
 #include <gtest/gtest.h>
+#include <sys/resource.h>
+#include <sys/syscall.h>
+#include <unistd.h>
 
 #include <filesystem>
 #include <fstream>
@@ -74,6 +77,31 @@ TEST_F(ProgramHookTest, OneThatTakesTooLongIsKilledWithAllThatItHasStarted) {
         }
         EXPECT_EQ(TextOf(process), "");
     }
+}
+
+TEST_F(ProgramHookTest, ItDoesNotGoBeforeOthersAsTheReceiverDoes) {
+    ProgramHook hook(
+        Script("nice > " + Path("nice") + "; ionice -p $$ > " + Path("disk") + "; [ $(nice) -ge 0 ]"));
+    std::thread delivering([&] {
+        // Not everybody may do either. ioprio_set(2): this thread, class best effort, the first one of it.
+        setpriority(PRIO_PROCESS, 0, -5);
+        syscall(SYS_ioprio_set, 1, 0, 2 << 13);
+        EXPECT_EQ(hook.Deliver(event_), std::nullopt) << TextOf(Path("nice"));
+    });
+    delivering.join();
+    EXPECT_NE(TextOf(Path("disk")), "best-effort: prio 0\n");
+}
+
+TEST_F(ProgramHookTest, ItIsNotSparedWhenMemoryRunsOut) {
+    const std::string own = "/proc/self/oom_score_adj";
+    const std::string before = TextOf(own);
+    // Not everybody may.
+    std::ofstream(own) << -500;
+    // It runs already when it loses that.
+    ProgramHook hook(
+        Script("until read -r score < /proc/$$/oom_score_adj && [ \"$score\" -ge 0 ]; do :; done"));
+    EXPECT_EQ(hook.Deliver(event_), std::nullopt);
+    std::ofstream(own) << before;
 }
 
 TEST_F(ProgramHookTest, TheEndKillsIt) {
