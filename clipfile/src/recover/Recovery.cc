@@ -6,6 +6,7 @@
 #include <vector>
 
 #include "common/ToolError.h"
+#include "media/NalUnits.h"
 #include "reader/BigEndian.h"
 #include "reader/RecordingSamples.h"
 #include "recover/DataChunks.h"
