@@ -24,7 +24,7 @@ TEST(NalHead, KnowsSlicesAndWhereAPictureBegins) {
 
 TEST(NalHead, KnowsBPictures) {
     // first_mb_in_slice 0, then slice_type 1 and 6, then the others up to 9.
-    for (const unsigned char code : {0b1'010'0000, 0b1'010'1111, 0b1'00111'00, 0b1'00111'11}) {
+    for (const unsigned char code : Data{0b1'010'0000, 0b1'010'1111, 0b1'00111'00, 0b1'00111'11}) {
         EXPECT_TRUE(ReadNalHead(Data{0x01, code})->startsBPicture) << int{code};
     }
     for (const unsigned char code :
