@@ -28,7 +28,7 @@ TEST(NalHead, KnowsBPictures) {
         EXPECT_TRUE(ReadNalHead(Data{0x01, code})->startsBPicture) << int{code};
     }
     for (const unsigned char code :
-         {0b1'1'000000, 0b1'011'0000, 0b1'00100'00, 0b1'00101'00, 0b1'00110'00, 0b1'0001000}) {
+         Data{0b1'1'000000, 0b1'011'0000, 0b1'00100'00, 0b1'00101'00, 0b1'00110'00, 0b1'0001000}) {
         EXPECT_FALSE(ReadNalHead(Data{0x41, code})->startsBPicture) << int{code};
     }
     // A later slice of a picture: first_mb_in_slice 1.
