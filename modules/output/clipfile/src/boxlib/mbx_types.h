@@ -1,7 +1,6 @@
 // Types of the box library's public interface: status, callbacks, configuration and parameter records.
 //
-// Parameter records are plain structures that a caller fills and a call reads. The library copies what it
-// keeps, pointed-to bytes included, so a record need only live for the length of the call.
+// A caller fills parameter records, and a call copies what it keeps, pointed-to bytes included.
 #pragma once
 
 #include <cstdint>
@@ -29,8 +28,7 @@ enum [[nodiscard]] MbxStatus : uint32_t{
 struct MbxContext;
 // The tree of one output file. Opaque; made by MbxSessionCreate.
 struct MbxSession;
-// The host's handle of one open file. Opaque to the library (see mbx_stdio.h); null where a call only
-// measures.
+// The host's handle of one open file. Opaque (see mbx_stdio.h); null where a call only measures.
 struct MbxFile;
 
 // Contract: callbacks-without-caller. `read`, `tell`, `size`, `strncmp`, `strncpy`, `memcmp`, `memmove`.
@@ -46,8 +44,7 @@ struct MbxCallbacks {
     void* (*alloc)(void* user_data, uint64_t size);  // at least 8-byte aligned memory, or null
     void (*free)(void* user_data, void* pointer);
     int (*strncmp)(void* user_data, const char* a, const char* b, uint64_t n);
-    // The copying entries return the destination, or null when a pointer is null or `capacity` is below
-    // `count`.
+    // The copying entries return the destination, or null for a null pointer or a `capacity` below `count`.
     char* (*strncpy)(void* user_data, char* destination, uint64_t capacity, const char* source,
                      uint64_t count);
     int (*memcmp)(void* user_data, const void* a, const void* b, uint64_t n);
