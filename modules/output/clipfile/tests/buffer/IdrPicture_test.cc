@@ -25,7 +25,10 @@ TEST(IdrPictureTest, TheFirstSliceDecides) {
 }
 
 TEST(IdrPictureTest, AUnitWithoutASliceIsNone) {
-    EXPECT_FALSE(isIdr({}));
+    const unsigned char behind = 0x65;
+    StreamData empty;
+    empty.payload = &behind;
+    EXPECT_FALSE(IsIdrPicture(empty));
     EXPECT_FALSE(isIdr({0x65}));
     EXPECT_FALSE(isIdr({0, 0, 1}));
     EXPECT_FALSE(isIdr({0, 0, 0, 1, 9, 16}));
