@@ -447,7 +447,7 @@ TEST_F(StreamBufferOrder, TheFirstPictureOfAFileIsTheFirstOneShownWhereNoIdrFram
     push(unitsOf(pictures, 1));
     pushMediaUpTo(44);
     harness.buffer->Stop();
-    const auto& chunk = harness.Chunks().at(2);
+    const auto chunk = harness.Chunks().at(2);
     // The 16th picture is decoded first and shown behind the 17th and 18th.
     ASSERT_EQ(pictures[16].shown, 18u);
     ASSERT_EQ(pictures[17].shown, 16u);
