@@ -58,8 +58,9 @@ void CommandDesk::TakeAnswers(std::vector<Outcome>& outcomes) {
         come.swap(answers_->come);
     }
     for (const auto& [number, result] : come) {
-        const auto waiting = std::find_if(waiting_.begin(), waiting_.end(),
-                                          [&](const Waiting& one) { return one.number == number; });
+        const auto waiting =
+            std::find_if(waiting_.begin(), waiting_.end(),
+                         [sought = number](const Waiting& one) { return one.number == sought; });
         if (waiting == waiting_.end()) {
             continue;
         }
