@@ -19,7 +19,7 @@ using libav::Check;
 
 constexpr double kSilence = -120;
 /// Nobody's picture is larger; what claims to be would take the memory of the recording.
-constexpr std::int64_t kMostPixels = 8192 * 4352;
+constexpr std::int64_t kMostPixels = std::int64_t{8192} * 4352;
 /// The encoder's scale from 1 (best) to 31.
 constexpr int kJpegQuality = 4;
 
