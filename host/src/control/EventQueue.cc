@@ -11,13 +11,19 @@ EventQueue::EventQueue(std::function<void()> added)
       display_(stream_) {}
 
 std::vector<std::string> EventQueue::Take() {
-    const std::lock_guard lock(mutex_);
-    std::vector<std::string> taken;
-    if (dropped_ != 0) {
-        taken.push_back(JsonRemark(std::exchange(dropped_, 0)));
+    std::deque<std::string> come;
+    std::uint64_t dropped = 0;
+    {
+        // The thread that tells events must not wait for one of lower priority that copies them.
+        const std::lock_guard lock(mutex_);
+        come.swap(waiting_);
+        dropped = std::exchange(dropped_, 0);
     }
-    std::move(waiting_.begin(), waiting_.end(), std::back_inserter(taken));
-    waiting_.clear();
+    std::vector<std::string> taken;
+    if (dropped != 0) {
+        taken.push_back(JsonRemark(dropped));
+    }
+    std::move(come.begin(), come.end(), std::back_inserter(taken));
     return taken;
 }
 

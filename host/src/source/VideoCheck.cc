@@ -259,8 +259,7 @@ std::string WhyNotPassed(const AVCodecParameters& parameters, const VideoFinding
     }
     if (findings.unordered) {
         return "the video has reordered pictures (B frames), and the source does not tell when they are "
-               "shown: "
-               "set the encoder to no B frames";
+               "shown: set the encoder to no B frames";
     }
     if (!findings.rate) {
         std::array<char, 32> rate{};
