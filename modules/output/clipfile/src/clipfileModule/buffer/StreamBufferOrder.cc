@@ -46,9 +46,11 @@ bool StreamBuffer::isOrderKnown(std::size_t pictures) const {
     // frame no earlier than that is shown.
     const std::uint64_t decoded = std::min(newestVideo, videoBuffer.back()->rtp_timestamp);
     for (std::size_t i = 0; i < std::min(pictures, videoBuffer.size()); ++i) {
+        if (shownAt(*videoBuffer[i]) <= decoded) {
+            continue;
+        }
         const std::size_t idr = findIdrFrom(i + 1);
-        const bool isIdrDecoded = idr < videoBuffer.size() && videoBuffer[idr]->rtp_timestamp <= decoded;
-        if (shownAt(*videoBuffer[i]) > decoded && !isIdrDecoded) {
+        if (idr == videoBuffer.size() || videoBuffer[idr]->rtp_timestamp > decoded) {
             return false;
         }
     }
